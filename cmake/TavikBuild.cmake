@@ -1,0 +1,44 @@
+# Compile and link settings shared by every target, as an interface library, and the helpers that use it.
+
+add_library(tavik_options INTERFACE)
+
+# Includes are written from the root ("common/include/Pointer.h"), and __FILE__ is a path from the root, whatever the
+# build directory: the log takes its file labels from it.
+target_include_directories(tavik_options INTERFACE ${PROJECT_SOURCE_DIR})
+target_compile_options(tavik_options INTERFACE
+  -fmacro-prefix-map=${PROJECT_SOURCE_DIR}/=
+  -Wall -Wextra -Wpedantic -Wconversion -Wshadow
+  $<$<BOOL:${TAVIK_WARNINGS_AS_ERRORS}>:-Werror>)
+
+if(CMAKE_CXX_COMPILER_ID STREQUAL "Clang")
+  target_compile_options(tavik_options INTERFACE -Wthread-safety)
+endif()
+
+if(TAVIK_SANITIZE)
+  target_compile_options(tavik_options INTERFACE
+    -fsanitize=${TAVIK_SANITIZE} -fno-sanitize-recover=all -fno-omit-frame-pointer -g -O1)
+  target_link_options(tavik_options INTERFACE -fsanitize=${TAVIK_SANITIZE})
+else()
+  target_compile_options(tavik_options INTERFACE -fstack-protector-strong
+    $<$<CONFIG:Release,RelWithDebInfo>:-U_FORTIFY_SOURCE -D_FORTIFY_SOURCE=2>)
+  target_link_options(tavik_options INTERFACE -Wl,-z,relro,-z,now -Wl,-z,noexecstack)
+endif()
+
+# tavik_library(NAME SOURCES ... [LINK ...]): a static library of the framework or the agent.
+function(tavik_library aName)
+  cmake_parse_arguments(PARSE_ARGV 1 lArg "" "" "SOURCES;LINK")
+  add_library(${aName} STATIC ${lArg_SOURCES})
+  target_link_libraries(${aName} PUBLIC tavik_options Threads::Threads ${lArg_LINK})
+endfunction()
+
+# tavik_test(NAME SOURCES ... [LINK ...] [TIMEOUT seconds] [LABELS ...]): a GoogleTest program, each case a test of CTest.
+function(tavik_test aName)
+  cmake_parse_arguments(PARSE_ARGV 1 lArg "" "TIMEOUT" "SOURCES;LINK;LABELS")
+  if(NOT lArg_TIMEOUT)
+    set(lArg_TIMEOUT 60)
+  endif()
+  add_executable(${aName} ${lArg_SOURCES})
+  target_link_libraries(${aName} PRIVATE tavik_options ${lArg_LINK} GTest::gmock GTest::gtest_main)
+  gtest_discover_tests(${aName} DISCOVERY_MODE PRE_TEST DISCOVERY_TIMEOUT 60
+    PROPERTIES TIMEOUT ${lArg_TIMEOUT} LABELS "${lArg_LABELS}")
+endfunction()
