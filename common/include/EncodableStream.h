@@ -1,0 +1,71 @@
+/// Typed fields to and from the bytes of a message.
+///
+/// Fields stand back to back without tags or padding; numbers are in network byte order; a string is its 32-bit byte
+/// count and its bytes. What has no width of its own on the wire (bool, char, enumerations, pointers) is refused at
+/// compile time: the writer states the width.
+
+#ifndef COMMON_INCLUDE_ENCODABLESTREAM_H
+#define COMMON_INCLUDE_ENCODABLESTREAM_H
+
+#include <type_traits>
+
+#include "common/include/Buffer.h"
+#include "common/include/Pointer.h"
+#include "common/include/String.h"
+#include "common/include/Types.h"
+
+/// Writes fields into a buffer of its own. Failures are those of ZTCBuffer; no field is ever written in part.
+class ZTCEncodableOutStream {
+public:
+    explicit ZTCEncodableOutStream(Size aInitialCapacity = 0);
+
+    ZTCEncodableOutStream& operator<<(unsigned char aValue);
+    ZTCEncodableOutStream& operator<<(unsigned short aValue);
+    ZTCEncodableOutStream& operator<<(unsigned int aValue);
+    ZTCEncodableOutStream& operator<<(unsigned long aValue);
+    ZTCEncodableOutStream& operator<<(int aValue);
+    ZTCEncodableOutStream& operator<<(long aValue);
+    ZTCEncodableOutStream& operator<<(const ZTCString& acrText);
+
+    template <typename T>
+    requires(std::is_arithmetic_v<T> || std::is_enum_v<T> || std::is_pointer_v<T>) ZTCEncodableOutStream& operator<<(
+        T aValue) = delete;
+
+    /// Writes bytes as they are, without a count.
+    ZTCEncodableOutStream& writeBytes(const void* apBytes, Size aCount);
+
+    /// The buffer that holds what was written so far; shared with the stream.
+    ZTCPointer<ZTCBuffer> getBuffer() const { return mBuffer; }
+
+private:
+    ZTCPointer<ZTCBuffer> mBuffer;
+};
+
+/// Reads fields from a shared buffer, from its first byte on. A field that is not there whole is
+/// ZTCInvalidEx("Not enough data in stream", 6): nothing is read then, and the target is unchanged.
+class ZTCEncodableInStream {
+public:
+    explicit ZTCEncodableInStream(const ZTCPointer<ZTCBuffer>& acrBuffer) : mBuffer(acrBuffer) {}
+
+    ZTCEncodableInStream& operator>>(unsigned char& arValue);
+    ZTCEncodableInStream& operator>>(unsigned short& arValue);
+    ZTCEncodableInStream& operator>>(unsigned int& arValue);
+    ZTCEncodableInStream& operator>>(unsigned long& arValue);
+    ZTCEncodableInStream& operator>>(int& arValue);
+    ZTCEncodableInStream& operator>>(long& arValue);
+    ZTCEncodableInStream& operator>>(ZTCString& arText);
+
+    /// Reads bytes as they are.
+    ZTCEncodableInStream& readBytes(void* apBytes, Size aCount);
+
+    /// The number of bytes not yet read.
+    Size remaining() const;
+
+private:
+    const unsigned char* peek(Size aCount) const;
+
+    ZTCPointer<ZTCBuffer> mBuffer;
+    Size mPosition = 0;
+};
+
+#endif

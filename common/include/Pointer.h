@@ -1,0 +1,192 @@
+/// The reference-counted owning pointer through which every shared object is held.
+///
+/// A pointer is empty, or shares its object with all of its copies; the last of them to go releases the object. Use of
+/// an empty pointer, copying one included, is a bug and ends the process by an assertion. Pointers to one object may
+/// be copied and destroyed on different threads; one pointer is guarded by its owner.
+
+#ifndef COMMON_INCLUDE_POINTER_H
+#define COMMON_INCLUDE_POINTER_H
+
+#include <cstddef>
+#include <cstdlib>
+#include <type_traits>
+
+#include "common/include/Assert.h"
+#include "common/include/Exception.h"
+#include "common/include/Memory.h"
+#include "common/include/ReferenceCount.h"
+
+/// What a pointer points to.
+enum ZTEPointerSizeType : unsigned char {
+    ZTPST_None = 0,
+    ZTPST_Individual = 1,  ///< one object
+    ZTPST_Array = 2,       ///< an array made with array new
+    ZTPST_Max = 3
+};
+
+/// How it was allocated.
+enum ZTEPointerAllocType : unsigned char {
+    ZTPAT_None = 0,
+    ZTPAT_New = 1,     ///< new or array new; released by the matching delete
+    ZTPAT_Malloc = 2,  ///< malloc; released by free, without a destructor
+    ZTPAT_Max = 3
+};
+
+template <typename T>
+class ZTCPointer {
+public:
+    /// An empty pointer.
+    ZTCPointer() noexcept = default;
+
+    /// Takes ownership, also when it throws. A null object is the result of an allocation that failed:
+    /// ZTCNoMemoryEx("Out of Memory", 2).
+    ZTCPointer(T* apObject, ZTEPointerSizeType aSizeType = ZTPST_Individual, ZTEPointerAllocType aAllocType = ZTPAT_New)
+        : mPointer(apObject), mSizeType(aSizeType), mAllocType(aAllocType) {
+        if (nullptr == mPointer) {
+            throw ZTCNoMemoryEx("Out of Memory", gcErrNoMemory);
+        }
+        mReferenceCount = NEW ZTCReferenceCount(1);
+        if (nullptr == mReferenceCount) {
+            _releaseMemory();
+            throw ZTCNoMemoryEx("Out of Memory", gcErrNoMemory);
+        }
+    }
+
+    /// Shares the object. Copying an empty pointer is fatal.
+    ZTCPointer(const ZTCPointer& acrCopy) {
+        ZT_ASSERT(0 != acrCopy.mPointer);
+        ZT_ASSERT(0 != acrCopy.mReferenceCount);
+        shareFieldsOf(acrCopy);
+    }
+
+    /// Shares the object of a pointer to a class derived from T. The same rules as for copying; T needs a virtual
+    /// destructor, since the release may come through it, and arrays cannot be converted.
+    template <typename Derived>
+    requires(!std::is_same_v<Derived, T> && std::is_convertible_v<Derived*, T*>)
+        ZTCPointer(const ZTCPointer<Derived>& acrCopy) {
+        static_assert(
+            std::is_same_v<std::remove_cv_t<Derived>, std::remove_cv_t<T>> || std::has_virtual_destructor_v<T>,
+            "an object is released through a base class only by a virtual destructor");
+        ZT_ASSERT(0 != acrCopy.mPointer);
+        ZT_ASSERT(0 != acrCopy.mReferenceCount);
+        ZT_ASSERT(ZTPST_Individual == acrCopy.mSizeType);
+        shareFieldsOf(acrCopy);
+    }
+
+    /// Shares the other object and gives up the own one. Assigning from an empty pointer is fatal.
+    ZTCPointer& operator=(const ZTCPointer& acrCopy) {
+        ZT_ASSERT(0 != acrCopy.mPointer);
+        ZT_ASSERT(0 != acrCopy.mReferenceCount);
+        if (this != &acrCopy) {
+            // The source may live inside of the object that is given up, so that one goes last.
+            ZTCPointer lFormer;
+            lFormer.takeFieldsOf(*this);
+            shareFieldsOf(acrCopy);
+        }
+        return *this;
+    }
+
+    ~ZTCPointer() {
+        if (nullptr != mReferenceCount && 0 == mReferenceCount->decrement()) {
+            _releaseMemory();
+        }
+        clearFields();
+    }
+
+    /// The one object.
+    T* operator->() const {
+        ZT_ASSERT(0 != mPointer);
+        ZT_ASSERT(0 != mReferenceCount);
+        ZT_ASSERT(ZTPST_Individual == mSizeType);
+        return mPointer;
+    }
+
+    /// The object, or the first element of an array.
+    T& operator*() const {
+        ZT_ASSERT(0 != mPointer);
+        ZT_ASSERT(0 != mReferenceCount);
+        switch (mSizeType) {
+            case ZTPST_Individual:
+            case ZTPST_Array:
+                break;
+            default:
+                ZT_NEVER_GET_HERE();
+        }
+        return *mPointer;
+    }
+
+    /// The raw pointer; the object stays owned.
+    T* get() const {
+        ZT_ASSERT(0 != mPointer);
+        ZT_ASSERT(0 != mReferenceCount);
+        return mPointer;
+    }
+
+    /// Compares with a raw pointer: `lPointer != nullptr` asks whether the pointer is not empty.
+    bool operator!=(const T* apOther) const noexcept { return mPointer != apOther; }
+
+private:
+    template <typename Other>
+    friend class ZTCPointer;
+
+    template <typename Other>
+    void shareFieldsOf(const ZTCPointer<Other>& acrCopy) noexcept {
+        mPointer = acrCopy.mPointer;
+        mReferenceCount = acrCopy.mReferenceCount;
+        mSizeType = acrCopy.mSizeType;
+        mAllocType = acrCopy.mAllocType;
+        mReferenceCount->increment();
+    }
+
+    void takeFieldsOf(ZTCPointer& arSource) noexcept {
+        mPointer = arSource.mPointer;
+        mReferenceCount = arSource.mReferenceCount;
+        mSizeType = arSource.mSizeType;
+        mAllocType = arSource.mAllocType;
+        arSource.clearFields();
+    }
+
+    void clearFields() noexcept {
+        mPointer = nullptr;
+        mReferenceCount = nullptr;
+        mSizeType = ZTPST_None;
+        mAllocType = ZTPAT_None;
+    }
+
+    /// Frees the count and the object, each if there is one.
+    void _releaseMemory() {
+        static_assert(sizeof(T) > 0, "an object is released only where its type is complete");
+        delete mReferenceCount;
+        mReferenceCount = nullptr;
+        if (nullptr == mPointer) {
+            return;
+        }
+        switch (mAllocType) {
+            case ZTPAT_New:
+                switch (mSizeType) {
+                    case ZTPST_Individual:
+                        delete mPointer;
+                        break;
+                    case ZTPST_Array:
+                        delete[] mPointer;
+                        break;
+                    default:
+                        ZT_NEVER_GET_HERE();
+                }
+                break;
+            case ZTPAT_Malloc:
+                std::free(const_cast<std::remove_cv_t<T>*>(mPointer));
+                break;
+            default:
+                ZT_NEVER_GET_HERE();
+        }
+    }
+
+    T* mPointer = nullptr;
+    ZTCReferenceCount* mReferenceCount = nullptr;
+    ZTEPointerSizeType mSizeType = ZTPST_None;
+    ZTEPointerAllocType mAllocType = ZTPAT_None;
+    unsigned char mPadding[2] = {0, 0};
+};
+
+#endif

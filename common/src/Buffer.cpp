@@ -1,0 +1,70 @@
+#include "common/include/Buffer.h"
+
+#include <cstdint>
+#include <cstdlib>
+#include <cstring>
+#include <functional>
+#include <limits>
+
+#include "common/include/Exception.h"
+#include "common/include/Memory.h"
+
+static constexpr std::uint64_t gcLargestBuffer = std::numeric_limits<Size>::max();
+static constexpr std::uint64_t gcLeastCapacity = 64;
+
+ZTCBuffer::ZTCBuffer(Size aCapacity) {
+    if (0 != aCapacity) {
+        growTo(aCapacity);
+    }
+}
+
+ZTCBuffer::~ZTCBuffer() {
+    std::free(mpData);
+}
+
+void ZTCBuffer::append(const void* apBytes, Size aCount) {
+    if (0 == aCount) {
+        return;
+    }
+    const std::uint64_t lNeeded = std::uint64_t{mSize} + aCount;
+    if (lNeeded > gcLargestBuffer) {
+        throw ZTCInvalidEx("Buffer cannot hold more than 4294967295 bytes", gcErrInvalid);
+    }
+
+    const unsigned char* lpBytes = static_cast<const unsigned char*>(apBytes);
+    if (lNeeded > mCapacity) {
+        const std::less<const unsigned char*> lIsBefore;
+        const bool lIsOwn = nullptr != mpData && !lIsBefore(lpBytes, mpData) && lIsBefore(lpBytes, mpData + mSize);
+        const std::ptrdiff_t lOffset = lIsOwn ? lpBytes - mpData : 0;
+        const std::uint64_t lDoubled = ZT_MAX(std::uint64_t{mCapacity} * 2, gcLeastCapacity);
+        growTo(static_cast<Size>(ZT_MIN(ZT_MAX(lNeeded, lDoubled), gcLargestBuffer)));
+        if (lIsOwn) {
+            lpBytes = mpData + lOffset;
+        }
+    }
+    std::memmove(mpData + mSize, lpBytes, aCount);
+    mSize = static_cast<Size>(lNeeded);
+}
+
+void ZTCBuffer::resize(Size aSize) {
+    reserve(aSize);
+    if (aSize > mSize) {
+        std::memset(mpData + mSize, 0, aSize - mSize);
+    }
+    mSize = aSize;
+}
+
+void ZTCBuffer::reserve(Size aCapacity) {
+    if (aCapacity > mCapacity) {
+        growTo(aCapacity);
+    }
+}
+
+void ZTCBuffer::growTo(Size aNeeded) {
+    void* const lpData = std::realloc(mpData, aNeeded);
+    if (nullptr == lpData) {
+        throw ZTCNoMemoryEx("Out of Memory", gcErrNoMemory);
+    }
+    mpData = static_cast<unsigned char*>(lpData);
+    mCapacity = aNeeded;
+}
