@@ -1,0 +1,356 @@
+#include "os/common/include/NamedPipe.h"
+
+#include <fcntl.h>
+
+#include <cerrno>
+#include <cinttypes>
+#include <climits>
+
+#include "common/include/Exception.h"
+#include "common/include/Log.h"
+#include "common/include/Memory.h"
+#include "os/common/include/Clib.h"
+#include "os/common/include/ProcessEvents.h"
+
+namespace {
+
+constexpr ::mode_t gcFifoMode = 0600;
+constexpr int gcRetryMilliseconds = 100;
+constexpr int gcNotOpen = 0;
+
+/// Closes a descriptor unless it is released.
+class ZTCDescriptorGuard {
+public:
+    explicit ZTCDescriptorGuard(int aDescriptor) : mDescriptor(aDescriptor) {}
+    ~ZTCDescriptorGuard() { ClibClose(mDescriptor); }
+
+    ZTCDescriptorGuard(const ZTCDescriptorGuard&) = delete;
+    ZTCDescriptorGuard& operator=(const ZTCDescriptorGuard&) = delete;
+
+    int get() const { return mDescriptor; }
+
+    int release() {
+        const int lDescriptor = mDescriptor;
+        mDescriptor = -1;
+        return lDescriptor;
+    }
+
+private:
+    int mDescriptor;
+};
+
+[[noreturn]] void sThrowNoFifo(const char* apPath, ::mode_t aMode) {
+    char lText[512];
+    ClibSprintf(lText, sizeof(lText), "'%s' is %s, not a FIFO; it is left untouched", apPath, ClibFileKind(aMode));
+    throw ZTCInvalidEx(lText);
+}
+
+[[noreturn]] void sThrowOpenFailed(const char* apPath, const char* apReason) {
+    char lText[512];
+    ClibSprintf(lText, sizeof(lText), "Opening the FIFO '%s' failed: %s", apPath, apReason);
+    throw ZTCClibOpenFailedEx(lText);
+}
+
+/// Before the path is opened: opening a device or the like could have effects of its own.
+void sRequireFifo(const char* apPath) {
+    struct stat lStatus {};
+    if (!ClibLstat(apPath, &lStatus)) {
+        sThrowOpenFailed(apPath, "there is none");
+    }
+    if (!S_ISFIFO(lStatus.st_mode)) {
+        sThrowNoFifo(apPath, lStatus.st_mode);
+    }
+}
+
+struct stat sStatusOfFifo(const char* apPath, int aDescriptor) {
+    struct stat lStatus {};
+    ClibFstat(aDescriptor, &lStatus);
+    if (!S_ISFIFO(lStatus.st_mode)) {
+        sThrowNoFifo(apPath, lStatus.st_mode);
+    }
+    return lStatus;
+}
+
+/// Waits for room in the pipe. False when the exit event comes first.
+bool sWaitForRoom(int aDescriptor) {
+    for (;;) {
+        struct pollfd lDescriptors[2] = {{aDescriptor, POLLOUT, 0}, {getExitEvent().getDescriptor(), POLLIN, 0}};
+        if (ClibPoll(lDescriptors, 2, -1) == -EINTR) {
+            continue;
+        }
+        if (lDescriptors[1].revents != 0) {
+            return false;
+        }
+        if (lDescriptors[0].revents != 0) {
+            return true;
+        }
+    }
+}
+
+[[noreturn]] void sThrowWriteFailed(const char* apPath, std::uint64_t aWritten, std::uint64_t aWanted,
+                                    const char* apReason) {
+    char lText[512];
+    ClibSprintf(lText, sizeof(lText), "Writing to '%s' ended after %" PRIu64 " of %" PRIu64 " bytes: %s", apPath,
+                aWritten, aWanted, apReason);
+    throw ZTCClibWriteFailedEx(lText);
+}
+
+}  // namespace
+
+ZTCNamedPipe::ZTCNamedPipe(const ZTCString& acrPath, ZTEFileMode aFileMode, ZTEPipeState aPipeState,
+                           ZTEConnectionMode aConnectionMode)
+    : mPath(acrPath), mPipeState(aPipeState), mFileMode(aFileMode), mConnectionMode(aConnectionMode) {}
+
+ZTCNamedPipe::~ZTCNamedPipe() {
+    close();
+}
+
+void ZTCNamedPipe::create() {
+    if (mConnectionMode == ZTCM_Client) {
+        sRequireFifo(mPath.get());
+        return;
+    }
+    try {
+        ClibMkfifo(mPath.get(), gcFifoMode);
+        return;
+    } catch (const ZTCExistsEx&) {
+        sRequireFifo(mPath.get());
+    }
+    ZT_LOG_INFO("The FIFO '%s' is there already and is taken over", mPath.get());
+}
+
+void ZTCNamedPipe::open() {
+    if (mDescriptor != gcNotOpen) {
+        sThrowOpenFailed(mPath.get(), "it is open already");
+    }
+    switch (mFileMode) {
+        case ZTFM_Read:
+            openForReading();
+            break;
+        case ZTFM_Write:
+            openForWriting();
+            break;
+        default:
+            throw ZTCNotImplementedEx("A FIFO is opened for reading or for writing alone");
+    }
+}
+
+void ZTCNamedPipe::openForReading() {
+    const char* lpPath = mPath.get();
+    sRequireFifo(lpPath);
+    ZTCDescriptorGuard lReader(ClibOpen(lpPath, O_RDONLY | O_NONBLOCK | O_NOFOLLOW));
+    const struct stat lReaderStatus = sStatusOfFifo(lpPath, lReader.get());
+
+    ZTCDescriptorGuard lWriter(ClibOpen(lpPath, O_WRONLY | O_NONBLOCK | O_NOFOLLOW));
+    const struct stat lWriterStatus = sStatusOfFifo(lpPath, lWriter.get());
+    if (lReaderStatus.st_dev != lWriterStatus.st_dev || lReaderStatus.st_ino != lWriterStatus.st_ino) {
+        sThrowOpenFailed(lpPath, "it was replaced meanwhile");
+    }
+    mDescriptor = lReader.release();
+    mOwnWriterDescriptor = lWriter.release();
+}
+
+void ZTCNamedPipe::openForWriting() {
+    const char* lpPath = mPath.get();
+    bool lIsAnnounced = false;
+    for (;;) {
+        sRequireFifo(lpPath);
+        const int lDescriptor = ClibTryOpen(lpPath, O_WRONLY | O_NONBLOCK | O_NOFOLLOW);
+        if (lDescriptor >= 0) {
+            ZTCDescriptorGuard lWriter(lDescriptor);
+            sStatusOfFifo(lpPath, lWriter.get());
+            mDescriptor = lWriter.release();
+            return;
+        }
+        if (lDescriptor != -ENXIO) {
+            sThrowOpenFailed(lpPath, ZTCErrnoText(-lDescriptor).get());
+        }
+        if (mPipeState != ZTNPS_Block) {
+            sThrowOpenFailed(lpPath, "nobody reads it");
+        }
+        if (!lIsAnnounced) {
+            ZT_LOG_NOTICE("Waiting for a reader of '%s'", lpPath);
+            lIsAnnounced = true;
+        }
+        if (getStopEvent().waitFor(gcRetryMilliseconds)) {
+            char lText[512];
+            ClibSprintf(lText, sizeof(lText), "Told to stop while waiting for a reader of '%s'", lpPath);
+            ZT_LOG_NOTICE("%s", lText);
+            throw ZTCExitConditionEx(lText, gcErrStop);
+        }
+    }
+}
+
+void ZTCNamedPipe::close() {
+    if (mDescriptor != gcNotOpen) {
+        ClibClose(mDescriptor);
+        mDescriptor = gcNotOpen;
+    }
+    if (mOwnWriterDescriptor != gcNotOpen) {
+        ClibClose(mOwnWriterDescriptor);
+        mOwnWriterDescriptor = gcNotOpen;
+    }
+    mAssembler.reset();
+}
+
+void ZTCNamedPipe::destroy() {
+    if (mConnectionMode == ZTCM_Client) {
+        return;
+    }
+    struct stat lStatus {};
+    if (!ClibLstat(mPath.get(), &lStatus)) {
+        return;
+    }
+    if (!S_ISFIFO(lStatus.st_mode)) {
+        ZT_LOG_WARN("'%s' is %s now, not a FIFO; it is left where it is", mPath.get(), ClibFileKind(lStatus.st_mode));
+        return;
+    }
+    ClibUnlink(mPath.get());
+}
+
+void ZTCNamedPipe::accept() {}
+
+void ZTCNamedPipe::read(ZTCPointer<ZTCBuffer>& arBuffer, unsigned& arCount) {
+    arCount = 0;
+    if (mAssembler.getState() != ZTFS_Complete) {
+        char lText[512];
+        ClibSprintf(lText, sizeof(lText), "Reading from '%s' failed: no whole message is there", mPath.get());
+        throw ZTCClibReadFailedEx(lText);
+    }
+    arBuffer = mAssembler.take();
+    arCount = arBuffer->getSize();
+}
+
+void ZTCNamedPipe::write(const ZTCPointer<ZTCBuffer>& acrBuffer, unsigned& arCount) {
+    constexpr std::uint64_t lcHeaderSize = ZTCFrameAssembler::gcHeaderSize;
+    arCount = 0;
+
+    // The parts are only read, but the system's structure has no const.
+    Size lHeader = ClibHtonl(acrBuffer->getSize());
+    struct iovec lParts[2] = {{&lHeader, sizeof(lHeader)}, {acrBuffer->getData(), acrBuffer->getSize()}};
+    const std::uint64_t lWanted = lcHeaderSize + acrBuffer->getSize();
+    std::uint64_t lWritten = 0;
+
+    if (mDescriptor == gcNotOpen) {
+        sThrowWriteFailed(mPath.get(), lWritten, lWanted, "it is not open");
+    }
+    while (lWritten < lWanted) {
+        const int lFirst = lParts[0].iov_len > 0 ? 0 : 1;
+        const int lNumberOfParts = lParts[1].iov_len > 0 ? 2 - lFirst : 1;
+        const ::ssize_t lResult = ClibWritev(mDescriptor, lParts + lFirst, lNumberOfParts);
+        if (lResult > 0) {
+            std::size_t lCount = static_cast<std::size_t>(lResult);
+            lWritten += lCount;
+            for (struct iovec& lrPart : lParts) {
+                const std::size_t lOfPart = ZT_MIN(lCount, lrPart.iov_len);
+                if (lOfPart > 0) {
+                    lrPart.iov_base = static_cast<unsigned char*>(lrPart.iov_base) + lOfPart;
+                    lrPart.iov_len -= lOfPart;
+                    lCount -= lOfPart;
+                }
+            }
+            arCount = lWritten > lcHeaderSize ? static_cast<unsigned>(lWritten - lcHeaderSize) : 0;
+        } else if (lResult == 0) {
+            sThrowWriteFailed(mPath.get(), lWritten, lWanted, "it takes nothing");
+        } else if (lResult == -EINTR) {
+            continue;
+        } else if (lResult == -EPIPE) {
+            sThrowWriteFailed(mPath.get(), lWritten, lWanted, "its reader has gone");
+        } else if (!sWaitForRoom(mDescriptor)) {
+            sThrowWriteFailed(mPath.get(), lWritten, lWanted, "the threads are to exit and its reader does not read");
+        }
+    }
+}
+
+void ZTCNamedPipe::waitForActivity(unsigned aSeconds) {
+    waitForActivity(std::chrono::seconds(aSeconds));
+}
+
+void ZTCNamedPipe::waitForActivity(std::chrono::milliseconds aTime) {
+    const std::int64_t lIdleDeadline = ClibMonotonicMilliseconds() + aTime.count();
+    std::int64_t lDeadline = lIdleDeadline;
+    if (mAssembler.getHad() == 0 && mDescriptor == gcNotOpen) {
+        char lText[512];
+        ClibSprintf(lText, sizeof(lText), "Waiting on '%s' failed: it is not open", mPath.get());
+        throw ZTCClibReadFailedEx(lText);
+    }
+
+    while (mAssembler.getState() != ZTFS_Complete) {
+        const std::int64_t lLeft = ZT_MAX(lDeadline - ClibMonotonicMilliseconds(), std::int64_t{0});
+        const int lMilliseconds = static_cast<int>(ZT_MIN(lLeft, std::int64_t{INT_MAX}));
+        struct pollfd lDescriptors[2] = {{mDescriptor, POLLIN, 0}, {getExitEvent().getDescriptor(), POLLIN, 0}};
+        const int lReady = ClibPoll(lDescriptors, 2, lMilliseconds);
+        if (lReady == -EINTR) {
+            continue;
+        }
+        if (lDescriptors[1].revents != 0) {
+            return;
+        }
+        if (lReady == 0) {
+            if (lLeft > lMilliseconds) {
+                continue;
+            }
+            if (mAssembler.getHad() > 0) {
+                discardPartialFrame();
+            }
+            throw ZTCTimeOutEx();
+        }
+        if (readAvailable()) {
+            lDeadline = ClibMonotonicMilliseconds() + aTime.count();
+        }
+        if (mAssembler.getState() == ZTFS_BadLength) {
+            discardBrokenFrame();
+            lDeadline = lIdleDeadline;
+        }
+    }
+}
+
+/// Reads once. True where bytes came.
+bool ZTCNamedPipe::readAvailable() {
+    const ::ssize_t lCount = ClibRead(mDescriptor, mAssembler.getSpace(), mAssembler.getWanted());
+    if (lCount == -EINTR || lCount == -EAGAIN) {
+        return false;
+    }
+    if (lCount == 0) {
+        // The own writing end rules this out; going on would spin.
+        char lText[512];
+        ClibSprintf(lText, sizeof(lText), "Reading from '%s' failed: unexpected end of file", mPath.get());
+        throw ZTCClibReadFailedEx(lText);
+    }
+    mAssembler.commit(static_cast<Size>(lCount));
+    return true;
+}
+
+void ZTCNamedPipe::discardBrokenFrame() {
+    const Size lLength = mAssembler.getLength();
+    mAssembler.reset();
+    const std::size_t lDrained = drain();
+    ZT_LOG_ERR(
+        "A message of %u bytes on '%s' is refused, its length has to be 1 to %u; %zu bytes behind it are thrown away",
+        lLength, mPath.get(), ZTCFrameAssembler::gcMaxRequestSize, lDrained);
+}
+
+void ZTCNamedPipe::discardPartialFrame() {
+    ZT_LOG_ERR("A message on '%s' broke off after %u of %" PRIu64 " bytes, its length included; it is thrown away",
+               mPath.get(), mAssembler.getHad(), mAssembler.getTotal());
+    mAssembler.reset();
+}
+
+/// Throws away what waits in the pipe now, and says how much that was. What is written meanwhile is left, so that a
+/// sensor that writes without end does not keep this from ending.
+std::size_t ZTCNamedPipe::drain() {
+    const std::size_t lWaiting = ClibBytesWaiting(mDescriptor);
+    std::size_t lDrained = 0;
+    while (lDrained < lWaiting) {
+        unsigned char lScrap[4096];
+        const ::ssize_t lCount = ClibRead(mDescriptor, lScrap, ZT_MIN(lWaiting - lDrained, sizeof(lScrap)));
+        if (lCount == -EINTR) {
+            continue;
+        }
+        if (lCount <= 0) {
+            break;
+        }
+        lDrained += static_cast<std::size_t>(lCount);
+    }
+    return lDrained;
+}

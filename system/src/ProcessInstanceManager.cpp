@@ -1,0 +1,270 @@
+#include "system/include/ProcessInstanceManager.h"
+
+#include <fcntl.h>
+#include <signal.h>
+#include <unistd.h>
+
+#include <cerrno>
+#include <iostream>
+
+#include "common/include/Exception.h"
+#include "common/include/Log.h"
+#include "os/common/include/Clib.h"
+
+namespace {
+
+constexpr ::mode_t gcPidFileMode = 0644;
+
+// Who looks whether the lock is held takes it for a moment (see sLookUp): one refusal proves nothing.
+constexpr int gcLockTries = 10;
+constexpr int gcLockPauseMilliseconds = 10;
+
+// Each round needs somebody who replaces the file in between.
+constexpr int gcReplacedTries = 100;
+
+constexpr int gcPollMilliseconds = 20;
+
+constexpr std::int32_t gcNoPid = 0;    // the file is empty
+constexpr std::int32_t gcBadPid = -1;  // it holds something else than a process id
+
+/// The process id that the text is, with blanks and line breaks around it allowed.
+std::int32_t sParsePid(const char* apText) {
+    const auto lIsBlank = [](char aCharacter) {
+        return aCharacter == ' ' || aCharacter == '\t' || aCharacter == '\n' || aCharacter == '\r';
+    };
+    while (lIsBlank(*apText)) {
+        ++apText;
+    }
+    if (*apText == '\0') {
+        return gcNoPid;
+    }
+    std::int64_t lPid = 0;
+    for (; *apText >= '0' && *apText <= '9'; ++apText) {
+        lPid = lPid * 10 + (*apText - '0');
+        if (lPid > INT32_MAX) {
+            return gcBadPid;
+        }
+    }
+    while (lIsBlank(*apText)) {
+        ++apText;
+    }
+    return *apText == '\0' && lPid > 0 ? static_cast<std::int32_t>(lPid) : gcBadPid;
+}
+
+/// The process id in the file that the descriptor stands at the beginning of.
+std::int32_t sReadPid(int aDescriptor) {
+    char lText[64] = {};
+    std::size_t lHad = 0;
+    while (lHad < sizeof(lText)) {
+        const ::ssize_t lCount = ClibRead(aDescriptor, lText + lHad, sizeof(lText) - lHad);
+        if (lCount == -EINTR) {
+            continue;
+        }
+        if (lCount <= 0) {
+            break;
+        }
+        lHad += static_cast<std::size_t>(lCount);
+    }
+    if (lHad == sizeof(lText)) {
+        return gcBadPid;
+    }
+    return sParsePid(lText);
+}
+
+void sRequireRegularFile(const char* apPath, int aDescriptor) {
+    struct stat lStatus {};
+    ClibFstat(aDescriptor, &lStatus);
+    if (!S_ISREG(lStatus.st_mode)) {
+        char lText[512];
+        ClibSprintf(lText, sizeof(lText), "The pid file '%s' is %s, not a regular file; it is left untouched", apPath,
+                    ClibFileKind(lStatus.st_mode));
+        throw ZTCInvalidEx(lText);
+    }
+}
+
+bool sIsAtPath(const char* apPath, int aDescriptor) {
+    struct stat lOfPath {};
+    struct stat lOfFile {};
+    ClibFstat(aDescriptor, &lOfFile);
+    return ClibLstat(apPath, &lOfPath) && lOfPath.st_dev == lOfFile.st_dev && lOfPath.st_ino == lOfFile.st_ino;
+}
+
+/// Closes a descriptor at the end of a scope.
+class ZTCOpenFile {
+public:
+    explicit ZTCOpenFile(int aDescriptor) : mDescriptor(aDescriptor) {}
+    ~ZTCOpenFile() { ClibClose(mDescriptor); }
+
+    ZTCOpenFile(const ZTCOpenFile&) = delete;
+    ZTCOpenFile& operator=(const ZTCOpenFile&) = delete;
+
+    int get() const { return mDescriptor; }
+
+    int release() {
+        const int lDescriptor = mDescriptor;
+        mDescriptor = -1;
+        return lDescriptor;
+    }
+
+private:
+    int mDescriptor;
+};
+
+struct ZTSHolder {
+    bool mIsThere;
+    std::int32_t mProcessId;  // above 0, gcNoPid or gcBadPid
+};
+
+/// Who holds the lock of the pid file.
+ZTSHolder sLookUp(const char* apPath) {
+    const ZTCOpenFile lFile(ClibTryOpen(apPath, O_RDONLY | O_NONBLOCK | O_NOFOLLOW));
+    if (lFile.get() == -ENOENT) {
+        return {false, gcNoPid};
+    }
+    if (lFile.get() < 0) {
+        char lText[512];
+        ClibSprintf(lText, sizeof(lText), "Opening the pid file '%s' failed: %s", apPath,
+                    ZTCErrnoText(-lFile.get()).get());
+        throw ZTCClibOpenFailedEx(lText);
+    }
+    sRequireRegularFile(apPath, lFile.get());
+    if (ClibTryLock(lFile.get())) {
+        return {false, gcNoPid};
+    }
+    return {true, sReadPid(lFile.get())};
+}
+
+[[noreturn]] void sThrowNoStatus(const char* apPath, const char* apReason) {
+    char lText[512];
+    ClibSprintf(lText, sizeof(lText), "No running process is named by the pid file '%s': %s", apPath, apReason);
+    throw ZTCClibGetProcStatusFailedEx(lText);
+}
+
+}  // namespace
+
+ZTCProcessInstanceManager::ZTCProcessInstanceManager(const ZTCString& acrPidFilePath,
+                                                     std::chrono::milliseconds aKillTimeout)
+    : mPidFilePath(acrPidFilePath), mKillTimeout(aKillTimeout) {}
+
+ZTCProcessInstanceManager::~ZTCProcessInstanceManager() {
+    ClibClose(mDescriptor);
+}
+
+bool ZTCProcessInstanceManager::isAnInstanceRunning() {
+    if (mIsLocked) {
+        return false;
+    }
+    const char* lpPath = mPidFilePath.get();
+    int lLockTries = 0;
+    for (int lReplacedTries = 0; lReplacedTries < gcReplacedTries;) {
+        ZTCOpenFile lFile(ClibOpen(lpPath, O_RDWR | O_CREAT | O_NONBLOCK | O_NOFOLLOW, gcPidFileMode));
+        sRequireRegularFile(lpPath, lFile.get());
+        if (!ClibTryLock(lFile.get())) {
+            if (++lLockTries < gcLockTries) {
+                ClibSleep(gcLockPauseMilliseconds);
+                continue;
+            }
+            const std::int32_t lProcessId = sReadPid(lFile.get());
+            mProcessId = lProcessId > 0 ? lProcessId : -1;
+            return true;
+        }
+        if (sIsAtPath(lpPath, lFile.get())) {
+            ClibFtruncate(lFile.get(), 0);
+            mDescriptor = lFile.release();
+            mIsLocked = true;
+            mProcessId = -1;
+            return false;
+        }
+        ++lReplacedTries;
+    }
+    char lText[512];
+    ClibSprintf(lText, sizeof(lText), "Locking the pid file '%s' failed: it was replaced %d times", lpPath,
+                gcReplacedTries);
+    throw ZTCClibLockFailedEx(lText);
+}
+
+void ZTCProcessInstanceManager::markAsRunning() {
+    if (isAnInstanceRunning()) {
+        char lText[512];
+        ClibSprintf(lText, sizeof(lText), "The pid file '%s' is locked by another process", mPidFilePath.get());
+        throw ZTCExistsEx(lText);
+    }
+    char lPid[32];
+    const int lLength = ClibSprintf(lPid, sizeof(lPid), "%d\n", static_cast<int>(::getpid()));
+    ClibFtruncate(mDescriptor, 0);
+    ClibPwriteAll(mDescriptor, lPid, static_cast<std::size_t>(lLength), 0);
+    mProcessId = static_cast<std::int32_t>(::getpid());
+    allowLogRotation(true);
+}
+
+void ZTCProcessInstanceManager::killRunningInstance() {
+    const char* lpPath = mPidFilePath.get();
+    const std::int64_t lDeadline = ClibMonotonicMilliseconds() + mKillTimeout.count();
+    std::int32_t lAsked = 0;
+    for (;;) {
+        const ZTSHolder lHolder = sLookUp(lpPath);
+        if (lAsked == 0 && !lHolder.mIsThere) {
+            std::cout << "No running instance is named by '" << lpPath << "'" << std::endl;
+            return;
+        }
+        const bool lHasGivenUp = !lHolder.mIsThere || lHolder.mProcessId != lAsked;
+        if (lAsked != 0 && lHasGivenUp && !ClibIsProcessAlive(lAsked)) {
+            std::cout << "Stopped the running instance, process " << lAsked << std::endl;
+            return;
+        }
+        if (lAsked == 0 && lHolder.mProcessId > 0 && ClibKill(lHolder.mProcessId, SIGTERM)) {
+            lAsked = lHolder.mProcessId;
+        }
+        if (ClibMonotonicMilliseconds() >= lDeadline) {
+            break;
+        }
+        ClibSleep(gcPollMilliseconds);
+    }
+    if (lAsked != 0) {
+        std::cout << "Asked the running instance, process " << lAsked << ", to stop; it has not ended within "
+                  << mKillTimeout.count() << " ms" << std::endl;
+    } else {
+        std::cout << "The pid file '" << lpPath << "' is locked, but named no process within " << mKillTimeout.count()
+                  << " ms" << std::endl;
+    }
+}
+
+void ZTCProcessInstanceManager::exitInstanceManagement() {
+    if (!mIsLocked) {
+        return;
+    }
+    // The lock goes last: whoever gets it then finds that the file is not at its path any more.
+    const ZTCOpenFile lFile(mDescriptor);
+    mDescriptor = -1;
+    mIsLocked = false;
+    if (sIsAtPath(mPidFilePath.get(), lFile.get())) {
+        ClibUnlink(mPidFilePath.get());
+    } else {
+        ZT_LOG_WARN("The pid file '%s' is not this process's own any more; it is left where it is", mPidFilePath.get());
+    }
+}
+
+void ZTCProcessInstanceManager::getProcStatus(const ZTCString& acrPidFilePath) const {
+    const char* lpPath = acrPidFilePath.get();
+    const ZTCOpenFile lFile(ClibTryOpen(lpPath, O_RDONLY | O_NONBLOCK));
+    if (lFile.get() < 0) {
+        sThrowNoStatus(lpPath, ZTCErrnoText(-lFile.get()).get());
+    }
+    std::int32_t lProcessId = gcBadPid;
+    try {
+        lProcessId = sReadPid(lFile.get());
+    } catch (const ZTCClibReadFailedEx& acrException) {
+        sThrowNoStatus(lpPath, acrException.what());
+    }
+    if (lProcessId == gcNoPid) {
+        sThrowNoStatus(lpPath, "it is empty");
+    }
+    if (lProcessId == gcBadPid) {
+        sThrowNoStatus(lpPath, "it holds no decimal process id above 0");
+    }
+    if (!ClibIsProcessAlive(lProcessId)) {
+        char lReason[64];
+        ClibSprintf(lReason, sizeof(lReason), "process %d is gone", lProcessId);
+        sThrowNoStatus(lpPath, lReason);
+    }
+}
