@@ -1,0 +1,41 @@
+/// Watches another process's heartbeat file.
+#ifndef TAVIK_CHECKHEARTBEAT_H
+#define TAVIK_CHECKHEARTBEAT_H
+
+#include <cstdint>
+
+#include "common/include/Pointer.h"
+#include "common/include/String.h"
+#include "os/common/include/SystemInterface.h"
+
+/// Looks without progress that make the other process suspect.
+inline constexpr unsigned int MAX_HEARTBEAT_RETRIES = 2;
+
+/// Used by one thread.
+class ZTCCheckHeartbeat {
+public:
+    /// aFileName is the other's heartbeat file and also its pid file. The system is not owned.
+    ZTCCheckHeartbeat(ZTCPointer<ZTCString> aFileName, ZTCSystemInterface* apSystem)
+        : mFileName(aFileName), mpSystemInterface(apSystem), mPrevTime(0), mRetriesDone(0) {}
+    virtual ~ZTCCheckHeartbeat() = default;
+
+    /// One look at the file. The first one never fails; the second look in a row without progress (the file cannot be
+    /// read, or its time has not changed), and every further one until the time changes, throws ZTCHeartbeatFailedEx. A
+    /// modification time of 0 counts as nothing seen yet.
+    void CheckStatus();
+
+    /// Returns where the process named by the file runs, throws ZTCClibGetProcStatusFailedEx where it does not.
+    void getProcStatus();
+
+private:
+    /// Counts a look without progress; true where that makes the other suspect.
+    bool isOutOfRetries();
+
+    ZTCPointer<ZTCString> mFileName;
+    ZTCSystemInterface* mpSystemInterface;
+    std::int64_t mPrevTime;
+    std::uint32_t mRetriesDone;
+    ZTCPointer<ZTCString> mServiceName;
+};
+
+#endif

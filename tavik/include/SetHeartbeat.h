@@ -1,0 +1,21 @@
+/// Touches a heartbeat file, so that whoever watches it sees that its owner is alive.
+#ifndef TAVIK_SETHEARTBEAT_H
+#define TAVIK_SETHEARTBEAT_H
+
+#include "common/include/Pointer.h"
+#include "common/include/String.h"
+
+/// Used by one thread.
+class ZTCSetHeartbeat {
+public:
+    explicit ZTCSetHeartbeat(ZTCPointer<ZTCString> aFileName) : mFileName(aFileName) {}
+    virtual ~ZTCSetHeartbeat() = default;
+
+    /// Sets the file's access and modification time to now. Throws ZTCClibUtimeFailedEx.
+    void SetHeartbeat();
+
+private:
+    ZTCPointer<ZTCString> mFileName;
+};
+
+#endif

@@ -1,0 +1,35 @@
+/// A scope record: one event kind with one set of identifying data, how often it was seen, and when first and last.
+#ifndef TAVIK_TAVIKRECORD_H
+#define TAVIK_TAVIKRECORD_H
+
+#include <cstdint>
+
+#include "common/include/DateTime.h"
+#include "common/include/EncodableStream.h"
+#include "common/include/Pointer.h"
+#include "sensor/agentcommon/include/ScopeData.h"
+
+/// No lock of its own: guarded by the system's previous-data lock until a retrieval has taken it out of the maps.
+class ZTCTavikRecord {
+public:
+    /// One occurrence, now. Shares the data. Throws ZTCNoMemoryEx.
+    explicit ZTCTavikRecord(const ZTCPointer<ZTCScopeData>& acrData);
+    virtual ~ZTCTavikRecord() = default;
+
+    virtual const ZTCPointer<ZTCScopeData>& getScopeData() const { return mScopeData; }
+    virtual ZTCPointer<ZTCScopeData>& getScopeData() { return mScopeData; }
+
+    /// One occurrence more, now. The count wraps at 2^32. Cannot fail, so that what goes with it is committed as one.
+    void incrementOccurrences() noexcept;
+
+    /// Occurrences, begin time, end time, scope data.
+    void encode(ZTCEncodableOutStream& arStream) const;
+
+private:
+    ZTCPointer<ZTCDateTime> mBeginTimeStamp;
+    ZTCPointer<ZTCDateTime> mEndTimeStamp;
+    std::uint32_t mOccurences;
+    ZTCPointer<ZTCScopeData> mScopeData;
+};
+
+#endif

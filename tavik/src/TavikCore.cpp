@@ -1,0 +1,499 @@
+#include "tavik/include/TavikCore.h"
+
+#include <algorithm>
+#include <cstdint>
+#include <cstring>
+#include <exception>
+
+#include "common/include/Exception.h"
+#include "common/include/Log.h"
+#include "common/include/Memory.h"
+#include "os/common/include/Clib.h"
+#include "sensor/agentcommon/include/EventDataRecords.h"
+#include "tavik/include/EventConsolidation.h"
+#include "tavik/include/EventDataBytes.h"
+#include "tavik/include/TavikProtocolHandler.h"
+#include "tavik/include/TavikSystem.h"
+
+namespace {
+
+// ---- Consolidation: one member a kind, each with its own notice and the identity of the last record it started
+// ---------
+
+/// A holder for the name of a previous event. Never destroyed: callbacks may run while the process exits.
+const ZTCPointer<ZTCWorldWideName>& sMakePrevName() {
+    ZTCPointer<ZTCWorldWideName> lName(NEW ZTCWorldWideName());
+    auto* lpHolder = NEW ZTCPointer<ZTCWorldWideName>(lName);
+    if (lpHolder == nullptr) {
+        throw ZTCNoMemoryEx();
+    }
+    return *lpHolder;
+}
+
+void sConsolidatePlogiEvents(const ZTCPointer<ZTCScopeEvent>& acrEvent, unsigned int aBoardId, const void* apData,
+                             bool aIsNew) ZT_REQUIRES(gpTavikSystem->getPrevDataLock()) {
+    ZT_ENTRY();
+    ZT_LOG_NOTICE("Processing PLOGI event Cat=%u SubCat=%u", acrEvent->getCategory(), acrEvent->getSubcategory());
+    static const ZTCPointer<ZTCWorldWideName>& lPrevPortName = sMakePrevName();
+    static const ZTCPointer<ZTCWorldWideName>& lPrevNodeName = sMakePrevName();
+    consolidateEvent(*gpTavikSystem, gcPlogiKind, {{lPrevPortName.get(), lPrevNodeName.get()}, {}}, acrEvent, aBoardId,
+                     apData, aIsNew);
+    ZT_EXIT();
+}
+
+void sConsolidatePrloEvents(const ZTCPointer<ZTCScopeEvent>& acrEvent, unsigned int aBoardId, const void* apData,
+                            bool aIsNew) ZT_REQUIRES(gpTavikSystem->getPrevDataLock()) {
+    ZT_ENTRY();
+    ZT_LOG_NOTICE("Processing PRLO event Cat=%u SubCat=%u", acrEvent->getCategory(), acrEvent->getSubcategory());
+    static const ZTCPointer<ZTCWorldWideName>& lPrevPortName = sMakePrevName();
+    consolidateEvent(*gpTavikSystem, gcPrloKind, {{lPrevPortName.get()}, {}}, acrEvent, aBoardId, apData, aIsNew);
+    ZT_EXIT();
+}
+
+void sConsolidateAdiscEvents(const ZTCPointer<ZTCScopeEvent>& acrEvent, unsigned int aBoardId, const void* apData,
+                             bool aIsNew) ZT_REQUIRES(gpTavikSystem->getPrevDataLock()) {
+    ZT_ENTRY();
+    ZT_LOG_NOTICE("Processing ADISC event Cat=%u SubCat=%u", acrEvent->getCategory(), acrEvent->getSubcategory());
+    static const ZTCPointer<ZTCWorldWideName>& lPrevPortName = sMakePrevName();
+    static const ZTCPointer<ZTCWorldWideName>& lPrevNodeName = sMakePrevName();
+    consolidateEvent(*gpTavikSystem, gcAdiscKind, {{lPrevPortName.get(), lPrevNodeName.get()}, {}}, acrEvent, aBoardId,
+                     apData, aIsNew);
+    ZT_EXIT();
+}
+
+void sConsolidateLogoEvents(const ZTCPointer<ZTCScopeEvent>& acrEvent, unsigned int aBoardId, const void* apData,
+                            bool aIsNew) ZT_REQUIRES(gpTavikSystem->getPrevDataLock()) {
+    ZT_ENTRY();
+    ZT_LOG_NOTICE("Processing LOGO event Cat=%u SubCat=%u", acrEvent->getCategory(), acrEvent->getSubcategory());
+    static const ZTCPointer<ZTCWorldWideName>& lPrevPortName = sMakePrevName();
+    static const ZTCPointer<ZTCWorldWideName>& lPrevPayloadWwpn = sMakePrevName();
+    consolidateEvent(*gpTavikSystem, gcLogoKind, {{lPrevPortName.get(), lPrevPayloadWwpn.get()}, {}}, acrEvent,
+                     aBoardId, apData, aIsNew);
+    ZT_EXIT();
+}
+
+void sConsolidatePbsyEvents(const ZTCPointer<ZTCScopeEvent>& acrEvent, unsigned int aBoardId, const void* apData,
+                            bool aIsNew) ZT_REQUIRES(gpTavikSystem->getPrevDataLock()) {
+    ZT_ENTRY();
+    ZT_LOG_NOTICE("Processing PORTBUSY event Cat=%u SubCat=%u", acrEvent->getCategory(), acrEvent->getSubcategory());
+    static const ZTCPointer<ZTCWorldWideName>& lPrevPortName = sMakePrevName();
+    consolidateEvent(*gpTavikSystem, gcPortBusyKind, {{lPrevPortName.get()}, {}}, acrEvent, aBoardId, apData, aIsNew);
+    ZT_EXIT();
+}
+
+void sConsolidateLsRjtEvents(const ZTCPointer<ZTCScopeEvent>& acrEvent, unsigned int aBoardId, const void* apData,
+                             bool aIsNew) ZT_REQUIRES(gpTavikSystem->getPrevDataLock()) {
+    ZT_ENTRY();
+    ZT_LOG_NOTICE("Processing LsRjt Event Category=%u SubCat=%u", acrEvent->getCategory(), acrEvent->getSubcategory());
+    static const ZTCPointer<ZTCWorldWideName>& lPrevPortName = sMakePrevName();
+    static unsigned int lPrevLsRjtOrgCmd = 0;
+    consolidateEvent(*gpTavikSystem, gcLsRjtKind, {{lPrevPortName.get()}, {&lPrevLsRjtOrgCmd}}, acrEvent, aBoardId,
+                     apData, aIsNew);
+    ZT_EXIT();
+}
+
+void sConsolidateFcprdChkErrEvents(const ZTCPointer<ZTCScopeEvent>& acrEvent, unsigned int aBoardId, const void* apData,
+                                   bool aIsNew) ZT_REQUIRES(gpTavikSystem->getPrevDataLock()) {
+    ZT_ENTRY();
+    ZT_LOG_NOTICE("Processing FCPRDCHKERR event Cat=%u SubCat=%u", acrEvent->getCategory(), acrEvent->getSubcategory());
+    static const ZTCPointer<ZTCWorldWideName>& lPrevPortName = sMakePrevName();
+    static unsigned int lPrevFcprdChkErrLun = 0;
+    static unsigned int lPrevFcprdChkErrOpCode = 0;
+    consolidateEvent(*gpTavikSystem, gcFcprdChkErrKind,
+                     {{lPrevPortName.get()}, {&lPrevFcprdChkErrLun, &lPrevFcprdChkErrOpCode}}, acrEvent, aBoardId,
+                     apData, aIsNew);
+    ZT_EXIT();
+}
+
+void sConsolidateLunResetEvents(const ZTCPointer<ZTCScopeEvent>& acrEvent, unsigned int aBoardId, const void* apData,
+                                bool aIsNew) ZT_REQUIRES(gpTavikSystem->getPrevDataLock()) {
+    ZT_ENTRY();
+    ZT_LOG_NOTICE("Processing LUN RESET Cat=%u SubCat=%u", acrEvent->getCategory(), acrEvent->getSubcategory());
+    static const ZTCPointer<ZTCWorldWideName>& lPrevPortName = sMakePrevName();
+    consolidateEvent(*gpTavikSystem, gcLunResetKind, {{lPrevPortName.get()}, {}}, acrEvent, aBoardId, apData, aIsNew);
+    ZT_EXIT();
+}
+
+void sConsolidateTargetResetEvents(const ZTCPointer<ZTCScopeEvent>& acrEvent, unsigned int aBoardId, const void* apData,
+                                   bool aIsNew) ZT_REQUIRES(gpTavikSystem->getPrevDataLock()) {
+    ZT_ENTRY();
+    ZT_LOG_NOTICE("Processing TGT RESET Cat=%u SubCat=%u", acrEvent->getCategory(), acrEvent->getSubcategory());
+    static const ZTCPointer<ZTCWorldWideName>& lPrevPortName = sMakePrevName();
+    consolidateEvent(*gpTavikSystem, gcTargetResetKind, {{lPrevPortName.get()}, {}}, acrEvent, aBoardId, apData,
+                     aIsNew);
+    ZT_EXIT();
+}
+
+void sConsolidateVarQDepthEvents(const ZTCPointer<ZTCScopeEvent>& acrEvent, unsigned int aBoardId, const void* apData,
+                                 bool aIsNew) ZT_REQUIRES(gpTavikSystem->getPrevDataLock()) {
+    ZT_ENTRY();
+    ZT_LOG_NOTICE("Processing VARQDEPTH event Cat=%u SubCat=%u", acrEvent->getCategory(), acrEvent->getSubcategory());
+    static const ZTCPointer<ZTCWorldWideName>& lPrevPortName = sMakePrevName();
+    consolidateEvent(*gpTavikSystem, gcVarQDepthKind, {{lPrevPortName.get()}, {}}, acrEvent, aBoardId, apData, aIsNew);
+    ZT_EXIT();
+}
+
+void sConsolidateQFullEvents(const ZTCPointer<ZTCScopeEvent>& acrEvent, unsigned int aBoardId, const void* apData,
+                             bool aIsNew) ZT_REQUIRES(gpTavikSystem->getPrevDataLock()) {
+    ZT_ENTRY();
+    ZT_LOG_NOTICE("Processing QFULL event Cat=%u SubCat=%u", acrEvent->getCategory(), acrEvent->getSubcategory());
+    static const ZTCPointer<ZTCWorldWideName>& lPrevPortName = sMakePrevName();
+    consolidateEvent(*gpTavikSystem, gcQFullKind, {{lPrevPortName.get()}, {}}, acrEvent, aBoardId, apData, aIsNew);
+    ZT_EXIT();
+}
+
+void sConsolidateDevBsyEvents(const ZTCPointer<ZTCScopeEvent>& acrEvent, unsigned int aBoardId, const void* apData,
+                              bool aIsNew) ZT_REQUIRES(gpTavikSystem->getPrevDataLock()) {
+    ZT_ENTRY();
+    ZT_LOG_NOTICE("Processing DEVBSY event Cat=%u SubCat=%u", acrEvent->getCategory(), acrEvent->getSubcategory());
+    static const ZTCPointer<ZTCWorldWideName>& lPrevPortName = sMakePrevName();
+    consolidateEvent(*gpTavikSystem, gcDevBsyKind, {{lPrevPortName.get()}, {}}, acrEvent, aBoardId, apData, aIsNew);
+    ZT_EXIT();
+}
+
+void sConsolidateCheckCondEvents(const ZTCPointer<ZTCScopeEvent>& acrEvent, unsigned int aBoardId, const void* apData,
+                                 bool aIsNew) ZT_REQUIRES(gpTavikSystem->getPrevDataLock()) {
+    ZT_ENTRY();
+    ZT_LOG_NOTICE("Processing CHECKCOND event Cat=%u SubCat=%u", acrEvent->getCategory(), acrEvent->getSubcategory());
+    static const ZTCPointer<ZTCWorldWideName>& lPrevPortName = sMakePrevName();
+    static unsigned int lPrevSensKey = 0;
+    static unsigned int lPrevAsc = 0;
+    consolidateEvent(*gpTavikSystem, gcCheckCondKind, {{lPrevPortName.get()}, {&lPrevSensKey, &lPrevAsc}}, acrEvent,
+                     aBoardId, apData, aIsNew);
+    ZT_EXIT();
+}
+
+void sConsolidateGenericEvents(const ZTCPointer<ZTCScopeEvent>& acrEvent, unsigned int aBoardId, bool aIsNew)
+    ZT_REQUIRES(gpTavikSystem->getPrevDataLock()) {
+    ZT_ENTRY();
+    if (aIsNew) {
+        TavikGeneric lRecord;
+        TavikStore32(lRecord.Version.mBytes, EVENTDATA_VERSION);
+        startScopeRecord(*gpTavikSystem, acrEvent, aBoardId, lRecord.Version.mBytes, sizeof lRecord, nullptr);
+    } else {
+        gpTavikSystem->incrementOccurences();
+    }
+    ZT_EXIT();
+}
+
+/// Where an event goes by its pair: to the member of its kind, or, with no kind of its own, to the generic one.
+struct ZTSDispatch {
+    unsigned char mCategory;
+    unsigned char mSubcategory;
+    const ZTSConsolidationKind* mpKind;  ///< null: the generic member
+    void (*mpMember)(const ZTCPointer<ZTCScopeEvent>&, unsigned int, const void*, bool);
+    const char* mpText;  ///< too short an event; for the generic member the notice in front
+};
+
+const ZTSDispatch gcDispatch[] = {
+    {1, 0x01, &gcPlogiKind, sConsolidatePlogiEvents, "Not enough data in ELS PLOGI Event %u %u"},
+    {1, 0x02, &gcPrloKind, sConsolidatePrloEvents, "Not enough data in ELS PRLO Event %u %u"},
+    {1, 0x04, &gcAdiscKind, sConsolidateAdiscEvents, "Not enough data in ELS ADISC Event %u %u"},
+    {1, 0x08, &gcLsRjtKind, sConsolidateLsRjtEvents, "Not enough data in ELS LSRJT Event %u %u"},
+    {1, 0x10, &gcLogoKind, sConsolidateLogoEvents, "Not enough data in ELS LOGO Event %u %u"},
+    {2, 0x01, nullptr, nullptr, "Processing Fabric BUSY event Cat=%u SubCat=%u"},
+    {2, 0x02, &gcPortBusyKind, sConsolidatePbsyEvents, "Not enough event data in FABRIC PORT BUSY event%u %u"},
+    {2, 0x04, &gcFcprdChkErrKind, sConsolidateFcprdChkErrEvents, "Not enough data in FCPRDCHKERR event %u %u"},
+    {4, 0x01, &gcQFullKind, sConsolidateQFullEvents, "Not enough data in SCSI Event %u %u"},
+    {4, 0x02, &gcDevBsyKind, sConsolidateDevBsyEvents, "Not enough data in SCSI Event %u %u"},
+    {4, 0x04, &gcCheckCondKind, sConsolidateCheckCondEvents, "Not enough data in SCSI CHECKCOND Event %u %u"},
+    // A LUN reset that is too short is reported as a target reset.
+    {4, 0x08, &gcLunResetKind, sConsolidateLunResetEvents, "Not enough data in SCSI TGTRESET Event %u %u"},
+    {4, 0x10, &gcTargetResetKind, sConsolidateTargetResetEvents, "Not enough data in SCSI TGTRESET Event %u %u"},
+    {4, 0x20, nullptr, nullptr, "Processing BUSRESET event Cat=%u SubCat=%u"},
+    {4, 0x40, &gcVarQDepthKind, sConsolidateVarQDepthEvents, "Not enough data in SCSI VARQUEDEPTH Event %u %u"},
+    {8, 0x01, nullptr, nullptr, "Processing PORTINTERR event Cat=%u SubCat=%u"},
+    {8, 0x02, nullptr, nullptr, "Processing LINK event Cat=%u SubCat=%u"},
+    {8, 0x04, nullptr, nullptr, "Processing TEMP event Cat=%u SubCat=%u"},
+    {16, 0x01, nullptr, nullptr, "Processing ADAPTER ARRIVAL Event Cat=%u SubCat=%u"},
+};
+
+const ZTSDispatch* sFindDispatch(unsigned char aCategory, unsigned char aSubcategory) {
+    for (const ZTSDispatch& lrDispatch : gcDispatch) {
+        if (lrDispatch.mCategory == aCategory && lrDispatch.mSubcategory == aSubcategory) {
+            return &lrDispatch;
+        }
+    }
+    return nullptr;
+}
+
+int sConsolidateEvents(const ZTCPointer<ZTCScopeEvent>& acrEvent, unsigned int aBoardId, const void* apData,
+                       unsigned int aLength) {
+    ZT_ENTRY();
+    const unsigned int lCategory = acrEvent->getCategory();
+    const unsigned int lSubcategory = acrEvent->getSubcategory();
+    const ZTSDispatch* lpDispatch = sFindDispatch(acrEvent->getCategory(), acrEvent->getSubcategory());
+    {
+        const ZTCPrevDataHold lHold(*gpTavikSystem);
+        const bool lIsNew = !gpTavikSystem->isPrevScopeDataSet() ||
+                            gpTavikSystem->getPrevScopeData()->getCategory() != lCategory ||
+                            gpTavikSystem->getPrevScopeData()->getSubcategory() != lSubcategory ||
+                            gpTavikSystem->getPrevBoardId() != aBoardId;
+        if (lpDispatch != nullptr && lpDispatch->mpKind == nullptr) {
+            ZT_LOG_NOTICE(lpDispatch->mpText, lCategory, lSubcategory);
+            sConsolidateGenericEvents(acrEvent, aBoardId, lIsNew);
+        } else if (lpDispatch != nullptr && aLength < lpDispatch->mpKind->mMinimumLength) {
+            ZT_LOG_WARN(lpDispatch->mpText, lpDispatch->mpKind->mMinimumLength, aLength);
+        } else if (lpDispatch != nullptr) {
+            lpDispatch->mpMember(acrEvent, aBoardId, apData, lIsNew);
+        } else {
+            switch (lCategory) {
+                case ZT_REG_ELS_EVENT:
+                    ZT_LOG_NOTICE("Unknown ELS Event subcategory = %u, ignored", lSubcategory);
+                    break;
+                case ZT_REG_FABRIC_EVENT:
+                    ZT_LOG_NOTICE("Unknown Fabric Event subcategory=%u, ignored", lSubcategory);
+                    break;
+                case ZT_REG_SCSI_EVENT:
+                    ZT_LOG_NOTICE("Unknown Scsi Event subcategory = %u, ignored", lSubcategory);
+                    break;
+                case ZT_REG_BOARD_EVENT:
+                    ZT_LOG_NOTICE("Unknown Board Evt catgory=%u subcatgory=%u ignored", lCategory, lSubcategory);
+                    break;
+                case ZT_REG_ADAPTER_EVENT:
+                    ZT_LOG_NOTICE("Unknown Adapter Evt catgory=%u subcatgory=%u ignored", lCategory, lSubcategory);
+                    break;
+                default:
+                    ZT_LOG_NOTICE("Unknown Category = %u SubCategory = %u, ignored", lCategory, lSubcategory);
+                    break;
+            }
+        }
+    }
+    ZT_EXIT();
+    return 1;
+}
+
+// ---- RSCN: a payload of affected-address pages, each consolidated on its own
+// -------------------------------------------
+
+constexpr unsigned int gcRscnHeaderSize = 4;
+constexpr unsigned int gcRscnPageSize = 4;
+constexpr unsigned int gcRscnMinimumLength = gcRscnHeaderSize + gcRscnPageSize;
+constexpr unsigned int gcRscnFormatMask = 0x03000000;  // 0: a single port's address
+constexpr unsigned int gcRscnAddressMask = 0x00FFFFFF;
+
+const ZTCTavikTarget* sFindFcTarget(unsigned int aFcId) ZT_REQUIRES(gpTavikSystem->getPrevDataLock()) {
+    try {
+        return gpTavikSystem->getFcTarget(aFcId).get();
+    } catch (const ZTCNotFoundEx&) {
+        return nullptr;
+    }
+}
+
+void sConsolidateRscnEvent(const ZTCPointer<ZTCScopeEvent>& acrEvent, unsigned int aBoardId, unsigned int aFcId) {
+    static unsigned int lPrevFcId = 0;
+    ZT_ENTRY();
+    ZT_LOG_NOTICE("Processing Rscn Event Cat=%u SubCat=%u", acrEvent->getCategory(), acrEvent->getSubcategory());
+    {
+        const ZTCPrevDataHold lHold(*gpTavikSystem);
+        if (gpTavikSystem->isPrevScopeDataSet() &&
+            gpTavikSystem->getPrevScopeData()->getCategory() == acrEvent->getCategory() &&
+            gpTavikSystem->getPrevScopeData()->getSubcategory() == acrEvent->getSubcategory() &&
+            gpTavikSystem->getPrevBoardId() == aBoardId && aFcId == lPrevFcId) {
+            gpTavikSystem->incrementOccurences();
+        } else {
+            unsigned char lRecord[sizeof(TavikRscn)];
+            TavikStore32(lRecord + offsetof(TavikRscn, Version), EVENTDATA_VERSION);
+            TavikStore32(lRecord + offsetof(TavikRscn, FcId), aFcId);
+            const bool lIsPortAddress = (aFcId & gcRscnFormatMask) == 0;
+            startScopeRecord(*gpTavikSystem, acrEvent, aBoardId, lRecord, sizeof lRecord,
+                             lIsPortAddress ? sFindFcTarget(aFcId & gcRscnAddressMask) : nullptr);
+            lPrevFcId = aFcId;
+        }
+    }
+    ZT_EXIT();
+}
+
+void sProcessRscnEvent(unsigned int aBoardId, const void* apData, unsigned int aLength,
+                       const ZTCPointer<ZTCScopeEvent>& acrEvent) {
+    ZT_ENTRY();
+    if (aLength < gcRscnMinimumLength) {
+        ZT_LOG_WARN("Not enough data in RSCN Event %u %u", gcRscnMinimumLength, aLength);
+        ZT_EXIT();
+        return;
+    }
+    ZT_LOG_INFO("Got an RSCN event: datalength:%u", aLength);
+    const auto* lpPayload = static_cast<const unsigned char*>(apData);
+    const auto lPayloadLength = static_cast<std::uint16_t>(lpPayload[2] << 8 | lpPayload[3]);
+    if (lPayloadLength == 0) {
+        ZT_LOG_NOTICE("No Payload in RSCN Event");
+        ZT_EXIT();
+        return;
+    }
+    ZT_LOG_INFO("lPayloadLength = %hu", lPayloadLength);
+    // The payload is as long as it says: the library delivers it whole, whatever length goes with it.
+    const auto lPageCount = std::max<std::int16_t>(static_cast<std::int16_t>(lPayloadLength / gcRscnPageSize - 1), 0);
+    for (std::int16_t lPage = 0; lPage < lPageCount; ++lPage) {
+        unsigned int lWord;
+        ClibMemcpy(&lWord, lpPayload + gcRscnHeaderSize + gcRscnPageSize * static_cast<unsigned int>(lPage),
+                   sizeof lWord);
+        sConsolidateRscnEvent(acrEvent, aBoardId, ClibNtohl(lWord));
+    }
+    ZT_EXIT();
+}
+
+// ---- Admission
+// ---------------------------------------------------------------------------------------------------------
+
+void sProcessScopeEvent(const ZTCCallbackEventData* apEventData) {
+    ZT_ENTRY();
+    const unsigned int lBoardId = apEventData->getBoardId();
+    bool lHasRecordList;
+    {
+        const ZTCPrevDataHold lHold(*gpTavikSystem);
+        lHasRecordList = gpTavikSystem->isRecordListExist(lBoardId);
+    }
+    if (!lHasRecordList) {
+        ZT_LOG_ERR("Bad boardid %d in event has been recieved. Event: wwn %s; cat %d; subcat %d.  Skip event!",
+                   static_cast<int>(lBoardId), ZTCWorldWideName(apEventData->getWwpn()).getString().get(),
+                   static_cast<int>(apEventData->getCategory()), static_cast<int>(apEventData->getSubcategory()));
+        ZT_EXIT();
+        return;
+    }
+    const ZTCPointer<ZTCScopeEvent> lEvent(
+        NEW ZTCScopeEvent(static_cast<unsigned char>(apEventData->getCategory()),
+                          static_cast<unsigned char>(apEventData->getSubcategory())));
+    if (lEvent->getCategory() == gcRscnCategory && lEvent->getSubcategory() == gcRscnSubcategory) {
+        sProcessRscnEvent(lBoardId, apEventData->getEventData(), apEventData->getEventDataLength(), lEvent);
+    } else {
+        try {
+            sConsolidateEvents(lEvent, lBoardId, apEventData->getEventData(), apEventData->getEventDataLength());
+        } catch (const ZTCNotFoundEx&) {  // the event's port or board is gone: there is nothing to say about it
+        }
+    }
+    ZT_EXIT();
+}
+
+/// Why an event is not admitted, as the text of a notice that is given the board id; null where it is admitted.
+const char* sFindRefusal(unsigned int aBoardId, const char* apBadBoardText) {
+    if (!mDoScopeCollection) {
+        return "Ignoring the event as Scope data Collection is not enabled.";
+    }
+    if (gpTavikSystem->isTotalLimitOnScopeDataReached()) {
+        return "Ignoring the event as the limit on the total Event Data";
+    }
+    if (!gpTavikSystem->isFcInitiatorExist(aBoardId)) {
+        return apBadBoardText;
+    }
+    return nullptr;
+}
+
+/// The text of the exception that is being handled.
+const char* sGetExceptionText() {
+    try {
+        throw;
+    } catch (const ZTCException& lrException) {
+        return lrException.what();
+    } catch (const std::exception& lrException) {
+        return lrException.what();
+    } catch (...) {
+        return "unknown exception";
+    }
+}
+
+/// The event-kind data of an event and their length; null and 0 where it has none.
+struct ZTSEventBytes {
+    unsigned char* mpData;
+    unsigned int mLength;
+};
+
+ZTSEventBytes sTakeEventBytes(const void* apPayload, std::uint64_t aEventSize) {
+    void* lpData;
+    std::memcpy(&lpData, static_cast<const unsigned char*>(apPayload) + offsetof(ZT_event_payload, zt_payload_data),
+                sizeof lpData);
+    const auto lSize = static_cast<std::uint32_t>(aEventSize);
+    return {static_cast<unsigned char*>(lpData), lSize > ZT_EVENT_HEADER_SIZE ? lSize - ZT_EVENT_HEADER_SIZE : 0};
+}
+
+const unsigned char* sGetInitiatorWwpn(unsigned int aBoardId) {
+    return gpTavikSystem->getFcInitiator(aBoardId)->getWwpn()->getBytes();
+}
+
+}  // namespace
+
+void ScopeCb_Generic(unsigned int aBoardId, HBA_wwn aWwn, unsigned int aCategory, unsigned int aSubcategory, void*,
+                     ZT_event* apEvent) {
+    ZT_ENTRY();
+    try {
+        ZT_TRACE_MSG("Invoking Generic callback with boardId: %u, hba wwn: %s, Cat: %u, subCat: %u", aBoardId,
+                     ZTCWorldWideName(aWwn.wwn).getString().get(), aCategory, aSubcategory);
+        // An unknown board is reported in the words of the link callback.
+        const char* lpRefusal = sFindRefusal(aBoardId, "Ignoring the KpmLink event callback as boardid %d is bad");
+        if (lpRefusal != nullptr) {
+            ZT_LOG_NOTICE(lpRefusal, aBoardId);
+        } else {
+            ZT_event lEvent{};
+            if (apEvent != nullptr) {
+                std::memcpy(&lEvent, apEvent, sizeof lEvent);
+            }
+            ZTSEventBytes lBytes{nullptr, 0};
+            if (lEvent.zt_evt_payload != nullptr) {
+                lBytes = sTakeEventBytes(lEvent.zt_evt_payload, lEvent.zt_evt_size);
+                ZT_TRACE_MSG("Data = %p", static_cast<void*>(lBytes.mpData));
+            }
+            const ZTCCallbackEventData lEventData(aBoardId, aWwn.wwn, aCategory, aSubcategory, lBytes.mpData,
+                                                  lBytes.mLength);
+            sProcessScopeEvent(&lEventData);
+        }
+    } catch (...) {
+        ZT_LOG_ERR("Error: %s, processing event callback", sGetExceptionText());
+    }
+    ZT_EXIT();
+}
+
+void ScopeCb_KpmTemp(unsigned int aBoardId, unsigned int, unsigned int) {
+    ZT_ENTRY();
+    try {
+        ZT_TRACE_MSG("Invoking TEMPERATURE callback with boardId: %u", aBoardId);
+        const char* lpRefusal = sFindRefusal(aBoardId, "Ignoring the KpmTemp event callback as boardid %d is bad");
+        if (lpRefusal != nullptr) {
+            ZT_LOG_NOTICE(lpRefusal, aBoardId);
+        } else {
+            const ZTCCallbackEventData lEventData(aBoardId, sGetInitiatorWwpn(aBoardId), gcTemperatureCategory,
+                                                  gcTemperatureSubcategory, nullptr, 0);
+            sProcessScopeEvent(&lEventData);
+        }
+    } catch (...) {
+        ZT_LOG_ERR("Error: %s, processing event callback", sGetExceptionText());
+    }
+    ZT_EXIT();
+}
+
+void ScopeCb_KpmLink(unsigned int aBoardId, void* apLinkInfo) {
+    ZT_ENTRY();
+    try {
+        ZT_TRACE_MSG("Invoking LINK callback with boardId: %u", aBoardId);
+        const char* lpRefusal = sFindRefusal(aBoardId, "Ignoring the KpmLink event callback as boardid %d is bad");
+        if (lpRefusal != nullptr) {
+            ZT_LOG_NOTICE(lpRefusal, aBoardId);
+        } else {
+            const unsigned char* lpWwpn = nullptr;
+            if (apLinkInfo != nullptr) {
+                lpWwpn = static_cast<const unsigned char*>(apLinkInfo) + offsetof(LINKINFO, a_wwpName);
+            }
+            const ZTCCallbackEventData lEventData(aBoardId, lpWwpn, gcLinkCategory, gcLinkSubcategory, nullptr, 0);
+            sProcessScopeEvent(&lEventData);
+        }
+    } catch (...) {
+        ZT_LOG_ERR("Error: %s, processing event callback", sGetExceptionText());
+    }
+    ZT_EXIT();
+}
+
+void ScopeCb_KpmRscn(unsigned int aBoardId, void* apData, unsigned int aLength) {
+    ZT_ENTRY();
+    try {
+        ZT_TRACE_MSG("Invoking RSCN callback with boardId: %u", aBoardId);
+        const char* lpRefusal = sFindRefusal(aBoardId, "Ignoring the KpmRscn event callback as boardid %d is bad");
+        if (lpRefusal != nullptr) {
+            ZT_LOG_NOTICE(lpRefusal, aBoardId);
+        } else {
+            const ZTCCallbackEventData lEventData(aBoardId, sGetInitiatorWwpn(aBoardId), gcRscnCategory,
+                                                  gcRscnSubcategory, static_cast<unsigned char*>(apData), aLength);
+            sProcessScopeEvent(&lEventData);
+        }
+    } catch (...) {
+        ZT_LOG_ERR("Error: %s, processing event callback", sGetExceptionText());
+    }
+    ZT_EXIT();
+}

@@ -1,0 +1,334 @@
+#include "tavik/include/TavikProtocolHandler.h"
+
+#include <cstdint>
+#include <cstdio>
+
+#include "common/include/Assert.h"
+#include "common/include/EncodableStream.h"
+#include "common/include/Exception.h"
+#include "common/include/Log.h"
+#include "common/include/Memory.h"
+#include "libkpm/include/libkpm.h"
+#include "tavik/include/ScopeEventSubType.h"
+#include "tavik/include/TavikCore.h"
+#include "tavik/include/TavikSystem.h"
+
+ZTCTavikSystem* gpTavikSystem = nullptr;
+std::atomic<bool> mDoScopeCollection(false);
+
+namespace {
+
+constexpr Size gcResponseCapacity = 1024;
+constexpr unsigned gcInitiatorKeySize = 128;
+
+using ZTPCommandHandler = void (ZTCTavikProtocolHandler::*)(const ZTCPointer<ZTCBuffer>&, ZTCPointer<ZTCBuffer>&);
+
+/// By command code.
+constexpr ZTPCommandHandler gcCommandHandlers[] = {
+    &ZTCTavikProtocolHandler::handleStartScopeCommand, &ZTCTavikProtocolHandler::handleGetScopeDataCommand,
+    &ZTCTavikProtocolHandler::handleStopCommand,       &ZTCTavikProtocolHandler::handleRegisterTargetsCommand,
+    &ZTCTavikProtocolHandler::handleShutDownCommand,   &ZTCTavikProtocolHandler::handleSetCollectionPeriodCommand,
+};
+
+/// How the kinds are registered that the library reports per board.
+struct ZTSBoardRegistration {
+    unsigned char mSubcategory;
+    unsigned int mEventType;
+    unsigned int mSize;
+    KPM_EventCallback mpCallback;
+    const char* mpFailedText;
+    const char* mpRegisteredText;
+    bool mIsRequired;  ///< a failure fails the whole command
+};
+
+const ZTSBoardRegistration gcBoardRegistrations[] = {
+    {FC_REG_RSCN_EVENT, FC_REG_RSCN_EVENT, 1024, reinterpret_cast<KPM_EventCallback>(&ScopeCb_KpmRscn),
+     "Failed to register RSCN for Initiator <%s, %s> - Error %u", "Registered RSCN for Initiator <%s, %s>", true},
+    {FC_REG_TEMPERATURE_EVENT, FC_REG_TEMPERATURE_EVENT, 0, reinterpret_cast<KPM_EventCallback>(&ScopeCb_KpmTemp),
+     "Failed to register TEMPERATURE for Initiator <%s, %s> - Error %u",
+     "Registered Temperature Event for Initiator <%s, %s>", false},
+    {FC_REG_LINK_EVENT, FC_REG_LINK_EVENT, sizeof(LINKINFO), reinterpret_cast<KPM_EventCallback>(&ScopeCb_KpmLink),
+     "Failed to register LINK for Initiator <%s, %s> - Error %u", "Registered LINK for Initiator <%s, %s>", true},
+};
+
+/// The library hands the context of a board registration back unread.
+void* const gcpBoardContext = reinterpret_cast<void*>(std::uintptr_t{0xFFFF});
+
+const ZTSBoardRegistration* sFindBoardRegistration(unsigned char aSubcategory) {
+    for (const ZTSBoardRegistration& lrRegistration : gcBoardRegistrations) {
+        if (lrRegistration.mSubcategory == aSubcategory) {
+            return &lrRegistration;
+        }
+    }
+    return nullptr;
+}
+
+bool sIsAccepted(unsigned int aStatus) {
+    return aStatus == KPM_STATUS_SUCCESS || aStatus == KPM_STATUS_INFO_5 || aStatus == KPM_STATUS_NO_SOURCE ||
+           aStatus == KPM_STATUS_INFO_7;
+}
+
+}  // namespace
+
+ZTCTavikProtocolHandler::ZTCTavikProtocolHandler(ZTCTavikSystem* apSystem) : mpTavikSystem(apSystem) {
+    ZT_ENTRY();
+    ZT_ASSERT(__null != this->mpTavikSystem);
+    gpTavikSystem = apSystem;
+    mDoScopeCollection = false;
+    mEventsRegistered = false;
+    ZT_EXIT();
+}
+
+void ZTCTavikProtocolHandler::process(const ZTCPointer<ZTCBuffer>& acrRequest, ZTCPointer<ZTCBuffer>& arResponse) {
+    ZT_ENTRY();
+    ZTCEncodableInStream lStream(acrRequest);
+    unsigned char lType = 0;
+    lStream >> lType;
+    ZT_TRACE_MSG("Command to handle: %u", lType);
+    if (lType >= sizeof gcCommandHandlers / sizeof gcCommandHandlers[0]) {
+        ZT_NEVER_GET_HERE();
+    }
+    (this->*gcCommandHandlers[lType])(acrRequest, arResponse);
+    ZT_EXIT();
+}
+
+void ZTCTavikProtocolHandler::handleStartScopeCommand(const ZTCPointer<ZTCBuffer>& acrRequest,
+                                                      ZTCPointer<ZTCBuffer>& arResponse) {
+    ZT_ENTRY();
+    ZTCEncodableInStream lStream(acrRequest);
+    unsigned char lType = 0;
+    lStream >> lType;
+    ZT_ASSERT(lType == ZTSTVKC_StartScope);
+    unsigned int lMaxEventDataSize = 0;
+    lStream >> lMaxEventDataSize;
+    mpTavikSystem->setMaxEventDataSize(lMaxEventDataSize);
+    mDoScopeCollection = true;
+    if (mEventsRegistered) {
+        ZT_LOG_NOTICE("ScopeEvents Already Registered. Hence Starting ScopeData Collection.");
+        createSuccessResponse(arResponse);
+        ZT_EXIT();
+        return;
+    }
+
+    ZTCLibkpmAbs& lrLibkpm = *mpTavikSystem->getLibkpmAbs();
+    for (const auto& lrEntry : mpTavikSystem->getInitiators()) {
+        const ZTCPointer<ZTCTavikInitiator>& lrInitiator = lrEntry.second;
+        const unsigned int lBoardId = lrInitiator->getBoardId();
+        const ZTCString lWwnn = lrInitiator->getWwnn()->getString();
+        const ZTCString lWwpn = lrInitiator->getWwpn()->getString();
+        for (const ZTCPointer<ZTCScopeEvent>& lrEvent : mpTavikSystem->getEventCatalogue()->getAll()) {
+            unsigned int lStatus = 0;
+            unsigned int lHandle = 0;
+            const unsigned int lCategory = lrEvent->getCategory();
+            const unsigned int lSubcategory = lrEvent->getSubcategory();
+            if (lCategory != gcBoardEventCategory) {
+                lStatus = lrLibkpm.LIBKPM_ZtapiRegEvent(lBoardId, lrInitiator->getWwpn(), lrEvent, mpTavikSystem,
+                                                        &lHandle, &ScopeCb_Generic);
+                if (!sIsAccepted(lStatus)) {
+                    ZT_LOG_ERR("Failed to register event (%u, %u) for Initiator <%s, %s> - Error %u", lCategory,
+                               lSubcategory, lWwnn.get(), lWwpn.get(), lStatus);
+                    createFailedResponse(ZTSAPS_NotAllowed, arResponse);
+                    ZT_EXIT();
+                    return;
+                }
+                ZT_LOG_NOTICE("Registered event (%u, %u) for Initiator <%s, %s>", lCategory, lSubcategory, lWwnn.get(),
+                              lWwpn.get());
+                lrInitiator->addRegEvent(lrEvent, lHandle);
+                continue;
+            }
+
+            const ZTSBoardRegistration* lpRegistration = sFindBoardRegistration(lrEvent->getSubcategory());
+            if (lpRegistration == nullptr) {
+                ZT_TRACE_MSG("Ignore other events for now");
+                continue;
+            }
+            lHandle = lrLibkpm.LIBKPM_KpmRegEvent(lBoardId, lpRegistration->mEventType, gcpBoardContext,
+                                                  lpRegistration->mSize, lpRegistration->mpCallback);
+            // A board registration yields no status, so that a failure shows the one it started with.
+            if (lHandle != 0) {
+                ZT_LOG_NOTICE(lpRegistration->mpRegisteredText, lWwnn.get(), lWwpn.get());
+                lrInitiator->addRegEvent(lrEvent, lHandle);
+            } else if (lpRegistration->mIsRequired) {
+                ZT_LOG_ERR(lpRegistration->mpFailedText, lWwnn.get(), lWwpn.get(), lStatus);
+                createFailedResponse(ZTSAPS_NotAllowed, arResponse);
+                ZT_EXIT();
+                return;
+            } else {
+                ZT_LOG_WARN(lpRegistration->mpFailedText, lWwnn.get(), lWwpn.get(), lStatus);
+            }
+        }
+    }
+    mEventsRegistered = true;
+    createSuccessResponse(arResponse);
+    ZT_EXIT();
+}
+
+void ZTCTavikProtocolHandler::handleGetScopeDataCommand(const ZTCPointer<ZTCBuffer>& acrRequest,
+                                                        ZTCPointer<ZTCBuffer>& arResponse) {
+    ZT_ENTRY();
+    ZTCEncodableInStream lInStream(acrRequest);
+    unsigned char lType = 0;
+    lInStream >> lType;
+    ZT_ASSERT(lType == ZTSTVKC_GetScopeData);
+
+    ZTCEncodableOutStream lOutStream(gcResponseCapacity);
+    lOutStream << static_cast<unsigned char>(ZTRO_ScopeData) << mpTavikSystem->getNumRecordLists();
+
+    ZTCTavikRecordsMap lFreshLists;
+    ZTCTavikRecordsMap lTakenLists;
+    mpTavikSystem->makeRecordLists(lFreshLists);
+    {
+        const ZTCPrevDataHold lHold(*mpTavikSystem);
+        mpTavikSystem->clearPrevScopeData();
+        mpTavikSystem->clearRecordsMap(lTakenLists);
+        mpTavikSystem->addNewRecordListsToRecordsMap(lFreshLists);
+        mpTavikSystem->resetTotalEventDataSize();
+    }
+
+    unsigned int lTotalRecords = 0;
+    for (const auto& lrEntry : lTakenLists) {
+        const ZTCPointer<ZTCTavikRecordList>& lrList = lrEntry.second;
+        try {
+            const ZTCPointer<ZTCTavikInitiator>& lrInitiator = mpTavikSystem->getFcInitiator(lrList->getBoardId());
+            char lKey[gcInitiatorKeySize] = {};
+            std::snprintf(lKey, sizeof lKey, "%s.%s", lrInitiator->getWwnn()->getString().get(),
+                          lrInitiator->getWwpn()->getString().get());
+            lOutStream << ZTCString(lKey);
+        } catch (const ZTCNotFoundEx&) {
+            // The list count in front still counts this list.
+            ZT_LOG_ERR("Bad boardid %d detected during handle GetScopeDataCommand command",
+                       static_cast<int>(lrList->getBoardId()));
+            continue;
+        }
+        lTotalRecords += lrList->size();
+        lrList->encode(lOutStream);
+        ZT_LOG_NOTICE("Wrote <%u> Scope records from record-list", lrList->size());
+        lrList->clear();
+    }
+    arResponse = lOutStream.getBuffer();
+    ZT_LOG_NOTICE("Wrote total <%u> Scope Events", lTotalRecords);
+    ZT_EXIT();
+}
+
+void ZTCTavikProtocolHandler::handleStopCommand(const ZTCPointer<ZTCBuffer>&, ZTCPointer<ZTCBuffer>& arResponse) {
+    ZT_ENTRY();
+    ZT_LOG_NOTICE("Stopping Scope Data Collection.");
+    mDoScopeCollection = false;
+    createSuccessResponse(arResponse);
+    ZT_EXIT();
+}
+
+void ZTCTavikProtocolHandler::handleUnregisterEvents() {
+    ZT_ENTRY();
+    ZTCLibkpmAbs& lrLibkpm = *mpTavikSystem->getLibkpmAbs();
+    const ZTCTavikEventCatalogue& lrCatalogue = *mpTavikSystem->getEventCatalogue();
+    for (const auto& lrEntry : mpTavikSystem->getInitiators()) {
+        const ZTCPointer<ZTCTavikInitiator>& lrInitiator = lrEntry.second;
+        for (auto lRegistration = lrInitiator->r_begin(); lRegistration != lrInitiator->r_end(); ++lRegistration) {
+            const unsigned short lKeyForm = lRegistration->first;
+            const unsigned int lHandle = lRegistration->second;
+            if (lHandle == 0) {
+                continue;
+            }
+            const ZTCPointer<ZTCScopeEvent>* lpEvent;
+            try {
+                lpEvent = &lrCatalogue.get(lKeyForm);
+            } catch (const ZTCNotFoundEx&) {
+                ZT_LOG_ERR("Bad event keyform %d has beed detected in map of registered events", lKeyForm);
+                continue;
+            }
+            const unsigned int lCategory = (*lpEvent)->getCategory();
+            const unsigned int lSubcategory = (*lpEvent)->getSubcategory();
+            if (lCategory == gcBoardEventCategory) {
+                lrLibkpm.LIBKPM_KpmUnregEvent(lrInitiator->getBoardId(), lHandle);
+                continue;
+            }
+            const unsigned int lResult =
+                lrLibkpm.LIBKPM_ZtapiUnregEvent(lrInitiator->getBoardId(), lrInitiator->getWwpn(), lHandle);
+            if (lResult != 0) {
+                ZT_LOG_WARN("Failed to Unregister event (%u, %u) for Initiator <%s, %s> - Error %u", lCategory,
+                            lSubcategory, lrInitiator->getWwnn()->getString().get(),
+                            lrInitiator->getWwpn()->getString().get(), lResult);
+            } else {
+                ZT_LOG_NOTICE("Successfully Unregistered event (%u, %u) for Initiator <%s, %s> ", lCategory,
+                              lSubcategory, lrInitiator->getWwnn()->getString().get(),
+                              lrInitiator->getWwpn()->getString().get());
+            }
+        }
+        lrInitiator->cleanRegs();
+    }
+    mEventsRegistered = false;
+    ZT_EXIT();
+}
+
+void ZTCTavikProtocolHandler::handleRegisterTargetsCommand(const ZTCPointer<ZTCBuffer>& acrRequest,
+                                                           ZTCPointer<ZTCBuffer>& arResponse) {
+    ZT_ENTRY();
+    ZTCEncodableInStream lStream(acrRequest);
+    unsigned char lType = 0;
+    lStream >> lType;
+    ZT_ASSERT(ZTSTVKC_RegisterTargets == lType);
+    unsigned int lTargetCount = 0;
+    lStream >> lTargetCount;
+    if (lTargetCount == 0) {
+        createFailedResponse(ZTSAPS_Invalid, arResponse);
+        ZT_EXIT();
+        return;
+    }
+    for (unsigned int lIndex = 0; lIndex < lTargetCount; ++lIndex) {
+        ZTCPointer<ZTCWorldWideName> lWwnn(NEW ZTCWorldWideName());
+        ZTCPointer<ZTCWorldWideName> lWwpn(NEW ZTCWorldWideName());
+        unsigned int lFcId = 0;
+        lWwnn->decode(lStream);
+        lWwpn->decode(lStream);
+        lStream >> lFcId;
+        const ZTCPointer<ZTCTavikTarget> lTarget(NEW ZTCTavikTarget(lWwnn, lWwpn, lFcId));
+        mpTavikSystem->addFcTarget(lTarget);
+        mpTavikSystem->addWwpnTarget(lTarget);
+    }
+    createSuccessResponse(arResponse);
+    ZT_EXIT();
+}
+
+void ZTCTavikProtocolHandler::handleSetCollectionPeriodCommand(const ZTCPointer<ZTCBuffer>& acrRequest,
+                                                               ZTCPointer<ZTCBuffer>& arResponse) {
+    ZT_ENTRY();
+    ZTCEncodableInStream lStream(acrRequest);
+    unsigned char lType = 0;
+    lStream >> lType;
+    ZT_ASSERT(ZTSTVKC_CollectionPeriod == lType);
+    unsigned int lPeriod = 0;
+    lStream >> lPeriod;
+    if (lPeriod == 0) {
+        createFailedResponse(ZTSAPS_Invalid, arResponse);
+    } else {
+        ZT_LOG_NOTICE("The limit set is %u", gcMaxScopeDataSize);
+        createSuccessResponse(arResponse);
+    }
+    ZT_EXIT();
+}
+
+void ZTCTavikProtocolHandler::handleShutDownCommand(const ZTCPointer<ZTCBuffer>&, ZTCPointer<ZTCBuffer>& arResponse) {
+    ZT_ENTRY();
+    mpTavikSystem->closeLibkpm();
+    createSuccessResponse(arResponse);
+    ZT_THROW(ZTCShutDownEx, "Shutting down Tavik", 19);
+}
+
+void ZTCTavikProtocolHandler::createSuccessResponse(ZTCPointer<ZTCBuffer>& arResponse) {
+    ZT_ENTRY();
+    ZTCEncodableOutStream lStream(gcResponseCapacity);
+    lStream << static_cast<unsigned char>(ZTRO_Success) << static_cast<int>(0);
+    arResponse = lStream.getBuffer();
+    ZT_EXIT();
+}
+
+void ZTCTavikProtocolHandler::createFailedResponse(ZTESensorAgentProtocolStatus aStatus,
+                                                   ZTCPointer<ZTCBuffer>& arResponse) {
+    ZT_ENTRY();
+    ZT_TRACE_MSG("Creating Failed Response...");
+    ZTCEncodableOutStream lStream(gcResponseCapacity);
+    lStream << static_cast<unsigned char>(ZTRO_Failed) << static_cast<unsigned short>(aStatus);
+    arResponse = lStream.getBuffer();
+    ZT_EXIT();
+}
