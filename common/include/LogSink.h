@@ -44,7 +44,7 @@ public:
     using MonotonicClock = std::uint64_t (*)() noexcept;
 
     /// The most bytes of lines that are held before a path is set; further lines count as lines that cannot be written.
-    static constexpr std::size_t gcHeldCapacity = 64 * 1024;
+    static constexpr std::size_t gcHeldCapacity = std::size_t{64} * 1024;
 
     /// The milliseconds between two attempts to open a file that could not be opened or renamed.
     static constexpr std::uint64_t gcRetryIntervalMs = 1000;

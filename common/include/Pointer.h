@@ -32,6 +32,9 @@ enum ZTEPointerAllocType : unsigned char {
     ZTPAT_Max = 3
 };
 
+// The log shows the conditions as they are written here.
+// NOLINTBEGIN(modernize-use-nullptr)
+
 template <typename T>
 class ZTCPointer {
 public:
@@ -155,7 +158,8 @@ private:
 
     /// Frees the count and the object, each if there is one.
     void _releaseMemory() {
-        static_assert(sizeof(T) > 0, "an object is released only where its type is complete");
+        static_assert(
+            requires { sizeof(T); }, "an object is released only where its type is complete");
         delete mReferenceCount;
         mReferenceCount = nullptr;
         if (nullptr == mPointer) {
@@ -188,5 +192,7 @@ private:
     ZTEPointerAllocType mAllocType = ZTPAT_None;
     unsigned char mPadding[2] = {0, 0};
 };
+
+// NOLINTEND(modernize-use-nullptr)
 
 #endif

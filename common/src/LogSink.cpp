@@ -104,7 +104,7 @@ const char* sDescribe(int aError, char* apBuffer, std::size_t aSize) noexcept {
     }
 }
 
-void sPutDigits(char* apDigits, std::size_t aCount, unsigned long aValue) noexcept {
+void sPutDigits(char* apDigits, std::size_t aCount, long aValue) noexcept {
     for (std::size_t i = aCount; i > 0; --i) {
         apDigits[i - 1] = static_cast<char>('0' + aValue % 10);
         aValue /= 10;
@@ -244,17 +244,17 @@ void ZTCLogSink::stamp(char* apStamp) noexcept {
         std::tm lLocal{};
         localtime_r(&lNow.tv_sec, &lLocal);
         std::memcpy(mStamp, "0000-00-00 00:00:00.", lcSecondsLength);
-        sPutDigits(mStamp, 4, static_cast<unsigned long>(lLocal.tm_year + 1900));
-        sPutDigits(mStamp + 5, 2, static_cast<unsigned long>(lLocal.tm_mon + 1));
-        sPutDigits(mStamp + 8, 2, static_cast<unsigned long>(lLocal.tm_mday));
-        sPutDigits(mStamp + 11, 2, static_cast<unsigned long>(lLocal.tm_hour));
-        sPutDigits(mStamp + 14, 2, static_cast<unsigned long>(lLocal.tm_min));
-        sPutDigits(mStamp + 17, 2, static_cast<unsigned long>(lLocal.tm_sec));
+        sPutDigits(mStamp, 4, lLocal.tm_year + 1900L);
+        sPutDigits(mStamp + 5, 2, lLocal.tm_mon + 1L);
+        sPutDigits(mStamp + 8, 2, lLocal.tm_mday);
+        sPutDigits(mStamp + 11, 2, lLocal.tm_hour);
+        sPutDigits(mStamp + 14, 2, lLocal.tm_min);
+        sPutDigits(mStamp + 17, 2, lLocal.tm_sec);
         mStampSecond = lNow.tv_sec;
         mHasStamp = true;
     }
     std::memcpy(apStamp, mStamp, lcSecondsLength);
-    sPutDigits(apStamp + lcSecondsLength, 6, static_cast<unsigned long>(lNow.tv_nsec / 1000));
+    sPutDigits(apStamp + lcSecondsLength, 6, lNow.tv_nsec / 1000);
 }
 
 void ZTCLogSink::hold(const char* apLine, std::size_t aLength) noexcept {

@@ -2,37 +2,36 @@
  * libkpm.h - the interface between the agent and an adapters' library
  *
  * An adapters' library is a shared object that reports the events of a host's Fibre Channel adapters. The agent loads
- * one (the path in the environment variable ZT_LIBKPM_PATH, or libkpm.so.1 where that is unset), asks it for its table of
- * functions with KPM_GetFunctionList, and reaches everything else through that table. This header is the whole contract: a
- * library that does what the comments here say works with the agent.
+ * one (the path in the environment variable ZT_LIBKPM_PATH, or libkpm.so.1 where that is unset), asks it for its table
+ * of functions with KPM_GetFunctionList, and reaches everything else through that table. This header is the whole
+ * contract: a library that does what the comments here say works with the agent.
  *
  * WORDS
- *   board       one local adapter port (an initiator), named by its index: 0 to GetNumberOfAdapters() - 1. A board keeps
- *               its index for as long as the library is open.
- *   WWN         an 8-byte Fibre Channel world wide name, in the byte order of the wire. WWNN: a node's, WWPN: a port's.
- *   kind        a category and a subcategory: what happened. A subcategory is a single bit of its category's mask.
+ *   board       one local adapter port (an initiator), named by its index: 0 to GetNumberOfAdapters() - 1. A board
+ * keeps its index for as long as the library is open. WWN         an 8-byte Fibre Channel world wide name, in the byte
+ * order of the wire. WWNN: a node's, WWPN: a port's. kind        a category and a subcategory: what happened. A
+ * subcategory is a single bit of its category's mask.
  *
  * THREADS
- *   Init, GetNumberOfAdapters, IsZtapiSupported and GetAdapterInfo are first called by the agent's main thread, one after the
- *   other. From then on one thread at a time calls GetNumberOfAdapters, the registrations and Close: the agent's command
- *   thread. No entry is called from inside a callback.
- *   The library calls the callbacks on threads of its own, from as many at once as it likes, also before the registration
- *   call that asked for them has returned. It holds none of its own locks while it does: a callback may wait for a lock that
- *   a caller of GetNumberOfAdapters holds.
- *   The agent blocks the signals that stop it before it loads the library, so that the library's threads inherit that; a
+ *   Init, GetNumberOfAdapters, IsZtapiSupported and GetAdapterInfo are first called by the agent's main thread, one
+ * after the other. From then on one thread at a time calls GetNumberOfAdapters, the registrations and Close: the
+ * agent's command thread. No entry is called from inside a callback. The library calls the callbacks on threads of its
+ * own, from as many at once as it likes, also before the registration call that asked for them has returned. It holds
+ * none of its own locks while it does: a callback may wait for a lock that a caller of GetNumberOfAdapters holds. The
+ * agent blocks the signals that stop it before it loads the library, so that the library's threads inherit that; a
  *   library does not unblock them.
  *
  * OWNERSHIP
- *   Everything is borrowed for the length of one call, in both directions: what a callback's pointers point to may be gone
- *   when the callback returns (the agent copies), and so may what an entry's pointers point to when the entry returns. The
- *   exceptions are the function table and the code behind it, which live until the library is unloaded, the context
- *   pointers, which the library hands back and never reads, and the callbacks themselves, which live until Close returns.
- *   Nothing that is pointed to need be aligned.
+ *   Everything is borrowed for the length of one call, in both directions: what a callback's pointers point to may be
+ * gone when the callback returns (the agent copies), and so may what an entry's pointers point to when the entry
+ * returns. The exceptions are the function table and the code behind it, which live until the library is unloaded, the
+ * context pointers, which the library hands back and never reads, and the callbacks themselves, which live until Close
+ * returns. Nothing that is pointed to need be aligned.
  *
  * EXIT
- *   The agent closes and unloads the library when it is told to shut down. When it ends for another reason (a stop signal,
- *   a sensor that died) the process exits with the library open and its threads running: code that the library runs at exit
- *   (destructors of static objects, atexit) neither joins its threads nor frees what they use.
+ *   The agent closes and unloads the library when it is told to shut down. When it ends for another reason (a stop
+ * signal, a sensor that died) the process exits with the library open and its threads running: code that the library
+ * runs at exit (destructors of static objects, atexit) neither joins its threads nor frees what they use.
  *
  * BYTE ORDER
  *   Integers are in the host's order, except inside an RSCN payload, which stands as on the wire.
@@ -46,7 +45,8 @@
 extern "C" {
 #endif
 
-/* ---- Names and events ------------------------------------------------------------------------------------------------ */
+/* ---- Names and events
+ * ------------------------------------------------------------------------------------------------ */
 
 /* A world wide name as on the wire (the shape of the common HBA API, SNIA FC-HBA). Passed by value. */
 typedef struct HBA_wwn {
@@ -98,26 +98,27 @@ typedef struct HBA_wwn {
 /*
  * One event as the scope callback gets it, 64-bit layout.
  *
- * zt_evt_size counts the event's data plus a header of 40 bytes; only its low 32 bits count, and a value below 40 counts as
- * 40, which is no data. zt_evt_payload points to a ZT_event_payload, or is null where the kind has no data.
+ * zt_evt_size counts the event's data plus a header of 40 bytes; only its low 32 bits count, and a value below 40
+ * counts as 40, which is no data. zt_evt_payload points to a ZT_event_payload, or is null where the kind has no data.
  */
 #define ZT_EVENT_VERSION 0u
 #define ZT_EVENT_HEADER_SIZE 40u
 
 typedef struct ZT_event_payload {
     uint64_t zt_payload_reserved; /* not read */
-    void *zt_payload_data;        /* the kind's structure below; null counts as no data */
+    void* zt_payload_data;        /* the kind's structure below; null counts as no data */
 } ZT_event_payload;
 
 typedef struct ZT_event {
     uint32_t zt_evt_version; /* ZT_EVENT_VERSION */
     uint64_t zt_evt_size;    /* at offset 8 */
-    void *zt_evt_payload;    /* at offset 16 */
+    void* zt_evt_payload;    /* at offset 16 */
 } ZT_event;
 
 /*
- * The data of each kind. The version words are 0. Ports are remote ports. A LUN of 0xFFFFFFFF means all LUNs, or that the
- * LUN is not known. The integers of SCSI and ELS fields carry the protocol's values (FC-LS, SPC) widened to 32 bits.
+ * The data of each kind. The version words are 0. Ports are remote ports. A LUN of 0xFFFFFFFF means all LUNs, or that
+ * the LUN is not known. The integers of SCSI and ELS fields carry the protocol's values (FC-LS, SPC) widened to 32
+ * bits.
  */
 typedef struct zt_plogi_rcv_v0 { /* ELS 0x01 */
     uint32_t zt_plogir_version;
@@ -203,40 +204,42 @@ typedef struct LINKINFO {
     HBA_wwn a_wwnName;
 } LINKINFO;
 
-/* ---- Callbacks ------------------------------------------------------------------------------------------------------- */
+/* ---- Callbacks
+ * ------------------------------------------------------------------------------------------------------- */
 
 /*
- * Called for every event that was registered with ZtapiRegEvent: board, local port, category, subcategory, the context given
- * at registration, the event. Never throws and never calls back into the library.
+ * Called for every event that was registered with ZtapiRegEvent: board, local port, category, subcategory, the context
+ * given at registration, the event. Never throws and never calls back into the library.
  */
-typedef void (*KPM_ScopeCallback)(unsigned board, HBA_wwn port, unsigned category, unsigned subcategory, void *context,
-                                  ZT_event *event);
+typedef void (*KPM_ScopeCallback)(unsigned board, HBA_wwn port, unsigned category, unsigned subcategory, void* context,
+                                  ZT_event* event);
 
 /*
- * A generic function pointer for the events of KpmRegEvent. The library converts it back to the type of the event it was
- * registered for before it calls it:
- *   FC_REG_LINK_EVENT         KPM_LinkCallback         board, a LINKINFO (never null)
- *   FC_REG_RSCN_EVENT         KPM_RscnCallback         board, the payload from its command code on, its length in bytes. The
- *                                                      payload is whole: as many bytes as its own length field says.
- *   FC_REG_TEMPERATURE_EVENT  KPM_TemperatureCallback  board, and two values that the agent does not keep
+ * A generic function pointer for the events of KpmRegEvent. The library converts it back to the type of the event it
+ * was registered for before it calls it: FC_REG_LINK_EVENT         KPM_LinkCallback         board, a LINKINFO (never
+ * null) FC_REG_RSCN_EVENT         KPM_RscnCallback         board, the payload from its command code on, its length in
+ * bytes. The payload is whole: as many bytes as its own length field says. FC_REG_TEMPERATURE_EVENT
+ * KPM_TemperatureCallback  board, and two values that the agent does not keep
  */
 typedef void (*KPM_EventCallback)(unsigned board, ...);
-typedef void (*KPM_LinkCallback)(unsigned board, void *linkInfo);
-typedef void (*KPM_RscnCallback)(unsigned board, void *payload, unsigned length);
+typedef void (*KPM_LinkCallback)(unsigned board, void* linkInfo);
+typedef void (*KPM_RscnCallback)(unsigned board, void* payload, unsigned length);
 typedef void (*KPM_TemperatureCallback)(unsigned board, unsigned first, unsigned second);
 
-/* ---- Registration statuses ------------------------------------------------------------------------------------------- */
+/* ---- Registration statuses
+ * ------------------------------------------------------------------------------------------- */
 
 /*
- * ZtapiRegEvent answers 0, or one of three informational statuses that count as success, or any other value for a refusal. A
- * handle is written for these four; it is 0 only where nothing will ever be delivered.
+ * ZtapiRegEvent answers 0, or one of three informational statuses that count as success, or any other value for a
+ * refusal. A handle is written for these four; it is 0 only where nothing will ever be delivered.
  */
 #define KPM_STATUS_SUCCESS 0u
-#define KPM_STATUS_INFO_5 5u         /* accepted; the library's own remark */
-#define KPM_STATUS_NO_SOURCE 6u      /* accepted, but this library has no source for that kind on this port */
-#define KPM_STATUS_INFO_7 7u         /* accepted; the library's own remark */
+#define KPM_STATUS_INFO_5 5u    /* accepted; the library's own remark */
+#define KPM_STATUS_NO_SOURCE 6u /* accepted, but this library has no source for that kind on this port */
+#define KPM_STATUS_INFO_7 7u    /* accepted; the library's own remark */
 
-/* ---- The table of functions ------------------------------------------------------------------------------------------ */
+/* ---- The table of functions
+ * ------------------------------------------------------------------------------------------ */
 
 #define KPM_INTERFACE_VERSION 1u
 
@@ -244,8 +247,8 @@ typedef void (*KPM_TemperatureCallback)(unsigned board, unsigned first, unsigned
 #define KPM_FUNCTION_LIST_SIZE_V1 80u
 
 /*
- * The library's functions. None of the nine is null. Later versions of this header append entries; the agent uses one only
- * where `size` covers it, and it may be null.
+ * The library's functions. None of the nine is null. Later versions of this header append entries; the agent uses one
+ * only where `size` covers it, and it may be null.
  */
 typedef struct KPM_FunctionList {
     uint32_t version; /* KPM_INTERFACE_VERSION */
@@ -266,14 +269,14 @@ typedef struct KPM_FunctionList {
     uint32_t (*IsZtapiSupported)(void);
 
     /* Writes the names of the board `index`. 0: success; any other status ends the agent's start. */
-    uint32_t (*GetAdapterInfo)(uint32_t index, HBA_wwn *nodeName, HBA_wwn *portName);
+    uint32_t (*GetAdapterInfo)(uint32_t index, HBA_wwn* nodeName, HBA_wwn* portName);
 
-    /* Registers `callback` for one kind on the board's port `port`. Returns a registration status (above); writes `*handle`
-       for those that count as success and leaves it alone otherwise. Registering the same kind again is allowed (the agent
-       does so when a start failed half-way): the newest registration is the one that counts, so that each event is
-       delivered once. */
-    uint32_t (*ZtapiRegEvent)(uint32_t board, HBA_wwn port, uint32_t category, uint32_t subcategory, void *context,
-                              uint32_t *handle, KPM_ScopeCallback callback);
+    /* Registers `callback` for one kind on the board's port `port`. Returns a registration status (above); writes
+       `*handle` for those that count as success and leaves it alone otherwise. Registering the same kind again is
+       allowed (the agent does so when a start failed half-way): the newest registration is the one that counts, so that
+       each event is delivered once. */
+    uint32_t (*ZtapiRegEvent)(uint32_t board, HBA_wwn port, uint32_t category, uint32_t subcategory, void* context,
+                              uint32_t* handle, KPM_ScopeCallback callback);
 
     /* Ends a registration. 0: success. A callback that runs on another thread may still be running on return. */
     uint32_t (*ZtapiUnregEvent)(uint32_t board, HBA_wwn port, uint32_t handle);
@@ -281,7 +284,8 @@ typedef struct KPM_FunctionList {
     /* Registers `callback` for one event type of a board. `size` is the number of bytes the caller reads of the event's
        data at most: 168 for link, 1024 for RSCN, 0 for temperature (for RSCN a hint only: a longer payload is delivered
        whole). Returns a handle, 0: failed. Registering again: as for ZtapiRegEvent. */
-    uint32_t (*KpmRegEvent)(uint32_t board, uint32_t eventType, void *context, uint32_t size, KPM_EventCallback callback);
+    uint32_t (*KpmRegEvent)(uint32_t board, uint32_t eventType, void* context, uint32_t size,
+                            KPM_EventCallback callback);
 
     /* Ends a registration of KpmRegEvent. 0: success. */
     uint32_t (*KpmUnregEvent)(uint32_t board, uint32_t handle);
@@ -292,8 +296,8 @@ typedef struct KPM_FunctionList {
  * `*list` where the library speaks it too; any other value, and no write, where it does not. Called once after loading,
  * before Init.
  */
-typedef uint32_t (*KPM_GetFunctionListType)(uint32_t version, const KPM_FunctionList **list);
-uint32_t KPM_GetFunctionList(uint32_t version, const KPM_FunctionList **list);
+typedef uint32_t (*KPM_GetFunctionListType)(uint32_t version, const KPM_FunctionList** list);
+uint32_t KPM_GetFunctionList(uint32_t version, const KPM_FunctionList** list);
 
 #ifdef __cplusplus
 }

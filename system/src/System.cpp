@@ -50,8 +50,7 @@ bool sRunGuarded(const ZTCString& acrThreadName, Function aFunction) noexcept {
 
 ZTCSystem::~ZTCSystem() = default;
 
-// ---- Numbers, waking and identity
-// ----------------------------------------------------------------------------------------
+// ---- Numbers, waking and identity ----
 
 void ZTCSystem::generateNumericId(unsigned& arId) {
     ZTCMutexLock lLock(mNumericIdsLock);
@@ -89,8 +88,7 @@ ZTCString ZTCSystem::getOsVariant() {
     return ZTCString(sSystemName().release);
 }
 
-// ---- The life of the process
-// ---------------------------------------------------------------------------------------------
+// ---- The life of the process ----
 
 void ZTCSystem::preInit() {}
 
@@ -178,8 +176,7 @@ void ZTCSystem::stopSignalWaiter() {
     }
 }
 
-// ---- Threads
-// -------------------------------------------------------------------------------------------------------------
+// ---- Threads ----
 
 void ZTCSystem::createThreads() {
     mThreadTable = ZTCPointer<ZTCThreadTable>(NEW ZTCThreadTable());
@@ -273,8 +270,7 @@ void ZTCSystem::destroyThreads() {
     mThreadTable->joinAll();
 }
 
-// ---- Waiting and messages, by slot
-// ---------------------------------------------------------------------------------------
+// ---- Waiting and messages, by slot ----
 
 void ZTCSystem::wait(unsigned aConditional) {
     mConditionals.get(aConditional)->wait();
@@ -378,8 +374,7 @@ ZTCSynchList::ZTIterator ZTCSystem::listEnd(unsigned aList) {
     return mLists.get(aList)->end();
 }
 
-// ---- The rest
-// ------------------------------------------------------------------------------------------------------------
+// ---- The rest ----
 
 void ZTCSystem::applySettings() {
     throw ZTCNotImplementedEx("Not Implemented", gcErrNotImplemented);

@@ -17,8 +17,7 @@
 
 namespace {
 
-// ---- Consolidation: one member a kind, each with its own notice and the identity of the last record it started
-// ---------
+// ---- Consolidation: one member a kind, each with its own notice and the identity of the last record it started ----
 
 /// A holder for the name of a previous event. Never destroyed: callbacks may run while the process exits.
 const ZTCPointer<ZTCWorldWideName>& sMakePrevName() {
@@ -193,7 +192,7 @@ const ZTSDispatch gcDispatch[] = {
     {1, 0x10, &gcLogoKind, sConsolidateLogoEvents, "Not enough data in ELS LOGO Event %u %u"},
     {2, 0x01, nullptr, nullptr, "Processing Fabric BUSY event Cat=%u SubCat=%u"},
     {2, 0x02, &gcPortBusyKind, sConsolidatePbsyEvents, "Not enough event data in FABRIC PORT BUSY event%u %u"},
-    {2, 0x04, &gcFcprdChkErrKind, sConsolidateFcprdChkErrEvents, "Not enough data in FCPRDCHKERR event %u %u"},
+    {2, 0x04, &gcFcprdChkErrKind, sConsolidateFcprdChkErrEvents, "Not enough data in FCPRDCHECKERR event %u %u"},
     {4, 0x01, &gcQFullKind, sConsolidateQFullEvents, "Not enough data in SCSI Event %u %u"},
     {4, 0x02, &gcDevBsyKind, sConsolidateDevBsyEvents, "Not enough data in SCSI Event %u %u"},
     {4, 0x04, &gcCheckCondKind, sConsolidateCheckCondEvents, "Not enough data in SCSI CHECKCOND Event %u %u"},
@@ -263,8 +262,7 @@ int sConsolidateEvents(const ZTCPointer<ZTCScopeEvent>& acrEvent, unsigned int a
     return 1;
 }
 
-// ---- RSCN: a payload of affected-address pages, each consolidated on its own
-// -------------------------------------------
+// ---- RSCN: a payload of affected-address pages, each consolidated on its own ----
 
 constexpr unsigned int gcRscnHeaderSize = 4;
 constexpr unsigned int gcRscnPageSize = 4;
@@ -332,8 +330,7 @@ void sProcessRscnEvent(unsigned int aBoardId, const void* apData, unsigned int a
     ZT_EXIT();
 }
 
-// ---- Admission
-// ---------------------------------------------------------------------------------------------------------
+// ---- Admission ----
 
 void sProcessScopeEvent(const ZTCCallbackEventData* apEventData) {
     ZT_ENTRY();

@@ -222,8 +222,7 @@ void ZTCTavikSystem::postDestroy() {
     ZT_EXIT();
 }
 
-// ---- Command line
-// ----------------------------------------------------------------------------------------------------
+// ---- Command line ----
 
 void ZTCTavikSystem::setCmdLineArgDescs() {
     static constexpr struct {
@@ -268,8 +267,7 @@ void ZTCTavikSystem::displayHelp() {
     ZT_EXIT();
 }
 
-// ---- Adapters and targets
-// --------------------------------------------------------------------------------------------
+// ---- Adapters and targets ----
 
 void ZTCTavikSystem::initLibkpm() {
     ZT_ENTRY();
@@ -348,8 +346,7 @@ void ZTCTavikSystem::addWwpnTarget(const ZTCPointer<ZTCTavikTarget>& acrTarget) 
     ZT_EXIT();
 }
 
-// ---- Record lists and the pending record
-// -----------------------------------------------------------------------------
+// ---- Record lists and the pending record ----
 
 void ZTCTavikSystem::makeRecordLists(ZTCTavikRecordsMap& arLists) {
     ZT_ENTRY();

@@ -21,8 +21,7 @@
 
 #include "common/include/Exception.h"
 
-// ---- Environment, memory and text
-// --------------------------------------------------------------------------------------
+// ---- Environment, memory and text ----
 
 /// The value of the environment variable, or null where it is unset. Where apBuffer is not null the value is copied
 /// there as well; the caller made it large enough. The result belongs to the environment.
@@ -49,8 +48,7 @@ std::uint32_t ClibHtonl(std::uint32_t aHostOrder);
 void* ClibMemcpy(void* apTo, const void* apFrom, std::size_t aSize);
 void* ClibMemset(void* apTo, int aByte, std::size_t aSize);
 
-// ---- Paths
-// ---------------------------------------------------------------------------------------------------------------
+// ---- Paths ----
 
 /// Makes the directory with the mode less the umask. Throws ZTCExistsEx where anything stands at the path,
 /// ZTCClibMkdirFailedEx otherwise.
@@ -86,8 +84,7 @@ private:
     char mText[128];
 };
 
-// ---- Descriptors
-// ---------------------------------------------------------------------------------------------------------
+// ---- Descriptors ----
 
 /// Opens with close-on-exec added to the flags. Returns the descriptor, 3 or higher. Throws ZTCClibOpenFailedEx.
 int ClibOpen(const char* apPath, int aFlags, ::mode_t aMode = 0);
@@ -135,8 +132,7 @@ std::size_t ClibBytesWaiting(int aDescriptor);
 /// Throws ZTCClibLockFailedEx.
 bool ClibTryLock(int aDescriptor);
 
-// ---- Processes and time
-// --------------------------------------------------------------------------------------------------
+// ---- Processes and time ----
 
 /// Whether the process exists and is no zombie. One that may not be signalled exists.
 bool ClibIsProcessAlive(::pid_t aProcessId);

@@ -41,6 +41,9 @@ public:
     /// Makes this wait and every later one, on all threads, return at once. For good.
     void interrupt();
 
+    /// Threads that wait and that no signal has released.
+    unsigned getNumberOfWaiters();
+
 protected:
     ZTSOsConditional& getOsConditional() { return mConditional; }
 

@@ -61,6 +61,11 @@ void ZTCConditional::interrupt() {
     OsBroadcastConditional(mConditional);
 }
 
+unsigned ZTCConditional::getNumberOfWaiters() {
+    ZTCMutexLock lLock(mMutex);
+    return mNumberOfWaiters;
+}
+
 bool ZTCConditional::takeWakeUp() {
     const bool lIsAwake = mIsInterrupted || mIsSignalKept;
     mIsSignalKept = false;

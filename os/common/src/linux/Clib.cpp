@@ -61,8 +61,7 @@ char sProcessState(::pid_t aProcessId) {
 
 }  // namespace
 
-// ---- Environment, memory and text
-// --------------------------------------------------------------------------------------
+// ---- Environment, memory and text ----
 
 const char* ClibGetenv(const char* apName, char* apBuffer) {
     const char* lpValue = std::getenv(apName);
@@ -119,8 +118,7 @@ void* ClibMemset(void* apTo, int aByte, std::size_t aSize) {
     return aSize == 0 ? apTo : std::memset(apTo, aByte, aSize);
 }
 
-// ---- Paths
-// ---------------------------------------------------------------------------------------------------------------
+// ---- Paths ----
 
 void ClibMkdir(const char* apPath, int aMode) {
     if (::mkdir(apPath, static_cast<::mode_t>(aMode)) == 0) {
@@ -200,8 +198,7 @@ ZTCErrnoText::ZTCErrnoText(int aErrno) {
     ClibSprintf(mText, sizeof(mText), "%s", ::strerror_r(aErrno, lBuffer, sizeof(lBuffer)));
 }
 
-// ---- Descriptors
-// ---------------------------------------------------------------------------------------------------------
+// ---- Descriptors ----
 
 int ClibOpen(const char* apPath, int aFlags, ::mode_t aMode) {
     const int lDescriptor = ClibTryOpen(apPath, aFlags, aMode);
@@ -357,8 +354,7 @@ bool ClibTryLock(int aDescriptor) {
     sThrowForNumber<ZTCClibLockFailedEx>("Locking descriptor", aDescriptor, errno);
 }
 
-// ---- Processes and time
-// --------------------------------------------------------------------------------------------------
+// ---- Processes and time ----
 
 bool ClibIsProcessAlive(::pid_t aProcessId) {
     if (aProcessId <= 0) {
