@@ -1,0 +1,60 @@
+/// The Unix stream socket on which a running library is spoken to: each line that a client sends is answered with one
+/// line.
+#ifndef LIBKPM_SIM_SRC_CONTROLSOCKET_H
+#define LIBKPM_SIM_SRC_CONTROLSOCKET_H
+
+#include <sys/stat.h>
+#include <sys/un.h>
+
+#include <functional>
+#include <list>
+#include <string>
+#include <string_view>
+#include <thread>
+
+#include "libkpm/sim/src/Descriptor.h"
+
+/// Fills in the address of a socket's path. Throws std::runtime_error for a path that is empty or too long for it.
+sockaddr_un makeSimSocketAddress(const std::string& acrPath);
+
+/// Serves any number of clients, one line at a time, on one thread of its own.
+class ZTCSimControlSocket {
+public:
+    using Answer = std::function<std::string(std::string_view aLine)>;
+
+    /// Makes the socket, of mode 0600, and starts to serve. A socket that nobody listens on is taken over; one that is
+    /// served, and whatever is no socket, is refused. Throws std::runtime_error with the path and the reason.
+    ZTCSimControlSocket(std::string aPath, Answer aAnswer);
+
+    /// Ends the service after the line that is being answered, and removes the socket if it is still this one.
+    ~ZTCSimControlSocket();
+    ZTCSimControlSocket(const ZTCSimControlSocket&) = delete;
+    ZTCSimControlSocket& operator=(const ZTCSimControlSocket&) = delete;
+
+private:
+    struct Client {
+        ZTCSimDescriptor mSocket;
+        std::string mIn;
+        std::string mOut;
+        bool mIsAtEnd = false;  ///< nothing more is read from it
+    };
+
+    void removeStale() const;
+    void listenOn(const sockaddr_un& acrAddress);
+    void serve();
+    bool acceptClient();
+    bool serveClient(Client& arClient) const;
+    static void receive(Client& arClient);
+    void answerLine(Client& arClient) const;
+    static bool send(Client& arClient);
+
+    const std::string mPath;
+    const Answer mAnswer;
+    ZTCSimDescriptor mQuit;
+    ZTCSimDescriptor mListener;
+    struct stat mIdentity {};
+    std::list<Client> mClients;  ///< of the serving thread
+    std::thread mThread;
+};
+
+#endif

@@ -1,0 +1,144 @@
+/// Plays one scenario: answers the entry points' questions, keeps the registrations, and delivers the events of the
+/// schedule from threads of its own.
+///
+/// Threads. One thread, the timer, delivers all lines that ask for no threads of their own and changes the number of
+/// boards; every line with threads= and every storm has its own. All are started by start(), wait for the schedule's
+/// start, and have ended when stop() returns. inject() delivers on the thread that calls it. A callback is called with
+/// no lock held.
+#ifndef LIBKPM_SIM_SRC_ENGINE_H
+#define LIBKPM_SIM_SRC_ENGINE_H
+
+#include <array>
+#include <atomic>
+#include <chrono>
+#include <condition_variable>
+#include <cstddef>
+#include <cstdint>
+#include <memory>
+#include <mutex>
+#include <optional>
+#include <thread>
+#include <vector>
+
+#include "libkpm/include/libkpm.h"
+#include "libkpm/sim/src/Delivery.h"
+#include "libkpm/sim/src/Registry.h"
+#include "libkpm/sim/src/Scenario.h"
+
+/// Statuses of the simulated library's own. None of them counts as success with an agent.
+enum ZTESimStatus : std::uint32_t {
+    ZTSST_Success = 0,
+    ZTSST_NoScenario = 1,    ///< Init: the scenario's file cannot be read
+    ZTSST_BadScenario = 2,   ///< Init: the scenario does not parse
+    ZTSST_NoSocket = 3,      ///< Init: the socket cannot be made
+    ZTSST_AlreadyOpen = 4,   ///< Init: the library is open
+    ZTSST_NoResources = 8,   ///< Init: out of memory or threads
+    ZTSST_NotOpen = 9,       ///< the library is not open
+    ZTSST_NoSuchBoard = 10,  ///< no board of that number
+    ZTSST_NotItsPort = 11,   ///< the port is not the board's
+    ZTSST_NoSuchKind = 12,   ///< no event kind of that category and subcategory
+    ZTSST_NullPointer = 13,  ///< a pointer is missing
+    ZTSST_NoSuchHandle = 14  ///< no registration of that handle
+};
+
+enum ZTESimSchedule : std::uint8_t { ZTSSC_Waiting, ZTSSC_Running, ZTSSC_Done };
+
+struct ZTSSimStatus {
+    std::uint64_t mDelivered = 0;  ///< callbacks that have returned
+    std::uint64_t mDropped = 0;    ///< events that nothing was registered for, or that have no source
+    std::uint64_t mPages = 0;      ///< pages of the RSCNs among the delivered
+    std::array<std::uint64_t, gcSimKindCount> mDeliveredByKind{};
+    std::size_t mRegistered = 0;
+    std::uint32_t mAdapters = 0;
+    ZTESimSchedule mSchedule = ZTSSC_Waiting;
+};
+
+/// All operations but start and stop may be called from any thread.
+class ZTCSimEngine {
+public:
+    explicit ZTCSimEngine(ZTSSimScenario aScenario);
+    ~ZTCSimEngine();
+    ZTCSimEngine(const ZTCSimEngine&) = delete;
+    ZTCSimEngine& operator=(const ZTCSimEngine&) = delete;
+
+    /// Starts the threads. Throws std::system_error or std::bad_alloc, with none left running.
+    void start();
+
+    /// Tells the threads and inject() to end after the callback they are in. Does not wait.
+    void requestStop();
+
+    /// Ends and joins the threads. Not to be called from a callback. More than once does no harm.
+    void stop();
+
+    const ZTSSimScenario& getScenario() const { return mScenario; }
+
+    std::uint32_t getNumberOfAdapters() const { return mCount.load(std::memory_order_relaxed); }
+    std::uint32_t getAdapterInfo(std::uint32_t aIndex, HBA_wwn* apNodeName, HBA_wwn* apPortName);
+    std::uint32_t registerForPort(std::uint32_t aBoard, const HBA_wwn& acrPort, std::uint32_t aCategory,
+                                  std::uint32_t aSubcategory, void* apContext, std::uint32_t* apHandle,
+                                  KPM_ScopeCallback apCallback);
+    std::uint32_t unregisterForPort(std::uint32_t aBoard, const HBA_wwn& acrPort, std::uint32_t aHandle);
+    std::uint32_t registerForBoard(std::uint32_t aBoard, std::uint32_t aEventType, void* apContext,
+                                   KPM_EventCallback apCallback);
+    std::uint32_t unregisterForBoard(std::uint32_t aBoard, std::uint32_t aHandle);
+
+    /// Delivers all occurrences of a line now and returns how many callbacks there were. Ends early when the engine
+    /// stops.
+    std::uint64_t inject(const ZTSSimEventLine& acrLine);
+
+    ZTSSimStatus getStatus() const;
+
+private:
+    using Clock = std::chrono::steady_clock;
+
+    /// A share of a line's occurrences: aFirst, aFirst + aStride, ... below aEnd; aEnd 0: without end.
+    struct Share {
+        const ZTSSimEvent* mpEvent = nullptr;
+        const ZTSSimStorm* mpStorm = nullptr;
+        const ZTSSimCountChange* mpCountChange = nullptr;
+        std::uint64_t mNext = 0;
+        std::uint64_t mStride = 1;
+        std::uint64_t mEnd = 1;
+
+        std::uint64_t getDueTime() const;
+        bool isLast() const { return mEnd != 0 && mEnd - mNext <= mStride; }
+    };
+    using Lane = std::vector<Share>;
+
+    std::vector<Lane> makeLanes() const;
+    void runLane(Lane aLane);
+    bool waitUntil(std::uint64_t aMilliseconds);
+    void startClock();
+    std::uint64_t play(const Share& acrShare);
+    std::uint64_t deliverToBoards(const ZTSSimEvent& acrEvent, std::uint64_t aOccurrence);
+    bool deliver(const ZTSSimDelivery& acrDelivery);
+    void callScope(const ZTSSimRegistration& acrRegistration, const ZTSSimDelivery& acrDelivery) const;
+    std::optional<ZTSSimAnswer> findAnswer(ZTESimOperation aOperation, std::optional<std::size_t> aKind,
+                                           std::uint32_t aBoard);
+    void noteRegistration(std::uint32_t aBoard, std::size_t aKind);
+
+    // Constant after construction.
+    const ZTSSimScenario mScenario;
+
+    // With synchronisation of their own.
+    ZTCSimRegistry mRegistry;
+    std::atomic<std::uint32_t> mCount;
+    std::atomic<bool> mIsStopping{false};
+    std::vector<std::atomic<std::uint32_t>> mLinkTags;  // by board; only counted, nothing hangs on their order
+    std::array<std::atomic<std::uint64_t>, gcSimKindCount> mDeliveredByKind{};
+    std::atomic<std::uint64_t> mDropped{0};
+    std::atomic<std::uint64_t> mPages{0};
+    std::atomic<Clock::rep> mStartTime{0};  // since the clock's epoch; 0: not started. Written with mLock held.
+
+    // Used by start() and stop() alone.
+    std::vector<std::thread> mThreads;
+
+    mutable std::mutex mLock;
+    std::condition_variable mWake;  // with mLock: the clock starts, or the engine stops
+
+    // Guarded by mLock.
+    std::size_t mLanesLeft = 0;
+    std::vector<std::uint64_t> mAnswerUses;
+};
+
+#endif
