@@ -1,0 +1,76 @@
+/// Frames to and from an agent over its two FIFOs.
+///
+/// Connecting opens the response FIFO for reading first (an agent that starts waits for that reader), takes the
+/// client's lock, opens the command FIFO without blocking, and throws away what stands in the response FIFO. What is
+/// missing is tried again until the time limit, so that an agent that is just starting is met. Any failure disconnects:
+/// what the agent still sends then belongs to no request of ours.
+///
+/// One thread at a time. Signals: SIGPIPE is kept from the process by the calls themselves; EINTR never shows.
+#ifndef SENSOR_CLIENT_INCLUDE_FIFOCONVERSATION_H
+#define SENSOR_CLIENT_INCLUDE_FIFOCONVERSATION_H
+
+#include <sys/types.h>
+
+#include <cstdint>
+#include <span>
+#include <string>
+
+#include "sensor/client/include/ClientErrors.h"
+#include "sensor/client/include/ClientLock.h"
+#include "sensor/client/include/CommandEncoder.h"
+#include "sensor/client/include/FileDescriptor.h"
+#include "sensor/client/include/TimeLimit.h"
+
+class ZTCFifoConversation {
+public:
+    /// @param aDirectory         the install directory
+    /// @param aCancelDescriptor  not owned; once it is readable, waiting ends with ZTCCancelledEx as long as no byte of
+    /// a
+    ///                           request has been sent. -1 = none
+    explicit ZTCFifoConversation(std::string aDirectory, int aCancelDescriptor = -1);
+
+    /// Does nothing when connected. Throws ZTCNoAnswerEx when the limit passes first, ZTCCancelledEx, ZTCSystemCallEx.
+    void connect(const ZTCTimeLimit& acrLimit);
+    bool isConnected() const { return mCommandFifo.isOpen(); }
+    /// Gives up lock and FIFOs.
+    void disconnect() noexcept;
+
+    /// Connects where that is needed, and sends one frame. Throws as connect does, and ZTCBadInputEx for a body whose
+    /// length no frame can have.
+    void send(std::span<const std::uint8_t> aBody, const ZTCTimeLimit& acrLimit);
+
+    /// The next frame's body. Reads no byte behind that frame; memory grows with the bytes that come, not with the
+    /// length that is announced. Throws ZTCNoAnswerEx naming the bytes had and wanted.
+    ZTCWireBytes receive(const ZTCTimeLimit& acrLimit);
+
+    /// Bytes that stood in the response FIFO and were thrown away, since construction.
+    std::uint64_t getDiscardedBytes() const { return mDiscardedBytes; }
+    const std::string& getDirectory() const { return mDirectory; }
+
+private:
+    bool tryOpenResponseFifo();
+    bool tryTakeLock();
+    bool tryOpenCommandFifo();
+    ZTCFileDescriptor openFifo(const std::string& acrPath, int aFlags);
+    void discardStaleBytes(const ZTCTimeLimit& acrLimit);
+    void writeAll(std::span<const std::uint8_t> aFrame, const ZTCTimeLimit& acrLimit);
+    void readExactly(ZTCWireBytes& arBytes, std::size_t aCount, const char* apWhat, const ZTCTimeLimit& acrLimit);
+    /// As read(): bytes, 0 = no writer, -1 = nothing yet.
+    ssize_t readSome(std::span<std::uint8_t> aPlace);
+
+    const std::string mDirectory;
+    const std::string mCommandPath;
+    const std::string mResponsePath;
+    const int mCancelDescriptor;
+
+    ZTCClientLock mLock;
+    ZTCFileDescriptor mResponseFifo;
+    ZTCFileDescriptor mCommandFifo;
+    std::uint64_t mDiscardedBytes = 0;
+
+    // Why the last try to connect was not enough.
+    ZTENoAnswerReason mObstacle = ZTNA_NoFifo;
+    std::string mObstacleText;
+};
+
+#endif
