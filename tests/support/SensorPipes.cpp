@@ -1,0 +1,161 @@
+#include "tests/support/SensorPipes.h"
+
+#include <fcntl.h>
+#include <poll.h>
+#include <sys/file.h>
+#include <sys/ioctl.h>
+#include <unistd.h>
+
+#include <cerrno>
+#include <csignal>
+#include <cstring>
+#include <stdexcept>
+
+#include "tests/support/TemporaryDirectory.h"
+
+[[noreturn]] static void sFail(const std::string& acrWhat) {
+    throw std::runtime_error(acrWhat + ": " + std::strerror(errno));
+}
+
+static void sClose(int& arDescriptor) {
+    if (arDescriptor >= 0) {
+        close(arDescriptor);
+        arDescriptor = -1;
+    }
+}
+
+ZTCSensorPipes::~ZTCSensorPipes() {
+    close();
+}
+
+void ZTCSensorPipes::open() {
+    if (mLock < 0) {
+        const std::string lPath = mDirectory + "/qrv-sn.lock";
+        mLock = ::open(lPath.c_str(), O_RDWR | O_CREAT | O_CLOEXEC, 0600);
+        if (mLock < 0 || flock(mLock, LOCK_EX | LOCK_NB) != 0) {
+            sFail("lock of " + lPath);
+        }
+    }
+    openResponse();
+    openCommand();
+}
+
+void ZTCSensorPipes::openResponse() {
+    waitUntil([this] { return isFifo(responsePath()); }, "the response FIFO");
+    mResponse = ::open(responsePath().c_str(), O_RDONLY | O_NONBLOCK | O_CLOEXEC);
+    if (mResponse < 0) {
+        sFail("open of " + responsePath());
+    }
+}
+
+void ZTCSensorPipes::openCommand() {
+    signal(SIGPIPE, SIG_IGN);
+    waitUntil(
+        [this] {
+            mCommand = ::open(commandPath().c_str(), O_WRONLY | O_NONBLOCK | O_CLOEXEC);
+            return mCommand >= 0;
+        },
+        "a reader of the command FIFO");
+}
+
+void ZTCSensorPipes::close() {
+    closeCommand();
+    closeResponse();
+    sClose(mLock);
+}
+
+void ZTCSensorPipes::closeCommand() {
+    sClose(mCommand);
+}
+
+void ZTCSensorPipes::closeResponse() {
+    sClose(mResponse);
+}
+
+void ZTCSensorPipes::sendRaw(const ZTCBytes& acrBytes) {
+    const ZTCDeadline lDeadline;
+    for (std::size_t lSent = 0; lSent < acrBytes.size();) {
+        const ssize_t lCount = write(mCommand, acrBytes.data() + lSent, acrBytes.size() - lSent);
+        if (lCount >= 0) {
+            lSent += static_cast<std::size_t>(lCount);
+        } else if (errno == EAGAIN) {
+            pollfd lPoll{mCommand, POLLOUT, 0};
+            if (poll(&lPoll, 1, lDeadline.remainingMilliseconds()) == 0) {
+                throw std::runtime_error("the agent does not read its command FIFO");
+            }
+        } else if (errno != EINTR) {
+            sFail("write to " + commandPath());
+        }
+    }
+}
+
+static std::size_t sWaitingBytes(int aDescriptor) {
+    int lCount = 0;
+    if (ioctl(aDescriptor, FIONREAD, &lCount) != 0) {
+        sFail("FIONREAD");
+    }
+    return static_cast<std::size_t>(lCount);
+}
+
+void ZTCSensorPipes::waitUntilTaken() const {
+    waitUntil([this] { return sWaitingBytes(mCommand) == 0; }, "the agent to empty its command FIFO");
+}
+
+std::size_t ZTCSensorPipes::waitingResponseBytes() const {
+    return sWaitingBytes(mResponse);
+}
+
+std::optional<ZTCBytes> ZTCSensorPipes::readBytes(std::size_t aCount, const ZTCDeadline& acrDeadline) {
+    ZTCBytes lBytes(aCount);
+    for (std::size_t lRead = 0; lRead < aCount;) {
+        pollfd lPoll{mResponse, POLLIN, 0};
+        const int lReady = poll(&lPoll, 1, acrDeadline.remainingMilliseconds());
+        if (lReady == 0) {
+            throw std::runtime_error("no response: got " + std::to_string(lRead) + " of " + std::to_string(aCount) +
+                                     " bytes before the deadline");
+        }
+        const ssize_t lCount = read(mResponse, lBytes.data() + lRead, aCount - lRead);
+        if (lCount > 0) {
+            lRead += static_cast<std::size_t>(lCount);
+        } else if (lCount == 0) {
+            if (lRead != 0) {
+                throw std::runtime_error("the response FIFO was closed after " + std::to_string(lRead) + " of " +
+                                         std::to_string(aCount) + " bytes");
+            }
+            return std::nullopt;
+        } else if (errno != EAGAIN && errno != EINTR) {
+            sFail("read of " + responsePath());
+        }
+    }
+    return lBytes;
+}
+
+ZTCBytes ZTCSensorPipes::readResponse(const ZTCDeadline& acrDeadline) {
+    const std::optional<ZTCBytes> lHeader = readBytes(4, acrDeadline);
+    if (!lHeader) {
+        throw std::runtime_error("no response: the agent has closed the response FIFO");
+    }
+    const std::uint32_t lLength = ZTCByteReader(*lHeader).u32();
+    if (lLength == 0) {
+        return {};
+    }
+    const std::optional<ZTCBytes> lBody = readBytes(lLength, acrDeadline);
+    if (!lBody) {
+        throw std::runtime_error("the response FIFO was closed behind a header");
+    }
+    return *lBody;
+}
+
+bool ZTCSensorPipes::isAtEnd() {
+    unsigned char lByte = 0;
+    return read(mResponse, &lByte, 1) == 0;
+}
+
+ZTCBytes ZTCSensorPipes::request(const ZTCBytes& acrBody) {
+    sendRequest(acrBody);
+    return readResponse();
+}
+
+ZTCBytes ZTCSensorPipes::frame(const ZTCBytes& acrBody) {
+    return ZTCByteWriter().u32(acrBody.size()).raw(acrBody).bytes();
+}

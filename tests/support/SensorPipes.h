@@ -1,0 +1,62 @@
+/// The sensor's ends of the two FIFOs: what a test sends and reads is bytes, so that a message can be cut anywhere and
+/// every byte of a response can be asserted.
+#ifndef TESTS_SUPPORT_SENSORPIPES_H
+#define TESTS_SUPPORT_SENSORPIPES_H
+
+#include <cstddef>
+#include <cstdint>
+#include <optional>
+#include <string>
+
+#include "tests/support/Bytes.h"
+#include "tests/support/Waiting.h"
+
+class ZTCSensorPipes {
+public:
+    /// `acrDirectory` is the sensor's directory; nothing is opened yet.
+    explicit ZTCSensorPipes(std::string aDirectory) : mDirectory(std::move(aDirectory)) {}
+    ~ZTCSensorPipes();
+    ZTCSensorPipes(const ZTCSensorPipes&) = delete;
+    ZTCSensorPipes& operator=(const ZTCSensorPipes&) = delete;
+
+    std::string commandPath() const { return mDirectory + "/qrvtvkcmd.fifo"; }
+    std::string responsePath() const { return mDirectory + "/qrvtvkout.fifo"; }
+
+    /// Takes the sensor's lock, waits until the agent has made the FIFOs and opens both, the response FIFO's reader
+    /// first.
+    void open();
+    void openResponse();
+    void openCommand();
+    void close();
+    void closeCommand();
+    void closeResponse();
+
+    /// Writes the bytes as they stand.
+    void sendRaw(const ZTCBytes& acrBytes);
+    /// Waits until the agent has taken every byte out of the command FIFO.
+    void waitUntilTaken() const;
+    /// Bytes that wait in the response FIFO now.
+    std::size_t waitingResponseBytes() const;
+
+    /// Frames the body and sends it.
+    void sendRequest(const ZTCBytes& acrBody) { sendRaw(frame(acrBody)); }
+    /// Reads one frame; throws std::runtime_error where the deadline is over or the agent has closed the FIFO first.
+    ZTCBytes readResponse(const ZTCDeadline& acrDeadline = ZTCDeadline());
+    /// Whether the agent has closed the FIFO with nothing left in it. To be called once the agent has ended.
+    bool isAtEnd();
+
+    /// One request, one response.
+    ZTCBytes request(const ZTCBytes& acrBody);
+
+    static ZTCBytes frame(const ZTCBytes& acrBody);
+
+private:
+    std::optional<ZTCBytes> readBytes(std::size_t aCount, const ZTCDeadline& acrDeadline);
+
+    std::string mDirectory;
+    int mLock = -1;
+    int mCommand = -1;
+    int mResponse = -1;
+};
+
+#endif

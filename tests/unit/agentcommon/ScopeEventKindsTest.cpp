@@ -1,0 +1,48 @@
+#include "sensor/agentcommon/include/ScopeEventKinds.h"
+
+#include <gtest/gtest.h>
+
+#include <set>
+#include <string>
+#include <utility>
+
+TEST(ScopeEventKinds, EveryNameAndEveryPairStandsOnce) {
+    std::set<std::string> lNames;
+    std::set<std::pair<int, int>> lRegistered;
+    std::set<std::pair<int, int>> lDelivered;
+    for (const ZTSScopeEventKind& lcrKind : gcScopeEventKinds) {
+        EXPECT_TRUE(lNames.insert(lcrKind.mpName).second) << lcrKind.mpName;
+        EXPECT_TRUE(lRegistered.insert({lcrKind.mRegisteredCategory, lcrKind.mRegisteredSubcategory}).second);
+        EXPECT_TRUE(lDelivered.insert({lcrKind.mDeliveredCategory, lcrKind.mDeliveredSubcategory}).second);
+    }
+    EXPECT_EQ(20u, lNames.size());
+}
+
+TEST(ScopeEventKinds, OnlyTheThreeWithCallbacksOfTheirOwnAreDeliveredUnderAnotherPair) {
+    std::set<std::string> lDiffering;
+    for (const ZTSScopeEventKind& lcrKind : gcScopeEventKinds) {
+        const bool lIsBoardEvent = lcrKind.mRegisteredCategory == 0;
+        const bool lDiffers = lcrKind.mRegisteredCategory != lcrKind.mDeliveredCategory ||
+                              lcrKind.mRegisteredSubcategory != lcrKind.mDeliveredSubcategory;
+        EXPECT_EQ(lIsBoardEvent, lDiffers) << lcrKind.mpName;
+        if (lDiffers) {
+            lDiffering.insert(lcrKind.mpName);
+        }
+    }
+    EXPECT_EQ((std::set<std::string>{"rscn", "link", "temperature"}), lDiffering);
+}
+
+TEST(ScopeEventKinds, FindsAKindByThePairItIsDeliveredUnder) {
+    EXPECT_STREQ("plogi", findDeliveredKind(1, 0x01)->mpName);
+    EXPECT_STREQ("rscn", findDeliveredKind(1, 0x20)->mpName);
+    EXPECT_STREQ("link", findDeliveredKind(8, 0x02)->mpName);
+    EXPECT_STREQ("temperature", findDeliveredKind(8, 0x04)->mpName);
+    EXPECT_STREQ("adapter-arrival", findDeliveredKind(16, 0x01)->mpName);
+}
+
+TEST(ScopeEventKinds, FindsNothingUnderThePairsOfRegistrationAlone) {
+    EXPECT_EQ(nullptr, findDeliveredKind(0, 0x01));
+    EXPECT_EQ(nullptr, findDeliveredKind(0, 0x02));
+    EXPECT_EQ(nullptr, findDeliveredKind(0, 0x20));
+    EXPECT_EQ(nullptr, findDeliveredKind(255, 255));
+}

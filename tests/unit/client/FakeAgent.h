@@ -1,0 +1,61 @@
+/// The agent's end of the two FIFOs, played by a thread of the test: it does with each request what a script says.
+#ifndef TESTS_UNIT_CLIENT_FAKEAGENT_H
+#define TESTS_UNIT_CLIENT_FAKEAGENT_H
+
+#include <deque>
+#include <functional>
+#include <mutex>
+#include <string>
+#include <thread>
+#include <vector>
+
+#include "sensor/client/include/CommandEncoder.h"
+#include "sensor/client/include/FileDescriptor.h"
+
+class ZTCFakeAgent {
+public:
+    /// Runs on the agent's thread with each request's body.
+    using ZTCStep = std::function<void(ZTCFakeAgent&, const ZTCWireBytes&)>;
+
+    /// Makes the FIFOs and starts the thread: it opens the command FIFO, waits for a reader of the response FIFO, and
+    /// takes one step a request; the last step serves all further ones.
+    ZTCFakeAgent(std::string aDirectory, std::deque<ZTCStep> aSteps);
+    /// Ends the thread and closes the FIFOs; they stay in the directory, as with an agent that was killed.
+    ~ZTCFakeAgent();
+    ZTCFakeAgent(const ZTCFakeAgent&) = delete;
+    ZTCFakeAgent& operator=(const ZTCFakeAgent&) = delete;
+
+    std::vector<ZTCWireBytes> getRequests() const;
+
+    // For steps only.
+    void sendFrame(const ZTCWireBytes& acrBody);
+    void sendRaw(const ZTCWireBytes& acrBytes);
+    /// Closes both FIFOs and ends the thread behind the step.
+    void die();
+
+    static ZTCStep answering(const ZTCWireBytes& acrBody);
+    static ZTCStep answeringRaw(const ZTCWireBytes& acrBytes);
+    static ZTCStep silent();
+    static ZTCStep dying(const ZTCWireBytes& acrLastBytes);
+
+private:
+    void run();
+    bool waitFor(int aDescriptor, short aEvents);
+    bool readExactly(ZTCWireBytes& arBytes, std::size_t aCount);
+
+    const std::string mDirectory;
+    std::deque<ZTCStep> mSteps;
+    ZTCFileDescriptor mStop;
+    ZTCFileDescriptor mCommandFifo;
+    ZTCFileDescriptor mOwnCommandWriter;
+    ZTCFileDescriptor mResponseFifo;
+    bool mIsDead = false;
+    mutable std::mutex mMutex;
+    std::vector<ZTCWireBytes> mRequests;  // under mMutex
+    std::thread mThread;
+};
+
+/// Makes the two FIFOs without anybody behind them.
+void makeFifos(const std::string& acrDirectory);
+
+#endif

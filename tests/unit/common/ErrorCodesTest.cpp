@@ -1,0 +1,25 @@
+#include "common/include/ErrorCodes.h"
+
+#include <gtest/gtest.h>
+
+TEST(ErrorCodes, SegmentsAre160CodesLong) {
+    EXPECT_EQ(0xA0u, ZT_ERRCODE_SPACE_LENGTH);
+    EXPECT_EQ(0u, ZT_ERRCODE_SPACE_BASE(0));
+    EXPECT_EQ(160u, ZT_ERRCODE_SPACE_BASE(1));
+    EXPECT_EQ(480u, ZT_ERRCODE_SPACE_BASE(3));
+}
+
+TEST(ErrorCodes, ACodeIsTakenApartIntoWhatItWasMadeOf) {
+    EXPECT_EQ(492u, ZT_SEGMENTED_ERRCODE(3, 12));
+    EXPECT_EQ(3u, ZT_ERRCODE_SEGMENT(492));
+    EXPECT_EQ(12u, ZT_UNSEGMENTED_ERRCODE(492, 3));
+    EXPECT_EQ(2u, ZT_ERRCODE_SEGMENT(479));
+    EXPECT_EQ(159u, ZT_UNSEGMENTED_ERRCODE(479, 2));
+}
+
+TEST(ErrorCodes, MacrosTakeExpressionsAsArguments) {
+    EXPECT_EQ(480u, ZT_ERRCODE_SPACE_BASE(1 + 2));
+    EXPECT_EQ(493u, ZT_SEGMENTED_ERRCODE(1 + 2, 6 + 7));
+    EXPECT_EQ(3u, ZT_ERRCODE_SEGMENT(480 + 12));
+    EXPECT_EQ(12u, ZT_UNSEGMENTED_ERRCODE(490 + 2, 1 + 2));
+}

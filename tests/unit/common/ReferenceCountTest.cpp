@@ -1,0 +1,45 @@
+#include "common/include/ReferenceCount.h"
+
+#include <gtest/gtest.h>
+
+#include <atomic>
+#include <thread>
+#include <vector>
+
+TEST(ReferenceCount, CountsUpAndReturnsTheNewCountOnTheWayDown) {
+    ZTCReferenceCount lCount(1);
+    lCount.increment();
+    lCount.increment();
+    EXPECT_EQ(2u, lCount.decrement());
+    EXPECT_EQ(1u, lCount.decrement());
+    EXPECT_EQ(0u, lCount.decrement());
+}
+
+TEST(ReferenceCount, IsOneMachineWord) {
+    EXPECT_EQ(sizeof(void*), sizeof(ZTCReferenceCount));
+}
+
+TEST(ReferenceCount, ExactlyOneThreadGetsToZero) {
+    constexpr unsigned lcThreads = 4;
+    constexpr unsigned lcRounds = 2000;
+    ZTCReferenceCount lCount(lcThreads);
+    std::atomic<unsigned> lZeros{0};
+    std::vector<std::thread> lThreads;
+    for (unsigned i = 0; i < lcThreads; ++i) {
+        lThreads.emplace_back([&lCount, &lZeros] {
+            for (unsigned lRound = 0; lRound < lcRounds; ++lRound) {
+                lCount.increment();
+                if (0 == lCount.decrement()) {
+                    ++lZeros;
+                }
+            }
+            if (0 == lCount.decrement()) {
+                ++lZeros;
+            }
+        });
+    }
+    for (std::thread& lrThread : lThreads) {
+        lrThread.join();
+    }
+    EXPECT_EQ(1u, lZeros.load());
+}

@@ -1,0 +1,219 @@
+#include "os/common/include/Clib.h"
+
+#include <fcntl.h>
+#include <gtest/gtest.h>
+#include <signal.h>
+#include <sys/wait.h>
+#include <unistd.h>
+
+#include <cerrno>
+#include <cstring>
+#include <string>
+
+#include "tests/support/TemporaryDirectory.h"
+
+TEST(Clib, GetenvYieldsTheValueAndCopiesItWhereABufferIsGiven) {
+    ASSERT_EQ(setenv("ZT_CLIB_TEST", "a value", 1), 0);
+    char lBuffer[32] = {};
+    EXPECT_STREQ(ClibGetenv("ZT_CLIB_TEST", nullptr), "a value");
+    EXPECT_STREQ(ClibGetenv("ZT_CLIB_TEST", lBuffer), "a value");
+    EXPECT_STREQ(lBuffer, "a value");
+}
+
+TEST(Clib, GetenvYieldsNullForAVariableThatIsUnset) {
+    unsetenv("ZT_CLIB_TEST");
+    char lBuffer[8] = "kept";
+    EXPECT_EQ(ClibGetenv("ZT_CLIB_TEST", lBuffer), nullptr);
+    EXPECT_STREQ(lBuffer, "kept");
+}
+
+TEST(Clib, StrcpyFillsAnArrayToItsLastByteAndNoFurther) {
+    char lBuffer[5] = {};
+    EXPECT_STREQ(ClibStrcpy(lBuffer, "/tmp"), "/tmp");
+    EXPECT_THROW(ClibStrcpy(lBuffer, "/temp"), ZTCInvalidEx);
+    EXPECT_STREQ(lBuffer, "/tmp");
+}
+
+TEST(Clib, SprintfCutsWhatDoesNotFit) {
+    char lBuffer[5];
+    EXPECT_EQ(ClibSprintf(lBuffer, sizeof(lBuffer), "%d", 1234567), 4);
+    EXPECT_STREQ(lBuffer, "1234");
+    EXPECT_EQ(ClibSprintf(lBuffer, sizeof(lBuffer), "%s", "ab"), 2);
+    EXPECT_STREQ(lBuffer, "ab");
+    EXPECT_EQ(ClibSprintf(nullptr, 0, "%s", "ab"), 0);
+}
+
+TEST(Clib, NetworkOrderIsTheOrderOfTheBytes) {
+    const unsigned char lcBytes[4] = {0x01, 0x02, 0x03, 0x04};
+    std::uint32_t lNumber;
+    ClibMemcpy(&lNumber, lcBytes, sizeof(lNumber));
+    EXPECT_EQ(ClibNtohl(lNumber), 0x01020304u);
+    EXPECT_EQ(ClibHtonl(0x01020304u), lNumber);
+}
+
+TEST(Clib, MemoryAndTextCallsDoWhatTheirNamesSay) {
+    char lBytes[4];
+    ClibMemset(lBytes, 'x', sizeof(lBytes));
+    EXPECT_EQ(std::string(lBytes, 4), "xxxx");
+    EXPECT_EQ(ClibStrcmp("a", "a"), 0);
+    EXPECT_LT(ClibStrcmp("a", "b"), 0);
+    EXPECT_GT(ClibStrcmp("b", "a"), 0);
+}
+
+TEST(Clib, MkdirSaysThatThePathExists) {
+    ZTCTemporaryDirectory lDirectory;
+    const std::string lPath = lDirectory.path("made");
+    ClibMkdir(lPath.c_str(), 0700);
+    EXPECT_THROW(ClibMkdir(lPath.c_str(), 0700), ZTCExistsEx);
+    try {
+        ClibMkdir(lDirectory.path("no/such").c_str(), 0700);
+        FAIL() << "a directory without its parent was made";
+    } catch (const ZTCClibMkdirFailedEx& acrException) {
+        EXPECT_NE(std::string(acrException.what()).find(lDirectory.path("no/such")), std::string::npos);
+    }
+}
+
+TEST(Clib, StatAndUtimeNameTheFileThatIsMissing) {
+    ZTCTemporaryDirectory lDirectory;
+    const std::string lPath = lDirectory.path("missing");
+    struct stat lStatus {};
+    EXPECT_THROW(ClibStat(lPath.c_str(), &lStatus), ZTCClibStatFailedEx);
+    EXPECT_FALSE(ClibLstat(lPath.c_str(), &lStatus));
+    EXPECT_FALSE(ClibUnlink(lPath.c_str()));
+    try {
+        ClibUtime(lPath.c_str());
+        FAIL() << "the times of a missing file were set";
+    } catch (const ZTCClibUtimeFailedEx& acrException) {
+        EXPECT_NE(std::string(acrException.what()).find(lPath), std::string::npos);
+        EXPECT_NE(std::string(acrException.what()).find(std::strerror(ENOENT)), std::string::npos);
+    }
+}
+
+TEST(Clib, UtimeSetsTheTimesToNow) {
+    ZTCTemporaryDirectory lDirectory;
+    const std::string lPath = lDirectory.path("file");
+    writeFile(lPath, "x");
+    const struct timespec lOld[2] = {{1000, 0}, {1000, 0}};
+    ASSERT_EQ(utimensat(AT_FDCWD, lPath.c_str(), lOld, 0), 0);
+    ClibUtime(lPath.c_str());
+    struct stat lStatus {};
+    ClibStat(lPath.c_str(), &lStatus);
+    EXPECT_GT(lStatus.st_mtim.tv_sec, 1000);
+    EXPECT_GT(lStatus.st_atim.tv_sec, 1000);
+}
+
+TEST(Clib, FileKindsHaveNames) {
+    EXPECT_STREQ(ClibFileKind(S_IFIFO | 0600), "a FIFO");
+    EXPECT_STREQ(ClibFileKind(S_IFREG | 0644), "a regular file");
+    EXPECT_STREQ(ClibFileKind(S_IFDIR), "a directory");
+    EXPECT_STREQ(ClibFileKind(S_IFLNK), "a symbolic link");
+    EXPECT_STREQ(ClibFileKind(S_IFSOCK), "a socket");
+    EXPECT_STREQ(ClibFileKind(S_IFCHR), "a character device");
+    EXPECT_STREQ(ClibFileKind(S_IFBLK), "a block device");
+    EXPECT_STREQ(ClibFileKind(0), "something unknown");
+}
+
+TEST(Clib, EveryDescriptorIsCloseOnExec) {
+    const int lFile = ClibOpen("/dev/null", O_RDONLY);
+    const int lEvent = ClibEventFd();
+    EXPECT_EQ(fcntl(lFile, F_GETFD) & FD_CLOEXEC, FD_CLOEXEC);
+    EXPECT_EQ(fcntl(lEvent, F_GETFD) & FD_CLOEXEC, FD_CLOEXEC);
+    ClibClose(lFile);
+    ClibClose(lEvent);
+}
+
+TEST(ClibDeathTest, ADescriptorIsNeverAStandardOne) {
+    GTEST_FLAG_SET(death_test_style, "threadsafe");
+    EXPECT_EXIT(
+        {
+            close(0);
+            close(1);
+            const int lFile = ClibOpen("/dev/null", O_RDONLY);
+            const int lEvent = ClibEventFd();
+            const bool lAreFree = fcntl(0, F_GETFD) < 0 && fcntl(1, F_GETFD) < 0;
+            _exit(lFile > 2 && lEvent > 2 && fcntl(lFile, F_GETFD) == FD_CLOEXEC && lAreFree ? 0 : 1);
+        },
+        testing::ExitedWithCode(0), "");
+}
+
+TEST(Clib, OpenNamesThePathAndTheReason) {
+    try {
+        ClibOpen("/no/such/file", O_RDONLY);
+        FAIL() << "a missing file was opened";
+    } catch (const ZTCClibOpenFailedEx& acrException) {
+        EXPECT_STREQ(acrException.what(),
+                     (std::string("Opening '/no/such/file' failed: ") + std::strerror(ENOENT)).c_str());
+    }
+    EXPECT_EQ(ClibTryOpen("/no/such/file", O_RDONLY), -ENOENT);
+}
+
+TEST(Clib, ReadAndWriteTellTheirOrdinaryOutcomesApart) {
+    signal(SIGPIPE, SIG_IGN);
+    int lPipe[2];
+    ASSERT_EQ(pipe2(lPipe, O_CLOEXEC | O_NONBLOCK), 0);
+    char lText[4] = {};
+    EXPECT_EQ(ClibRead(lPipe[0], lText, sizeof(lText)), -EAGAIN);
+
+    char lOut[] = "ab";
+    const struct iovec lPart = {lOut, 2};
+    EXPECT_EQ(ClibWritev(lPipe[1], &lPart, 1), 2);
+    EXPECT_EQ(ClibBytesWaiting(lPipe[0]), 2u);
+    EXPECT_EQ(ClibRead(lPipe[0], lText, sizeof(lText)), 2);
+    close(lPipe[1]);
+    EXPECT_EQ(ClibRead(lPipe[0], lText, sizeof(lText)), 0);
+    close(lPipe[0]);
+
+    ASSERT_EQ(pipe2(lPipe, O_CLOEXEC | O_NONBLOCK), 0);
+    close(lPipe[0]);
+    EXPECT_EQ(ClibWritev(lPipe[1], &lPart, 1), -EPIPE);
+    close(lPipe[1]);
+    EXPECT_THROW(ClibRead(-1, lText, 1), ZTCClibReadFailedEx);
+    EXPECT_THROW(ClibWritev(-1, &lPart, 1), ZTCClibWriteFailedEx);
+}
+
+TEST(Clib, ALockIsHeldByOneOpenFileAtATime) {
+    ZTCTemporaryDirectory lDirectory;
+    const std::string lPath = lDirectory.path("lock");
+    const int lFirst = ClibOpen(lPath.c_str(), O_RDWR | O_CREAT, 0600);
+    const int lSecond = ClibOpen(lPath.c_str(), O_RDONLY);
+    EXPECT_TRUE(ClibTryLock(lFirst));
+    EXPECT_FALSE(ClibTryLock(lSecond));
+    ClibClose(lFirst);
+    EXPECT_TRUE(ClibTryLock(lSecond));
+    ClibClose(lSecond);
+}
+
+TEST(Clib, AZombieIsNotAlive) {
+    const pid_t lChild = fork();
+    if (lChild == 0) {
+        _exit(0);
+    }
+    ASSERT_GT(lChild, 0);
+    siginfo_t lInfo;
+    ASSERT_EQ(waitid(P_PID, static_cast<id_t>(lChild), &lInfo, WEXITED | WNOWAIT), 0);
+    EXPECT_EQ(kill(lChild, 0), 0) << "the zombie is gone before it was looked at";
+    EXPECT_FALSE(ClibIsProcessAlive(lChild));
+    ASSERT_EQ(waitpid(lChild, nullptr, 0), lChild);
+    EXPECT_FALSE(ClibIsProcessAlive(lChild));
+    EXPECT_FALSE(ClibKill(lChild, 0));
+    EXPECT_TRUE(ClibIsProcessAlive(getpid()));
+    EXPECT_FALSE(ClibIsProcessAlive(0));
+    EXPECT_FALSE(ClibIsProcessAlive(-1));
+}
+
+TEST(Clib, AProcessThatMayNotBeSignalledIsAlive) {
+    if (geteuid() != 0) {
+        EXPECT_TRUE(ClibIsProcessAlive(1));
+        return;
+    }
+    const pid_t lChild = fork();
+    if (lChild == 0) {
+        const bool lIsNobody = setgid(65534) == 0 && setuid(65534) == 0;
+        const bool lIsRefused = kill(1, 0) != 0 && errno == EPERM;
+        _exit(lIsNobody && lIsRefused && ClibIsProcessAlive(1) ? 0 : 1);
+    }
+    ASSERT_GT(lChild, 0);
+    int lStatus = -1;
+    ASSERT_EQ(waitpid(lChild, &lStatus, 0), lChild);
+    EXPECT_EQ(lStatus, 0);
+}

@@ -1,0 +1,42 @@
+#include "os/common/include/ProcessEvents.h"
+
+#include <gtest/gtest.h>
+
+#include <thread>
+
+TEST(ProcessEvents, AnEventStaysRaised) {
+    ZTCProcessEvent lEvent;
+    EXPECT_FALSE(lEvent.isRaised());
+    EXPECT_FALSE(lEvent.waitFor(1));
+    lEvent.raise();
+    lEvent.raise();
+    EXPECT_TRUE(lEvent.isRaised());
+    EXPECT_TRUE(lEvent.isRaised());
+    EXPECT_TRUE(lEvent.waitFor(-1));
+}
+
+TEST(ProcessEvents, AnEventCanBeTakenBack) {
+    ZTCProcessEvent lEvent;
+    lEvent.raise();
+    lEvent.raise();
+    lEvent.reset();
+    EXPECT_FALSE(lEvent.isRaised());
+    lEvent.reset();
+    EXPECT_FALSE(lEvent.isRaised());
+}
+
+TEST(ProcessEvents, RaisingWakesWhoWaits) {
+    ZTCProcessEvent lEvent;
+    std::thread lThread([&] { EXPECT_TRUE(lEvent.waitFor(20000)); });
+    lEvent.raise();
+    lThread.join();
+}
+
+TEST(ProcessEvents, TheProcessHasOneStopEventAndOneExitEvent) {
+    EXPECT_EQ(&getStopEvent(), &getStopEvent());
+    EXPECT_EQ(&getExitEvent(), &getExitEvent());
+    EXPECT_NE(&getStopEvent(), &getExitEvent());
+    getStopEvent().raise();
+    EXPECT_FALSE(getExitEvent().isRaised());
+    getStopEvent().reset();
+}
