@@ -1,0 +1,46 @@
+# Shared by the scripts: sourced, never run. Sets the working directory to the root of the tree.
+
+set -euo pipefail
+
+gRoot=$(cd "$(dirname "${BASH_SOURCE[0]}")/../.." && pwd)
+cd "$gRoot"
+
+# What each step builds with, as Debian's package names.
+gCompilerPackages=(g++ gcc cmake ninja-build)
+gClientPackages=(libcli11-dev nlohmann-json3-dev)
+gTestPackages=(libgtest-dev libgmock-dev)
+gClangPackages=(clang libclang-rt-14-dev llvm)
+gStylePackages=(clang-format clang-tidy)
+
+say() { printf '\n== %s\n' "$*"; }
+fail() {
+  printf '%s\n' "$*" >&2
+  exit 1
+}
+
+# need_packages PACKAGE...: installs what is missing where the user is root, else names it in one line and ends.
+need_packages() {
+  local lMissing=() lPackage
+  for lPackage in "$@"; do
+    if [ "$(dpkg-query -W -f '${db:Status-Status}' "$lPackage" 2>/dev/null)" != installed ]; then
+      lMissing+=("$lPackage")
+    fi
+  done
+  [ ${#lMissing[@]} -eq 0 ] && return 0
+  if [ "$(id -u)" -ne 0 ]; then
+    fail "Packages are missing. Install them with:
+  sudo apt-get update && sudo apt-get install -y --no-install-recommends ${lMissing[*]}"
+  fi
+  say "Installing ${lMissing[*]}"
+  export DEBIAN_FRONTEND=noninteractive
+  apt-get update -q
+  apt-get install -q -y --no-install-recommends "${lMissing[@]}"
+}
+
+# configure_and_build PRESET [CMAKE-OPTION...]: into build/PRESET.
+configure_and_build() {
+  local lPreset=$1
+  shift
+  cmake --preset "$lPreset" "$@"
+  cmake --build --preset "$lPreset" -- --quiet
+}
