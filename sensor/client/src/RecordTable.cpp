@@ -3,6 +3,8 @@
 #include <algorithm>
 #include <array>
 #include <cstdio>
+#include <map>
+#include <utility>
 #include <vector>
 
 #include "sensor/client/include/RecordFields.h"
@@ -58,29 +60,25 @@ static std::string sFormatValue(const ZTSFieldValue& acrValue) {
     return lText;
 }
 
-/// "a/b c/d*3": the fields of one entry joined by slashes, equal neighbours counted.
+/// "a/b c/d*3": the fields of one entry joined by slashes, in the order of first occurrence, equal entries counted.
 static std::string sFormatEntries(const std::vector<std::vector<ZTSFieldValue>>& acrEntries) {
-    std::string lText;
-    std::string lPrevious;
-    std::size_t lTimes = 0;
-    const auto lFinish = [&] {
-        if (lTimes != 0) {
-            lText += (lText.empty() ? "" : " ") + lPrevious + (lTimes > 1 ? "*" + std::to_string(lTimes) : "");
-        }
-    };
+    std::vector<std::pair<std::string, std::size_t>> lCounts;
+    std::map<std::string, std::size_t> lPlaces;
     for (const std::vector<ZTSFieldValue>& lrEntry : acrEntries) {
         std::string lOne;
         for (const ZTSFieldValue& lrValue : lrEntry) {
             lOne += (lOne.empty() ? "" : "/") + sFormatValue(lrValue);
         }
-        if (lOne != lPrevious || lTimes == 0) {
-            lFinish();
-            lPrevious = lOne;
-            lTimes = 0;
+        const auto lPlace = lPlaces.try_emplace(lOne, lCounts.size());
+        if (lPlace.second) {
+            lCounts.emplace_back(std::move(lOne), 0);
         }
-        ++lTimes;
+        ++lCounts[lPlace.first->second].second;
     }
-    lFinish();
+    std::string lText;
+    for (const auto& [lOne, lTimes] : lCounts) {
+        lText += (lText.empty() ? "" : " ") + lOne + (lTimes > 1 ? "*" + std::to_string(lTimes) : "");
+    }
     return lText;
 }
 

@@ -44,3 +44,13 @@ TEST(RecordTable, AKeyThatIsNoPairOfNamesIsShownWithoutControlCharacters) {
         decodeResponse(makeSampleResponse(1, {makeSampleList("bad\n\x1b[2Jkey", {makeSampleRecord(8, 2, {})})}));
     EXPECT_NE(formatTable(lResponse).find("bad\\x0a\\x1b[2Jkey"), std::string::npos);
 }
+
+TEST(RecordTable, EqualEntriesAreCountedWhereverTheyStand) {
+    ZTSReceivedRecord lRecord;
+    lRecord.mCategory = 4;
+    lRecord.mSubcategory = 0x08;
+    ZTCByteWriter lWriter;
+    lWriter.le32(1).wwn(makeWwn(gcSamplePort)).le32(7).le32(2).le32(7).le32(0xFFFFFFFF).le32(2).le32(7);
+    lRecord.mEventData = lWriter.bytes();
+    EXPECT_EQ(formatDetails(lRecord), "resets=[7*3 2*2 all]");
+}
