@@ -1,7 +1,8 @@
 /// The name of a source file as the log shows it, made at compile time.
 ///
-/// The build gives __FILE__ as a path from the root of the sources. The label is that path without its extension; the
-/// agent's own sources, tavik/src/NAME.cpp, are labelled .//NAME.
+/// The build gives __FILE__ as a path from the root of the sources, or, where a compiler cache has made the paths
+/// relative, from the build directory within it. The label is that path without what leads up to the root and without
+/// its extension; the agent's own sources, tavik/src/NAME.cpp, are labelled .//NAME.
 
 #ifndef COMMON_INCLUDE_FILELABEL_H
 #define COMMON_INCLUDE_FILELABEL_H
@@ -16,13 +17,18 @@ struct ZTSFileLabel {
         constexpr char lcAgent[] = "tavik/src/";
         constexpr std::size_t lcAgentLength = sizeof(lcAgent) - 1;
 
-        bool lIsAgent = tLength > lcAgentLength;
+        std::size_t lIn = 0;
+        while (lIn + 3 < tLength && acrPath[lIn] == '.' && acrPath[lIn + 1] == '.' && acrPath[lIn + 2] == '/') {
+            lIn += 3;
+        }
+
+        bool lIsAgent = tLength - lIn > lcAgentLength;
         for (std::size_t i = 0; lIsAgent && i < lcAgentLength; ++i) {
-            lIsAgent = acrPath[i] == lcAgent[i];
+            lIsAgent = acrPath[lIn + i] == lcAgent[i];
         }
 
         std::size_t lEnd = tLength - 1;
-        for (std::size_t i = tLength - 1; i > 0 && acrPath[i] != '/'; --i) {
+        for (std::size_t i = tLength - 1; i > lIn && acrPath[i] != '/'; --i) {
             if (acrPath[i] == '.' && acrPath[i - 1] != '/') {
                 lEnd = i;
                 break;
@@ -30,12 +36,11 @@ struct ZTSFileLabel {
         }
 
         std::size_t lOut = 0;
-        std::size_t lIn = 0;
         if (lIsAgent) {
             mText[lOut++] = '.';
             mText[lOut++] = '/';
             mText[lOut++] = '/';
-            lIn = lcAgentLength;
+            lIn += lcAgentLength;
         }
         while (lIn < lEnd) {
             mText[lOut++] = acrPath[lIn++];

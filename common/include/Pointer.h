@@ -32,8 +32,7 @@ enum ZTEPointerAllocType : unsigned char {
     ZTPAT_Max = 3
 };
 
-// The log shows the conditions as they are written here.
-// NOLINTBEGIN(modernize-use-nullptr)
+// The log shows the conditions as they are written here: 0, not nullptr.
 
 template <typename T>
 class ZTCPointer {
@@ -192,7 +191,5 @@ private:
     ZTEPointerAllocType mAllocType = ZTPAT_None;
     unsigned char mPadding[2] = {0, 0};
 };
-
-// NOLINTEND(modernize-use-nullptr)
 
 #endif

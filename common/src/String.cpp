@@ -32,8 +32,7 @@ ZTCString::ZTCString(const char* apText) : mString(sMakeText(sCheckText(apText))
 ZTCString::ZTCString(const char* apText, std::size_t aLength)
     : mString(sMakeText(0 == aLength ? "" : sCheckText(apText), aLength)) {}
 
-// The log shows the conditions as they are written here.
-// NOLINTBEGIN(modernize-use-nullptr)
+// The log shows the conditions as they are written here: 0, not nullptr.
 
 ZTCString::ZTCString(const ZTCString& acrCopy) {
     ZT_ASSERT(acrCopy.mString != 0);
@@ -87,5 +86,3 @@ ZTCString ZTCString::operator+(const ZTCString& acrOther) const {
     }
     return lSum;
 }
-
-// NOLINTEND(modernize-use-nullptr)

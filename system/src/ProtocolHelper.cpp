@@ -18,7 +18,7 @@ void sDumpLine(const unsigned char* apBytes, Size aCount) {
     constexpr char lcDigits[] = "0123456789abcdef";
     char lHex[3 * gcBytesPerLine + 1];
     char lText[gcBytesPerLine + 1];
-    for (Size lIndex = 0; lIndex < gcBytesPerLine; ++lIndex) {
+    for (std::size_t lIndex = 0; lIndex < gcBytesPerLine; ++lIndex) {
         const bool lIsThere = lIndex < aCount;
         const unsigned char lByte = lIsThere ? apBytes[lIndex] : 0;
         lHex[3 * lIndex] = lIsThere ? lcDigits[lByte >> 4] : ' ';

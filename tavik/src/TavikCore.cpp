@@ -321,11 +321,12 @@ void sProcessRscnEvent(unsigned int aBoardId, const void* apData, unsigned int a
     ZT_LOG_INFO("lPayloadLength = %hu", lPayloadLength);
     // The payload is as long as it says: the library delivers it whole, whatever length goes with it.
     const auto lPageCount = std::max<std::int16_t>(static_cast<std::int16_t>(lPayloadLength / gcRscnPageSize - 1), 0);
+    const unsigned char* lpPage = lpPayload + gcRscnHeaderSize;
     for (std::int16_t lPage = 0; lPage < lPageCount; ++lPage) {
         unsigned int lWord;
-        ClibMemcpy(&lWord, lpPayload + gcRscnHeaderSize + gcRscnPageSize * static_cast<unsigned int>(lPage),
-                   sizeof lWord);
+        ClibMemcpy(&lWord, lpPage, sizeof lWord);
         sConsolidateRscnEvent(acrEvent, aBoardId, ClibNtohl(lWord));
+        lpPage += gcRscnPageSize;
     }
     ZT_EXIT();
 }

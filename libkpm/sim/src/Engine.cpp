@@ -274,7 +274,7 @@ bool ZTCSimEngine::deliver(const ZTSSimDelivery& acrDelivery) {
 
 std::uint64_t ZTCSimEngine::inject(const ZTSSimEventLine& acrLine) {
     const auto* lpEvent = std::get_if<ZTSSimEvent>(&acrLine);
-    const auto* lpStorm = std::get_if<ZTSSimStorm>(&acrLine);
+    const auto* lpStorm = lpEvent != nullptr ? nullptr : &std::get<ZTSSimStorm>(acrLine);
     const std::uint64_t lEnd = lpEvent != nullptr ? lpEvent->mTimes : lpStorm->mCount;
     const std::uint64_t lThreads = std::min(lpEvent != nullptr ? lpEvent->mThreads : lpStorm->mThreads, lEnd);
     std::atomic<std::uint64_t> lDelivered{0};

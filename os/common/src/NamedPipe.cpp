@@ -102,7 +102,7 @@ ZTCNamedPipe::ZTCNamedPipe(const ZTCString& acrPath, ZTEFileMode aFileMode, ZTEP
     : mPath(acrPath), mPipeState(aPipeState), mFileMode(aFileMode), mConnectionMode(aConnectionMode) {}
 
 ZTCNamedPipe::~ZTCNamedPipe() {
-    close();
+    ZTCNamedPipe::close();
 }
 
 void ZTCNamedPipe::create() {

@@ -138,7 +138,7 @@ static std::string sFormatDetails(const ZTSReceivedRecord& acrRecord, const ZTSD
         const bool lIsKnownAnyway =
             lName == "version" || lName == "page" || (lName == "portName" && lValue == lRemotePort);
         if (!lIsKnownAnyway) {
-            lAdd(lName + "=" + lValue);
+            lAdd(std::string(lName).append("=").append(lValue));
         }
     }
     if (!acrData.mEntries.empty()) {

@@ -17,6 +17,13 @@ TEST(FileLabel, OfTheAgentsSourcesIsTheNameAlone) {
     EXPECT_STREQ(".//", ZT_FILE_LABEL_OF("tavik/src/"));
 }
 
+TEST(FileLabel, LeavesOutWhatLeadsUpToTheRoot) {
+    EXPECT_STREQ(".//TavikSystem", ZT_FILE_LABEL_OF("../../tavik/src/TavikSystem.cpp"));
+    EXPECT_STREQ("os/common/include/Mutex", ZT_FILE_LABEL_OF("../os/common/include/Mutex.h"));
+    EXPECT_STREQ("..a/b", ZT_FILE_LABEL_OF("..a/b.h"));
+    EXPECT_STREQ("", ZT_FILE_LABEL_OF("../"));
+}
+
 TEST(FileLabel, OnlyTheLastExtensionOfTheNameGoes) {
     EXPECT_STREQ("a.b/c", ZT_FILE_LABEL_OF("a.b/c"));
     EXPECT_STREQ("a.b/c", ZT_FILE_LABEL_OF("a.b/c.d"));
