@@ -110,8 +110,8 @@ void ZTCTavikProtocolHandler::handleStartScopeCommand(const ZTCPointer<ZTCBuffer
         return;
     }
 
-    ZTCLibkpmAbs& lrLibkpm = *mpTavikSystem->getLibkpmAbs();
     for (const auto& lrEntry : mpTavikSystem->getInitiators()) {
+        ZTCLibkpmAbs& lrLibkpm = *mpTavikSystem->getLibkpmAbs();
         const ZTCPointer<ZTCTavikInitiator>& lrInitiator = lrEntry.second;
         const unsigned int lBoardId = lrInitiator->getBoardId();
         const ZTCString lWwnn = lrInitiator->getWwnn()->getString();
@@ -220,9 +220,9 @@ void ZTCTavikProtocolHandler::handleStopCommand(const ZTCPointer<ZTCBuffer>&, ZT
 
 void ZTCTavikProtocolHandler::handleUnregisterEvents() {
     ZT_ENTRY();
-    ZTCLibkpmAbs& lrLibkpm = *mpTavikSystem->getLibkpmAbs();
-    const ZTCTavikEventCatalogue& lrCatalogue = *mpTavikSystem->getEventCatalogue();
     for (const auto& lrEntry : mpTavikSystem->getInitiators()) {
+        ZTCLibkpmAbs& lrLibkpm = *mpTavikSystem->getLibkpmAbs();
+        const ZTCTavikEventCatalogue& lrCatalogue = *mpTavikSystem->getEventCatalogue();
         const ZTCPointer<ZTCTavikInitiator>& lrInitiator = lrEntry.second;
         for (auto lRegistration = lrInitiator->r_begin(); lRegistration != lrInitiator->r_end(); ++lRegistration) {
             const unsigned short lKeyForm = lRegistration->first;
