@@ -96,7 +96,9 @@ void ZTCAdaptersLibraryDouble::close() {
 }
 
 std::uint32_t ZTCAdaptersLibraryDouble::getNumberOfAdapters() {
-    mCalls.emplace_back("GetNumberOfAdapters");
+    if (mNotesCounting) {
+        mCalls.emplace_back("GetNumberOfAdapters");
+    }
     return mNumberOfAdapters;
 }
 

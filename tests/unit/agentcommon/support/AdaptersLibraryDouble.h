@@ -54,6 +54,7 @@ public:
     std::function<void()> mBeforeClosed;                               ///< runs before Close returns
 
     // ---- What the agent has done ----
+    bool mNotesCounting = true;  ///< false: GetNumberOfAdapters is not noted, and so allocates nothing
     /// One text for each call, in order.
     const std::vector<std::string>& calls() const { return mCalls; }
     std::vector<std::string> callsOf(const std::string& acrPrefix) const;
