@@ -52,6 +52,33 @@ TEST_F(EventAdmission, AnEventIsAdmittedOneByteBelowTheTotalLimitAndMayPassIt) {
     EXPECT_EQ(mPlogiText, retrieveTexts().at(1));
 }
 
+TEST_F(EventAdmission, AnAppendMayPassTheTotalLimitAndIsTheLastThingAdmitted) {
+    const ZTSDeliveredKind& lcrKind = kindNamed("LS_RJT");
+    const auto lcRecord = static_cast<unsigned>(lcrKind.recordSize());
+    for (const unsigned lTotal : {262143u, 262144u}) {
+        SCOPED_TRACE(lTotal);
+        mSystem->getProtocolHandler() != nullptr ? startScope() : collect();
+        mSystem->makePendingRecord(0, lTotal - lcRecord);
+        for (unsigned lEvent = 0; lEvent < 3; ++lEvent) {
+            deliverScope(0, lcrKind.mCategory, lcrKind.mSubcategory, lcrKind.mPayload);
+        }
+        const bool lIsAppended = lTotal == 262143;
+        EXPECT_EQ(lIsAppended ? 262151u : 262144u, mSystem->getTotalEventDataSize());
+        EXPECT_EQ(lIsAppended ? "1/8 x2 " + lcrKind.mRecordHex + lcrKind.mAppendedHex : "1/8 x1 " + lcrKind.mRecordHex,
+                  retrieveTexts().at(1));
+    }
+}
+
+TEST_F(EventAdmission, AnEventThatIsOnlyCountedLeavesTheTotalBelowItsLimit) {
+    collect();
+    mSystem->makePendingRecord(0, 262143 - 4);
+    for (unsigned lEvent = 0; lEvent < 5; ++lEvent) {
+        deliverTemperature(0);
+    }
+    EXPECT_EQ(262143u, mSystem->getTotalEventDataSize());
+    EXPECT_EQ("8/4 x5 01000000", retrieveTexts().at(1));
+}
+
 TEST_F(EventAdmission, AtTheTotalLimitEveryCallbackDropsItsEventAfterTwoNotices) {
     collect();
     mSystem->makePendingRecord(0, 262144);

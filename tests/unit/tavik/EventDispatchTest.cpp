@@ -1,6 +1,7 @@
 #include <gtest/gtest.h>
 
 #include <algorithm>
+#include <array>
 
 #include "common/include/Log.h"
 #include "tests/unit/tavik/support/DeliveredKinds.h"
@@ -40,6 +41,53 @@ protected:
 
     static bool isRscn(unsigned aCategory, unsigned aSubcategory) { return aCategory == 1 && aSubcategory == 0x20; }
 
+    /// What becomes of four events of one pair: without data, with a byte less than its kind needs, with what it needs,
+    /// and with more.
+    struct ZTSExpectation {
+        ZTCBytes mPayload;
+        std::array<std::string, 4> mTexts;
+        std::array<std::size_t, 4> mBytes{};  ///< that each adds to the total
+        std::string mRecord;                  ///< the one record of all four; empty: none
+    };
+
+    static ZTSExpectation expectationOf(unsigned aCategory, unsigned aSubcategory) {
+        const std::string lWithout = textWithoutData(aCategory, aSubcategory);
+        if (isRscn(aCategory, aSubcategory)) {
+            const std::string lNotice = "-N- Processing Rscn Event Cat=1 SubCat=32";
+            return {makeRscn({0x00010203}),
+                    {lWithout, "-W- Not enough data in RSCN Event 8 7", lNotice, lNotice},
+                    {0, 0, 8, 0},
+                    "x2 0100000003020100"};
+        }
+        const ZTSDeliveredKind* const lpKind = findKind(aCategory, aSubcategory);
+        if (lpKind == nullptr) {
+            return {ZTCBytes(40, 0x5A), {lWithout, lWithout, lWithout, lWithout}, {}, ""};
+        }
+        const std::string lNotice = "-N- " + lpKind->mNotice;
+        if (lpKind->mMinimumLength == 0) {
+            return {
+                {}, {lNotice, lNotice, lNotice, lNotice}, {lpKind->recordSize(), 0, 0, 0}, "x4 " + lpKind->mRecordHex};
+        }
+        return {lpKind->mPayload,
+                {lWithout,
+                 "-W- " + lpKind->mTooShortText + std::to_string(lpKind->mMinimumLength) + " " +
+                     std::to_string(lpKind->mMinimumLength - 1),
+                 lNotice, lNotice},
+                {0, 0, lpKind->recordSize(), lpKind->appendedSize()},
+                "x2 " + lpKind->mRecordHex + lpKind->mAppendedHex};
+    }
+
+    static ZTCBytes shorter(ZTCBytes aData) {
+        if (!aData.empty()) {
+            aData.pop_back();
+        }
+        return aData;
+    }
+    static ZTCBytes longer(ZTCBytes aData) {
+        aData.insert(aData.end(), 7, 0xCC);
+        return aData;
+    }
+
     /// The one line that an event without data leaves.
     static std::string textWithoutData(unsigned aCategory, unsigned aSubcategory) {
         if (isRscn(aCategory, aSubcategory)) {
@@ -74,43 +122,32 @@ TEST_F(EventDispatch, EachOfThe65536PairsLeavesItsOneLineWithoutData) {
     }
 }
 
-TEST_F(EventDispatch, EachOfThe65536PairsMakesExactlyTheRecordsOfItsKindAtEveryLength) {
+TEST_F(EventDispatch, EachOfThe65536PairsLeavesItsLineAndItsBytesAtEveryLength) {
     collect();
-    setLogCode(0);
-    const ZTCBytes lRscn = makeRscn({0x00010203});
-    const ZTCBytes lUnknown(40, 0x5A);
-    ZTSDeliveryShape lNoPayload;
-    lNoPayload.mHasPayload = false;
     for (unsigned lCategory = 0; lCategory < 256; ++lCategory) {
-        std::vector<std::string> lExpected;
+        const ZTCTestLog lLog(mDirectory.path("log of category " + std::to_string(lCategory)));
+        std::vector<std::string> lTexts;
+        std::vector<std::string> lRecords;
         std::size_t lTotal = 0;
         for (unsigned lSubcategory = 0; lSubcategory < 256; ++lSubcategory) {
-            const ZTSDeliveredKind* const lpKind = findKind(lCategory, lSubcategory);
-            const bool lIsRscn = isRscn(lCategory, lSubcategory);
-            const ZTCBytes lPayload = lIsRscn ? lRscn : lpKind != nullptr ? lpKind->mPayload : lUnknown;
-            ZTCBytes lShorter = lPayload;
-            ZTCBytes lLonger = lPayload;
-            if (!lShorter.empty()) {
-                lShorter.pop_back();
-            }
-            lLonger.insert(lLonger.end(), 7, 0xCC);
-            deliverScope(0, lCategory, lSubcategory, {}, lNoPayload);
-            deliverScope(0, lCategory, lSubcategory, lShorter);
-            deliverScope(0, lCategory, lSubcategory, lPayload);
-            deliverScope(0, lCategory, lSubcategory, lLonger);
-
+            const ZTSExpectation lExpected = expectationOf(lCategory, lSubcategory);
             const std::string lPair = std::to_string(lCategory) + "/" + std::to_string(lSubcategory);
-            if (lIsRscn) {
-                lExpected.push_back(lPair + " x2 0100000003020100");
-                lTotal += 8;
-            } else if (lpKind != nullptr) {
-                lExpected.push_back(lPair + (lpKind->mMinimumLength == 0 ? " x4 " : " x2 ") + lpKind->mRecordHex +
-                                    lpKind->mAppendedHex);
-                lTotal += lpKind->recordSize() + lpKind->appendedSize();
+            unsigned lLength = 0;
+            for (const ZTCBytes& lcrData :
+                 {ZTCBytes{}, shorter(lExpected.mPayload), lExpected.mPayload, longer(lExpected.mPayload)}) {
+                deliverScope(0, lCategory, lSubcategory, lcrData);
+                lTexts.push_back(lExpected.mTexts.at(lLength));
+                lTotal += lExpected.mBytes.at(lLength);
+                ASSERT_EQ(lTotal, mSystem->getTotalEventDataSize()) << lPair << " with " << lcrData.size() << " bytes";
+                ++lLength;
             }
-            ASSERT_EQ(lTotal, mSystem->getTotalEventDataSize()) << lPair;
+            if (!lExpected.mRecord.empty()) {
+                lRecords.push_back(lPair + " " + lExpected.mRecord);
+            }
         }
-        ASSERT_EQ(lExpected, retrieveTexts());
+        ASSERT_EQ(lTexts, lLog.texts());
+        setLogCode(0);
+        ASSERT_EQ(lRecords, retrieveTexts());
     }
 }
 
