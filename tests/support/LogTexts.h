@@ -1,0 +1,49 @@
+/// Every text that the agent can log, in one table: the tests drive each of them and find it in a log that was really
+/// written, and hold the sources against it, so that no text is changed, moved or added unnoticed.
+#ifndef TESTS_SUPPORT_LOGTEXTS_H
+#define TESTS_SUPPORT_LOGTEXTS_H
+
+#include <cstddef>
+#include <set>
+#include <string>
+#include <vector>
+
+#include "tests/support/AgentLog.h"
+
+/// Where a text is driven.
+enum class ZTELogTextPath {
+    Agent,   ///< by the agent itself, over its pipes, its library and its files
+    Process  ///< in a test's own process: no path of the agent leads there, or none that can be had at will
+};
+
+struct ZTSLogText {
+    unsigned mLevel;
+    const char* mpMark;
+    const char* mpLabel;     ///< the source file; empty for the lines without a place
+    const char* mpFunction;  ///< likewise
+    const char* mpFormat;    ///< as it stands in the source, an assertion with its condition
+    ZTELogTextPath mPath;
+};
+
+/// The lines "Entered" and "Left" of every function but the system's constructor are not listed.
+const std::vector<ZTSLogText>& logTexts();
+
+/// Whether a line has a text of this format.
+bool isOfFormat(const std::string& acrText, const std::string& acrFormat);
+
+/// Takes log lines and notes which rows of the table they belong to.
+class ZTCLogTextsSeen {
+public:
+    void add(const std::vector<std::string>& acrRawLines);
+
+    /// The rows of this path that no line belonged to, one text each.
+    std::vector<std::string> unseen(ZTELogTextPath aPath) const;
+    /// The lines that belong to no row, each once, without time and line number.
+    const std::set<std::string>& strangers() const { return mStrangers; }
+
+private:
+    std::set<std::size_t> mSeen;
+    std::set<std::string> mStrangers;
+};
+
+#endif
