@@ -96,6 +96,7 @@ ZTSChildProcessSetup ZTCAgentProcess::setup(const std::vector<std::string>& acrA
 }
 
 void ZTCAgentProcess::start(const std::vector<std::string>& acrArguments) {
+    mLibrary.isOpen();
     mProcess = launch(acrArguments);
 }
 

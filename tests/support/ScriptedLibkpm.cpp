@@ -22,6 +22,7 @@
 #include <map>
 #include <memory>
 #include <mutex>
+#include <set>
 #include <sstream>
 #include <stdexcept>
 #include <string>
@@ -148,6 +149,9 @@ private:
     std::string endStorm(bool aIsToStop);
     void deliver(const ZTSLibraryEvent& acrEvent);
     void deliverOnRegister(const ZTCKindKey& acrKind);
+    void deliverInClose();
+    /// Where a test holds this function: waits until it lets go of it.
+    void waitWhileHeld(const std::string& acrFunction);
     ZTCWorker& worker(unsigned aNumber);
 
     // Constant after construction.
@@ -170,6 +174,12 @@ private:
     std::map<ZTCKindKey, uint32_t> mRegisterStatuses;
     std::map<ZTCKindKey, uint32_t> mRegisterHandles;
     std::map<ZTCKindKey, std::vector<ZTSLibraryEvent>> mDeliveries;
+    std::map<ZTCKindKey, std::vector<ZTSLibraryEvent>> mInlineDeliveries;
+    unsigned mCloseThreads = 0;
+    std::vector<ZTSLibraryEvent> mCloseDeliveries;
+    std::set<std::string> mHeldFunctions;
+    bool mIsLetGo = false;
+    std::condition_variable mLettingGo;
     std::map<ZTCKindKey, ZTSScopeRegistration> mScopeRegistrations;
     ZTSScopeRegistration mLatestScope;
     std::map<std::pair<unsigned, unsigned>, KPM_EventCallback> mBoardRegistrations;  // board, event type
@@ -326,6 +336,18 @@ void ZTCScriptedLibkpm::configure(const std::string& acrLine) {
     } else if (lKey == "deliver-on-register") {
         const ZTCKindKey lKey2 = lKind();
         mDeliveries[lKey2].push_back(ZTSLibraryEvent::parse(lLine));
+    } else if (lKey == "deliver-in-register") {
+        const ZTCKindKey lKey2 = lKind();
+        mInlineDeliveries[lKey2].push_back(ZTSLibraryEvent::parse(lLine));
+    } else if (lKey == "deliver-in-close") {
+        mCloseThreads = lNumber();
+        mCloseDeliveries.push_back(ZTSLibraryEvent::parse(lLine));
+    } else if (lKey == "hold") {
+        std::string lFunction;
+        lLine >> lFunction;
+        mHeldFunctions.insert(lFunction);
+    } else if (lKey == "hold-nothing") {
+        mHeldFunctions.clear();
     } else if (!lKey.empty()) {
         throw std::runtime_error("no such configuration: " + lKey);
     }
@@ -370,11 +392,59 @@ uint32_t ZTCScriptedLibkpm::init() {
         if (connectToTest()) {
             mServer = std::thread([this] { serve(); });
         }
+        waitWhileHeld("Init");
     }
     return mInitStatus;
 }
 
+void ZTCScriptedLibkpm::waitWhileHeld(const std::string& acrFunction) {
+    std::unique_lock lGuard(mLock);
+    if (mHeldFunctions.erase(acrFunction) == 0) {
+        return;
+    }
+    mIsLetGo = false;
+    record(acrFunction + " held");
+    if (!mLettingGo.wait_for(lGuard, std::chrono::seconds(60), [this] { return mIsLetGo; })) {
+        record(acrFunction + " was not let go of");
+    }
+}
+
+void ZTCScriptedLibkpm::deliverInClose() {
+    std::vector<ZTSLibraryEvent> lEvents;
+    unsigned lThreads = 0;
+    {
+        const std::lock_guard lGuard(mLock);
+        lEvents = mCloseDeliveries;
+        lThreads = mCloseThreads;
+    }
+    if (lEvents.empty()) {
+        return;
+    }
+    const auto lDeliver = [this](const ZTSLibraryEvent& acrEvent) {
+        try {
+            deliver(acrEvent);
+        } catch (const std::exception& lcrError) {
+            record(std::string("deliver-in-close failed: ") + lcrError.what());
+        }
+    };
+    std::vector<std::thread> lDeliverers;
+    for (unsigned i = 0; i < lThreads; ++i) {
+        lDeliverers.emplace_back([&lDeliver, &lEvents] {
+            for (const ZTSLibraryEvent& lcrEvent : lEvents) {
+                lDeliver(lcrEvent);
+            }
+        });
+    }
+    for (std::thread& lrThread : lDeliverers) {
+        lrThread.join();
+    }
+    lDeliver(lEvents.front());
+    record("deliver-in-close returned");
+}
+
 void ZTCScriptedLibkpm::close() {
+    waitWhileHeld("Close");
+    deliverInClose();
     if (mConnection >= 0) {
         shutdown(mConnection, SHUT_RDWR);
     }
@@ -405,6 +475,7 @@ void ZTCScriptedLibkpm::close() {
 }
 
 uint32_t ZTCScriptedLibkpm::getNumberOfAdapters() {
+    waitWhileHeld("GetNumberOfAdapters");
     const std::lock_guard lGuard(mLock);
     record("GetNumberOfAdapters -> " + std::to_string(mNumberOfAdapters));
     return mNumberOfAdapters;
@@ -431,6 +502,7 @@ uint32_t ZTCScriptedLibkpm::getAdapterInfo(uint32_t aIndex, HBA_wwn* apNodeName,
 
 uint32_t ZTCScriptedLibkpm::ztapiRegEvent(uint32_t aBoard, HBA_wwn aPort, uint32_t aCategory, uint32_t aSubcategory,
                                           void* apContext, uint32_t* apHandle, KPM_ScopeCallback apCallback) {
+    waitWhileHeld("ZtapiRegEvent");
     const ZTCKindKey lKind(aBoard, aCategory, aSubcategory);
     uint32_t lStatus = 0;
     {
@@ -488,12 +560,21 @@ uint32_t ZTCScriptedLibkpm::kpmUnregEvent(uint32_t aBoard, uint32_t aHandle) {
 
 void ZTCScriptedLibkpm::deliverOnRegister(const ZTCKindKey& acrKind) {
     std::vector<ZTSLibraryEvent> lEvents;
+    std::vector<ZTSLibraryEvent> lInlineEvents;
     {
         const std::lock_guard lGuard(mLock);
         const auto lScripted = mDeliveries.find(acrKind);
         if (lScripted != mDeliveries.end()) {
             lEvents = lScripted->second;
         }
+        const auto lInline = mInlineDeliveries.find(acrKind);
+        if (lInline != mInlineDeliveries.end()) {
+            lInlineEvents = lInline->second;
+        }
+    }
+    for (const ZTSLibraryEvent& lcrEvent : lInlineEvents) {
+        deliver(lcrEvent);
+        record("deliver-in-register returned");
     }
     for (const ZTSLibraryEvent& lcrEvent : lEvents) {
         const bool lIsDone = worker(0).runJob([this, lcrEvent] { deliver(lcrEvent); }, std::chrono::seconds(10));
@@ -589,6 +670,8 @@ void ZTCScriptedLibkpm::serve() {
         }
         lBuffered.append(lChunk, static_cast<std::size_t>(lCount));
         for (std::size_t lEnd = lBuffered.find('\n'); lEnd != std::string::npos; lEnd = lBuffered.find('\n')) {
+            // The function that is let go of may close the connection: the reply comes first.
+            const bool lIsToLetGo = lBuffered.starts_with("let-go\n");
             std::string lReply;
             try {
                 lReply = "ok " + handle(lBuffered.substr(0, lEnd));
@@ -599,6 +682,11 @@ void ZTCScriptedLibkpm::serve() {
             lReply += '\n';
             if (send(mConnection, lReply.data(), lReply.size(), MSG_NOSIGNAL) < 0) {
                 return;
+            }
+            if (lIsToLetGo) {
+                const std::lock_guard lGuard(mLock);
+                mIsLetGo = true;
+                mLettingGo.notify_all();
             }
         }
     }
@@ -631,6 +719,9 @@ std::string ZTCScriptedLibkpm::handle(const std::string& acrLine) {
         if (!lIsDone || !lFailure.empty()) {
             throw std::runtime_error(lFailure);
         }
+        return "";
+    }
+    if (lVerb == "let-go") {
         return "";
     }
     if (lVerb == "storm") {

@@ -49,7 +49,7 @@ std::string ZTCScriptedLibrary::modulePath() {
 }
 
 void ZTCScriptedLibrary::configure(const std::string& acrLine) {
-    if (takeConnection(0) || mConnection >= 0) {
+    if (isOpen()) {
         request("configure " + acrLine);
     } else {
         std::ofstream lFile(mDirectory + "/scripted.conf", std::ios::app);
@@ -115,6 +115,22 @@ bool ZTCScriptedLibrary::takeConnection(int aMilliseconds) {
     }
     mConnection = lConnection;
     return true;
+}
+
+bool ZTCScriptedLibrary::isOpen() {
+    while (takeConnection(0)) {
+    }
+    char lByte = 0;
+    if (mConnection >= 0 && recv(mConnection, &lByte, 1, MSG_PEEK | MSG_DONTWAIT) == 0) {
+        close(mConnection);
+        mConnection = -1;
+        mBuffered.clear();
+    }
+    return mConnection >= 0;
+}
+
+void ZTCScriptedLibrary::letGo() {
+    request("let-go");
 }
 
 void ZTCScriptedLibrary::waitUntilOpen() {

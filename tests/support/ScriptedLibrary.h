@@ -19,6 +19,13 @@
 ///   register-handle B C U H              the handle of that registration (category 0: of KpmRegEvent for event type U)
 ///   deliver-on-register B C U EVENT...   that registration delivers the event on another thread, and returns only when
 ///                                        its callback has returned (or after 10 s, which the calls tell)
+///   deliver-in-register B C U EVENT...   the same, on the very thread that registers
+///   deliver-in-close N EVENT...          Close delivers these events on N threads, waits for those, and delivers the
+///                                        first one more on its own thread, before it closes anything
+///   hold FUNCTION                        the next call of Init, GetNumberOfAdapters, ZtapiRegEvent or Close is
+///   recorded
+///                                        as "FUNCTION held" and waits until letGo()
+///   hold-nothing                         takes every such line back
 #ifndef TESTS_SUPPORT_SCRIPTEDLIBRARY_H
 #define TESTS_SUPPORT_SCRIPTEDLIBRARY_H
 
@@ -64,6 +71,12 @@ public:
     /// Ends a storm early, and waits as above.
     std::uint64_t stopStorm();
 
+    /// Lets the function that is held go on (see "hold").
+    void letGo();
+
+    /// Whether an agent that runs has the library open. Forgets agents that have ended: only a few of them may wait to
+    /// be forgotten.
+    bool isOpen();
     /// Waits until the library has been opened by the agent. Everything that drives the library does so by itself.
     void waitUntilOpen();
 

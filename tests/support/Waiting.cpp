@@ -1,7 +1,23 @@
 #include "tests/support/Waiting.h"
 
+#include <algorithm>
+#include <cstdlib>
 #include <stdexcept>
 #include <thread>
+
+#if defined(__SANITIZE_ADDRESS__) || defined(__SANITIZE_THREAD__)
+static constexpr double gcSanitizerFactor = 5;
+#else
+static constexpr double gcSanitizerFactor = 1;
+#endif
+
+std::chrono::milliseconds stretched(std::chrono::milliseconds aTime) {
+    double lLoad = 0;
+    const double lProcessors = std::max(1u, std::thread::hardware_concurrency());
+    const double lShare = getloadavg(&lLoad, 1) == 1 ? 1 + lLoad / lProcessors : 2;
+    return std::chrono::milliseconds(
+        static_cast<std::chrono::milliseconds::rep>(static_cast<double>(aTime.count()) * lShare * gcSanitizerFactor));
+}
 
 int ZTCDeadline::remainingMilliseconds() const {
     const auto lLeft =

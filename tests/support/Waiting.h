@@ -10,6 +10,10 @@
 /// it.
 inline constexpr std::chrono::seconds gcTestPatience{20};
 
+/// This time as it is on a machine that has nothing else to do; longer where others compete for the processors, or
+/// where a sanitizer slows the programs down. For bounds that the agent promises.
+std::chrono::milliseconds stretched(std::chrono::milliseconds aTime);
+
 /// A point in time after which waiting is given up.
 class ZTCDeadline {
 public:

@@ -151,22 +151,6 @@ TEST(Lifecycle, AStopThatIsAskedForManyTimesIsOneStop) {
     sExpectNothingLeft(lAgent);
 }
 
-TEST(Lifecycle, AStopWhileTheAgentWaitsForAReaderOfResponsesIsAnExitCondition) {
-    ZTCAgentProcess lAgent;
-    lAgent.start();
-    waitUntil([&] { return isFifo(lAgent.responseFifoPath()); }, "the response FIFO");
-    EXPECT_EQ(lAgent.stop(), 0);
-    EXPECT_EQ(lAgent.log().count("Exit condition", "-I-"), 1u);
-    EXPECT_FALSE(lAgent.log().has("Tavik System exiting"));
-    EXPECT_FALSE(exists(lAgent.pidFilePath()));
-
-    // Whatever FIFOs are left, the next start takes them over.
-    lAgent.startAndConnect();
-    EXPECT_EQ(lAgent.request("0500000000"), gcInvalidHex);
-    EXPECT_EQ(lAgent.stop(), 0);
-    sExpectNothingLeft(lAgent);
-}
-
 TEST(Lifecycle, ASignalAtAnyMomentOfTheStartEndsTheAgentWithStatusZero) {
     // The signal comes as soon as the n-th of these lines is in the log.
     for (const char* lpLine :

@@ -118,31 +118,6 @@ TEST(Storm, StopsAndStartsInAStormLoseNothingThatWasAdmitted) {
     EXPECT_EQ(lSum + lAgent.log().count(lRefused), 16000u);
 }
 
-TEST(Storm, AShutDownInAStormIsAnsweredAndClosesTheLibrary) {
-    ZTCAgentProcess lAgent(2);
-    lAgent.startAndConnectQuietly();
-    lAgent.startScope();
-    lAgent.library().startStorm(8, 0, sMixture());
-    lAgent.retrieve();
-    EXPECT_EQ(lAgent.request("04"), gcSuccessHex);
-    EXPECT_EQ(lAgent.waitForExit(), 0);
-    EXPECT_EQ(lAgent.library().callsOf("Close").size(), 1u);
-}
-
-TEST(Storm, AStopSignalInAStormEndsTheAgentInOrder) {
-    for (int i = 0; i < 5; ++i) {
-        ZTCAgentProcess lAgent(2);
-        lAgent.startAndConnectQuietly();
-        lAgent.startScope();
-        lAgent.library().startStorm(8, 0, sMixture());
-        lAgent.retrieve();
-        EXPECT_EQ(lAgent.stop(), 0);
-        EXPECT_TRUE(lAgent.log().has("Tavik System exiting", "-H-"));
-        EXPECT_FALSE(exists(lAgent.pidFilePath()));
-        EXPECT_TRUE(lAgent.library().callsOf("Close").empty());
-    }
-}
-
 TEST(Storm, AStopSignalAmongCommandsInAStormEndsTheAgentInOrder) {
     ZTCAgentProcess lAgent(2);
     lAgent.startAndConnectQuietly();
@@ -205,14 +180,4 @@ TEST(Storm, AdaptersMayComeAndGoInAStorm) {
     lAgent.retrieve();
     lAgent.library().deliver(ZTSLibraryEvent::bare(1, 2, 1));
     EXPECT_EQ(lAgent.retrieve().texts(1), std::vector<std::string>{"2/1 x1 01000000"});
-}
-
-TEST(Storm, AHeartbeatFailureInAStormEndsTheAgentInOrder) {
-    ZTCAgentProcess lAgent(2);
-    lAgent.startAndConnectQuietly(1, {"-b", "1"});
-    lAgent.startScope();
-    lAgent.library().startStorm(4, 0, sMixture());
-    EXPECT_EQ(lAgent.waitForExit(), 0);
-    EXPECT_TRUE(lAgent.log().has("Failed in getting the status of Sensor", "-H-"));
-    EXPECT_FALSE(exists(lAgent.pidFilePath()));
 }
