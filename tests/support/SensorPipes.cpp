@@ -6,6 +6,7 @@
 #include <sys/ioctl.h>
 #include <unistd.h>
 
+#include <algorithm>
 #include <cerrno>
 #include <csignal>
 #include <cstring>
@@ -89,6 +90,22 @@ void ZTCSensorPipes::sendRaw(const ZTCBytes& acrBytes) {
     }
 }
 
+std::size_t ZTCSensorPipes::sendSome(const ZTCBytes& acrBytes, std::size_t aFrom) {
+    std::size_t lSent = aFrom;
+    while (lSent < acrBytes.size()) {
+        // Few enough bytes at a time that a FIFO with a little room takes them.
+        const ssize_t lCount = write(mCommand, acrBytes.data() + lSent, std::min(acrBytes.size() - lSent, size_t{512}));
+        if (lCount >= 0) {
+            lSent += static_cast<std::size_t>(lCount);
+        } else if (errno == EAGAIN) {
+            break;
+        } else if (errno != EINTR) {
+            sFail("write to " + commandPath());
+        }
+    }
+    return lSent - aFrom;
+}
+
 static std::size_t sWaitingBytes(int aDescriptor) {
     int lCount = 0;
     if (ioctl(aDescriptor, FIONREAD, &lCount) != 0) {
@@ -98,7 +115,11 @@ static std::size_t sWaitingBytes(int aDescriptor) {
 }
 
 void ZTCSensorPipes::waitUntilTaken() const {
-    waitUntil([this] { return sWaitingBytes(mCommand) == 0; }, "the agent to empty its command FIFO");
+    waitUntil([this] { return hasNothingToTake(); }, "the agent to empty its command FIFO");
+}
+
+bool ZTCSensorPipes::hasNothingToTake() const {
+    return sWaitingBytes(mCommand) == 0;
 }
 
 std::size_t ZTCSensorPipes::waitingResponseBytes() const {
@@ -144,6 +165,20 @@ ZTCBytes ZTCSensorPipes::readResponse(const ZTCDeadline& acrDeadline) {
         throw std::runtime_error("the response FIFO was closed behind a header");
     }
     return *lBody;
+}
+
+unsigned char ZTCSensorPipes::readByte(const ZTCDeadline& acrDeadline) {
+    const std::optional<ZTCBytes> lByte = readBytes(1, acrDeadline);
+    if (!lByte) {
+        throw std::runtime_error("the agent has closed the response FIFO");
+    }
+    return lByte->front();
+}
+
+void ZTCSensorPipes::discardResponses() {
+    unsigned char lScrap[4096];
+    while (read(mResponse, lScrap, sizeof(lScrap)) > 0) {
+    }
 }
 
 bool ZTCSensorPipes::isAtEnd() {

@@ -33,6 +33,9 @@ public:
 
     /// Writes the bytes as they stand.
     void sendRaw(const ZTCBytes& acrBytes);
+    /// Writes what the command FIFO has room for, from this position on, and returns how much that was.
+    std::size_t sendSome(const ZTCBytes& acrBytes, std::size_t aFrom);
+    bool hasNothingToTake() const;
     /// Waits until the agent has taken every byte out of the command FIFO.
     void waitUntilTaken() const;
     /// Bytes that wait in the response FIFO now.
@@ -42,6 +45,9 @@ public:
     void sendRequest(const ZTCBytes& acrBody) { sendRaw(frame(acrBody)); }
     /// Reads one frame; throws std::runtime_error where the deadline is over or the agent has closed the FIFO first.
     ZTCBytes readResponse(const ZTCDeadline& acrDeadline = ZTCDeadline());
+    unsigned char readByte(const ZTCDeadline& acrDeadline = ZTCDeadline());
+    /// Throws away what waits in the response FIFO.
+    void discardResponses();
     /// Whether the agent has closed the FIFO with nothing left in it. To be called once the agent has ended.
     bool isAtEnd();
 
