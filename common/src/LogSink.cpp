@@ -1,6 +1,8 @@
 #include "common/include/LogSink.h"
 
 #include <fcntl.h>
+#include <limits.h>
+#include <poll.h>
 #include <signal.h>
 #include <sys/stat.h>
 #include <unistd.h>
@@ -75,9 +77,19 @@ int sWriteAll(int aDescriptor, const char* apBytes, std::size_t aCount, std::siz
     return 0;
 }
 
+/// Drops what finds no room: a standard error that nobody reads holds up no thread. A pipe that is ready takes PIPE_BUF
+/// bytes without waiting.
 void sWriteToStandardError(const char* apBytes, std::size_t aCount) noexcept {
-    std::size_t lWritten = 0;
-    sWriteAll(STDERR_FILENO, apBytes, aCount, lWritten);
+    while (aCount > 0) {
+        struct pollfd lStandardError = {STDERR_FILENO, POLLOUT, 0};
+        const std::size_t lPart = std::min(aCount, std::size_t{PIPE_BUF});
+        std::size_t lWritten = 0;
+        if (poll(&lStandardError, 1, 0) <= 0 || 0 != sWriteAll(STDERR_FILENO, apBytes, lPart, lWritten)) {
+            return;
+        }
+        apBytes += lPart;
+        aCount -= lPart;
+    }
 }
 
 void sFinish(ZTCLogLine& arLine, const char* apFormat, ...) noexcept __attribute__((format(printf, 2, 3)));

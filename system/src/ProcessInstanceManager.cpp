@@ -240,7 +240,7 @@ void ZTCProcessInstanceManager::exitInstanceManagement() {
     if (sIsAtPath(mPidFilePath.get(), lFile.get())) {
         ClibUnlink(mPidFilePath.get());
     } else {
-        ZT_LOG_WARN("The pid file '%s' is not this process's own any more; it is left where it is", mPidFilePath.get());
+        ZT_LOG_WARN("The pid file '%s' is gone or another's; nothing is removed", mPidFilePath.get());
     }
 }
 

@@ -132,7 +132,12 @@ void ZTCSystem::processCommandLineArguments() {
         processConfigFile(lcrOptions.mConfigFile);
     }
     if (lcrOptions.mShutDownOther) {
-        killRunningInstance();
+        try {
+            killRunningInstance();
+        } catch (const ZTCException& acrException) {
+            std::cout << "The running instance cannot be stopped: " << acrException.what() << std::endl;
+            ZT_LOG_ERR("The running instance cannot be stopped: %s", acrException.what());
+        }
         std::exit(0);
     }
 

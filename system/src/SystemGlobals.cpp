@@ -66,6 +66,34 @@ private:
     bool mIsArmed = true;
 };
 
+/// The life of the process from its options on.
+void sRun(ZTCSystem& lrSystem) {
+    lrSystem.processCommandLineArguments();
+
+    if (lrSystem.isAnInstanceRunning()) {
+        sRefuseToRunTwice(lrSystem);
+    }
+    ZTCRunGuard lGuard(lrSystem);
+    if (lrSystem.isToRunAsDaemon()) {
+        const ZTCString lNull("/dev/null");
+        lrSystem.systemDaemonize(ZTCString(""), lNull, lNull, lNull);
+    }
+    lrSystem.markAsRunning();
+    lrSystem.startSignalWaiter();
+
+    lrSystem.init();
+    lrSystem.createThreads();
+    lrSystem.startThreads();
+    lrSystem.postThreadsInit();
+    lrSystem.waitForThreads();
+
+    lrSystem.destroy();
+    lrSystem.stopSignalWaiter();
+    lrSystem.exitInstanceManagement();
+    lrSystem.postDestroy();
+    lGuard.disarm();
+}
+
 }  // namespace
 
 void setSystemObject(ZTCSystem* apSystem) {
@@ -94,28 +122,14 @@ void SystemMain(int aArgc, char** apArgv) {
     lrSystem.preInit();
     lrSystem.setCmdLineArgDescs();
     lrSystem.processCommandLine(aArgc, apArgv);
-    lrSystem.processCommandLineArguments();
-
-    if (lrSystem.isAnInstanceRunning()) {
-        sRefuseToRunTwice(lrSystem);
+    try {
+        sRun(lrSystem);
+    } catch (const ZTCExitConditionEx&) {
+        throw;
+    } catch (const ZTCException& acrException) {
+        // Who catches it says so at info level, which is off by default.
+        std::cerr << lrSystem.getName().get() << " ends: " << acrException.what() << std::endl;
+        ZT_LOG_ERR("%s ends: %s", lrSystem.getName().get(), acrException.what());
+        throw;
     }
-    ZTCRunGuard lGuard(lrSystem);
-    if (lrSystem.isToRunAsDaemon()) {
-        const ZTCString lNull("/dev/null");
-        lrSystem.systemDaemonize(ZTCString(""), lNull, lNull, lNull);
-    }
-    lrSystem.markAsRunning();
-    lrSystem.startSignalWaiter();
-
-    lrSystem.init();
-    lrSystem.createThreads();
-    lrSystem.startThreads();
-    lrSystem.postThreadsInit();
-    lrSystem.waitForThreads();
-
-    lrSystem.destroy();
-    lrSystem.stopSignalWaiter();
-    lrSystem.exitInstanceManagement();
-    lrSystem.postDestroy();
-    lGuard.disarm();
 }

@@ -22,9 +22,9 @@
 ///   deliver-in-register B C U EVENT...   the same, on the very thread that registers
 ///   deliver-in-close N EVENT...          Close delivers these events on N threads, waits for those, and delivers the
 ///                                        first one more on its own thread, before it closes anything
-///   hold FUNCTION                        the next call of Init, GetNumberOfAdapters, ZtapiRegEvent or Close is
-///   recorded
-///                                        as "FUNCTION held" and waits until letGo()
+///   hold FUNCTION                        the next call of Init, GetNumberOfAdapters, ZtapiRegEvent or Close waits
+///   until
+///                                        letGo(), and is recorded as "FUNCTION held"
 ///   hold-nothing                         takes every such line back
 #ifndef TESTS_SUPPORT_SCRIPTEDLIBRARY_H
 #define TESTS_SUPPORT_SCRIPTEDLIBRARY_H

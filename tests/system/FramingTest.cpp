@@ -61,6 +61,27 @@ TEST(Framing, AForbiddenLengthIsReportedOnceAndEverythingThatWaitsIsThrownAway) 
     }
 }
 
+TEST(Framing, ARequestThatIsTooLongIsThrownAwayToItsEndAndNothingOfItIsServed) {
+    for (const char* lpPart : {"0000000102", "00", "ff"}) {
+        SCOPED_TRACE(lpPart);
+        ZTCAgentProcess lAgent;
+        lAgent.startAndConnectQuietly(63);
+        const ZTCBytes lPart = bytesOf(lpPart);
+        ZTCByteWriter lRequest;
+        lRequest.u32(1048577);
+        for (std::size_t lSize = 0; lSize < 1048577; lSize += lPart.size()) {
+            lRequest.raw(lPart);
+        }
+        lAgent.pipes().sendRaw(lRequest.bytes());
+        lAgent.pipes().waitUntilTaken();
+        sWaitForError(lAgent, {"1048577"});
+        EXPECT_EQ(lAgent.request("0500000000"), gcInvalidHex);
+        EXPECT_EQ(sErrors(lAgent), 1u);
+        EXPECT_FALSE(lAgent.log().has("Stopping Scope Data Collection."));
+        EXPECT_EQ(lAgent.pipes().waitingResponseBytes(), 0u);
+    }
+}
+
 TEST(Framing, TheLargestFrameIsServedAndTheBytesBehindItsFieldsAreIgnored) {
     ZTCAgentProcess lAgent;
     lAgent.startAndConnect();

@@ -171,6 +171,16 @@ TEST(Instance, ShutDownOptionSaysThatNoneIsRunning) {
     EXPECT_EQ(lAgent.run({"-s"}).mOutput, lNone.mOutput);
 }
 
+TEST(Instance, ShutDownOptionSaysWhyItCannotStopTheAgent) {
+    ZTCAgentProcess lAgent;
+    std::filesystem::create_directory(lAgent.pidFilePath());
+    const ZTSRunResult lResult = lAgent.run({"-s"});
+    EXPECT_EQ(lResult.mStatus, 0);
+    EXPECT_EQ(lResult.mOutput.find("The running instance cannot be stopped: "), 0u) << lResult.mOutput;
+    EXPECT_NE(lResult.mOutput.find(lAgent.pidFilePath()), std::string::npos) << lResult.mOutput;
+    EXPECT_EQ(lAgent.defaultLog().containing("The running instance cannot be stopped: ").size(), 1u);
+}
+
 TEST(Instance, ShutDownOptionLeavesAStrangerAlone) {
     ZTCAgentProcess lAgent;
     const auto lpStranger = sBystander(lAgent);

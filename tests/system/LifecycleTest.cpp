@@ -211,6 +211,36 @@ TEST(Lifecycle, APathThatIsNoFifoIsRefusedAndLeftUntouched) {
     }
 }
 
+TEST(Lifecycle, ARefusedStartSaysWhyInTheLogAndOnStandardErrorWhateverTheLogCode) {
+    const auto lStart = [](ZTCAgentProcess& lrAgent, const std::string& acrReason) {
+        const ZTSRunResult lResult = lrAgent.run({"-D", "false"});
+        EXPECT_EQ(lResult.mStatus, 0);
+        EXPECT_EQ(lResult.mError.find("qrv-tvk ends: "), 0u) << lResult.mError;
+        EXPECT_NE(lResult.mError.find(acrReason), std::string::npos) << lResult.mError;
+        const auto lLines = lrAgent.defaultLog().containing("qrv-tvk ends: ");
+        ASSERT_EQ(lLines.size(), 1u);
+        EXPECT_EQ(lLines[0].mMark, "-E-");
+        EXPECT_NE(lLines[0].mText.find(acrReason), std::string::npos) << lLines[0].mText;
+    };
+    ZTCAgentProcess lFileAgent;
+    writeFile(lFileAgent.commandFifoPath(), "precious");
+    lStart(lFileAgent, lFileAgent.commandFifoPath());
+    ZTCAgentProcess lDirectoryAgent;
+    lDirectoryAgent.setEnvironment("ZT_QRV_SENSOR_DIR", lDirectoryAgent.sensorDirectory() + "/missing");
+    lStart(lDirectoryAgent, "missing/qrv-tvk.pid");
+    ZTCAgentProcess lLibraryAgent;
+    lLibraryAgent.library().configure("init-status 3");
+    lStart(lLibraryAgent, "3");
+}
+
+TEST(Lifecycle, AnOrdinaryEndSaysNothingOnStandardError) {
+    ZTCAgentProcess lAgent(0);
+    const ZTSRunResult lResult = lAgent.run({"-D", "false"});
+    EXPECT_EQ(lResult.mStatus, 0);
+    EXPECT_EQ(lResult.mError, "");
+    EXPECT_TRUE(lAgent.defaultLog().has("No QRV Adapters found.. Tavik would exit", "-N-"));
+}
+
 TEST(Lifecycle, ADirectoryInAFifosPlaceIsRefused) {
     ZTCAgentProcess lAgent;
     std::filesystem::create_directory(lAgent.commandFifoPath());

@@ -128,6 +128,9 @@ int ClibPoll(struct pollfd* apDescriptors, unsigned aNumberOfDescriptors, int aM
 /// The number of bytes that wait in a pipe. Throws ZTCClibReadFailedEx.
 std::size_t ClibBytesWaiting(int aDescriptor);
 
+/// The most bytes that a pipe holds. Throws ZTCClibReadFailedEx.
+std::size_t ClibPipeCapacity(int aDescriptor);
+
 /// Takes the exclusive advisory lock of the open file without waiting; false while another holds it.
 /// Throws ZTCClibLockFailedEx.
 bool ClibTryLock(int aDescriptor);

@@ -81,7 +81,7 @@ private:
     bool readAvailable();
     void discardBrokenFrame();
     void discardPartialFrame();
-    std::size_t drain();
+    std::size_t drain(std::uint64_t aMost);
 
     ZTCString mPath;
     int mDescriptor = 0;  // 0: not open, which no open one is

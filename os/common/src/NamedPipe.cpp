@@ -16,6 +16,7 @@ namespace {
 
 constexpr ::mode_t gcFifoMode = 0600;
 constexpr int gcRetryMilliseconds = 100;
+constexpr int gcWriterMilliseconds = 100;  // a writer that found room goes on within
 constexpr int gcNotOpen = 0;
 
 /// Closes a descriptor unless it is released.
@@ -324,7 +325,7 @@ bool ZTCNamedPipe::readAvailable() {
 void ZTCNamedPipe::discardBrokenFrame() {
     const Size lLength = mAssembler.getLength();
     mAssembler.reset();
-    const std::size_t lDrained = drain();
+    const std::size_t lDrained = drain(ZT_MAX(lLength, ZTCFrameAssembler::gcMaxRequestSize));
     ZT_LOG_ERR(
         "A message of %u bytes on '%s' is refused, its length has to be 1 to %u; %zu bytes behind it are thrown away",
         lLength, mPath.get(), ZTCFrameAssembler::gcMaxRequestSize, lDrained);
@@ -336,21 +337,32 @@ void ZTCNamedPipe::discardPartialFrame() {
     mAssembler.reset();
 }
 
-/// Throws away what waits in the pipe now, and says how much that was. What is written meanwhile is left, so that a
+/// Throws away what waits in the pipe, and says how much that was. A pipe that is full has a writer in the middle of a
+/// write: what it still has to write belongs to the same message and goes too, up to aMost bytes in all, so that a
 /// sensor that writes without end does not keep this from ending.
-std::size_t ZTCNamedPipe::drain() {
-    const std::size_t lWaiting = ClibBytesWaiting(mDescriptor);
+std::size_t ZTCNamedPipe::drain(std::uint64_t aMost) {
     std::size_t lDrained = 0;
-    while (lDrained < lWaiting) {
-        unsigned char lScrap[4096];
-        const ::ssize_t lCount = ClibRead(mDescriptor, lScrap, ZT_MIN(lWaiting - lDrained, sizeof(lScrap)));
-        if (lCount == -EINTR) {
-            continue;
+    std::size_t lWaiting = ClibBytesWaiting(mDescriptor);
+    const bool lIsWriterBusy = lWaiting + PIPE_BUF >= ClibPipeCapacity(mDescriptor);
+    while (lWaiting > 0) {
+        const std::size_t lEnd = lDrained + lWaiting;
+        while (lDrained < lEnd) {
+            unsigned char lScrap[4096];
+            const ::ssize_t lCount = ClibRead(mDescriptor, lScrap, ZT_MIN(lEnd - lDrained, sizeof(lScrap)));
+            if (lCount == -EINTR) {
+                continue;
+            }
+            if (lCount <= 0) {
+                return lDrained;
+            }
+            lDrained += static_cast<std::size_t>(lCount);
         }
-        if (lCount <= 0) {
+        struct pollfd lDescriptors[2] = {{mDescriptor, POLLIN, 0}, {getExitEvent().getDescriptor(), POLLIN, 0}};
+        if (!lIsWriterBusy || lDrained >= aMost || ClibPoll(lDescriptors, 2, gcWriterMilliseconds) <= 0 ||
+            lDescriptors[1].revents != 0) {
             break;
         }
-        lDrained += static_cast<std::size_t>(lCount);
+        lWaiting = ClibBytesWaiting(mDescriptor);
     }
     return lDrained;
 }

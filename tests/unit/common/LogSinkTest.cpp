@@ -288,6 +288,24 @@ TEST_F(LogSink, LostLinesGoToStandardErrorAreCountedAndReportedWhenWritingWorksA
     EXPECT_EQ("", mStandardError.take());
 }
 
+TEST_F(LogSink, AStandardErrorThatNobodyReadsHoldsNothingUp) {
+    ASSERT_EQ(0, fcntl(STDERR_FILENO, F_SETFL, 0)) << "a write that finds no room would wait for ever";
+    mpSink->setPath(mPath.c_str());
+    const std::string lText(1019, 'x');
+    {
+        ZTCFileSizeLimit lLimit(0);
+        for (int i = 0; i < 100; ++i) {
+            sWriteTo(*mpSink, "%s", lText.c_str());
+        }
+    }
+    const Lines lSaid = linesOf(mStandardError.take());
+    EXPECT_LT(50u, lSaid.size());
+    EXPECT_GT(65u, lSaid.size()) << "a pipe has room for 64 of them";
+    EXPECT_EQ(Lines(lSaid.size(), "-M- " + lText), lSaid) << "what finds room is whole";
+    sWriteTo(*mpSink, "after");
+    EXPECT_EQ((Lines{lostReport(100, "File too large"), "-M- after"}), sLines(mPath));
+}
+
 TEST_F(LogSink, ALineThatIsCutByTheFileIsEndedBeforeTheNextOne) {
     mpSink->setPath(mPath.c_str());
     {

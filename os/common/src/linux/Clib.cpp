@@ -340,6 +340,14 @@ std::size_t ClibBytesWaiting(int aDescriptor) {
     return lCount > 0 ? static_cast<std::size_t>(lCount) : 0;
 }
 
+std::size_t ClibPipeCapacity(int aDescriptor) {
+    const int lCapacity = ::fcntl(aDescriptor, F_GETPIPE_SZ);
+    if (lCapacity < 0) {
+        sThrowForNumber<ZTCClibReadFailedEx>("Getting the capacity of descriptor", aDescriptor, errno);
+    }
+    return static_cast<std::size_t>(lCapacity);
+}
+
 bool ClibTryLock(int aDescriptor) {
     int lResult;
     do {
