@@ -289,6 +289,7 @@ const std::vector<ZTSLogText>& logTexts() {
         {128, "-T-", "os/common/include/Mutex", "~ZTCMutex", "Ignoring exception in Mutex destruction ...", sProcess},
         {128, "-T-", "os/common/include/Conditional", "~ZTCConditional", "Ignoring exceptions while destructing ...",
          sProcess},
+        {16, "-W-", "common/src/LogSink", "sayOnStandardError", "%s '%s': %s: %s", sAgent},
         {16, "-W-", "common/src/LogSink", "reopen",
          "Cannot open the log file '%s' anew (%s): lines go on into the former one until it can be opened", sAgent},
         {16, "-W-", "common/src/LogSink", "reportLostLines",

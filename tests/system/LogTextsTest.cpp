@@ -7,6 +7,7 @@
 #include <filesystem>
 #include <functional>
 #include <set>
+#include <sstream>
 #include <string>
 #include <vector>
 
@@ -207,7 +208,7 @@ void sDriveAnUnknownCommand(ZTCLogTextsSeen& arSeen) {
     sAddLogs(arSeen, lAgent);
 }
 
-/// A log whose directory comes only later.
+/// A log whose directory comes only later: until then its lines, and why they are there, go to standard error.
 void sDriveLostLines(ZTCLogTextsSeen& arSeen) {
     ZTCAgentProcess lAgent;
     const std::string lDirectory = lAgent.workingDirectory() + "/later";
@@ -219,8 +220,12 @@ void sDriveLostLines(ZTCLogTextsSeen& arSeen) {
     lAgent.process().sendSignal(SIGHUP);
     waitUntil([&] { return exists(lLater.path()); }, "the log to be made");
     EXPECT_EQ(gcSuccessHex, lAgent.request("0500000001"));
-    arSeen.add(lLater.rawLines());
     EXPECT_EQ(0, lAgent.stop());
+    arSeen.add(lLater.rawLines());
+    std::istringstream lError(lAgent.process().standardError());
+    for (std::string lLine; std::getline(lError, lLine);) {
+        arSeen.add({lLine});
+    }
 }
 
 }  // namespace
