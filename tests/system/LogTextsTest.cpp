@@ -191,6 +191,7 @@ void sDriveReplacedFiles(ZTCLogTextsSeen& arSeen) {
 void sDriveHeartbeatFailures(ZTCLogTextsSeen& arSeen) {
     ZTCAgentProcess lWithoutSensor;
     ZTCAgentProcess lWithoutFile;
+    writeFile(lWithoutFile.sensorPidFilePath(), std::to_string(getpid()) + "\n");
     lWithoutSensor.startAndConnect({"-b", "1"});
     lWithoutFile.startAndConnect({"-b", "1"});
     std::filesystem::remove(lWithoutFile.pidFilePath());
