@@ -163,6 +163,7 @@ void sDriveRefusedStarts(ZTCLogTextsSeen& arSeen) {
     lDrive(0, [](ZTCAgentProcess& arAgent) { arAgent.library().configure("ztapi-supported 0"); });
     lDrive(0, [](ZTCAgentProcess& arAgent) { arAgent.library().configure("init-status 5"); });
     lDrive(0, [](ZTCAgentProcess&) {}, {"-x"});
+    lDrive(0, [](ZTCAgentProcess& arAgent) { std::filesystem::create_directory(arAgent.pidFilePath()); }, {"-s"});
 }
 
 /// A stop while nobody reads responses, and the start that finds what it left.
