@@ -18,8 +18,8 @@ public:
     ZTCSignalWaiter(const ZTCSignalWaiter&) = delete;
     ZTCSignalWaiter& operator=(const ZTCSignalWaiter&) = delete;
 
-    /// Blocks the three signals on the calling thread and on those that it starts, and ignores SIGPIPE. Comes before
-    /// everything that could make a thread.
+    /// Blocks the three signals on the calling thread and on those that it starts, and ignores SIGPIPE and SIGXFSZ.
+    /// Comes before everything that could make a thread.
     static void blockSignals();
 
     /// Starts the thread. Throws ZTCClibEx or ZTCOsException; nothing runs then.

@@ -191,8 +191,15 @@ void ZTCProcessInstanceManager::markAsRunning() {
     }
     char lPid[32];
     const int lLength = ClibSprintf(lPid, sizeof(lPid), "%d\n", static_cast<int>(::getpid()));
-    ClibFtruncate(mDescriptor, 0);
-    ClibPwriteAll(mDescriptor, lPid, static_cast<std::size_t>(lLength), 0);
+    try {
+        ClibFtruncate(mDescriptor, 0);
+        ClibPwriteAll(mDescriptor, lPid, static_cast<std::size_t>(lLength), 0);
+    } catch (const ZTCClibEx& acrException) {
+        char lText[512];
+        ClibSprintf(lText, sizeof(lText), "Writing the pid file '%s' failed: %s", mPidFilePath.get(),
+                    acrException.what());
+        throw ZTCClibWriteFailedEx(lText);
+    }
     mProcessId = static_cast<std::int32_t>(::getpid());
     allowLogRotation(true);
 }

@@ -39,10 +39,13 @@ void ZTCSignalWaiter::blockSignals() {
     if (lError != 0) {
         sThrowSignalFailed("pthread_sigmask", lError);
     }
+    // A reader that has gone and a limit on file sizes are errors of the write.
     struct sigaction lIgnore {};
     lIgnore.sa_handler = SIG_IGN;
-    if (::sigaction(SIGPIPE, &lIgnore, nullptr) != 0) {
-        sThrowSignalFailed("sigaction", errno);
+    for (const int lSignal : {SIGPIPE, SIGXFSZ}) {
+        if (::sigaction(lSignal, &lIgnore, nullptr) != 0) {
+            sThrowSignalFailed("sigaction", errno);
+        }
     }
 }
 

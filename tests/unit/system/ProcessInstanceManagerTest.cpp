@@ -2,6 +2,7 @@
 
 #include <gtest/gtest.h>
 #include <signal.h>
+#include <sys/resource.h>
 #include <sys/stat.h>
 #include <sys/wait.h>
 #include <unistd.h>
@@ -61,6 +62,24 @@ static std::string sStatusError(const std::string& acrPath) {
 }
 
 // ---- The lock and the file ----
+
+TEST_F(ProcessInstanceManager, APidFileThatTakesNoByteIsAnErrorThatNamesIt) {
+    ZTCForkedProcess lChild([this](ZTCForkedProcess&) {
+        signal(SIGXFSZ, SIG_IGN);
+        const rlimit lNone{0, 0};
+        const ZTCPointer<ZTCProcessInstanceManager> lManager(newManager());
+        if (lManager->isAnInstanceRunning() || setrlimit(RLIMIT_FSIZE, &lNone) != 0) {
+            return 2;
+        }
+        try {
+            lManager->markAsRunning();
+        } catch (const ZTCClibWriteFailedEx& acrException) {
+            return std::string(acrException.what()).find(mPath) != std::string::npos ? 0 : 1;
+        }
+        return 3;
+    });
+    EXPECT_EQ(lChild.waitForExit(), 0);
+}
 
 TEST_F(ProcessInstanceManager, TheFirstProcessWritesItsIdWhenItIsMarkedAsRunning) {
     const mode_t lMask = umask(0);

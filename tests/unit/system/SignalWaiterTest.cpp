@@ -2,6 +2,7 @@
 
 #include <gtest/gtest.h>
 #include <signal.h>
+#include <sys/resource.h>
 #include <unistd.h>
 
 #include "tests/unit/os/LogCapture.h"
@@ -64,6 +65,20 @@ TEST(SignalWaiter, ABrokenPipeIsNoSignal) {
         }
         close(lPipe[0]);
         return write(lPipe[1], "x", 1) == -1 && errno == EPIPE ? 0 : 1;
+    });
+    EXPECT_EQ(lChild.waitForExit(), 0);
+}
+
+TEST(SignalWaiter, ALimitOnFileSizesIsNoSignal) {
+    ZTCTemporaryDirectory lDirectory;
+    ZTCForkedProcess lChild([&](ZTCForkedProcess&) {
+        ZTCSignalWaiter::blockSignals();
+        const rlimit lNone{0, 0};
+        const int lFile = open(lDirectory.path("file").c_str(), O_WRONLY | O_CREAT | O_CLOEXEC, 0600);
+        if (lFile < 0 || setrlimit(RLIMIT_FSIZE, &lNone) != 0) {
+            return 2;
+        }
+        return write(lFile, "x", 1) == -1 && errno == EFBIG ? 0 : 1;
     });
     EXPECT_EQ(lChild.waitForExit(), 0);
 }
