@@ -53,7 +53,7 @@ public:
                 killWithin(150, [&](const std::atomic<bool>&) { load(lAcknowledged, 1u << 30); });
             } else {
                 load(lAcknowledged, 3);
-                killWithin(20, [this](const std::atomic<bool>&) { askToStop(); });
+                killWithin(8, [this](const std::atomic<bool>&) { askToStop(); });
             }
         }
         ++mPhases[static_cast<std::size_t>(lPhase)];
@@ -66,8 +66,8 @@ public:
         return std::to_string(mPhases[0] + mPhases[1] + mPhases[2]) + " agents killed: " + std::to_string(mPhases[0]) +
                " while starting, " + std::to_string(mPhases[1]) + " under load, " + std::to_string(mPhases[2]) +
                " while stopping (" + std::to_string(mEarlyEnds) + " of them had ended); " + std::to_string(mLines) +
-               " whole log lines, " + std::to_string(mEvents) +
-               " acknowledged events among them; every next start was served";
+               " log lines, those of " + std::to_string(mEvents) + " acknowledged events among them, whole; " +
+               std::to_string(mCutLines) + " cut while they were being written; every next start was served";
     }
 
 private:
@@ -126,7 +126,8 @@ private:
     }
 
     void expectLinesThere(const std::string& acrLog, const ZTSAcknowledged& acrAcknowledged) {
-        EXPECT_TRUE(acrLog.empty() || acrLog.ends_with('\n')) << "the last line is cut";
+        // The kernel may cut the line that was being written, at the end of a page. No call had returned from it yet.
+        mCutLines += acrLog.empty() || acrLog.ends_with('\n') ? 0 : 1;
         const std::vector<ZTSLogLine> lLines = parseLogLines(acrLog);
         EXPECT_EQ(lLines.size(), static_cast<std::size_t>(std::count(acrLog.begin(), acrLog.end(), '\n')));
         const auto lCount = [&lLines](const char* apFunction, const char* apText) {
@@ -148,7 +149,10 @@ private:
         EXPECT_FALSE(exists(mAgent.commandFifoPath()));
         EXPECT_FALSE(exists(mAgent.responseFifoPath()));
         EXPECT_FALSE(exists(mAgent.pidFilePath()));
-        EXPECT_TRUE(readFile(mAgent.agentLogPath()).starts_with(acrLog)) << "the next start took lines away";
+        const std::string lBoth = readFile(mAgent.agentLogPath());
+        EXPECT_TRUE(lBoth.starts_with(acrLog)) << "the next start took lines away";
+        const bool lIsCut = !acrLog.empty() && !acrLog.ends_with('\n');
+        EXPECT_EQ(lBoth[acrLog.size()] == '\n', lIsCut) << "the next start does not begin on a line of its own";
         mAgent.pipes().close();
     }
 
@@ -158,6 +162,7 @@ private:
     unsigned mEarlyEnds = 0;
     std::size_t mLines = 0;
     std::size_t mEvents = 0;
+    unsigned mCutLines = 0;
 };
 
 TEST(Kill, AnAgentKilledAtAnyMomentHasLostNoLineAndTheNextStartIsServed) {
