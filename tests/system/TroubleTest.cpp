@@ -187,18 +187,27 @@ TEST(Trouble, ALogThatNeverTakesALineStopsNothing) {
 
 // ---- The sensor's directory ----
 
+/// A start that fails says why at the default levels, and on standard error.
+static void sExpectStartToFail(ZTCAgentProcess& arAgent, const std::vector<std::string>& acrParts) {
+    arAgent.start({"-D", "false", "-l", arAgent.agentLogPath()});
+    EXPECT_EQ(arAgent.waitForExit(), 0);
+    std::vector<ZTSLogLine> lErrors = arAgent.log().lines();
+    std::erase_if(lErrors, [](const ZTSLogLine& acrLine) { return acrLine.mMark != "-E-"; });
+    ASSERT_EQ(lErrors.size(), 1u);
+    for (const std::string& lcrPart : acrParts) {
+        EXPECT_NE(lErrors[0].mText.find(lcrPart), std::string::npos) << lErrors[0].mText;
+    }
+    EXPECT_EQ(sStandardError(arAgent), lErrors[0].mText + "\n");
+    EXPECT_TRUE(arAgent.library().calls().empty());
+}
+
 TEST(Trouble, AFullFileSystemUnderTheDirectoryIsAClearErrorAtTheStart) {
     ZTCAgentProcess lAgent;
     ZTCSmallFileSystem lFileSystem(lAgent.sensorDirectory(), 64);
     if (lFileSystem.isMounted()) {
         lFileSystem.fill();
-        lAgent.start();
-        EXPECT_EQ(lAgent.waitForExit(), 0);
-        const auto lLines = lAgent.log().containing("Failed with error - ");
-        ASSERT_EQ(lLines.size(), 1u);
-        EXPECT_NE(lLines[0].mText.find("Writing the pid file '" + lAgent.pidFilePath() + "' failed"), std::string::npos)
-            << lLines[0].mText;
-        EXPECT_NE(lLines[0].mText.find("No space left on device"), std::string::npos) << lLines[0].mText;
+        sExpectStartToFail(lAgent,
+                           {"Writing the pid file '" + lAgent.pidFilePath() + "' failed", "No space left on device"});
         EXPECT_FALSE(exists(lAgent.pidFilePath()));
         lFileSystem.empty();
     }
@@ -217,12 +226,13 @@ TEST(Trouble, ADirectoryThatTakesNoFileIsAClearErrorAtTheStart) {
         lAgent.setEnvironment("ZT_QRV_SENSOR_DIR", "/sys");
         lPidFile = "/sys/qrv-tvk.pid";
     }
-    lAgent.start();
-    EXPECT_EQ(lAgent.waitForExit(), 0);
-    const auto lLines = lAgent.log().containing("Failed with error - ");
-    ASSERT_EQ(lLines.size(), 1u);
-    EXPECT_NE(lLines[0].mText.find(lPidFile), std::string::npos) << lLines[0].mText;
-    EXPECT_TRUE(lAgent.library().calls().empty());
+    sExpectStartToFail(lAgent, {lPidFile});
+}
+
+TEST(Trouble, ADirectoryThatIsMissingIsAClearErrorAtTheStart) {
+    ZTCAgentProcess lAgent;
+    std::filesystem::remove(lAgent.sensorDirectory());
+    sExpectStartToFail(lAgent, {lAgent.pidFilePath(), "No such file or directory"});
 }
 
 TEST(Trouble, ADirectoryThatBecomesReadOnlyEndsTheAgentAtItsNextHeartbeat) {
