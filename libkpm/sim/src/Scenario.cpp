@@ -13,9 +13,9 @@ static constexpr std::uint32_t gcMaxFcId = 0xFFFFFF;
 static constexpr std::size_t gcMaxNamedWord = 40;
 static constexpr std::size_t gcSimMaxPages = 16382;  // the length field of an RSCN holds no more
 
-/// Quotes a word for a message, cut where it is long and with its control characters escaped.
-static std::string sQuoted(std::string_view aWord) {
-    std::string lText = "\"";
+/// A word as it can stand in a message: cut where it is long and with its control characters escaped.
+static std::string sShown(std::string_view aWord) {
+    std::string lText;
     for (const char lChar : aWord.substr(0, gcMaxNamedWord)) {
         const auto lByte = static_cast<unsigned char>(lChar);
         if (lByte < 0x20 || lByte == 0x7F) {
@@ -27,8 +27,11 @@ static std::string sQuoted(std::string_view aWord) {
             lText += lChar;
         }
     }
-    lText += aWord.size() > gcMaxNamedWord ? "...\"" : "\"";
-    return lText;
+    return aWord.size() > gcMaxNamedWord ? lText + "..." : lText;
+}
+
+static std::string sQuoted(std::string_view aWord) {
+    return "\"" + sShown(aWord) + "\"";
 }
 
 [[noreturn]] static void sRefuse(const std::string& acrReason) {
@@ -36,7 +39,7 @@ static std::string sQuoted(std::string_view aWord) {
 }
 
 static std::string sField(std::string_view aName) {
-    return std::string(aName) + "= ";
+    return sShown(aName) + "= ";
 }
 
 /// The words of a line. A word with `=` is a field; every field is taken once, and those that are left are refused.

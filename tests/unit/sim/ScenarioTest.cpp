@@ -243,6 +243,12 @@ INSTANTIATE_TEST_SUITE_P(
         ZTSRefusedLine{"register plogi board=0", "register needs status="},
         ZTSRefusedLine{"info board=0 status=1 handle=2", "info has no field \"handle\""}));
 
+TEST(Scenario, ARefusalShowsAnUnknownFieldCutAndWithoutControlCharacters) {
+    EXPECT_EQ(sRefusal("plogi a\x1b[2J="), "a\\x1b[2J= has no value");
+    const std::string lLong(1000, 'z');
+    EXPECT_EQ(sRefusal("plogi " + lLong + "=1 " + lLong + "=1"), std::string(40, 'z') + "...= stands twice");
+}
+
 TEST(Scenario, AllThreadsTogetherHaveALimit) {
     std::string lText = gcTwoAdapters;
     for (int lLine = 0; lLine < 4; ++lLine) {
