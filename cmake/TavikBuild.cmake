@@ -35,6 +35,15 @@ else()
   target_link_options(tavik_options INTERFACE -Wl,-z,relro,-z,now -Wl,-z,noexecstack)
 endif()
 
+# Everything counts its edges for libFuzzer; the fuzzers themselves link the engine (fuzz/CMakeLists.txt).
+if(TAVIK_FUZZ)
+  if(NOT CMAKE_CXX_COMPILER_ID STREQUAL "Clang")
+    message(FATAL_ERROR "TAVIK_FUZZ needs clang++: use the preset fuzz")
+  endif()
+  target_compile_options(tavik_options INTERFACE -fsanitize=fuzzer-no-link)
+  target_link_options(tavik_options INTERFACE -fsanitize=fuzzer-no-link)
+endif()
+
 # tavik_library(NAME SOURCES ... [LINK ...]): a static library of the framework or the agent.
 function(tavik_library aName)
   cmake_parse_arguments(PARSE_ARGV 1 lArg "" "" "SOURCES;LINK")
