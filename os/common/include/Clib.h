@@ -65,7 +65,8 @@ void ClibStat(const char* apPath, struct stat* apStatus);
 /// ZTCClibStatFailedEx for every other failure.
 bool ClibLstat(const char* apPath, struct stat* apStatus);
 
-/// Sets the access and modification times to now. Throws ZTCClibUtimeFailedEx.
+/// Sets the access and modification times of what stands at the path itself to now: of a symbolic link those of the
+/// link, never of what it leads to. Throws ZTCClibUtimeFailedEx.
 void ClibUtime(const char* apPath);
 
 /// Removes the name; false where there was none. Throws ZTCClibUnlinkFailedEx.
@@ -86,7 +87,8 @@ private:
 
 // ---- Descriptors ----
 
-/// Opens with close-on-exec added to the flags. Returns the descriptor, 3 or higher. Throws ZTCClibOpenFailedEx.
+/// Opens with close-on-exec added to the flags, and so that a terminal does not become the controlling one. Returns the
+/// descriptor, 3 or higher. Throws ZTCClibOpenFailedEx.
 int ClibOpen(const char* apPath, int aFlags, ::mode_t aMode = 0);
 
 /// The same, but the negated error number in place of an exception.
@@ -120,6 +122,9 @@ void ClibPwriteAll(int aDescriptor, const void* apFrom, std::size_t aSize, ::off
 
 /// Cuts the file. Throws ZTCClibTruncateFailedEx.
 void ClibFtruncate(int aDescriptor, ::off_t aSize);
+
+/// Gives the file to the user; false where that is not allowed.
+bool ClibTryGive(int aDescriptor, ::uid_t aUser) noexcept;
 
 /// Waits. Returns the number of ready descriptors, 0 after the time-out, or -EINTR; a negative time-out never ends.
 /// Throws ZTCClibPollFailedEx.

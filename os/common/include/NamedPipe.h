@@ -39,7 +39,8 @@ public:
     /// Closes what is open; leaves the FIFO where it is.
     ~ZTCNamedPipe() override;
 
-    /// Makes the FIFO, with mode 0600, or takes over one that is there. Anything else at the path is left untouched:
+    /// Makes the FIFO, with mode 0600, or takes over one that is there, with a warning line where that is another
+    /// user's, or is open to more than its owner. Anything else at the path is left untouched:
     /// ZTCInvalidEx that names the path and what stands there.
     void create() override;
 

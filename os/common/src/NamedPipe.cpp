@@ -1,6 +1,7 @@
 #include "os/common/include/NamedPipe.h"
 
 #include <fcntl.h>
+#include <unistd.h>
 
 #include <cerrno>
 #include <cinttypes>
@@ -53,13 +54,26 @@ private:
 }
 
 /// Before the path is opened: opening a device or the like could have effects of its own.
-void sRequireFifo(const char* apPath) {
+struct stat sRequireFifo(const char* apPath) {
     struct stat lStatus {};
     if (!ClibLstat(apPath, &lStatus)) {
         sThrowOpenFailed(apPath, "there is none");
     }
     if (!S_ISFIFO(lStatus.st_mode)) {
         sThrowNoFifo(apPath, lStatus.st_mode);
+    }
+    return lStatus;
+}
+
+/// A FIFO that is taken over may be open to more than the one that would have been made.
+void sWarnOfSharedFifo(const char* apPath, const struct stat& acrStatus) {
+    const unsigned lMode = acrStatus.st_mode & 07777;
+    if ((lMode & ~gcFifoMode) != 0 || acrStatus.st_uid != ::geteuid()) {
+        ZT_LOG_WARN(
+            "The FIFO '%s' was there already, with owner %u and mode %04o: whoever may open it can talk in the place "
+            "of "
+            "the sensor or the agent; to have it made anew, stop the agent and remove it",
+            apPath, acrStatus.st_uid, lMode);
     }
 }
 
@@ -115,7 +129,7 @@ void ZTCNamedPipe::create() {
         ClibMkfifo(mPath.get(), gcFifoMode);
         return;
     } catch (const ZTCExistsEx&) {
-        sRequireFifo(mPath.get());
+        sWarnOfSharedFifo(mPath.get(), sRequireFifo(mPath.get()));
     }
     ZT_LOG_INFO("The FIFO '%s' is there already and is taken over", mPath.get());
 }

@@ -102,6 +102,24 @@ TEST(Clib, UtimeSetsTheTimesToNow) {
     EXPECT_GT(lStatus.st_atim.tv_sec, 1000);
 }
 
+TEST(Clib, UtimeOfASymbolicLinkLeavesTheTimesOfWhatItLeadsTo) {
+    ZTCTemporaryDirectory lDirectory;
+    const std::string lPath = lDirectory.path("file");
+    const std::string lLink = lDirectory.path("link");
+    writeFile(lPath, "x");
+    ASSERT_EQ(symlink(lPath.c_str(), lLink.c_str()), 0);
+    const struct timespec lOld[2] = {{1000, 0}, {1000, 0}};
+    for (const std::string& lcrPath : {lPath, lLink}) {
+        ASSERT_EQ(utimensat(AT_FDCWD, lcrPath.c_str(), lOld, AT_SYMLINK_NOFOLLOW), 0);
+    }
+    ClibUtime(lLink.c_str());
+    struct stat lStatus {};
+    ClibStat(lLink.c_str(), &lStatus);
+    EXPECT_EQ(lStatus.st_mtim.tv_sec, 1000);
+    ASSERT_TRUE(ClibLstat(lLink.c_str(), &lStatus));
+    EXPECT_GT(lStatus.st_mtim.tv_sec, 1000);
+}
+
 TEST(Clib, FileKindsHaveNames) {
     EXPECT_STREQ(ClibFileKind(S_IFIFO | 0600), "a FIFO");
     EXPECT_STREQ(ClibFileKind(S_IFREG | 0644), "a regular file");

@@ -594,3 +594,23 @@ TEST_F(NamedPipe, APipeThatIsNotOpenCannotBeWritten) {
     unsigned lCount = 0;
     EXPECT_THROW(lPipe->write(sBuffer("x"), lCount), ZTCClibWriteFailedEx);
 }
+
+TEST_F(NamedPipe, TakingOverAFifoThatOthersMayOpenDrawsAWarning) {
+    for (const auto& [lMode, lWarnings] :
+         {std::pair<mode_t, unsigned>{0600, 0}, {0400, 0}, {0620, 1}, {0602, 1}, {0644, 1}}) {
+        ZTCLogCapture lLog;
+        ASSERT_EQ(mkfifo(mPath.c_str(), 0600), 0);
+        ASSERT_EQ(chmod(mPath.c_str(), lMode), 0);
+        ZTCNamedPipe lPipe(ZTCString(mPath.c_str()), ZTFM_Read, ZTNPS_NonBlock, ZTCM_Server);
+        lPipe.create();
+        EXPECT_EQ(lLog.countMark("-W-"), lWarnings) << lMode;
+        lPipe.destroy();
+    }
+}
+
+TEST_F(NamedPipe, AFifoOfItsOwnDrawsNoWarning) {
+    ZTCLogCapture lLog;
+    ZTCNamedPipe lPipe(ZTCString(mPath.c_str()), ZTFM_Read, ZTNPS_NonBlock, ZTCM_Server);
+    lPipe.create();
+    EXPECT_EQ(lLog.countMark("-W-"), 0u);
+}

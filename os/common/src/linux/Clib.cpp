@@ -9,7 +9,6 @@
 #include <sys/types.h>
 #include <time.h>
 #include <unistd.h>
-#include <utime.h>
 
 #include <cerrno>
 #include <cstdarg>
@@ -157,7 +156,7 @@ bool ClibLstat(const char* apPath, struct stat* apStatus) {
 }
 
 void ClibUtime(const char* apPath) {
-    if (::utime(apPath, nullptr) != 0) {
+    if (::utimensat(AT_FDCWD, apPath, nullptr, AT_SYMLINK_NOFOLLOW) != 0) {
         sThrowForPath<ZTCClibUtimeFailedEx>("Setting the times of", apPath, errno);
     }
 }
@@ -211,7 +210,7 @@ int ClibOpen(const char* apPath, int aFlags, ::mode_t aMode) {
 int ClibTryOpen(const char* apPath, int aFlags, ::mode_t aMode) noexcept {
     int lDescriptor;
     do {
-        lDescriptor = ::open(apPath, aFlags | O_CLOEXEC, aMode);
+        lDescriptor = ::open(apPath, aFlags | O_CLOEXEC | O_NOCTTY, aMode);
     } while (lDescriptor < 0 && errno == EINTR);
     return ClibLiftDescriptor(lDescriptor < 0 ? -errno : lDescriptor);
 }
@@ -316,6 +315,10 @@ void ClibFtruncate(int aDescriptor, ::off_t aSize) {
     if (lResult != 0) {
         sThrowForNumber<ZTCClibTruncateFailedEx>("Cutting descriptor", aDescriptor, errno);
     }
+}
+
+bool ClibTryGive(int aDescriptor, ::uid_t aUser) noexcept {
+    return ::fchown(aDescriptor, aUser, static_cast<::gid_t>(-1)) == 0;
 }
 
 int ClibPoll(struct pollfd* apDescriptors, unsigned aNumberOfDescriptors, int aMilliseconds) {
