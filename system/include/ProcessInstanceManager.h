@@ -40,8 +40,9 @@ public:
     void markAsRunning();
 
     /// Asks the process that holds the lock to stop (SIGTERM) and waits until it is gone; waits for one that is
-    /// starting. Says on standard output what came of it, also that none is running. Throws ZTCClibKillFailedEx where
-    /// it may not be asked.
+    /// starting. A process that does not belong to the file's owner is left alone: the file may be forged. Says on
+    /// standard output what came of it, also that none is running. Throws ZTCClibKillFailedEx where it may not be
+    /// asked.
     void killRunningInstance();
 
     /// Removes the file, if it still is the one that this process locked, and drops the lock. Does nothing a second

@@ -71,7 +71,7 @@ std::int32_t sReadPid(int aDescriptor) {
     return sParsePid(lText);
 }
 
-void sRequireRegularFile(const char* apPath, int aDescriptor) {
+struct stat sRequireRegularFile(const char* apPath, int aDescriptor) {
     struct stat lStatus {};
     ClibFstat(aDescriptor, &lStatus);
     if (!S_ISREG(lStatus.st_mode)) {
@@ -80,6 +80,7 @@ void sRequireRegularFile(const char* apPath, int aDescriptor) {
                     ClibFileKind(lStatus.st_mode));
         throw ZTCInvalidEx(lText);
     }
+    return lStatus;
 }
 
 bool sIsAtPath(const char* apPath, int aDescriptor) {
@@ -113,13 +114,22 @@ private:
 struct ZTSHolder {
     bool mIsThere;
     std::int32_t mProcessId;  // above 0, gcNoPid or gcBadPid
+    ::uid_t mFileOwner;
 };
+
+/// Whether the process belongs to the user; true where there is no such process any more.
+bool sIsProcessOf(::uid_t aUser, std::int32_t aProcessId) {
+    char lPath[64];
+    ClibSprintf(lPath, sizeof(lPath), "/proc/%d", static_cast<int>(aProcessId));
+    struct stat lStatus {};
+    return !ClibLstat(lPath, &lStatus) || lStatus.st_uid == aUser;
+}
 
 /// Who holds the lock of the pid file.
 ZTSHolder sLookUp(const char* apPath) {
     const ZTCOpenFile lFile(ClibTryOpen(apPath, O_RDONLY | O_NONBLOCK | O_NOFOLLOW));
     if (lFile.get() == -ENOENT) {
-        return {false, gcNoPid};
+        return {false, gcNoPid, 0};
     }
     if (lFile.get() < 0) {
         char lText[512];
@@ -127,11 +137,11 @@ ZTSHolder sLookUp(const char* apPath) {
                     ZTCErrnoText(-lFile.get()).get());
         throw ZTCClibOpenFailedEx(lText);
     }
-    sRequireRegularFile(apPath, lFile.get());
+    const ::uid_t lOwner = sRequireRegularFile(apPath, lFile.get()).st_uid;
     if (ClibTryLock(lFile.get())) {
-        return {false, gcNoPid};
+        return {false, gcNoPid, lOwner};
     }
-    return {true, sReadPid(lFile.get())};
+    return {true, sReadPid(lFile.get()), lOwner};
 }
 
 [[noreturn]] void sThrowNoStatus(const char* apPath, const char* apReason) {
@@ -158,7 +168,7 @@ bool ZTCProcessInstanceManager::isAnInstanceRunning() {
     int lLockTries = 0;
     for (int lReplacedTries = 0; lReplacedTries < gcReplacedTries;) {
         ZTCOpenFile lFile(ClibOpen(lpPath, O_RDWR | O_CREAT | O_NONBLOCK | O_NOFOLLOW, gcPidFileMode));
-        sRequireRegularFile(lpPath, lFile.get());
+        const struct stat lStatus = sRequireRegularFile(lpPath, lFile.get());
         if (!ClibTryLock(lFile.get())) {
             if (++lLockTries < gcLockTries) {
                 ClibSleep(gcLockPauseMilliseconds);
@@ -169,6 +179,10 @@ bool ZTCProcessInstanceManager::isAnInstanceRunning() {
             return true;
         }
         if (sIsAtPath(lpPath, lFile.get())) {
+            if (lStatus.st_uid != ::geteuid()) {
+                // Left by another user's run: what stops this process by the file goes by the owner.
+                ClibTryGive(lFile.get(), ::geteuid());
+            }
             ClibFtruncate(lFile.get(), 0);
             mDescriptor = lFile.release();
             mIsLocked = true;
@@ -217,6 +231,12 @@ void ZTCProcessInstanceManager::killRunningInstance() {
         const bool lHasGivenUp = !lHolder.mIsThere || lHolder.mProcessId != lAsked;
         if (lAsked != 0 && lHasGivenUp && !ClibIsProcessAlive(lAsked)) {
             std::cout << "Stopped the running instance, process " << lAsked << std::endl;
+            return;
+        }
+        // Who may write the file must not have another's process ended by it.
+        if (lAsked == 0 && lHolder.mProcessId > 0 && !sIsProcessOf(lHolder.mFileOwner, lHolder.mProcessId)) {
+            std::cout << "The pid file '" << lpPath << "' names process " << lHolder.mProcessId
+                      << ", which is not its owner's; nothing is stopped" << std::endl;
             return;
         }
         if (lAsked == 0 && lHolder.mProcessId > 0 && ClibKill(lHolder.mProcessId, SIGTERM)) {

@@ -328,6 +328,40 @@ TEST_F(ProcessInstanceManager, StoppingGivesUpOnALockWithoutAProcess) {
     }
 }
 
+TEST_F(ProcessInstanceManager, StoppingLeavesAProcessAloneThatIsNotTheFileOwners) {
+    // Another user's file that names a process of this one; without root's rights this user's that names process 1.
+    ZTCForkedProcess lBystander([](ZTCForkedProcess& arSelf) {
+        arSelf.tellParent();
+        arSelf.waitForParent();
+        return 0;
+    });
+    lBystander.waitForChild();
+    const ZTCPointer<ZTCProcessInstanceManager> lHolder(newManager());
+    EXPECT_FALSE(lHolder->isAnInstanceRunning());
+    const bool lIsRoot = geteuid() == 0;
+    const std::string lPid = std::to_string(lIsRoot ? lBystander.getPid() : 1);
+    writeFile(mPath, lPid + "\n");
+    EXPECT_EQ(lIsRoot ? chown(mPath.c_str(), 65534, 65534) : 0, 0);
+    const ZTCPointer<ZTCProcessInstanceManager> lManager(newManager());
+    EXPECT_EQ(killAndCapture(*lManager), "The pid file '" + mPath + "' names process " + lPid +
+                                             ", which is not its owner's; nothing is stopped\n");
+    lBystander.tellChild();
+    EXPECT_EQ(lBystander.waitForExit(), 0);
+}
+
+TEST_F(ProcessInstanceManager, APidFileThatIsTakenOverBelongsToTheProcess) {
+    writeFile(mPath, "");
+    if (geteuid() == 0) {
+        ASSERT_EQ(chown(mPath.c_str(), 65534, 65534), 0);
+    }
+    const ZTCPointer<ZTCProcessInstanceManager> lManager(newManager());
+    EXPECT_FALSE(lManager->isAnInstanceRunning());
+    struct stat lStatus {};
+    ASSERT_EQ(lstat(mPath.c_str(), &lStatus), 0);
+    EXPECT_EQ(lStatus.st_uid, geteuid());
+    lManager->exitInstanceManagement();
+}
+
 // ---- The status of a process ----
 
 TEST_F(ProcessInstanceManager, TheStatusOfARunningProcessIsNoError) {
