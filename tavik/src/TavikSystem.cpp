@@ -1,5 +1,8 @@
 #include "tavik/include/TavikSystem.h"
 
+#include <sys/stat.h>
+#include <unistd.h>
+
 #include <iostream>
 
 #include "common/include/Assert.h"
@@ -51,6 +54,26 @@ void sInitGlobals() {
     ZT_EXIT();
 }
 
+/// Whoever can write in the sensor's directory is trusted like the sensor: that should be nobody else.
+void sWarnOfSharedDirectory(const ZTCString& acrPath) {
+    ZT_ENTRY();
+    struct stat lStatus {};
+    ClibStat(acrPath.get(), &lStatus);
+    const unsigned lMode = lStatus.st_mode & 07777;
+    if ((lMode & (S_IWGRP | S_IWOTH)) != 0) {
+        ZT_LOG_WARN(
+            "The sensor directory '%s' has mode %04o: %s can command this agent and replace its files there; make it "
+            "private: chmod go-w '%s'",
+            acrPath.get(), lMode, (lMode & S_IWOTH) != 0 ? "everybody" : "its group", acrPath.get());
+    } else if (lStatus.st_uid != 0 && lStatus.st_uid != ::geteuid()) {
+        ZT_LOG_WARN(
+            "The sensor directory '%s' belongs to user %u, who can command this agent and replace its files there; run "
+            "the agent as that user, or take the directory over: chown %u '%s'",
+            acrPath.get(), lStatus.st_uid, ::geteuid(), acrPath.get());
+    }
+    ZT_EXIT();
+}
+
 }  // namespace
 
 ZTCTavikSystem::ZTCTavikSystem(const ZTCString& acrName)
@@ -91,6 +114,7 @@ void ZTCTavikSystem::init() {
     ZT_ENTRY();
     ZT_LOG_INFO("Performing Tavik system data initialization");
     ZTCSystem::init();
+    sWarnOfSharedDirectory(getInstallDir());
     // Adapters come before anything that leaves a trace in the file system: a host without any ends here.
     initLibkpm();
     initSynchronizationObjects();
