@@ -18,7 +18,8 @@ static constexpr int scStartMilliseconds = 200;
 ZTSAgentState lookAtAgent(const std::string& acrDirectory) {
     const std::string lPath = acrDirectory + gcAgentPidFileName;
     ZTSAgentState lState;
-    const ZTCFileDescriptor lFile = ZTCFileDescriptor::open(lPath.c_str(), O_RDONLY | O_NONBLOCK);
+    const ZTCFileDescriptor lFile =
+        ZTCFileDescriptor::open(lPath.c_str(), O_RDONLY | O_NONBLOCK | O_NOCTTY | O_NOFOLLOW);
     if (!lFile.isOpen()) {
         if (errno == ENOENT) {
             return lState;

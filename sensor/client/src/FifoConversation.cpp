@@ -77,7 +77,7 @@ void ZTCFifoConversation::disconnect() noexcept {
 }
 
 ZTCFileDescriptor ZTCFifoConversation::openFifo(const std::string& acrPath, int aFlags) {
-    ZTCFileDescriptor lFifo = ZTCFileDescriptor::open(acrPath.c_str(), aFlags | O_NONBLOCK | O_NOCTTY);
+    ZTCFileDescriptor lFifo = ZTCFileDescriptor::open(acrPath.c_str(), aFlags | O_NONBLOCK | O_NOCTTY | O_NOFOLLOW);
     if (!lFifo.isOpen()) {
         if (errno == ENOENT) {
             mObstacle = ZTNA_NoFifo;

@@ -6,6 +6,7 @@
 #include <sys/wait.h>
 #include <unistd.h>
 
+#include "sensor/client/include/ClientErrors.h"
 #include "sensor/client/include/FileDescriptor.h"
 #include "tests/support/TemporaryDirectory.h"
 
@@ -49,4 +50,12 @@ TEST(AgentState, AStalePidFileIsNoAgentEvenWhereItsPidIsInUseAgain) {
     ASSERT_EQ(waitpid(lChild, nullptr, 0), lChild);
     writeFile(lDirectory.path("qrv-tvk.pid"), std::to_string(lChild) + "\n");
     EXPECT_EQ(lookAtAgent(lDirectory.path()).mPresence, ZTAP_None);
+}
+
+TEST(AgentState, ASymbolicLinkIsNoPidFileOfAnAgent) {
+    const ZTCTemporaryDirectory lDirectory;
+    const ZTCTemporaryDirectory lOther;
+    const ZTCFileDescriptor lHeld = sHold(lOther, std::to_string(getpid()) + "\n");
+    ASSERT_EQ(symlink(lOther.path("qrv-tvk.pid").c_str(), lDirectory.path("qrv-tvk.pid").c_str()), 0);
+    EXPECT_THROW(lookAtAgent(lDirectory.path()), ZTCSystemCallEx);
 }

@@ -114,6 +114,17 @@ TEST(FifoConversation, AFileInAFifosPlaceIsRefusedAndKept) {
     EXPECT_EQ(readFile(lDirectory.path("qrvtvkcmd.fifo")), "precious");
 }
 
+TEST(FifoConversation, RefusesFifosBehindSymbolicLinks) {
+    const ZTCTemporaryDirectory lDirectory;
+    const ZTCTemporaryDirectory lOther;
+    const ZTCFakeAgent lAgent(lOther.path(), {ZTCFakeAgent::answering({1})});
+    for (const char* lpName : {"qrvtvkcmd.fifo", "qrvtvkout.fifo"}) {
+        ASSERT_EQ(symlink(lOther.path(lpName).c_str(), lDirectory.path(lpName).c_str()), 0);
+    }
+    ZTCFifoConversation lConversation(lDirectory.path());
+    EXPECT_THROW(lConversation.connect(sPatience()), ZTCSystemCallEx);
+}
+
 TEST(FifoConversation, IsTheReaderThatAStartingAgentWaitsFor) {
     const ZTCTemporaryDirectory lDirectory;
     makeFifos(lDirectory.path());  // left by an agent that was killed
