@@ -59,17 +59,23 @@ void sWarnOfSharedDirectory(const ZTCString& acrPath) {
     ZT_ENTRY();
     struct stat lStatus {};
     ClibStat(acrPath.get(), &lStatus);
-    const unsigned lMode = lStatus.st_mode & 07777;
-    if ((lMode & (S_IWGRP | S_IWOTH)) != 0) {
+    const bool lIsShared = (lStatus.st_mode & (S_IWGRP | S_IWOTH)) != 0;
+    const bool lIsForeign = lStatus.st_uid != 0 && lStatus.st_uid != ::geteuid();
+    if (lIsShared || lIsForeign) {
+        char lWho[64];
+        char lRemedy[MAX_FILE_PATH];
+        if (lIsShared) {
+            ClibStrcpy(lWho, (lStatus.st_mode & S_IWOTH) != 0 ? "everybody" : "its group");
+            ClibSprintf(lRemedy, sizeof lRemedy, "chmod go-w '%s'", acrPath.get());
+        } else {
+            ClibSprintf(lWho, sizeof lWho, "user %u", lStatus.st_uid);
+            ClibSprintf(lRemedy, sizeof lRemedy, "run the agent as that user, or chown %u '%s'", ::geteuid(),
+                        acrPath.get());
+        }
         ZT_LOG_WARN(
-            "The sensor directory '%s' has mode %04o: %s can command this agent and replace its files there; make it "
-            "private: chmod go-w '%s'",
-            acrPath.get(), lMode, (lMode & S_IWOTH) != 0 ? "everybody" : "its group", acrPath.get());
-    } else if (lStatus.st_uid != 0 && lStatus.st_uid != ::geteuid()) {
-        ZT_LOG_WARN(
-            "The sensor directory '%s' belongs to user %u, who can command this agent and replace its files there; run "
-            "the agent as that user, or take the directory over: chown %u '%s'",
-            acrPath.get(), lStatus.st_uid, ::geteuid(), acrPath.get());
+            "The sensor directory '%s' can be written by %s, who can so command this agent and replace its files; to "
+            "make it private: %s",
+            acrPath.get(), lWho, lRemedy);
     }
     ZT_EXIT();
 }

@@ -12,8 +12,10 @@
 /// The command thread logs this when it begins to wait for a command.
 static const char* const gcRunningText = "Waiting for control availability...";
 
+/// A directory that its owner alone may write in, whatever the umask is.
 static std::string sMadeDirectory(const std::string& acrPath) {
     std::filesystem::create_directory(acrPath);
+    std::filesystem::permissions(acrPath, std::filesystem::perms::owner_all);
     return acrPath;
 }
 

@@ -21,6 +21,10 @@ const std::vector<ZTSLogText>& logTexts() {
         {128, "-T-", ".//TavikSystem", "sCreateRtdir", "Trying to create '%s'", sProcess},
         {16, "-W-", ".//TavikSystem", "sCreateRtdir", "'%s' already exists... continuing", sAgent},
         {64, "-I-", ".//TavikSystem", "init", "Performing Tavik system data initialization", sAgent},
+        {16, "-W-", ".//TavikSystem", "sWarnOfSharedDirectory",
+         "The sensor directory '%s' can be written by %s, who can so command this agent and replace its files; to make "
+         "it private: %s",
+         sAgent},
         {64, "-I-", ".//TavikSystem", "initConditionals", "Creating HeartbeatHandler Conditional...", sAgent},
         {64, "-I-", ".//TavikSystem", "initConditionals", "Creating CommandHandler Conditional...", sAgent},
         {128, "-T-", ".//TavikSystem", "initCommandIpc", "Creating Tavik Command Reader IPC...", sAgent},
@@ -280,6 +284,10 @@ const std::vector<ZTSLogText>& logTexts() {
         {128, "-T-", "system/src/SynchList", "~ZTCSynchList", "Ignoring '%s'", sProcess},
         {16, "-W-", "system/src/ProcessInstanceManager", "exitInstanceManagement",
          "The pid file '%s' is gone or another's; nothing is removed", sAgent},
+        {16, "-W-", "os/common/src/NamedPipe", "sWarnOfSharedFifo",
+         "The FIFO '%s' was there already, with owner %u and mode %s: whoever may open it can talk in the place of the "
+         "sensor or the agent; to have it made anew, stop the agent and remove it",
+         sAgent},
         {64, "-I-", "os/common/src/NamedPipe", "create", "The FIFO '%s' is there already and is taken over", sAgent},
         {32, "-N-", "os/common/src/NamedPipe", "openForWriting", "Waiting for a reader of '%s'", sAgent},
         {32, "-N-", "os/common/src/NamedPipe", "openForWriting", "%s", sAgent},

@@ -1,6 +1,7 @@
 #include "tests/support/LogTexts.h"
 
 #include <gtest/gtest.h>
+#include <sys/stat.h>
 #include <unistd.h>
 
 #include <csignal>
@@ -177,6 +178,17 @@ void sDriveAWaitForAReader(ZTCLogTextsSeen& arSeen) {
     sAddLogs(arSeen, lAgent);
 }
 
+/// A directory and a FIFO that are open to others.
+void sDriveSharedPlaces(ZTCLogTextsSeen& arSeen) {
+    ZTCAgentProcess lAgent;
+    std::filesystem::permissions(lAgent.sensorDirectory(), std::filesystem::perms::all);
+    EXPECT_EQ(0, mkfifo(lAgent.commandFifoPath().c_str(), 0600));
+    std::filesystem::permissions(lAgent.commandFifoPath(), std::filesystem::perms::all);
+    lAgent.startAndConnect();
+    EXPECT_EQ(0, lAgent.stop());
+    sAddLogs(arSeen, lAgent);
+}
+
 /// Files of the agent's that somebody replaces while it runs.
 void sDriveReplacedFiles(ZTCLogTextsSeen& arSeen) {
     ZTCAgentProcess lAgent;
@@ -238,6 +250,7 @@ TEST(LogTexts, EveryTextOfARealPathIsFoundInARealLogAndNoOtherOne) {
     sDriveTheTotalLimit(lSeen);
     sDriveRefusedStarts(lSeen);
     sDriveAWaitForAReader(lSeen);
+    sDriveSharedPlaces(lSeen);
     sDriveReplacedFiles(lSeen);
     sDriveHeartbeatFailures(lSeen);
     sDriveAnUnknownCommand(lSeen);

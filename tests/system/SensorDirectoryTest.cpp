@@ -27,7 +27,8 @@ TEST(SensorDirectory, OneThatItsGroupOrEverybodyMayWriteInDrawsOneWarningWithThe
         const std::vector<ZTSLogLine> lWarnings = sWarnings(lAgent);
         ASSERT_EQ(lWarnings.size(), 1u);
         EXPECT_EQ(lWarnings[0].mMark, "-W-");
-        EXPECT_NE(lWarnings[0].mText.find(lWho + " can command this agent"), std::string::npos) << lWarnings[0].mText;
+        EXPECT_NE(lWarnings[0].mText.find("' can be written by " + lWho + ", "), std::string::npos)
+            << lWarnings[0].mText;
         EXPECT_TRUE(lWarnings[0].mText.ends_with("chmod go-w '" + lAgent.sensorDirectory() + "'"))
             << lWarnings[0].mText;
     }
@@ -52,7 +53,7 @@ TEST(SensorDirectory, OneOfAnotherUserDrawsAWarning) {
     const std::vector<ZTSLogLine> lWarnings = sWarnings(lAgent);
     ASSERT_EQ(lWarnings.size(), lIsRoot ? 1u : 0u);
     if (lIsRoot) {
-        EXPECT_NE(lWarnings[0].mText.find("belongs to user 65534"), std::string::npos) << lWarnings[0].mText;
+        EXPECT_NE(lWarnings[0].mText.find("' can be written by user 65534, "), std::string::npos) << lWarnings[0].mText;
     }
 }
 

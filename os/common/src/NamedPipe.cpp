@@ -69,11 +69,12 @@ struct stat sRequireFifo(const char* apPath) {
 void sWarnOfSharedFifo(const char* apPath, const struct stat& acrStatus) {
     const unsigned lMode = acrStatus.st_mode & 07777;
     if ((lMode & ~gcFifoMode) != 0 || acrStatus.st_uid != ::geteuid()) {
+        char lShown[16];
+        ClibSprintf(lShown, sizeof(lShown), "%04o", lMode);
         ZT_LOG_WARN(
-            "The FIFO '%s' was there already, with owner %u and mode %04o: whoever may open it can talk in the place "
-            "of "
+            "The FIFO '%s' was there already, with owner %u and mode %s: whoever may open it can talk in the place of "
             "the sensor or the agent; to have it made anew, stop the agent and remove it",
-            apPath, acrStatus.st_uid, lMode);
+            apPath, acrStatus.st_uid, lShown);
     }
 }
 
