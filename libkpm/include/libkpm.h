@@ -235,7 +235,7 @@ typedef void (*KPM_TemperatureCallback)(unsigned board, unsigned first, unsigned
  */
 #define KPM_STATUS_SUCCESS 0u
 #define KPM_STATUS_INFO_5 5u    /* accepted; the library's own remark */
-#define KPM_STATUS_NO_SOURCE 6u /* accepted, but this library has no source for that kind on this port */
+#define KPM_STATUS_NO_SOURCE 6u /* accepted and never delivered: this library has no source for that kind here */
 #define KPM_STATUS_INFO_7 7u    /* accepted; the library's own remark */
 
 /* ---- The table of functions
@@ -246,9 +246,26 @@ typedef void (*KPM_TemperatureCallback)(unsigned board, unsigned first, unsigned
 /* The size of the structure up to and including the ninth function: the least that the agent accepts. */
 #define KPM_FUNCTION_LIST_SIZE_V1 80u
 
+/* The size of the structure up to and including SetLog. */
+#define KPM_FUNCTION_LIST_SIZE_LOG 88u
+
+/* Levels of a line for the agent's log. The agent counts a level that it does not know as a warning. */
+#define KPM_LOG_ERROR 1u
+#define KPM_LOG_WARNING 2u
+#define KPM_LOG_NOTICE 3u
+#define KPM_LOG_INFO 4u
+
 /*
- * The library's functions. None of the nine is null. Later versions of this header append entries; the agent uses one
- * only where `size` covers it, and it may be null.
+ * Writes one line to the agent's log: a level, and a text of the library's own that ends with a null byte and is
+ * borrowed for the call. May be called from any thread, from inside the library's entries too, but never with a lock of
+ * the library held that an entry takes. Never throws and never calls back into the library. A library keeps its lines
+ * few: what can happen often is counted, and the count told at most once a second.
+ */
+typedef void (*KPM_LogFunction)(uint32_t level, const char* text);
+
+/*
+ * The library's functions. None of the first nine is null. Later versions of this header append entries; the agent uses
+ * one only where `size` covers it, and it may be null.
  */
 typedef struct KPM_FunctionList {
     uint32_t version; /* KPM_INTERFACE_VERSION */
@@ -283,12 +300,20 @@ typedef struct KPM_FunctionList {
 
     /* Registers `callback` for one event type of a board. `size` is the number of bytes the caller reads of the event's
        data at most: 168 for link, 1024 for RSCN, 0 for temperature (for RSCN a hint only: a longer payload is delivered
-       whole). Returns a handle, 0: failed. Registering again: as for ZtapiRegEvent. */
+       whole). Returns a handle, 0: failed. A library without a source for an event type answers 0 for temperature,
+       which the agent does without, and for link and RSCN a handle that nothing is ever delivered for: the agent cannot
+       start without those two. Registering again: as for ZtapiRegEvent. */
     uint32_t (*KpmRegEvent)(uint32_t board, uint32_t eventType, void* context, uint32_t size,
                             KPM_EventCallback callback);
 
     /* Ends a registration of KpmRegEvent. 0: success. */
     uint32_t (*KpmUnregEvent)(uint32_t board, uint32_t handle);
+
+    /* ---- Appended entries: optional ---- */
+
+    /* Hands the library the agent's log. Called once, after KPM_GetFunctionList and before Init. `log` may be called
+       until the library is unloaded. */
+    void (*SetLog)(KPM_LogFunction log);
 } KPM_FunctionList;
 
 /*

@@ -180,9 +180,17 @@ static std::uint32_t sKpmUnregEvent(std::uint32_t aBoard, std::uint32_t aHandle)
 }
 
 const KPM_FunctionList* getSimFunctionList() {
-    static constexpr KPM_FunctionList scList{
-        KPM_INTERFACE_VERSION, sizeof(KPM_FunctionList), sInit,          sClose,           sGetNumberOfAdapters,
-        sIsZtapiSupported,     sGetAdapterInfo,          sZtapiRegEvent, sZtapiUnregEvent, sKpmRegEvent,
-        sKpmUnregEvent};
+    static constexpr KPM_FunctionList scList{KPM_INTERFACE_VERSION,
+                                             sizeof(KPM_FunctionList),
+                                             sInit,
+                                             sClose,
+                                             sGetNumberOfAdapters,
+                                             sIsZtapiSupported,
+                                             sGetAdapterInfo,
+                                             sZtapiRegEvent,
+                                             sZtapiUnregEvent,
+                                             sKpmRegEvent,
+                                             sKpmUnregEvent,
+                                             nullptr};
     return &scList;
 }

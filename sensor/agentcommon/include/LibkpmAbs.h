@@ -26,7 +26,7 @@ public:
     ZTCLibkpmAbs& operator=(const ZTCLibkpmAbs&) = delete;
 
     /// Throws ZTCNotFoundEx, after logging the reason, where the library is missing, disabled, without its function, of
-    /// another version, or with an incomplete table of functions.
+    /// another version, or with an incomplete table of functions. A library that takes a log function is given one.
     void LIBKPM_LoadLibrary();
 
     /// Unloads the library, which must have been closed.

@@ -2,6 +2,7 @@
 
 #include <dlfcn.h>
 
+#include <cstdint>
 #include <cstdio>
 #include <cstring>
 
@@ -37,6 +38,27 @@ bool sIsRefused(const KPM_FunctionList* apFunctions, char* apReason) {
         return true;
     }
     return false;
+}
+
+/// The library's way into the agent's log.
+void sWriteLibraryLine(std::uint32_t aLevel, const char* apText) {
+    if (apText == nullptr) {
+        apText = "(no text)";
+    }
+    switch (aLevel) {
+        case KPM_LOG_ERROR:
+            ZT_LOG_ERR("Libkpm: %s", apText);
+            break;
+        case KPM_LOG_NOTICE:
+            ZT_LOG_NOTICE("Libkpm: %s", apText);
+            break;
+        case KPM_LOG_INFO:
+            ZT_LOG_INFO("Libkpm: %s", apText);
+            break;
+        default:
+            ZT_LOG_WARN("Libkpm: %s", apText);
+            break;
+    }
 }
 
 HBA_wwn sMakeHbaWwn(const ZTCPointer<ZTCWorldWideName>& acrName) {
@@ -80,6 +102,9 @@ void ZTCLibkpmAbs::LIBKPM_LoadLibrary() {
         ZT_LOG_WARN("Libkpm '%s' cannot be used: %s", lpPath, lReason);
         dlclose(lpHandle);
         throw ZTCNotFoundEx("Libkpm cannot be used");
+    }
+    if (lpFunctions->size >= KPM_FUNCTION_LIST_SIZE_LOG && lpFunctions->SetLog != nullptr) {
+        lpFunctions->SetLog(&sWriteLibraryLine);
     }
     mpHandle = lpHandle;
     mpFunctions = lpFunctions;

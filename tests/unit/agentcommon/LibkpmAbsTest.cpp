@@ -118,6 +118,55 @@ TEST_F(LibkpmAbs, ALargerTableOfALaterHeaderIsAccepted) {
     mLibkpm.LIBKPM_FreeLibrary();
 }
 
+TEST_F(LibkpmAbs, ALibraryThatTakesALogIsGivenItOnceBeforeInit) {
+    mDouble.mTakesLog = true;
+    mLibkpm.LIBKPM_LoadLibrary();
+    mLibkpm.LIBKPM_Init();
+    EXPECT_EQ((std::vector<std::string>{"KPM_GetFunctionList 1", "SetLog", "Init"}), mDouble.calls());
+    mLibkpm.LIBKPM_FreeLibrary();
+}
+
+TEST_F(LibkpmAbs, ALibraryWithAnEmptyEntryForTheLogWorksWithoutOne) {
+    mLibkpm.LIBKPM_LoadLibrary();
+    EXPECT_EQ(std::vector<std::string>{"KPM_GetFunctionList 1"}, mDouble.calls());
+    mLibkpm.LIBKPM_FreeLibrary();
+}
+
+TEST_F(LibkpmAbs, AnOlderTableThatDoesNotCoverTheEntryForTheLogIsNeverAskedForIt) {
+    mDouble.mTakesLog = true;
+    for (const std::uint32_t lSize : {80u, 84u, 87u}) {
+        SCOPED_TRACE(lSize);
+        mDouble.forgetCalls();
+        mDouble.mShape = [lSize](KPM_FunctionList& arList) { arList.size = lSize; };
+        mLibkpm.LIBKPM_LoadLibrary();
+        EXPECT_EQ(std::vector<std::string>{"KPM_GetFunctionList 1"}, mDouble.calls());
+        mLibkpm.LIBKPM_FreeLibrary();
+    }
+}
+
+TEST_F(LibkpmAbs, ARefusedLibraryIsGivenNoLog) {
+    mDouble.mTakesLog = true;
+    mDouble.mShape = [](KPM_FunctionList& arList) { arList.Close = nullptr; };
+    EXPECT_THROW(mLibkpm.LIBKPM_LoadLibrary(), ZTCNotFoundEx);
+    EXPECT_TRUE(mDouble.callsOf("SetLog").empty());
+}
+
+TEST_F(LibkpmAbs, TheLibrarysLinesStandInTheLogAtTheirLevels) {
+    mDouble.mTakesLog = true;
+    mLibkpm.LIBKPM_LoadLibrary();
+    ASSERT_NE(nullptr, mDouble.mpLog);
+    mDouble.mpLog(KPM_LOG_ERROR, "one");
+    mDouble.mpLog(KPM_LOG_WARNING, "two %s%n 50%");
+    mDouble.mpLog(KPM_LOG_NOTICE, "three");
+    mDouble.mpLog(KPM_LOG_INFO, "below the level of the log");
+    mDouble.mpLog(4711, "five");
+    mDouble.mpLog(KPM_LOG_NOTICE, nullptr);
+    EXPECT_EQ((std::vector<std::string>{"-E- Libkpm: one", "-W- Libkpm: two %s%n 50%", "-N- Libkpm: three",
+                                        "-W- Libkpm: five", "-N- Libkpm: (no text)"}),
+              mLog.texts());
+    mLibkpm.LIBKPM_FreeLibrary();
+}
+
 TEST_F(LibkpmAbs, ATableWithAnyEmptyEntryIsRefused) {
     for (unsigned lEntry = 0; lEntry < 9; ++lEntry) {
         SCOPED_TRACE(lEntry);

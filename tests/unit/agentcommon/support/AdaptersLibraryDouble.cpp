@@ -74,6 +74,9 @@ std::uint32_t ZTCAdaptersLibraryDouble::getFunctionList(std::uint32_t aVersion, 
                                                         const KPM_FunctionList** appList) {
     mCalls.push_back("KPM_GetFunctionList " + std::to_string(aVersion));
     mList = acrList;
+    if (!mTakesLog) {
+        mList.SetLog = nullptr;
+    }
     if (mShape) {
         mShape(mList);
     }
@@ -155,6 +158,11 @@ std::uint32_t ZTCAdaptersLibraryDouble::kpmRegEvent(std::uint32_t aBoard, std::u
 std::uint32_t ZTCAdaptersLibraryDouble::kpmUnregEvent(std::uint32_t aBoard, std::uint32_t aHandle) {
     mCalls.push_back("KpmUnregEvent board " + std::to_string(aBoard) + " handle " + std::to_string(aHandle));
     return sFind(mUnregisterStatuses, aHandle, 0);
+}
+
+void ZTCAdaptersLibraryDouble::setLog(KPM_LogFunction apLog) {
+    mCalls.emplace_back("SetLog");
+    mpLog = apLog;
 }
 
 std::uint32_t ZTCAdaptersLibraryDouble::makeHandle(const ZTCRegistrationKey& acrKey) {

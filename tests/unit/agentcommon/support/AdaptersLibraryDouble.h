@@ -42,6 +42,7 @@ public:
     // ---- What the library answers ----
     std::uint32_t mFunctionListStatus = 0;
     bool mGivesTable = true;                        ///< false: the status is given, but no table
+    bool mTakesLog = false;                         ///< whether the table has the entry for the log
     std::function<void(KPM_FunctionList&)> mShape;  ///< changes the table before it is given
     std::uint32_t mInitStatus = 0;
     std::uint32_t mNumberOfAdapters;
@@ -64,6 +65,7 @@ public:
     std::map<ZTCRegistrationKey, KPM_EventCallback> mEventCallbacks;
     std::map<ZTCRegistrationKey, void*> mContexts;
     std::map<ZTCRegistrationKey, std::uint32_t> mHandles;
+    KPM_LogFunction mpLog = nullptr;
 
 private:
     std::uint32_t getFunctionList(std::uint32_t aVersion, const KPM_FunctionList& acrList,
@@ -80,6 +82,7 @@ private:
     std::uint32_t kpmRegEvent(std::uint32_t aBoard, std::uint32_t aEventType, void* apContext, std::uint32_t aSize,
                               KPM_EventCallback apCallback) override;
     std::uint32_t kpmUnregEvent(std::uint32_t aBoard, std::uint32_t aHandle) override;
+    void setLog(KPM_LogFunction apLog) override;
 
     std::uint32_t makeHandle(const ZTCRegistrationKey& acrKey);
 

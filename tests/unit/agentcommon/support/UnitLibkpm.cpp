@@ -32,11 +32,22 @@ uint32_t sKpmRegEvent(uint32_t aBoard, uint32_t aType, void* apContext, uint32_t
 uint32_t sKpmUnregEvent(uint32_t aBoard, uint32_t aHandle) {
     return spBehaviour->kpmUnregEvent(aBoard, aHandle);
 }
+void sSetLog(KPM_LogFunction apLog) {
+    spBehaviour->setLog(apLog);
+}
 
-const KPM_FunctionList scList = {
-    KPM_INTERFACE_VERSION, sizeof(KPM_FunctionList), sInit,          sClose,           sGetNumberOfAdapters,
-    sIsZtapiSupported,     sGetAdapterInfo,          sZtapiRegEvent, sZtapiUnregEvent, sKpmRegEvent,
-    sKpmUnregEvent};
+const KPM_FunctionList scList = {KPM_INTERFACE_VERSION,
+                                 sizeof(KPM_FunctionList),
+                                 sInit,
+                                 sClose,
+                                 sGetNumberOfAdapters,
+                                 sIsZtapiSupported,
+                                 sGetAdapterInfo,
+                                 sZtapiRegEvent,
+                                 sZtapiUnregEvent,
+                                 sKpmRegEvent,
+                                 sKpmUnregEvent,
+                                 sSetLog};
 
 }  // namespace
 

@@ -25,6 +25,7 @@ public:
     virtual std::uint32_t kpmRegEvent(std::uint32_t aBoard, std::uint32_t aEventType, void* apContext,
                                       std::uint32_t aSize, KPM_EventCallback apCallback) = 0;
     virtual std::uint32_t kpmUnregEvent(std::uint32_t aBoard, std::uint32_t aHandle) = 0;
+    virtual void setLog(KPM_LogFunction apLog) = 0;
 
 protected:
     ~ZTCUnitLibkpmBehaviour() = default;
