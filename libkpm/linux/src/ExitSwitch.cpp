@@ -1,0 +1,32 @@
+#include "libkpm/linux/src/ExitSwitch.h"
+
+#include <unistd.h>
+
+#include <atomic>
+
+// Whoever takes the descriptor out owns it: exit and Close may meet.
+static std::atomic<int> sFile{-1};
+static std::atomic<bool> sIsPulled{false};
+
+void armLinuxExitSwitch(ZTCLinuxDescriptor aFile) noexcept {
+    const ZTCLinuxDescriptor lBefore(sFile.exchange(aFile.release()));
+}
+
+void disarmLinuxExitSwitch() noexcept {
+    const ZTCLinuxDescriptor lFile(sFile.exchange(-1));
+}
+
+void pullLinuxExitSwitch() noexcept {
+    // Before the file is used: who switches on and then looks here finds out in time.
+    sIsPulled.store(true);
+    const int lFile = sFile.exchange(-1);
+    if (lFile >= 0) {
+        // Not closed: the process ends, and other threads may be opening files.
+        const ssize_t lWritten = ::write(lFile, "0", 1);
+        static_cast<void>(lWritten);
+    }
+}
+
+bool isLinuxExitSwitchPulled() noexcept {
+    return sIsPulled.load();
+}

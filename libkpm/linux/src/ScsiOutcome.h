@@ -1,0 +1,48 @@
+/// The outcome of one SCSI command as a trace record tells it. Pure.
+#ifndef LIBKPM_LINUX_SRC_SCSIOUTCOME_H
+#define LIBKPM_LINUX_SRC_SCSIOUTCOME_H
+
+#include <bit>
+#include <cstdint>
+#include <optional>
+#include <string>
+#include <vector>
+
+#include "libkpm/linux/src/HostBytes.h"
+#include "libkpm/linux/src/TraceFormat.h"
+
+/// Status bytes of SCSI (SAM) that are events here.
+enum ZTELinuxScsiStatus : std::uint8_t { ZTLSS_CheckCondition = 0x02, ZTLSS_Busy = 0x08, ZTLSS_TaskSetFull = 0x28 };
+
+/// What a sense value is that the kernel does not tell.
+inline constexpr std::uint32_t gcUnknownSense = 0xFFFFFFFFu;
+
+struct ZTSScsiOutcome {
+    std::uint32_t mHost = 0;
+    std::uint32_t mChannel = 0;
+    std::uint32_t mTarget = 0;
+    std::uint32_t mLun = 0;
+    std::uint8_t mStatus = 0;
+    std::uint8_t mOpcode = 0;
+    std::uint32_t mSenseKey = gcUnknownSense;
+    std::uint32_t mAsc = gcUnknownSense;
+    std::uint32_t mAscq = gcUnknownSense;
+};
+
+/// The event number that a record begins with; nothing where it is too short for one.
+std::optional<std::uint32_t> getTraceRecordId(ZTCByteSpan aRecord, const ZTSScsiDoneLayout& acrLayout,
+                                              std::endian aOrder = std::endian::native);
+
+/// Nothing where the record is shorter than its fields.
+std::optional<ZTSScsiOutcome> parseScsiOutcome(ZTCByteSpan aRecord, const ZTSScsiDoneLayout& acrLayout,
+                                               std::endian aOrder = std::endian::native);
+
+/// The filter that the kernel is given for finished commands: those of these hosts (in ascending order) whose status
+/// has a bit of one of the three above. A few others pass, which the library drops. Runs of hosts are written as
+/// ranges; where the text would still be longer than the kernel takes, or there are no hosts, they are left out.
+std::string makeScsiFilter(const std::vector<std::uint32_t>& acrHosts);
+
+/// A filter this long or longer is refused by the kernel.
+inline constexpr std::size_t gcScsiFilterLimit = 4096;
+
+#endif

@@ -1,0 +1,66 @@
+/// Looks at the FC transport class below one root (/sys; tests have trees of their own). What is missing, garbled or
+/// vanishes while it is read is told as not known. From any thread.
+#ifndef LIBKPM_LINUX_SRC_SYSFS_H
+#define LIBKPM_LINUX_SRC_SYSFS_H
+
+#include <cstdint>
+#include <map>
+#include <optional>
+#include <string>
+#include <tuple>
+#include <utility>
+#include <vector>
+
+#include "libkpm/linux/src/Boards.h"
+#include "libkpm/linux/src/SysfsText.h"
+
+/// The content of a small file; nothing where it cannot be read at once or is longer than `aLimit`.
+std::optional<std::string> readSmallFile(const std::string& acrPath, std::size_t aLimit);
+
+/// The names in a directory, without those that begin with a dot, in no order; none where it cannot be read.
+std::vector<std::string> listDirectory(const std::string& acrPath);
+
+class ZTCSysfs {
+public:
+    explicit ZTCSysfs(std::string aRoot) : mRoot(std::move(aRoot)) {}
+
+    /// All FC hosts, in ascending order.
+    std::vector<ZTSLinuxHost> readHosts() const;
+
+    ZTELinuxLink readPortState(std::uint32_t aHost) const;
+
+    /// The FC id of the host's port, 0 where it is not known.
+    std::uint32_t readPortId(std::uint32_t aHost) const;
+
+    /// An attribute of the class, such as "fc_host/host0/port_state".
+    std::optional<std::string> readAttribute(const std::string& acrName) const;
+
+    std::vector<std::string> listClass(const std::string& acrName) const;
+
+private:
+    const std::string mRoot;
+};
+
+/// The names of remote ports by SCSI address, read when they are first asked for and kept until told to forget. One
+/// thread at a time.
+class ZTCLinuxRemotePorts {
+public:
+    explicit ZTCLinuxRemotePorts(const ZTCSysfs& acrSysfs) : mrSysfs(acrSysfs) {}
+
+    /// The port name of a target; the zero name where it cannot be told.
+    HBA_wwn find(std::uint32_t aHost, std::uint32_t aChannel, std::uint32_t aTarget);
+
+    void forget();
+
+private:
+    using Key = std::tuple<std::uint32_t, std::uint32_t, std::uint32_t>;
+
+    HBA_wwn read(const Key& acrKey);
+
+    const ZTCSysfs& mrSysfs;
+    std::map<Key, HBA_wwn> mNames;
+    bool mHasIndex = false;
+    std::map<Key, std::string> mIndex;  // the remote ports' directories
+};
+
+#endif
