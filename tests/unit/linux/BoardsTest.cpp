@@ -1,0 +1,82 @@
+#include "libkpm/linux/src/Boards.h"
+
+#include <gtest/gtest.h>
+
+using testing::Test;
+
+static ZTSLinuxHost sHost(std::uint32_t aNumber, std::uint8_t aName) {
+    ZTSLinuxHost lHost;
+    lHost.mNumber = aNumber;
+    lHost.mPortName.wwn[7] = aName;
+    return lHost;
+}
+
+using ZTCBoardNumbers = std::vector<std::uint32_t>;
+
+TEST(Boards, HostsGetBoardsInTheOrderOfTheirNumbers) {
+    ZTCLinuxBoards lBoards;
+    const auto lChanges = lBoards.update({sHost(2, 12), sHost(5, 15), sHost(11, 21)});
+    EXPECT_EQ(lChanges.mArrived, (ZTCBoardNumbers{0, 1, 2}));
+    EXPECT_TRUE(lChanges.mLeft.empty());
+    EXPECT_EQ(lBoards.findHost(11), 2u);
+    EXPECT_EQ(lBoards.getHosts(), (ZTCBoardNumbers{2, 5, 11}));
+}
+
+TEST(Boards, WhatStaysIsNoChange) {
+    ZTCLinuxBoards lBoards;
+    lBoards.update({sHost(2, 12)});
+    EXPECT_TRUE(lBoards.update({sHost(2, 12)}).isEmpty());
+}
+
+TEST(Boards, AHostThatComesLaterGetsTheNextBoardWhateverItsNumber) {
+    ZTCLinuxBoards lBoards;
+    lBoards.update({sHost(5, 15), sHost(6, 16)});
+    EXPECT_EQ(lBoards.update({sHost(1, 11), sHost(5, 15), sHost(6, 16)}).mArrived, ZTCBoardNumbers{2});
+    EXPECT_EQ(lBoards.findHost(1), 2u);
+    EXPECT_EQ(lBoards.findHost(5), 0u);
+}
+
+TEST(Boards, AHostThatLeavesLeavesItsBoardEmptyAndTheCountAsItIs) {
+    ZTCLinuxBoards lBoards;
+    lBoards.update({sHost(0, 10), sHost(1, 11)});
+    EXPECT_EQ(lBoards.update({sHost(1, 11)}).mLeft, ZTCBoardNumbers{0});
+    EXPECT_EQ(lBoards.size(), 2u);
+    EXPECT_EQ(lBoards.findHost(1), 1u);
+    EXPECT_FALSE(lBoards.get(0).mHost.has_value());
+    EXPECT_EQ(lBoards.update({sHost(1, 11), sHost(2, 12)}).mArrived, ZTCBoardNumbers{2}) << "no board is given twice";
+}
+
+TEST(Boards, APortThatComesBackUnderAnotherHostNumberGetsItsOwnBoard) {
+    ZTCLinuxBoards lBoards;
+    lBoards.update({sHost(0, 10), sHost(1, 11)});
+    lBoards.update({sHost(1, 11)});
+    EXPECT_EQ(lBoards.update({sHost(1, 11), sHost(7, 10)}).mArrived, ZTCBoardNumbers{0});
+    EXPECT_EQ(lBoards.findHost(7), 0u);
+    EXPECT_EQ(lBoards.size(), 2u);
+}
+
+TEST(Boards, AnotherPortUnderTheSameHostNumberIsAnotherBoard) {
+    ZTCLinuxBoards lBoards;
+    lBoards.update({sHost(0, 10)});
+    const auto lChanges = lBoards.update({sHost(0, 20)});
+    EXPECT_EQ(lChanges.mLeft, ZTCBoardNumbers{0});
+    EXPECT_EQ(lChanges.mArrived, ZTCBoardNumbers{1});
+    EXPECT_EQ(lBoards.get(0).mPortName.wwn[7], 10);
+    EXPECT_EQ(lBoards.findHost(0), 1u);
+}
+
+TEST(Boards, ANameThatCouldNotBeReadIsFilledInAndIsNoOtherPort) {
+    ZTCLinuxBoards lBoards;
+    lBoards.update({sHost(0, 0)});
+    EXPECT_TRUE(lBoards.update({sHost(0, 10)}).isEmpty());
+    EXPECT_EQ(lBoards.get(0).mPortName.wwn[7], 10);
+    EXPECT_TRUE(lBoards.update({sHost(0, 0)}).isEmpty()) << "unreadable for a moment";
+    EXPECT_EQ(lBoards.get(0).mPortName.wwn[7], 10);
+}
+
+TEST(Boards, HostsWithoutNamesAreNotTakenForEachOther) {
+    ZTCLinuxBoards lBoards;
+    lBoards.update({sHost(0, 0)});
+    lBoards.update({});
+    EXPECT_EQ(lBoards.update({sHost(3, 0)}).mArrived, ZTCBoardNumbers{1});
+}

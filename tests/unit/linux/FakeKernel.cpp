@@ -1,0 +1,265 @@
+#include "tests/unit/linux/FakeKernel.h"
+
+#include <fcntl.h>
+#include <sys/eventfd.h>
+#include <sys/stat.h>
+#include <unistd.h>
+
+#include <algorithm>
+#include <cerrno>
+#include <cstdio>
+#include <filesystem>
+#include <stdexcept>
+#include <utility>
+
+#include "libkpm/linux/src/Report.h"
+
+std::string portNameText(std::uint32_t aName) {
+    char lText[32];
+    std::snprintf(lText, sizeof lText, "0x10000000000000%02x", aName);
+    return lText;
+}
+
+HBA_wwn portName(std::uint32_t aName) {
+    return HBA_wwn{{0x10, 0, 0, 0, 0, 0, 0, static_cast<std::uint8_t>(aName)}};
+}
+
+HBA_wwn nodeName(std::uint32_t aName) {
+    return HBA_wwn{{0x20, 0, 0, 0, 0, 0, 0, static_cast<std::uint8_t>(aName)}};
+}
+
+ZTCFakeKernel::ZTCFakeKernel() : mFcWake(::eventfd(0, EFD_CLOEXEC | EFD_NONBLOCK)) {
+    for (const char* lpClass : {"fc_host", "fc_remote_ports", "fc_transport"}) {
+        std::filesystem::create_directories(sysfs() + "/class/" + lpClass);
+    }
+    std::filesystem::create_directories(tracefs() + "/instances");
+}
+
+ZTCFakeKernel::~ZTCFakeKernel() = default;
+
+ZTSLinuxOptions ZTCFakeKernel::options() const {
+    return {sysfs(), {tracefs()}, std::chrono::milliseconds(20)};
+}
+
+// ---- sysfs ----
+
+void ZTCFakeKernel::setAttribute(const std::string& acrName, const std::string& acrText) {
+    const std::filesystem::path lPath = sysfs() + "/class/" + acrName;
+    std::filesystem::create_directories(lPath.parent_path());
+    const std::string lNew = mDirectory.path("new");
+    writeFile(lNew, acrText);
+    std::filesystem::rename(lNew, lPath);
+}
+
+void ZTCFakeKernel::setHost(std::uint32_t aHost, const std::string& acrAttribute, const std::string& acrText) {
+    setAttribute("fc_host/host" + std::to_string(aHost) + "/" + acrAttribute, acrText);
+}
+
+void ZTCFakeKernel::addHost(std::uint32_t aHost, std::uint32_t aName) {
+    const std::uint32_t lName = aName == 0 ? aHost + 1 : aName;
+    // Made aside and moved in: the library never sees a half of it.
+    const std::string lHost = "fc_host/host" + std::to_string(aHost);
+    const std::string lAside = "aside";
+    char lText[32];
+    std::snprintf(lText, sizeof lText, "0x20000000000000%02x\n", lName);
+    setAttribute(lAside + "/node_name", lText);
+    setAttribute(lAside + "/port_name", portNameText(lName) + "\n");
+    setAttribute(lAside + "/port_state", "Online\n");
+    std::snprintf(lText, sizeof lText, "0x0100%02x\n", lName);
+    setAttribute(lAside + "/port_id", lText);
+    std::filesystem::rename(sysfs() + "/class/" + lAside, sysfs() + "/class/" + lHost);
+}
+
+void ZTCFakeKernel::removeClass(const std::string& acrName) {
+    const std::string lAside = mDirectory.path("gone");
+    std::filesystem::rename(sysfs() + "/class/" + acrName, lAside);
+    std::filesystem::remove_all(lAside);
+}
+
+void ZTCFakeKernel::removeHost(std::uint32_t aHost) {
+    removeClass("fc_host/host" + std::to_string(aHost));
+}
+
+void ZTCFakeKernel::addTarget(std::uint32_t aHost, std::uint32_t aChannel, std::uint32_t aTarget,
+                              const std::string& acrName) {
+    setAttribute("fc_transport/target" + std::to_string(aHost) + ":" + std::to_string(aChannel) + ":" +
+                     std::to_string(aTarget) + "/port_name",
+                 acrName + "\n");
+}
+
+void ZTCFakeKernel::addRport(std::uint32_t aHost, std::uint32_t aNumber, std::int64_t aTarget,
+                             const std::string& acrName) {
+    const std::string lRport = "fc_remote_ports/rport-" + std::to_string(aHost) + ":0-" + std::to_string(aNumber);
+    const std::string lPath = sysfs() + "/class/" + lRport;
+    std::filesystem::create_directory(lPath);
+    writeFile(lPath + "/scsi_target_id", std::to_string(aTarget) + "\n");
+    writeFile(lPath + "/port_name", acrName + "\n");
+}
+
+// ---- FC events ----
+
+class ZTCFakeFcSource : public ZTCFcEventSource {
+public:
+    explicit ZTCFakeFcSource(ZTCFakeKernel& arKernel) : mrKernel(arKernel) {}
+
+    int getDescriptor() const override { return mrKernel.mFcWake.get(); }
+
+    ZTSLinuxReceived receive(std::span<std::uint8_t> aBuffer) override {
+        const std::lock_guard<std::mutex> lGuard(mrKernel.mLock);
+        std::uint64_t lCount = 0;
+        if (mrKernel.mOutcomes.empty() || mrKernel.mIsHeld) {
+            static_cast<void>(::read(mrKernel.mFcWake.get(), &lCount, sizeof lCount) < 0);
+            return {ZTLR_Empty, 0};
+        }
+        const auto [lOutcome, lBytes] = mrKernel.mOutcomes.front();
+        mrKernel.mOutcomes.pop_front();
+        std::copy(lBytes.begin(), lBytes.end(), aBuffer.begin());
+        return {lOutcome, lBytes.size()};
+    }
+
+private:
+    ZTCFakeKernel& mrKernel;
+};
+
+std::unique_ptr<ZTCFcEventSource> ZTCFakeKernel::openFcEvents(std::string& arProblem) {
+    if (mRefusesFcEvents) {
+        arProblem = "FC events cannot be subscribed to: Operation not permitted";
+        return nullptr;
+    }
+    return std::make_unique<ZTCFakeFcSource>(*this);
+}
+
+void ZTCFakeKernel::sendFc(ZTELinuxReceived aOutcome, const ZTCBytes& acrBytes) {
+    const std::lock_guard<std::mutex> lGuard(mLock);
+    mOutcomes.emplace_back(aOutcome, acrBytes);
+    const std::uint64_t lOne = 1;
+    if (!mIsHeld && ::write(mFcWake.get(), &lOne, sizeof lOne) < 0) {
+        throw std::runtime_error("the event source cannot be woken");
+    }
+}
+
+void ZTCFakeKernel::holdFc() {
+    const std::lock_guard<std::mutex> lGuard(mLock);
+    mIsHeld = true;
+}
+
+void ZTCFakeKernel::releaseFc() {
+    const std::lock_guard<std::mutex> lGuard(mLock);
+    mIsHeld = false;
+    const std::uint64_t lOne = 1;
+    if (::write(mFcWake.get(), &lOne, sizeof lOne) < 0) {
+        throw std::runtime_error("the event source cannot be woken");
+    }
+}
+
+bool ZTCFakeKernel::isFcDrained() const {
+    const std::lock_guard<std::mutex> lGuard(mLock);
+    return mOutcomes.empty();
+}
+
+// ---- tracefs ----
+
+int ZTCFakeKernel::make(const std::string& acrPath) {
+    if (mMakeError != 0) {
+        return mMakeError;
+    }
+    if (!std::filesystem::create_directory(acrPath)) {
+        return EEXIST;
+    }
+    mInstance = acrPath;
+    const std::string lEvent = acrPath + "/events/scsi/scsi_dispatch_cmd_done";
+    std::filesystem::create_directories(lEvent);
+    if (!mFormat.empty()) {
+        writeFile(lEvent + "/format", mFormat);
+    }
+    writeFile(lEvent + "/enable", "0");
+    if (mHasFilter) {
+        writeFile(lEvent + "/filter", "none");
+    } else {
+        std::filesystem::create_directory(lEvent + "/filter");
+    }
+    if (!mHeaderPage.empty()) {
+        writeFile(acrPath + "/events/header_page", mHeaderPage);
+    }
+    writeFile(acrPath + "/buffer_size_kb", "1408");
+    if (mHasBufferPercent) {
+        writeFile(acrPath + "/buffer_percent", "50");
+    } else {
+        std::filesystem::create_directory(acrPath + "/buffer_percent");
+    }
+    for (unsigned lProcessor = 0; lProcessor < mProcessors; ++lProcessor) {
+        const std::string lBuffer = acrPath + "/per_cpu/cpu" + std::to_string(lProcessor);
+        std::filesystem::create_directories(lBuffer);
+        writeFile(lBuffer + "/stats", "entries: 0\noverrun: 0\ncommit overrun: 0\ndropped events: 0\n");
+        if (::mkfifo((lBuffer + "/trace_pipe_raw").c_str(), 0600) != 0) {
+            return errno;
+        }
+        // Open for both, so that the reader never sees an end.
+        mPipes[lProcessor] = ZTCLinuxDescriptor(::open((lBuffer + "/trace_pipe_raw").c_str(), O_RDWR | O_CLOEXEC));
+    }
+    return 0;
+}
+
+int ZTCFakeKernel::remove(const std::string& acrPath) {
+    std::error_code lError;
+    return std::filesystem::remove_all(acrPath, lError) == 0 || lError ? ENOENT : 0;
+}
+
+void ZTCFakeKernel::sendPage(const ZTCBytes& acrPage, unsigned aProcessor) {
+    if (::write(mPipes.at(aProcessor).get(), acrPage.data(), acrPage.size()) != static_cast<ssize_t>(acrPage.size())) {
+        throw std::runtime_error("a page cannot be written");
+    }
+}
+
+std::string ZTCFakeKernel::instance() const {
+    return mInstance;
+}
+
+std::vector<std::string> ZTCFakeKernel::instances() const {
+    return listDirectory(tracefs() + "/instances");
+}
+
+// ---- The log ----
+
+static std::mutex sLogLock;
+static std::vector<std::string>& sLines() {
+    static std::vector<std::string>& srLines = *new std::vector<std::string>;
+    return srLines;
+}
+
+static void sLog(std::uint32_t aLevel, const char* apText) {
+    const std::lock_guard<std::mutex> lGuard(sLogLock);
+    sLines().push_back(std::to_string(aLevel) + " " + apText);
+}
+
+ZTCLinuxLog::ZTCLinuxLog() {
+    {
+        const std::lock_guard<std::mutex> lGuard(sLogLock);
+        sLines().clear();
+    }
+    setLinuxLog(&sLog);
+}
+
+ZTCLinuxLog::~ZTCLinuxLog() {
+    setLinuxLog(nullptr);
+}
+
+std::vector<std::string> ZTCLinuxLog::lines() const {
+    const std::lock_guard<std::mutex> lGuard(sLogLock);
+    return sLines();
+}
+
+std::size_t ZTCLinuxLog::count(const std::string& acrText) const {
+    const std::vector<std::string> lLines = lines();
+    return static_cast<std::size_t>(std::count_if(lLines.begin(), lLines.end(), [&](const std::string& acrLine) {
+        return acrLine.find(acrText) != std::string::npos;
+    }));
+}
+
+std::string ZTCLinuxLog::all() const {
+    std::string lText;
+    for (const std::string& lrLine : lines()) {
+        lText += lrLine + "\n";
+    }
+    return lText;
+}

@@ -1,0 +1,36 @@
+#include "libkpm/linux/src/KindSources.h"
+
+#include <gtest/gtest.h>
+
+#include <set>
+#include <string>
+
+TEST(KindSources, EveryRowNamesAKind) {
+    std::set<std::string_view> lNames;
+    for (const ZTSScopeEventKind& lrKind : gcScopeEventKinds) {
+        lNames.insert(lrKind.mpName);
+    }
+    for (const ZTSLinuxKindSource& lrRow : gcLinuxKindSources) {
+        EXPECT_TRUE(lNames.contains(lrRow.mName)) << lrRow.mName;
+        EXPECT_NE(lrRow.mSource, ZTLSO_None);
+    }
+}
+
+TEST(KindSources, FourteenKindsHaveNoSource) {
+    std::size_t lNone = 0;
+    for (std::size_t lKind = 0; lKind < gcLinuxKindCount; ++lKind) {
+        lNone += getLinuxSource(lKind) == ZTLSO_None ? 1 : 0;
+    }
+    EXPECT_EQ(lNone, 14u);
+}
+
+TEST(KindSources, KindsAreFoundByTheirRegistration) {
+    EXPECT_EQ(findLinuxKind(4, 1), gcLinuxQueueFull);
+    EXPECT_EQ(findLinuxKind(4, 2), gcLinuxDeviceBusy);
+    EXPECT_EQ(findLinuxKind(4, 4), gcLinuxCheckCondition);
+    EXPECT_EQ(findLinuxKind(16, 1), gcLinuxAdapterArrival);
+    EXPECT_EQ(findLinuxKind(0, 1), gcLinuxLink);
+    EXPECT_EQ(findLinuxKind(0, 2), gcLinuxRscn);
+    EXPECT_FALSE(findLinuxKind(1, 0x20).has_value());
+    EXPECT_FALSE(findLinuxKind(0x104, 1).has_value());
+}

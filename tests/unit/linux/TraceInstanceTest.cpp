@@ -1,0 +1,168 @@
+#include "libkpm/linux/src/TraceInstance.h"
+
+#include <gtest/gtest.h>
+#include <unistd.h>
+
+#include <cerrno>
+#include <filesystem>
+#include <string>
+
+#include "tests/support/Waiting.h"
+#include "tests/unit/linux/FakeKernel.h"
+
+class TraceInstance : public testing::Test {
+protected:
+    std::unique_ptr<ZTCTraceInstance> open() {
+        mProblem.clear();
+        return ZTCTraceInstance::open(mKernel.tracefs(), mKernel, mProblem);
+    }
+
+    /// Expects that it cannot be opened, for this reason, and that nothing is left.
+    void expectProblem(const std::string& acrText) {
+        EXPECT_EQ(open(), nullptr);
+        EXPECT_NE(mProblem.find(acrText), std::string::npos) << mProblem;
+        EXPECT_TRUE(mKernel.instances().empty());
+    }
+
+    std::string event(const char* apFile) {
+        return mKernel.instanceFile(std::string("events/scsi/scsi_dispatch_cmd_done/") + apFile);
+    }
+
+    ZTCLinuxLog mLog;
+    ZTCFakeKernel mKernel;
+    std::string mProblem;
+};
+
+TEST_F(TraceInstance, IsMadeUnderANameOfThisProcessAndRemovedWithItsOwner) {
+    {
+        const auto lpInstance = open();
+        ASSERT_NE(lpInstance, nullptr) << mProblem;
+        EXPECT_EQ(mKernel.instances(), std::vector<std::string>{makeTraceInstanceName()});
+        EXPECT_TRUE(makeTraceInstanceName().starts_with("libkpm-linux-" + std::to_string(::getpid()) + "-"));
+        EXPECT_EQ(lpInstance->getBufferCount(), 2u);
+        EXPECT_TRUE(lpInstance->wakesAtOnce());
+        EXPECT_EQ(mKernel.instanceFile("buffer_size_kb"), "256");
+        EXPECT_EQ(mKernel.instanceFile("buffer_percent"), "0");
+        EXPECT_EQ(event("enable"), "0") << "nothing is recorded yet";
+    }
+    EXPECT_TRUE(mKernel.instances().empty());
+    EXPECT_EQ(mLog.all(), "");
+}
+
+TEST_F(TraceInstance, RecordsTheHostsItIsToldOfAndNoneWithoutAny) {
+    const auto lpInstance = open();
+    ASSERT_NE(lpInstance, nullptr) << mProblem;
+    EXPECT_TRUE(lpInstance->watchHosts({1, 3}, mProblem));
+    EXPECT_EQ(event("filter"), makeScsiFilter({1, 3}));
+    EXPECT_EQ(event("enable"), "1");
+    EXPECT_TRUE(lpInstance->watchHosts({}, mProblem));
+    EXPECT_EQ(event("enable"), "0");
+}
+
+TEST_F(TraceInstance, AFilterThatTheKernelRefusesLeavesTheEventOff) {
+    mKernel.mHasFilter = false;
+    const auto lpInstance = open();
+    ASSERT_NE(lpInstance, nullptr) << mProblem;
+    EXPECT_FALSE(lpInstance->watchHosts({1}, mProblem));
+    EXPECT_EQ(mProblem, "the trace event scsi_dispatch_cmd_done cannot be switched on: Is a directory");
+    EXPECT_EQ(event("enable"), "0");
+}
+
+TEST_F(TraceInstance, PagesAreReadWithoutWaiting) {
+    const auto lpInstance = open();
+    ASSERT_NE(lpInstance, nullptr) << mProblem;
+    ZTCBytes lPage(4096);
+    std::size_t lSize = 0;
+    EXPECT_EQ(lpInstance->read(0, lPage, lSize), ZTTR_Empty);
+    const ZTCBytes lSent = ZTCPageBuilder().addShort({1, 2, 3, 4}).make();
+    mKernel.sendPage(lSent, 0);
+    mKernel.sendPage(lSent, 1);
+    for (std::size_t lBuffer = 0; lBuffer < 2; ++lBuffer) {
+        EXPECT_EQ(lpInstance->read(lBuffer, lPage, lSize), ZTTR_Page);
+        EXPECT_EQ(lSize, 4096u);
+        EXPECT_EQ(lPage, lSent);
+        EXPECT_EQ(lpInstance->read(lBuffer, lPage, lSize), ZTTR_Empty);
+    }
+}
+
+TEST_F(TraceInstance, LossesAreToldOnceAndACountThatGoesBackBeginsAnew) {
+    mKernel.mProcessors = 1;
+    const auto lpInstance = open();
+    ASSERT_NE(lpInstance, nullptr) << mProblem;
+    const std::string lStats = mKernel.instance() + "/per_cpu/cpu0/stats";
+    EXPECT_EQ(lpInstance->takeLosses(0), 0u);
+    writeFile(lStats, "overrun: 7\ncommit overrun: 1\ndropped events: 2\n");
+    EXPECT_EQ(lpInstance->takeLosses(0), 10u);
+    EXPECT_EQ(lpInstance->takeLosses(0), 0u);
+    writeFile(lStats, "overrun: 12\ncommit overrun: 1\ndropped events: 2\n");
+    EXPECT_EQ(lpInstance->takeLosses(0), 5u);
+    writeFile(lStats, "overrun: 3\n");
+    EXPECT_EQ(lpInstance->takeLosses(0), 0u);
+    writeFile(lStats, "overrun: 4\n");
+    EXPECT_EQ(lpInstance->takeLosses(0), 1u);
+    writeFile(lStats, "overrun: 18446744073709551615\n");
+    EXPECT_FALSE(lpInstance->takeLosses(0).has_value());
+    std::filesystem::remove(lStats);
+    EXPECT_FALSE(lpInstance->takeLosses(0).has_value());
+}
+
+TEST_F(TraceInstance, WithoutTracefsTheReasonSaysHowToMountIt) {
+    std::filesystem::remove_all(mKernel.tracefs());
+    EXPECT_EQ(open(), nullptr);
+    EXPECT_EQ(mProblem, "there is no tracefs at " + mKernel.tracefs() +
+                            ": No such file or directory; mount it with: mount -t tracefs nodev /sys/kernel/tracing");
+}
+
+TEST_F(TraceInstance, WithoutTheRightTheReasonSaysHowToGetIt) {
+    mKernel.mMakeError = EACCES;
+    expectProblem("cannot be made: Permission denied; run the agent as root, or mount tracefs with a group");
+}
+
+TEST_F(TraceInstance, AnUnknownKernelsDescriptionsAreRefusedByName) {
+    mKernel.mFormat.erase(mKernel.mFormat.find("\tfield:int result"), 55);
+    expectProblem("the trace event scsi_dispatch_cmd_done cannot be used: the format has no field result");
+    mKernel.mFormat = "";
+    expectProblem("events/scsi/scsi_dispatch_cmd_done/format cannot be read");
+    mKernel.mFormat = std::string(100000, 'x');
+    expectProblem("events/scsi/scsi_dispatch_cmd_done/format cannot be read");
+    mKernel.mFormat = doneFormat();
+    mKernel.mHeaderPage = "nothing\n";
+    expectProblem("trace pages cannot be read: header_page has no field commit");
+    mKernel.mHeaderPage = "";
+    expectProblem("events/header_page cannot be read");
+    mKernel.mHeaderPage = headerPage();
+    mKernel.mProcessors = 0;
+    expectProblem("no trace buffer");
+}
+
+TEST_F(TraceInstance, TheDescriptionOfPagesMayStandAtTheRoot) {
+    mKernel.mHeaderPage = "";
+    std::filesystem::create_directories(mKernel.tracefs() + "/events");
+    writeFile(mKernel.tracefs() + "/events/header_page", headerPage());
+    EXPECT_NE(open(), nullptr) << mProblem;
+}
+
+TEST_F(TraceInstance, WhatKilledRunsHaveLeftIsRemovedAndNothingElse) {
+    // No process has such a number; and this one was not started at that time.
+    const std::string lDead = "libkpm-linux-999999999-1";
+    const std::string lOther = "libkpm-linux-" + std::to_string(::getpid()) + "-1";
+    for (const std::string& lrName : {lDead, lOther, std::string("libkpm-linux-x-1"), std::string("libkpm-linux-1"),
+                                      std::string("someone"), makeTraceInstanceName()}) {
+        std::filesystem::create_directories(mKernel.tracefs() + "/instances/" + lrName + "/events");
+    }
+    const auto lpInstance = open();
+    ASSERT_NE(lpInstance, nullptr) << mProblem;
+    std::vector<std::string> lLeft = mKernel.instances();
+    std::sort(lLeft.begin(), lLeft.end());
+    EXPECT_EQ(lLeft,
+              (std::vector<std::string>{"libkpm-linux-1", makeTraceInstanceName(), "libkpm-linux-x-1", "someone"}));
+    EXPECT_EQ(mLog.count("3 removed the trace instance " + lDead + ", which a killed run has left"), 1u);
+}
+
+TEST_F(TraceInstance, ALivingProcesssInstanceIsNoLeftOver) {
+    EXPECT_FALSE(isTraceInstanceLeftOver(makeTraceInstanceName()));
+    EXPECT_FALSE(isTraceInstanceLeftOver("libkpm-linux-"));
+    EXPECT_FALSE(isTraceInstanceLeftOver("libkpm-linux-1-"));
+    EXPECT_FALSE(isTraceInstanceLeftOver("libkpm-linux--1"));
+    EXPECT_FALSE(isTraceInstanceLeftOver("libkpm-linux-../1-1"));
+}
