@@ -72,7 +72,7 @@ bool isTraceInstanceLeftOver(const std::string& acrName) {
 static std::string sExplain(const std::string& acrWhat, int aError) {
     std::string lText = acrWhat + ": " + std::strerror(aError);
     if (aError == EACCES || aError == EPERM) {
-        lText += "; run the agent as root, or mount tracefs with a group that it is in (gid= and mode=0770)";
+        lText += "; run the agent as root, or with CAP_DAC_OVERRIDE";
     } else if (aError == ENOENT) {
         lText += "; mount it with: mount -t tracefs nodev /sys/kernel/tracing";
     }
@@ -227,7 +227,7 @@ bool ZTCTraceInstance::watchHosts(const std::vector<std::uint32_t>& acrHosts, st
         return true;
     }
     write(lEnable, "0");
-    arProblem = "the trace event scsi_dispatch_cmd_done cannot be switched on: " + std::string(std::strerror(lError));
+    arProblem = sExplain("the trace event scsi_dispatch_cmd_done cannot be switched on", lError);
     return false;
 }
 

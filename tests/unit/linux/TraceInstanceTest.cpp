@@ -115,7 +115,7 @@ TEST_F(TraceInstance, WithoutTracefsTheReasonSaysHowToMountIt) {
 
 TEST_F(TraceInstance, WithoutTheRightTheReasonSaysHowToGetIt) {
     mKernel.mMakeError = EACCES;
-    expectProblem("cannot be made: Permission denied; run the agent as root, or mount tracefs with a group");
+    expectProblem("cannot be made: Permission denied; run the agent as root, or with CAP_DAC_OVERRIDE");
 }
 
 TEST_F(TraceInstance, AnUnknownKernelsDescriptionsAreRefusedByName) {
