@@ -1,5 +1,308 @@
+# The checks: each is a function check_NAME with what it shows behind it, and gets an agent that collects. They write one line an
+# expectation to the second serial port: ok or FAIL, the check, what was looked at, what was expected, what came.
 . /vm/fabric.sh
-fabric_up
-cat /proc/uptime
-for f in /sys/class/fc_host/host*/port_* /sys/class/fc_remote_ports/*/port_*; do echo $f $(cat $f); done
-ls -l /sys/class/scsi_device /sys/class/scsi_generic
+. /vm/agent.sh
+exec 3>/dev/ttyS1
+gBad=0
+
+report() { printf '%s\t%s\t%s\t%s\t%s\n' "$@" >&3; }
+
+# expect_text WHAT EXPECTED GOT
+expect_text() {
+  if [ "$2" = "$3" ]; then
+    report ok "$gCheck" "$@"
+  else
+    report FAIL "$gCheck" "$@"
+    gBad=1
+  fi
+}
+
+# expect WHAT EXPECTED FILTER: collects until the filter over all records gives what is expected, ten seconds at most.
+gives() {
+  collect
+  gGot=$(query "$2")
+  [ "$gGot" = "$1" ]
+}
+expect() {
+  wait_until 10 gives "$2" "$3"
+  expect_text "$1" "$2" "$gGot"
+}
+# expect_still: the same after the library has looked at everything once more: no more came.
+expect_still() {
+  usleep 2500000
+  expect "$@"
+}
+
+# expect_logged WHAT EXPECTED TEXT: the log's lines with the text.
+is_logged() { [ "$(logged "$2")" = "$1" ]; }
+expect_logged() {
+  wait_until 5 is_logged "$2" "$3"
+  expect_text "$1" "$2" "$(logged "$3")"
+}
+
+check_adapters() { # every FC host is a board, in the order of host numbers, with its names
+  expect_text "names at discovery" \
+    "<$(colons $gInitiatorNode), $(colons $gInitiatorName)> <$(colons $gTargetNode), $(colons $gTargetName)>" \
+    "$(echo $(logged 'Discovered QRV initiator' | sed 's/.*initiator //'))"
+  collect
+  expect_text "boards in an answer" "$(colons $gInitiatorName) $(colons $gTargetName)" \
+    "$(echo $(jq -r '.lists[].initiator.portName' $gRecords))"
+  expect_text "what the kernel cannot tell is said" \
+    "plogi prlo adisc lsrjt logo fabric-busy port-busy fcp-read-check lun-reset target-reset bus-reset queue-depth port-interrupt temperature" \
+    "$(echo $(logged 'cannot deliver' | sed 's/.*deliver: //; s/,//g'))"
+}
+
+check_link() { # a link that goes down and up is two link events of each end
+  set_link veth0 down
+  expect "down, initiator's end" 1 "$(total link)"
+  expect "down, target's end" 1 "$(total link $gTargetName)"
+  set_link veth0 up
+  expect "up, initiator's end" 2 "$(total link)"
+  expect_still "up, target's end" 2 "$(total link $gTargetName)"
+  expect "remote ports of link records" "" '[.[] | select(.kind == "link").remotePort | values | .portName] | join(" ")'
+  wait_until 20 target_is Online
+}
+
+check_lip() { # a reset of the link's loop is no link event, and the ports see each other again
+  issue_lip
+  wait_until 20 target_is Online
+  expect_text "the target" Online "$(cat "$(target_port)/port_state")"
+  expect_still "link events, even" 0 "($(total link)) % 2"
+}
+
+# The check conditions of one (key, asc), as one word.
+outcome() {
+  echo "[.[] | select(.kind == \"check-condition\" and $1) | \"\\(.remotePort.portName) n=\\(.occurrences) key=\\(.data.senseKey) \
+asc=\\(.data.asc) luns=\\(.data.luns) opcodes=\\(.data.commandCodes) ascqs=\\(.data.ascqs)\"] | join(\"; \")" | tr -s ' '
+}
+
+# Whether there is a failed READ(10) of that LUN: other commands fail while devices are looked for.
+reads_fail() { echo "any(.[]; .kind == \"check-condition\" and (.data.luns | index($1)) and (.data.commandCodes | index(40)))"; }
+
+check_sense() { # check conditions with LUN, operation code and sense data; where the kernel has none, the sense is unknown
+  local lPort
+  lPort=$(colons $gTargetName)
+  past_end 0
+  expect "a read past the end" "$lPort n=1 $(sense 5 33) luns=[0] opcodes=[40] $(ascqs 0)" "$(outcome true)"
+  : >$gRecords
+  unknown_command 1
+  expect "an unknown command" "$lPort n=1 $(sense 5 32) luns=[1] opcodes=[238] $(ascqs 0)" "$(outcome true)"
+  : >$gRecords
+  answered 2 0 02 06 29 03
+  answered 2 0 02 06 29 07
+  expect "two unit attentions" "$lPort n=2 $(sense 6 41) luns=[2] opcodes=[40] $(ascqs 3,7)" "$(outcome true)"
+}
+has_sense() { grep -q sense_key $gTracing/events/scsi/scsi_dispatch_cmd_done/format; }
+sense() { has_sense && echo "key=$1 asc=$2" || echo "key=4294967295 asc=4294967295"; }
+ascqs() { has_sense && echo "ascqs=[$1]" || echo "ascqs=[]"; }
+
+check_busy() { # busy and task set full are counted, each time they are answered
+  answered 2 3 08
+  expect "busy" 3 "$(total device-busy)"
+  answered 2 4 28
+  expect "task set full" 4 "$(total queue-full)"
+  expect_still "LUNs" "[2]" '[.[].data.luns | tostring] | unique | join(" ")'
+}
+
+check_high_lun() { # a LUN beyond the bits of a record
+  past_end 300
+  expect "an event of LUN 300" "n=1 luns=[]" '[.[] | "n=\(.occurrences) luns=\(.data.luns)"] | join("; ")'
+}
+
+check_rscn() { # what a driver posts of the fabric comes as RSCN pages
+  post_event $gInitiator 5 1 03020100
+  expect "a port's page" "66051 port" '[.[] | select(.kind == "rscn") | "\(.data.page) \(.data.addressFormatName)"] | join("; ")'
+  : >$gRecords
+  post_event $gTarget 5 2 00000003
+  expect "the fabric's page, twice, of the other board" "2 50331648 fabric $(colons $gTargetName)" \
+    '[.[] | select(.kind == "rscn") | "\(.occurrences) \(.data.page) \(.data.addressFormatName) \(.board)"] | join("; ")'
+}
+
+check_messages() { # link messages between two looks are counted; what no driver sent is dropped, and said
+  post_event $gInitiator 3 1 00000000
+  post_event $gInitiator 2 1 00000000
+  expect_still "down and up while the link is seen up" 2 "$(total link)"
+  post_event $gInitiator 501 1 16000000000000240002000100000000200002000000000210000200000000010003000000000001
+  post_event $gInitiator ffff 1 0102030405060708
+  fc-capture forge 3
+  expect_logged "a forged message" "-W- 1 FC messages are dropped: the kernel did not send them (1 since the start)" dropped
+  expect_still "no event of all these" 2 "$(total link) + ([.[] | select(.kind != \"link\")] | length)"
+}
+
+# sums_up KIND LOSS EXPECTED: what came of that kind, and what the log says was lost, add up.
+sums_up() {
+  collect
+  gGot=$(query "$(total $1)")
+  gLost=$(lost "$2")
+  [ $((gGot + gLost)) -ge $3 ]
+}
+# expect_sum KIND LOSS EXPECTED
+expect_sum() {
+  wait_until 15 sums_up "$@"
+  expect_text "$1: what came and what is said to be lost, together ($gGot, $gLost)" $3 $((gGot + gLost))
+}
+
+check_message_storm() { # a storm of messages that the agent reads comes whole; of one that it cannot read, each loss is counted
+  post_event $gInitiator 5 2000 03020100
+  expect_sum rscn 'were passed over' 2000
+  kill -STOP $gAgent
+  post_event $gInitiator 5 30000 03020100
+  kill -CONT $gAgent
+  # A gap shows with the next message that is received, and while the agent catches up there is no room for one.
+  local lPosted=0
+  wait_until 15 next_arrives
+  expect_sum rscn 'were passed over' $((32000 + lPosted - 1))
+  expect_text "something was lost" yes "$([ $gLost -gt 0 ] && echo yes)"
+  expect_text "the socket's overrun is said" yes "$([ "$(lost 'overran')" -gt 0 ] && echo yes)"
+}
+next_arrives() {
+  post_event $gTarget 5 1 03020100
+  lPosted=$((lPosted + 1))
+  collect
+  [ "$(query "$(total rscn $gTargetName)")" = 1 ]
+}
+
+check_command_storm() { # a storm of failing commands is counted whole; where the trace buffers overrun, each loss is counted
+  scsi-repeat $(sg_of 1) 300 28 00 0f ff ff ff 00 00 01 00
+  expect_sum check-condition 'SCSI outcomes are lost' 300
+  kill -STOP $gAgent
+  echo 8 >$(echo $gTracing/instances/*)/buffer_size_kb
+  scsi-repeat $(sg_of 1) 700 28 00 0f ff ff ff 00 00 01 00
+  kill -CONT $gAgent
+  expect_sum check-condition 'SCSI outcomes are lost' 1000
+  expect_text "something was lost" yes "$([ $gLost -gt 0 ] && echo yes)"
+}
+
+check_unmapped() { # a LUN that is taken away answers with check conditions of its own LUN
+  lun_unmap 1
+  unknown_command 1
+  unknown_command 1
+  expect "after the unit attention" "$(sense 5 37)" \
+    '[.[] | select(.kind == "check-condition" and .data.luns == [1])] | last | "key=\(.data.senseKey) asc=\(.data.asc)"'
+  lun_map 1 rd_mcp_1/memory
+  unknown_command 1
+}
+
+check_gone() { # a host that is removed is a link event; one of the same name that comes has its board again
+  echo veth0 >/sys/bus/fcoe/ctlr_destroy
+  expect "gone" 1 "$(total link)"
+  port_create veth0
+  wait_until 20 host_of $gInitiatorName
+  gInitiator=$(host_of $gInitiatorName)
+  expect "back: every board hears of it" "1 1" "[($(total adapter-arrival)), ($(total adapter-arrival $gTargetName)) | tostring] | join(\" \")"
+  wait_until 20 sg_of 1
+  : >$gRecords
+  past_end 1
+  post_event $gInitiator 5 1 03020100
+  expect "its SCSI outcomes" true "$(reads_fail 1)"
+  expect "its messages" 1 "$(total rscn)"
+}
+
+check_device_loss() { # a remote port that was given up and comes back is known by its name again
+  echo 2 >"$(target_port)/dev_loss_tmo"
+  set_link veth0 down
+  wait_until 10 target_is 'Not Present'
+  expect_text "the target" "Not Present" "$(cat "$(target_port)/port_state")"
+  set_link veth0 up
+  wait_until 20 target_is Online
+  wait_until 20 sg_of 1
+  past_end 1
+  expect "a failed command" true "$(reads_fail 1)"
+  expect "the port of all check conditions" "$(colons $gTargetName)" \
+    '[.[] | select(.kind == "check-condition").data.portName] | unique | join(" ")'
+}
+
+check_vport() { # a virtual port that is made while the agent runs has arrived
+  echo 20000200000000aa:10000200000000aa >/sys/class/fc_host/host$gInitiator/vport_create
+  wait_until 5 host_of 20000200000000aa
+  expect "every board hears of it" "1 1" "[($(total adapter-arrival)), ($(total adapter-arrival $gTargetName)) | tostring] | join(\" \")"
+  echo 20000200000000aa:10000200000000aa >/sys/class/fc_host/host$gInitiator/vport_delete
+  expect_logged "and when it goes" "-N- board 2: its host is gone" "its host is gone"
+}
+
+check_killed() { # what a killed agent leaves in tracefs, the next one removes
+  local lFirst
+  lFirst=$(ls $gTracing/instances)
+  expect_text "an instance of its own" 1 "$(instances)"
+  kill -9 $gAgent
+  wait $gAgent 2>/dev/null
+  expect_text "left by the killed one" "$lFirst" "$(ls $gTracing/instances)"
+  start_agent
+  expect_text "one instance, another one" "1 0" "$(instances) $(ls $gTracing/instances | grep -c "^$lFirst\$")"
+  past_end 0
+  expect "the next one delivers" 1 "$(total check-condition)"
+}
+
+check_no_tracefs() { # without tracefs there are no SCSI outcomes, the log says why, and messages come
+  stop_agent
+  umount $gTracing
+  umount /sys/kernel/debug
+  start_agent
+  expect_logged "why" "-W- no SCSI outcomes: there is no tracefs at $gTracing: No such file or directory; \
+mount it with: mount -t tracefs nodev $gTracing" "no SCSI outcomes"
+  post_event $gInitiator 5 1 03020100
+  expect "messages" 1 "$(total rscn)"
+  mount -t tracefs tracefs $gTracing
+  mount -t debugfs debugfs /sys/kernel/debug
+}
+
+check_read_only_tracefs() { # with a tracefs that cannot be changed it is the same
+  stop_agent
+  mount -o remount,ro $gTracing
+  start_agent
+  expect_text "why" "cannot be made: Read-only file system" "$(logged 'no SCSI outcomes' | sed 's/.*cannot be/cannot be/')"
+  post_event $gInitiator 5 1 03020100
+  expect "messages" 1 "$(total rscn)"
+  mount -o remount,rw $gTracing
+}
+
+check_no_network_rights() { # without the right to listen there are no messages, the log says why, and SCSI outcomes come
+  stop_agent
+  start_agent /vm/bin/setpriv --bounding-set -net_admin --inh-caps -net_admin
+  expect_logged "why" "-W- no RSCNs, and link states only every 2000 ms: FC events cannot be subscribed to: Operation not permitted; \
+run the agent with CAP_NET_ADMIN in the first network namespace" "no RSCNs"
+  past_end 0
+  expect "SCSI outcomes" 1 "$(total check-condition)"
+}
+
+check_nobody() { # a user without rights has links, by polling
+  stop_agent
+  start_agent /vm/bin/setpriv --reuid 65534 --clear-groups --inh-caps -all
+  expect_logged "why there are no outcomes" "-W- no SCSI outcomes: there is no tracefs at $gTracing: Permission denied; \
+run the agent as root, or mount tracefs with a group that it is in (gid= and mode=0770)" "no SCSI outcomes"
+  expect_text "that there are no messages" 1 "$(logged 'no RSCNs' | wc -l)"
+  set_link veth0 down
+  expect "link down" 1 "$(total link)"
+  set_link veth0 up
+  expect "and up" 2 "$(total link)"
+  wait_until 20 target_is Online
+}
+
+check_lockdown() { # where the kernel is locked down there are no SCSI outcomes, and messages come; this has no way back
+  stop_agent
+  post_event $gInitiator 5 1 03020100
+  mount -t securityfs securityfs /sys/kernel/security
+  echo confidentiality >/sys/kernel/security/lockdown
+  start_agent
+  expect_text "that there are no outcomes" 1 "$(logged 'no SCSI outcomes' | wc -l)"
+  post_event $gInitiator 5 1 03020100
+  expect "messages" 1 "$(total rscn)"
+}
+
+fabric_up || exit 1
+gCheck=fabric
+lAll=$(sed -n 's/^check_\([a-z_]*\)().*/\1/p' /vm/checks.sh)
+for gCheck in $(echo "${gOnly:-$lAll}" | tr , ' '); do
+  lBegin=$(cut -d. -f1 /proc/uptime)
+  if start_agent; then
+    check_$gCheck >/dev/null
+    stop_agent
+    expect_text "the agent's end: status, trace instances" "0 0" "$gAgentStatus $(instances)"
+    gAgent=
+  else
+    expect_text "the agent's start" started "$(tail -n 1 $gLog)"
+  fi
+  cp $gLog /out/$gCheck.log
+  report time "$gCheck" "$(($(cut -d. -f1 /proc/uptime) - lBegin)) s"
+done
+exit $gBad

@@ -119,6 +119,13 @@ post_event() {
   echo "$*" >/sys/module/fc_post/parameters/post
 }
 
+# port_create CARD: an FC port over that card.
+port_create() {
+  echo $1 >/sys/bus/fcoe/ctlr_create
+  echo VN2VN >$(controller $1)/mode
+  echo 1 >$(controller $1)/enabled
+}
+
 # fabric_up: sets gInitiator and gTarget, the numbers of the two hosts.
 fabric_up() {
   local lCard
@@ -126,10 +133,9 @@ fabric_up() {
   /vm/bin/ip link add veth0 mtu 2500 address 02:00:00:00:00:01 type veth peer name veth1 mtu 2500 address 02:00:00:00:00:02
   set_link veth0 up
   set_link veth1 up
-  for lCard in veth0 veth1; do echo $lCard >/sys/bus/fcoe/ctlr_create; done
-  for lCard in veth0 veth1; do echo VN2VN >$(controller $lCard)/mode; done
   target_create
-  for lCard in veth0 veth1; do echo 1 >$(controller $lCard)/enabled; done
+  port_create veth0
+  port_create veth1
   wait_until 10 host_of $gInitiatorName >/dev/null && wait_until 10 host_of $gTargetName >/dev/null ||
     { echo "fabric: no FC hosts" >&2; return 1; }
   gInitiator=$(host_of $gInitiatorName)
