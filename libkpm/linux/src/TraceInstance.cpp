@@ -70,13 +70,9 @@ bool isTraceInstanceLeftOver(const std::string& acrName) {
 }
 
 static std::string sExplain(const std::string& acrWhat, int aError) {
-    std::string lText = acrWhat + ": " + std::strerror(aError);
-    if (aError == EACCES || aError == EPERM) {
-        lText += "; run the agent as root, or with CAP_DAC_OVERRIDE";
-    } else if (aError == ENOENT) {
-        lText += "; mount it with: mount -t tracefs nodev /sys/kernel/tracing";
-    }
-    return lText;
+    const bool lIsRight = aError == EACCES || aError == EPERM;
+    return acrWhat + ": " + std::strerror(aError) +
+           (lIsRight ? "; run the agent as root, or with CAP_DAC_OVERRIDE" : "");
 }
 
 /// Instances of killed runs; one that is in use after all (a process of another namespace) the kernel keeps.
@@ -99,7 +95,9 @@ std::unique_ptr<ZTCTraceInstance> ZTCTraceInstance::open(const std::string& acrR
                                                          std::string& arProblem) {
     const std::string lInstances = acrRoot + "/instances";
     if (::access(lInstances.c_str(), F_OK) != 0) {
+        const bool lIsMissing = errno == ENOENT;
         arProblem = sExplain("there is no tracefs at " + acrRoot, errno);
+        arProblem += lIsMissing ? "; mount it with: mount -t tracefs nodev /sys/kernel/tracing" : "";
         return nullptr;
     }
     sRemoveLeftOvers(lInstances, arDirectories);
