@@ -1,6 +1,5 @@
 #include "libkpm/linux/src/Engine.h"
 
-#include <poll.h>
 #include <pthread.h>
 #include <signal.h>
 #include <sys/eventfd.h>
@@ -189,22 +188,24 @@ void ZTCLinuxEngine::runRound() {
 
 /// Waits until a source is readable, a look is due, or the engine stops, and marks what is to be read.
 void ZTCLinuxEngine::waitForWork() {
-    std::vector<pollfd> lPolls{{mWake.get(), POLLIN, 0}};
+    // A member: with memory short, waiting must go on working.
+    mPolls.resize(2 + mBuffers.size());
+    mPolls[0] = {mWake.get(), POLLIN, 0};
     const bool lHasSocket = mpMessages != nullptr && !mIsSocketResting;
     // A negative descriptor is passed over.
-    lPolls.push_back({lHasSocket ? mpMessages->getDescriptor() : -1, POLLIN, 0});
+    mPolls[1] = {lHasSocket ? mpMessages->getDescriptor() : -1, POLLIN, 0};
     for (std::size_t lBuffer = 0; lBuffer < mBuffers.size(); ++lBuffer) {
-        lPolls.push_back({mBuffers[lBuffer].mIsResting ? -1 : mpTrace->getDescriptor(lBuffer), POLLIN, 0});
+        mPolls[lBuffer + 2] = {mBuffers[lBuffer].mIsResting ? -1 : mpTrace->getDescriptor(lBuffer), POLLIN, 0};
     }
     const auto lLeft = std::chrono::duration_cast<std::chrono::milliseconds>(mNextLook - Clock::now()).count() + 1;
-    ::poll(lPolls.data(), lPolls.size(),
+    ::poll(mPolls.data(), mPolls.size(),
            static_cast<int>(std::clamp<long long>(lLeft, 0, mOptions.mPollInterval.count() + 1)));
     const bool lIsLookDue = Clock::now() >= mNextLook;
-    mIsSocketReady = lPolls[1].revents != 0;
+    mIsSocketReady = mPolls[1].revents != 0;
     for (std::size_t lBuffer = 0; lBuffer < mBuffers.size(); ++lBuffer) {
         // Buffers that do not wake for a single record are read with every look.
         const bool lIsToBeTried = lIsLookDue && !mpTrace->wakesAtOnce();
-        mBuffers[lBuffer].mIsReady = lPolls[lBuffer + 2].revents != 0 || lIsToBeTried;
+        mBuffers[lBuffer].mIsReady = mPolls[lBuffer + 2].revents != 0 || lIsToBeTried;
     }
 }
 

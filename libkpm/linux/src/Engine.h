@@ -6,6 +6,8 @@
 #ifndef LIBKPM_LINUX_SRC_ENGINE_H
 #define LIBKPM_LINUX_SRC_ENGINE_H
 
+#include <poll.h>
+
 #include <atomic>
 #include <chrono>
 #include <cstdint>
@@ -148,6 +150,7 @@ private:
     std::unique_ptr<ZTCFcEventSource> mpMessages;
     std::unique_ptr<ZTCTraceInstance> mpTrace;
     std::vector<Buffer> mBuffers;
+    std::vector<pollfd> mPolls;
     std::vector<ZTCLinuxLinkState> mLinks;  // by board
     ZTCLinuxEventSequence mSequence;
     ZTCLinuxRemotePorts mRemotePorts;

@@ -29,7 +29,7 @@ struct ZTSTraceFormat {
 ZTSTraceFormat parseTraceFormat(std::string_view aText);
 
 /// No field of an event lies behind this, and no page is longer.
-inline constexpr std::size_t gcMostTraceOffset = 1024 * 1024;
+inline constexpr std::size_t gcMostTraceOffset = std::size_t{1024} * 1024;
 
 /// How a page of the ring buffer begins.
 struct ZTSTracePageLayout {

@@ -70,9 +70,11 @@ bool isTraceInstanceLeftOver(const std::string& acrName) {
 }
 
 static std::string sExplain(const std::string& acrWhat, int aError) {
-    const bool lIsRight = aError == EACCES || aError == EPERM;
-    return acrWhat + ": " + std::strerror(aError) +
-           (lIsRight ? "; run the agent as root, or with CAP_DAC_OVERRIDE" : "");
+    std::string lText = acrWhat + ": " + std::strerror(aError);
+    if (aError == EACCES || aError == EPERM) {
+        lText += "; run the agent as root, or with CAP_DAC_OVERRIDE";
+    }
+    return lText;
 }
 
 /// Instances of killed runs; one that is in use after all (a process of another namespace) the kernel keeps.
