@@ -241,6 +241,13 @@ TEST_F(ScopeDataRetrieval, EventsOfABoardThatHasComeBackAreDeliveredAgain) {
     EXPECT_EQ(std::vector<std::string>{textOf(kindNamed("PRLO"))}, retrieve().texts(1));
 }
 
+TEST_F(ScopeDataRetrieval, TheLibraryIsAskedWithoutTheRecordLockAndEventsThatComeMeanwhileAreDelivered) {
+    collect(2);
+    // Whoever holds the lock cannot take it again.
+    mLibrary.mBeforeCounted = [] { deliver(kindNamed("PRLO"), 1); };
+    EXPECT_EQ(std::vector<std::string>{textOf(kindNamed("PRLO"))}, retrieve().texts(1));
+}
+
 TEST_F(ScopeDataRetrieval, AFailedAllocationDeliversNothingTwice) {
     const ZTCPointer<ZTCBuffer> lRequest = makeBuffer({1});
     unsigned lFailures = 0;

@@ -209,7 +209,12 @@ TEST_F(TavikProtocolHandler, AStopReadsNothingOfItsRequest) {
 TEST_F(TavikProtocolHandler, AShutDownClosesTheLibraryAndLeavesItsResponseToTheExceptionsCatcher) {
     collect();
     ZTCPointer<ZTCBuffer> lResponse;
-    mLibrary.mBeforeClosed = [&] { EXPECT_FALSE(lResponse != nullptr) << "the library is closed first"; };
+    mLibrary.mBeforeClosed = [&] {
+        EXPECT_FALSE(lResponse != nullptr) << "the library is closed first";
+        // A callback that runs until then needs the record lock, which nobody who holds it can take again.
+        deliverTemperature(0);
+        EXPECT_TRUE(mSystem->hasPendingRecord());
+    };
     try {
         mSystem->getProtocolHandler()->process(makeBuffer({4}), lResponse);
         ADD_FAILURE() << "no exception";

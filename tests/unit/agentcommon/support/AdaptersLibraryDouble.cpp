@@ -102,6 +102,9 @@ std::uint32_t ZTCAdaptersLibraryDouble::getNumberOfAdapters() {
     if (mNotesCounting) {
         mCalls.emplace_back("GetNumberOfAdapters");
     }
+    if (mBeforeCounted) {
+        mBeforeCounted();
+    }
     return mNumberOfAdapters;
 }
 

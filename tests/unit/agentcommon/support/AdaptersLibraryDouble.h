@@ -53,6 +53,7 @@ public:
     std::map<unsigned, std::uint32_t> mUnregisterStatuses;             ///< by handle
     std::function<void(const ZTCRegistrationKey&)> mBeforeRegistered;  ///< runs before a registration returns
     std::function<void()> mBeforeClosed;                               ///< runs before Close returns
+    std::function<void()> mBeforeCounted;                              ///< runs before GetNumberOfAdapters returns
 
     // ---- What the agent has done ----
     bool mNotesCounting = true;  ///< false: GetNumberOfAdapters is not noted, and so allocates nothing
