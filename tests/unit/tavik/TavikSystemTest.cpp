@@ -188,6 +188,17 @@ TEST_F(TavikSystem, InitWithoutASystemObjectEndsTheProcess) {
         testing::ExitedWithCode(1), failedAssertion("lpSystem != __null"));
 }
 
+TEST_F(TavikSystem, AnInstallDirectoryThatCannotBeLookedAtIsLeftToThoseWhoUseIt) {
+    // Without a library init ends right behind its look at the directory.
+    setenv("ZT_LIBKPM_PATH", "", 1);
+    for (const std::string& lcrDirectory : {std::string(), mDirectory.path("missing")}) {
+        setenv("ZT_QRV_SENSOR_DIR", lcrDirectory.c_str(), 1);
+        ZTCTestTavikSystem lSystem;
+        lSystem.preInit();
+        EXPECT_THROW(lSystem.init(), ZTCExitConditionEx) << '"' << lcrDirectory << '"';
+    }
+}
+
 TEST_F(TavikSystem, InitMakesTheFifosAndDestroyRemovesThem) {
     bringUp();
     EXPECT_TRUE(isFifo(commandFifoPath()));
