@@ -225,6 +225,12 @@ uint32_t sKpmUnregEvent(uint32_t aBoard, uint32_t aHandle) {
     return spLibrary->kpmUnregEvent(aBoard, aHandle);
 }
 
+std::atomic<KPM_LogFunction> spLog{nullptr};
+
+void sSetLog(KPM_LogFunction apLog) {
+    spLog = apLog;
+}
+
 HBA_wwn sToHba(const ZTCBytes& acrBytes) {
     HBA_wwn lName{};
     if (acrBytes.size() != sizeof(lName.wwn)) {
@@ -260,6 +266,7 @@ ZTCScriptedLibkpm::ZTCScriptedLibkpm() {
     mList.ZtapiUnregEvent = sZtapiUnregEvent;
     mList.KpmRegEvent = sKpmRegEvent;
     mList.KpmUnregEvent = sKpmUnregEvent;
+    mList.SetLog = sSetLog;
 
     std::string lLine;
     const int lFile = open(pathOf("scripted.conf").c_str(), O_RDONLY | O_CLOEXEC);
@@ -348,6 +355,11 @@ void ZTCScriptedLibkpm::configure(const std::string& acrLine) {
         mHeldFunctions.insert(lFunction);
     } else if (lKey == "hold-nothing") {
         mHeldFunctions.clear();
+    } else if (lKey == "log") {
+        const uint32_t lLevel = lNumber();
+        std::string lText;
+        std::getline(lLine >> std::ws, lText);
+        spLog.load()(lLevel, lText.c_str());
     } else if (!lKey.empty()) {
         throw std::runtime_error("no such configuration: " + lKey);
     }

@@ -26,6 +26,7 @@
 ///   until
 ///                                        letGo(), and is recorded as "FUNCTION held"
 ///   hold-nothing                         takes every such line back
+///   log L TEXT                           writes a line of level L to the agent's log; only while the library is open
 #ifndef TESTS_SUPPORT_SCRIPTEDLIBRARY_H
 #define TESTS_SUPPORT_SCRIPTEDLIBRARY_H
 

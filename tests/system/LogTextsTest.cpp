@@ -117,6 +117,9 @@ void sDriveALongLife(ZTCLogTextsSeen& arSeen) {
     EXPECT_EQ(0, lAgent.run(lAgent.defaultArguments()).mStatus) << "a second start";
     lAgent.registerTargets({{makeWwn(gcOtherNode), makeWwn(gcOtherPort), 0x010203}});
     lAgent.library().deliverAll(sOneOfEach(0));
+    for (const char* lpLevel : {"1", "2", "3", "4"}) {
+        lAgent.library().configure(std::string("log ") + lpLevel + " a line of the library's own");
+    }
     sDriveRegistration(lAgent);
     sDriveEvents(lAgent);
     sDriveAdapters(lAgent);
