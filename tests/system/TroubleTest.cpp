@@ -141,6 +141,7 @@ TEST(Trouble, ALimitOnFileSizesSendsLinesToStandardErrorAndTheyAreCounted) {
         [&] { lLimitTo(std::filesystem::file_size(lAgent.agentLogPath()) + 10); }, [&] { lLimitTo(RLIM_INFINITY); });
 }
 
+#ifndef __SANITIZE_THREAD__  // its runtime writes a file of its own, larger than any such limit, before main
 TEST(Trouble, ALimitOnFileSizesThatTakesNoPidFileEndsTheStartInOrder) {
     ZTCAgentProcess lAgent;
     rlimit lFormer{};
@@ -154,6 +155,7 @@ TEST(Trouble, ALimitOnFileSizesThatTakesNoPidFileEndsTheStartInOrder) {
     EXPECT_FALSE(exists(lAgent.pidFilePath()));
     sExpectNextStartServed(lAgent);
 }
+#endif
 
 TEST(Trouble, AFullFileSystemSendsLinesToStandardErrorAndTheyAreCounted) {
     ZTCAgentProcess lAgent;
