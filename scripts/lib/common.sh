@@ -11,7 +11,7 @@ gClientPackages=(libcli11-dev nlohmann-json3-dev)
 gTestPackages=(libgtest-dev libgmock-dev)
 gClangPackages=(clang libclang-rt-14-dev llvm)
 gStylePackages=(clang-format clang-tidy)
-gVmPackages=(qemu-system-x86 busybox-static kmod cpio xz-utils iproute2 jq sg3-utils)
+gVmPackages=(make qemu-system-x86 busybox-static kmod cpio xz-utils iproute2 jq sg3-utils)
 
 say() { printf '\n== %s\n' "$*"; }
 fail() {

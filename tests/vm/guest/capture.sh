@@ -71,11 +71,11 @@ link_lost_under_load() {
   link_cycle
   wait $!
 }
-link_cycle() { set_link veth0 down && wait_until 10 host_is $gInitiator Linkdown; }
+link_cycle() { set_link veth0 down && wait_until 60 host_is $gInitiator Linkdown; }
 link_back() {
   set_link veth0 up
-  wait_until 20 host_is $gInitiator Online
-  wait_until 20 target_is Online
+  wait_until 60 host_is $gInitiator Online
+  fabric_wait
 }
 several_outcomes() {
   past_end 0
@@ -124,7 +124,7 @@ fc-capture netlink /tmp/messages &
 lCapture=$!
 wait_until 5 [ -e /tmp/messages/index ]
 message lip issue_lip
-wait_until 20 target_is Online
+fabric_wait
 message post-link-up post_event $gInitiator 2 1 00000000
 message post-link-down post_event $gInitiator 3 1 00000000
 message post-rscn-port post_event $gInitiator 5 1 03020100

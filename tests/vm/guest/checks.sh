@@ -1,11 +1,12 @@
 # The checks: each is a function check_NAME with what it shows behind it, and gets an agent that collects. They write one line an
-# expectation to the second serial port: ok or FAIL, the check, what was looked at, what was expected, what came.
+# expectation to the second serial port: ok or FAIL, the check, what was looked at, what was expected, what came, with the
+# character 037 in between.
 . /vm/fabric.sh
 . /vm/agent.sh
 exec 3>/dev/ttyS1
 gBad=0
 
-report() { printf '%s\t%s\t%s\t%s\t%s\n' "$@" >&3; }
+report() { printf '%s\037%s\037%s\037%s\037%s\n' "$@" >&3; }
 
 # expect_text WHAT EXPECTED GOT
 expect_text() {
@@ -17,14 +18,14 @@ expect_text() {
   fi
 }
 
-# expect WHAT EXPECTED FILTER: collects until the filter over all records gives what is expected, ten seconds at most.
+# expect WHAT EXPECTED FILTER: collects until the filter over all records gives what is expected, twenty seconds at most.
 gives() {
   collect
   gGot=$(query "$2")
   [ "$gGot" = "$1" ]
 }
 expect() {
-  wait_until 10 gives "$2" "$3"
+  wait_until 20 gives "$2" "$3"
   expect_text "$1" "$2" "$gGot"
 }
 # expect_still: the same after the library has looked at everything once more: no more came.
@@ -36,8 +37,16 @@ expect_still() {
 # expect_logged WHAT EXPECTED TEXT: the log's lines with the text.
 is_logged() { [ "$(logged "$2")" = "$1" ]; }
 expect_logged() {
-  wait_until 5 is_logged "$2" "$3"
+  wait_until 20 is_logged "$2" "$3"
   expect_text "$1" "$2" "$(logged "$3")"
+}
+
+# The two ports see each other and the LUNs are there, as every check finds it.
+fabric_is_ready() { fabric_wait || expect_text "the ports and LUNs" "all there" "not within a minute"; }
+
+# expect_reason WHAT TEXT: the log says TEXT as a warning, and behind a semicolon perhaps what would help.
+expect_reason() {
+  expect_text "$1" "-W- $2" "$(logged "${2%%:*}" | sed "s#$gTracing/instances/[^ ]*#PATH#; s/;.*//")"
 }
 
 check_adapters() { # every FC host is a board, in the order of host numbers, with its names
@@ -60,12 +69,24 @@ check_link() { # a link that goes down and up is two link events of each end
   expect "up, initiator's end" 2 "$(total link)"
   expect_still "up, target's end" 2 "$(total link $gTargetName)"
   expect "remote ports of link records" "" '[.[] | select(.kind == "link").remotePort | values | .portName] | join(" ")'
-  wait_until 20 target_is Online
+  fabric_is_ready
+}
+
+check_flaps() { # a link that flaps faster than it can be looked at comes to rest with an even count, up
+  local lTimes=0
+  while [ $lTimes -lt 6 ]; do
+    set_link veth0 down
+    set_link veth0 up
+    lTimes=$((lTimes + 1))
+  done
+  fabric_is_ready
+  expect_still "link events, even" "0 0" "[($(total link)) % 2, ($(total link $gTargetName)) % 2 | tostring] | join(\" \")"
+  expect "some, and no more than there were" true "($(total link)) > 0 and ($(total link)) <= 12"
 }
 
 check_lip() { # a reset of the link's loop is no link event, and the ports see each other again
   issue_lip
-  wait_until 20 target_is Online
+  fabric_is_ready
   expect_text "the target" Online "$(cat "$(target_port)/port_state")"
   expect_still "link events, even" 0 "($(total link)) % 2"
 }
@@ -138,7 +159,7 @@ sums_up() {
 }
 # expect_sum KIND LOSS EXPECTED
 expect_sum() {
-  wait_until 15 sums_up "$@"
+  wait_until 20 sums_up "$@"
   expect_text "$1: what came and what is said to be lost, together ($gGot, $gLost)" $3 $((gGot + gLost))
 }
 
@@ -150,7 +171,7 @@ check_message_storm() { # a storm of messages that the agent reads comes whole; 
   kill -CONT $gAgent
   # A gap shows with the next message that is received, and while the agent catches up there is no room for one.
   local lPosted=0
-  wait_until 15 next_arrives
+  wait_until 20 next_arrives
   expect_sum rscn 'were passed over' $((32000 + lPosted - 1))
   expect_text "something was lost" yes "$([ $gLost -gt 0 ] && echo yes)"
   expect_text "the socket's overrun is said" yes "$([ "$(lost 'overran')" -gt 0 ] && echo yes)"
@@ -186,11 +207,14 @@ check_unmapped() { # a LUN that is taken away answers with check conditions of i
 check_gone() { # a host that is removed is a link event; one of the same name that comes has its board again
   echo veth0 >/sys/bus/fcoe/ctlr_destroy
   expect "gone" 1 "$(total link)"
+  # The other end notices too, which lets it find the new host without waiting for its own timers.
+  set_link veth0 down
+  set_link veth0 up
   port_create veth0
-  wait_until 20 host_of $gInitiatorName
+  wait_until 60 host_of $gInitiatorName
   gInitiator=$(host_of $gInitiatorName)
   expect "back: every board hears of it" "1 1" "[($(total adapter-arrival)), ($(total adapter-arrival $gTargetName)) | tostring] | join(\" \")"
-  wait_until 20 sg_of 1
+  fabric_is_ready
   : >$gRecords
   past_end 1
   post_event $gInitiator 5 1 03020100
@@ -201,11 +225,10 @@ check_gone() { # a host that is removed is a link event; one of the same name th
 check_device_loss() { # a remote port that was given up and comes back is known by its name again
   echo 2 >"$(target_port)/dev_loss_tmo"
   set_link veth0 down
-  wait_until 10 target_is 'Not Present'
+  wait_until 60 target_is 'Not Present'
   expect_text "the target" "Not Present" "$(cat "$(target_port)/port_state")"
   set_link veth0 up
-  wait_until 20 target_is Online
-  wait_until 20 sg_of 1
+  fabric_is_ready
   past_end 1
   expect "a failed command" true "$(reads_fail 1)"
   expect "the port of all check conditions" "$(colons $gTargetName)" \
@@ -214,10 +237,41 @@ check_device_loss() { # a remote port that was given up and comes back is known 
 
 check_vport() { # a virtual port that is made while the agent runs has arrived
   echo 20000200000000aa:10000200000000aa >/sys/class/fc_host/host$gInitiator/vport_create
-  wait_until 5 host_of 20000200000000aa
+  wait_until 60 host_of 20000200000000aa
   expect "every board hears of it" "1 1" "[($(total adapter-arrival)), ($(total adapter-arrival $gTargetName)) | tostring] | join(\" \")"
   echo 20000200000000aa:10000200000000aa >/sys/class/fc_host/host$gInitiator/vport_delete
   expect_logged "and when it goes" "-N- board 2: its host is gone" "its host is gone"
+}
+
+check_processor() { # outcomes on a processor that comes up while the agent runs are seen
+  stop_agent
+  echo 0 >/sys/devices/system/cpu/cpu1/online
+  start_agent
+  echo 1 >/sys/devices/system/cpu/cpu1/online
+  local lTimes=0
+  while [ $lTimes -lt 10 ]; do
+    taskset $((lTimes % 2 + 1)) scsi-repeat $(sg_of 1) 4 28 00 0f ff ff ff 00 00 01 00
+    lTimes=$((lTimes + 1))
+  done
+  expect "check conditions" 40 "$(total check-condition)"
+}
+
+check_two() { # two agents of one machine see the same and leave each other alone
+  local lFirst
+  lFirst=$(ls $gTracing/instances)
+  mkdir -m 0700 /tmp/second
+  (
+    export ZT_QRV_SENSOR_DIR=/tmp/second
+    qrv-tvk -D false -l /tmp/second/agent.log &
+    tavikctl start
+    past_end 0
+    wait_until 10 grep -q 'Processing CHECKCOND' /tmp/second/agent.log
+    tavikctl shutdown
+    wait
+  ) >/dev/null 2>&1
+  expect "the first sees it" 1 "$(total check-condition)"
+  expect_text "the second saw it" 1 "$(grep -c 'Processing CHECKCOND' /tmp/second/agent.log)"
+  expect_text "the first's instance" "$lFirst" "$(ls $gTracing/instances)"
 }
 
 check_killed() { # what a killed agent leaves in tracefs, the next one removes
@@ -233,13 +287,24 @@ check_killed() { # what a killed agent leaves in tracefs, the next one removes
   expect "the next one delivers" 1 "$(total check-condition)"
 }
 
+check_terminated() { # an agent that a signal ends leaves its trace instance switched off, and the next one removes it
+  local lFirst
+  lFirst=$gTracing/instances/$(ls $gTracing/instances)
+  expect_text "the trace event while it runs" 1 "$(cut -c1 "$lFirst/events/scsi/scsi_dispatch_cmd_done/enable")"
+  kill -TERM $gAgent
+  wait $gAgent
+  expect_text "its status" 0 $?
+  expect_text "the trace event after it" 0 "$(cut -c1 "$lFirst/events/scsi/scsi_dispatch_cmd_done/enable")"
+  start_agent
+  expect_text "left by the next one" "" "$(ls -d "$lFirst" 2>/dev/null)"
+}
+
 check_no_tracefs() { # without tracefs there are no SCSI outcomes, the log says why, and messages come
   stop_agent
   umount $gTracing
   umount /sys/kernel/debug
   start_agent
-  expect_logged "why" "-W- no SCSI outcomes: there is no tracefs at $gTracing: No such file or directory; \
-mount it with: mount -t tracefs nodev $gTracing" "no SCSI outcomes"
+  expect_reason "why" "no SCSI outcomes: there is no tracefs at $gTracing: No such file or directory"
   post_event $gInitiator 5 1 03020100
   expect "messages" 1 "$(total rscn)"
   mount -t tracefs tracefs $gTracing
@@ -250,7 +315,7 @@ check_read_only_tracefs() { # with a tracefs that cannot be changed it is the sa
   stop_agent
   mount -o remount,ro $gTracing
   start_agent
-  expect_text "why" "cannot be made: Read-only file system" "$(logged 'no SCSI outcomes' | sed 's/.*cannot be/cannot be/')"
+  expect_reason "why" "no SCSI outcomes: the trace instance PATH cannot be made: Read-only file system"
   post_event $gInitiator 5 1 03020100
   expect "messages" 1 "$(total rscn)"
   mount -o remount,rw $gTracing
@@ -259,8 +324,7 @@ check_read_only_tracefs() { # with a tracefs that cannot be changed it is the sa
 check_no_network_rights() { # without the right to listen there are no messages, the log says why, and SCSI outcomes come
   stop_agent
   start_agent /vm/bin/setpriv --bounding-set -net_admin --inh-caps -net_admin
-  expect_logged "why" "-W- no RSCNs, and link states only every 2000 ms: FC events cannot be subscribed to: Operation not permitted; \
-run the agent with CAP_NET_ADMIN in the first network namespace" "no RSCNs"
+  expect_reason "why" "no RSCNs, and link states only every 2000 ms: FC events cannot be subscribed to: Operation not permitted"
   past_end 0
   expect "SCSI outcomes" 1 "$(total check-condition)"
 }
@@ -268,14 +332,14 @@ run the agent with CAP_NET_ADMIN in the first network namespace" "no RSCNs"
 check_nobody() { # a user without rights has links, by polling
   stop_agent
   start_agent /vm/bin/setpriv --reuid 65534 --clear-groups --inh-caps -all
-  expect_logged "why there are no outcomes" "-W- no SCSI outcomes: there is no tracefs at $gTracing: Permission denied; \
-run the agent as root, or mount tracefs with a group that it is in (gid= and mode=0770)" "no SCSI outcomes"
-  expect_text "that there are no messages" 1 "$(logged 'no RSCNs' | wc -l)"
+  expect_reason "why there are no outcomes" "no SCSI outcomes: there is no tracefs at $gTracing: Permission denied"
+  expect_reason "why there are no messages" \
+    "no RSCNs, and link states only every 2000 ms: FC events cannot be subscribed to: Operation not permitted"
   set_link veth0 down
   expect "link down" 1 "$(total link)"
   set_link veth0 up
   expect "and up" 2 "$(total link)"
-  wait_until 20 target_is Online
+  fabric_is_ready
 }
 
 check_lockdown() { # where the kernel is locked down there are no SCSI outcomes, and messages come; this has no way back
@@ -284,7 +348,7 @@ check_lockdown() { # where the kernel is locked down there are no SCSI outcomes,
   mount -t securityfs securityfs /sys/kernel/security
   echo confidentiality >/sys/kernel/security/lockdown
   start_agent
-  expect_text "that there are no outcomes" 1 "$(logged 'no SCSI outcomes' | wc -l)"
+  expect_reason "why" "no SCSI outcomes: the trace instance PATH cannot be made: Invalid argument"
   post_event $gInitiator 5 1 03020100
   expect "messages" 1 "$(total rscn)"
 }

@@ -126,9 +126,15 @@ port_create() {
   echo 1 >$(controller $1)/enabled
 }
 
+# fabric_wait: until the initiator sees the target and its LUNs.
+fabric_wait() {
+  local lLun
+  wait_until 60 target_is Online || return 1
+  for lLun in 0 1 2 300; do wait_until 60 sg_of $lLun >/dev/null || return 1; done
+}
+
 # fabric_up: sets gInitiator and gTarget, the numbers of the two hosts.
 fabric_up() {
-  local lCard
   modprobe -a fcoe veth sd_mod sg
   /vm/bin/ip link add veth0 mtu 2500 address 02:00:00:00:00:01 type veth peer name veth1 mtu 2500 address 02:00:00:00:00:02
   set_link veth0 up
@@ -136,10 +142,6 @@ fabric_up() {
   target_create
   port_create veth0
   port_create veth1
-  wait_until 10 host_of $gInitiatorName >/dev/null && wait_until 10 host_of $gTargetName >/dev/null ||
-    { echo "fabric: no FC hosts" >&2; return 1; }
-  gInitiator=$(host_of $gInitiatorName)
-  gTarget=$(host_of $gTargetName)
-  wait_until 20 target_is Online || { echo "fabric: the target is not Online" >&2; return 1; }
-  wait_until 20 sg_of 300 >/dev/null || { echo "fabric: no LUN 300" >&2; return 1; }
+  gInitiator=$(wait_until 60 host_of $gInitiatorName) && gTarget=$(wait_until 60 host_of $gTargetName) && fabric_wait ||
+    { echo "fabric: the ports do not see each other" >&2; return 1; }
 }
