@@ -94,6 +94,7 @@ ZTSChildProcessSetup ZTCAgentProcess::setup(const std::vector<std::string>& acrA
     lSetup.mWorkingDirectory = workingDirectory();
     lSetup.mOutputPrefix = mDirectory.path(acrName);
     lSetup.mUmask = mUmask;
+    lSetup.mHasStandardStreams = mHasStandardStreams;
     return lSetup;
 }
 

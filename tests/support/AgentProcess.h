@@ -53,6 +53,7 @@ public:
     ZTCScriptedLibrary& library() { return mLibrary; }
     void setEnvironment(const std::string& acrName, const std::string& acrValue) { mEnvironment[acrName] = acrValue; }
     void unsetEnvironment(const std::string& acrName) { mEnvironment.erase(acrName); }
+    void setStandardStreams(bool aHasThem) { mHasStandardStreams = aHasThem; }
     void setUmask(mode_t aMask) { mUmask = aMask; }
 
     // ---- places ----
@@ -120,6 +121,7 @@ private:
     ZTCAgentLog mLog;
     std::map<std::string, std::string> mEnvironment;
     mode_t mUmask = 022;
+    bool mHasStandardStreams = true;
     unsigned mRuns = 0;
     std::unique_ptr<ZTCChildProcess> mProcess;
 };

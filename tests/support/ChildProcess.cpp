@@ -35,7 +35,7 @@ static std::vector<char*> sPointersTo(std::vector<std::string>& arTexts) {
     umask(acrSetup.mUmask);
     if (lNull >= 0 && lOut >= 0 && lErr >= 0 && dup2(lNull, 0) >= 0 && dup2(lOut, 1) >= 0 && dup2(lErr, 2) >= 0 &&
         chdir(acrSetup.mWorkingDirectory.c_str()) == 0) {
-        for (int lDescriptor = 3; lDescriptor < 256; ++lDescriptor) {
+        for (int lDescriptor = acrSetup.mHasStandardStreams ? 3 : 0; lDescriptor < 256; ++lDescriptor) {
             close(lDescriptor);
         }
         execve(acrSetup.mProgram.c_str(), appArguments, appEnvironment);

@@ -17,6 +17,7 @@ struct ZTSChildProcessSetup {
     std::string mWorkingDirectory;
     std::string mOutputPrefix;  ///< standard output goes to this + ".out", standard error to this + ".err"
     mode_t mUmask = 022;
+    bool mHasStandardStreams = true;  ///< false: the process starts without the descriptors 0 to 2
 };
 
 class ZTCChildProcess {

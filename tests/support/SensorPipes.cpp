@@ -29,7 +29,7 @@ ZTCSensorPipes::~ZTCSensorPipes() {
     close();
 }
 
-void ZTCSensorPipes::open() {
+void ZTCSensorPipes::lock() {
     if (mLock < 0) {
         const std::string lPath = mDirectory + "/qrv-sn.lock";
         mLock = ::open(lPath.c_str(), O_RDWR | O_CREAT | O_CLOEXEC, 0600);
@@ -37,8 +37,29 @@ void ZTCSensorPipes::open() {
             sFail("lock of " + lPath);
         }
     }
+}
+
+void ZTCSensorPipes::open() {
+    lock();
     openResponse();
     openCommand();
+}
+
+bool ZTCSensorPipes::openUnless(const std::function<bool()>& acrIsOver, const ZTCDeadline& acrDeadline) {
+    lock();
+    signal(SIGPIPE, SIG_IGN);
+    waitUntil(
+        [&] {
+            if (mResponse < 0) {
+                mResponse = ::open(responsePath().c_str(), O_RDONLY | O_NONBLOCK | O_CLOEXEC);
+            }
+            if (mResponse >= 0 && mCommand < 0) {
+                mCommand = ::open(commandPath().c_str(), O_WRONLY | O_NONBLOCK | O_CLOEXEC);
+            }
+            return mCommand >= 0 || acrIsOver();
+        },
+        "the FIFOs, or the end of waiting for them", acrDeadline);
+    return mCommand >= 0;
 }
 
 void ZTCSensorPipes::openResponse() {

@@ -5,6 +5,7 @@
 
 #include <cstddef>
 #include <cstdint>
+#include <functional>
 #include <optional>
 #include <string>
 
@@ -25,6 +26,8 @@ public:
     /// Takes the sensor's lock, waits until the agent has made the FIFOs and opens both, the response FIFO's reader
     /// first.
     void open();
+    /// The same, given up as soon as the condition holds: then it returns false.
+    bool openUnless(const std::function<bool()>& acrIsOver, const ZTCDeadline& acrDeadline = ZTCDeadline());
     void openResponse();
     void openCommand();
     void close();
@@ -57,6 +60,7 @@ public:
     static ZTCBytes frame(const ZTCBytes& acrBody);
 
 private:
+    void lock();
     std::optional<ZTCBytes> readBytes(std::size_t aCount, const ZTCDeadline& acrDeadline);
 
     std::string mDirectory;

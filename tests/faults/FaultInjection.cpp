@@ -1,0 +1,65 @@
+#include "tests/faults/FaultInjection.h"
+
+#include <fcntl.h>
+#include <sys/mman.h>
+#include <unistd.h>
+
+#include <cerrno>
+#include <cstring>
+#include <new>
+#include <stdexcept>
+
+ZTCFaultInjection::ZTCFaultInjection(ZTCAgentProcess& arAgent)
+    : mrAgent(arAgent), mPath(arAgent.agentLogPath() + ".faults") {
+    const int lFile = open(mPath.c_str(), O_RDWR | O_CREAT | O_EXCL | O_CLOEXEC, 0600);
+    void* lpMapped = MAP_FAILED;
+    if (lFile >= 0 && ftruncate(lFile, sizeof(ZTSFaultControl)) == 0) {
+        lpMapped = mmap(nullptr, sizeof(ZTSFaultControl), PROT_READ | PROT_WRITE, MAP_SHARED, lFile, 0);
+    }
+    const int lErrno = errno;
+    if (lFile >= 0) {
+        close(lFile);
+    }
+    if (lpMapped == MAP_FAILED) {
+        throw std::runtime_error("cannot map " + mPath + ": " + std::strerror(lErrno));
+    }
+    mpControl = new (lpMapped) ZTSFaultControl{};
+
+    // A sanitizer's library insists on being the first.
+    const std::string lRuntime = TAVIK_SANITIZER_RUNTIME;
+    arAgent.setEnvironment("LD_PRELOAD", lRuntime + (lRuntime.empty() ? "" : ":") + TAVIK_INTERPOSER);
+    attach();
+}
+
+ZTCFaultInjection::~ZTCFaultInjection() {
+    munmap(mpControl, sizeof(*mpControl));
+}
+
+void ZTCFaultInjection::attach() {
+    mrAgent.setEnvironment(gcFaultFileVariable, mPath);
+}
+
+void ZTCFaultInjection::detach() {
+    mrAgent.unsetEnvironment(gcFaultFileVariable);
+}
+
+void ZTCFaultInjection::arm(const ZTSFaultPlan& acrPlan) {
+    disarm();
+    if (acrPlan.mCall.size() >= sizeof(mpControl->mCall)) {
+        throw std::runtime_error("no call has so long a name: " + acrPlan.mCall);
+    }
+    std::memset(mpControl->mCall, 0, sizeof(mpControl->mCall));
+    acrPlan.mCall.copy(mpControl->mCall, acrPlan.mCall.size());
+    mpControl->mNth = acrPlan.mNth;
+    mpControl->mErrno = acrPlan.mErrno;
+    mpControl->mCount = acrPlan.mCount;
+    mpControl->mIsLasting = acrPlan.mIsLasting ? 1 : 0;
+    mpControl->mCalls.store(0);
+    mpControl->mFired.store(0);
+    mpControl->mPlace.store(0);
+    mpControl->mIsArmed.store(1);
+}
+
+bool ZTCFaultInjection::isForAllocations() {
+    return std::string(TAVIK_SANITIZER_RUNTIME).empty();
+}

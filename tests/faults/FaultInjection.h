@@ -1,0 +1,53 @@
+/// Makes one of the agent's operating-system calls fail. Made before the agent starts: it puts the interposed calls in.
+#ifndef TESTS_FAULTS_FAULTINJECTION_H
+#define TESTS_FAULTS_FAULTINJECTION_H
+
+#include <cstdint>
+#include <string>
+
+#include "tests/faults/FaultControl.h"
+#include "tests/support/AgentProcess.h"
+
+/// What is to fail, and how.
+struct ZTSFaultPlan {
+    std::string mCall;        ///< its name, or gcAllocationCall
+    unsigned mNth = 1;        ///< which one from the arming on, from 1
+    int mErrno = 0;           ///< 0: the call succeeds, short
+    unsigned mCount = 0;      ///< with mErrno 0: the bytes that it moves
+    bool mIsLasting = false;  ///< all the later ones fail too
+};
+
+class ZTCFaultInjection {
+public:
+    explicit ZTCFaultInjection(ZTCAgentProcess& arAgent);
+    ~ZTCFaultInjection();
+    ZTCFaultInjection(const ZTCFaultInjection&) = delete;
+    ZTCFaultInjection& operator=(const ZTCFaultInjection&) = delete;
+
+    /// Whether an agent that is started from now on has them; one made with this object has, until it is told
+    /// otherwise.
+    void attach();
+    void detach();
+
+    void arm(const ZTSFaultPlan& acrPlan);
+    void disarm() { mpControl->mIsArmed.store(0); }
+
+    /// Whether the planned failure came.
+    bool hasFired() const { return mpControl->mFired.load() != 0; }
+    /// Where from, as an offset into the agent's program.
+    std::uint64_t firedAt() const { return mpControl->mPlace.load(); }
+    /// Blocks of memory that the agent's process holds now.
+    std::int64_t liveBlocks() const { return mpControl->mLiveBlocks.load(); }
+    /// Whether an agent has run with the interposed calls.
+    bool isAttached() const { return mpControl->mIsAttached.load() != 0; }
+
+    /// Whether allocations and look-ups can be made to fail: they cannot in a build with a sanitizer.
+    static bool isForAllocations();
+
+private:
+    ZTCAgentProcess& mrAgent;
+    std::string mPath;
+    ZTSFaultControl* mpControl = nullptr;
+};
+
+#endif

@@ -1,0 +1,293 @@
+#include "tests/faults/FaultPhases.h"
+
+#include <unistd.h>
+
+#include <csignal>
+#include <filesystem>
+#include <map>
+
+#include "tests/system/AdapterEvents.h"
+
+namespace {
+
+constexpr unsigned gcUnlimited = 100000;
+
+void sNothing(ZTCFaultStage&) {}
+
+void sStart(ZTCFaultStage& arStage) {
+    arStage.startUndisturbed();
+}
+
+/// So that the agent lifts each descriptor that it gets above those of the standard streams.
+void sTakeStandardStreams(ZTCFaultStage& arStage) {
+    arStage.setStandardStreams(false);
+}
+
+void sStartCollecting(ZTCFaultStage& arStage) {
+    arStage.startUndisturbed();
+    arStage.agent().startScope();
+}
+
+/// The agent is started with a failure in it.
+std::function<void(ZTCFaultStage&)> sStarting(std::vector<std::string> (*apArguments)(const ZTCFaultStage&)) {
+    return [=](ZTCFaultStage& arStage) {
+        const std::vector<std::string> lArguments = apArguments(arStage);
+        arStage.arm();
+        const bool lServes = arStage.start(lArguments);
+        arStage.disarm();
+        if (!lServes) {
+            throw std::runtime_error("it does not start");
+        }
+        arStage.probe();
+        arStage.agent().startScope();
+        arStage.stop();
+        arStage.checkNextStart();
+    };
+}
+
+/// The program is run with a failure beside an agent that was started without.
+std::function<void(ZTCFaultStage&)> sRunningBeside(const char* apOption) {
+    return [=](ZTCFaultStage& arStage) {
+        arStage.faults().detach();
+        arStage.startUndisturbed();
+        arStage.faults().attach();
+        arStage.arm();
+        const ZTSRunResult lResult = arStage.agent().run({apOption, "-D", "false"});
+        arStage.disarm();
+        if (lResult.mStatus != 0) {
+            throw ZTCFinding("the second one ended with " + std::to_string(lResult.mStatus) + ": " + lResult.mError);
+        }
+        const bool lWasStopped = lResult.mOutput.find("Stopped the running instance") != std::string::npos;
+        if (lWasStopped) {
+            arStage.waitForEnd();
+        } else {
+            try {
+                arStage.probe();
+                arStage.stop();
+            } catch (const ZTCFinding&) {
+                throw;
+            } catch (const std::runtime_error&) {
+                arStage.waitForEnd();  // asked to stop, by one that could not tell
+            }
+        }
+        arStage.checkNextStart();
+    };
+}
+
+/// One command with a failure in it, and its answer; the agent is as it was afterwards.
+std::function<void(ZTCFaultStage&)> sCommanding(const ZTCBytes& acrBody, const std::string& acrAnswer) {
+    return [=](ZTCFaultStage& arStage) {
+        arStage.arm();
+        const std::string lAnswer = hexOf(arStage.agent().pipes().request(acrBody));
+        arStage.probe();
+        arStage.disarm();
+        if (lAnswer != acrAnswer) {
+            throw ZTCFinding("answered " + lAnswer + ", not " + acrAnswer);
+        }
+        arStage.probe();
+    };
+}
+
+std::string sTexts(const std::vector<std::string>& acrTexts) {
+    std::string lAll;
+    for (const std::string& lcrText : acrTexts) {
+        lAll += "\n        " + lcrText;
+    }
+    return lAll;
+}
+
+std::vector<ZTSLibraryEvent> sMixture() {
+    return {ZTSLibraryEvent::scope(0, 4, 0x01, scsiData(gcRemotePort, 3)),
+            ZTSLibraryEvent::scope(0, 1, 0x08, lsRjtData(gcRemotePort, 1, 2, 3)),
+            ZTSLibraryEvent::scope(1, 1, 0x01, plogiData(gcRemotePort, gcRemoteNode)),
+            ZTSLibraryEvent::rscn(1, rscnPayload({0x00010203, 0x00010204})), ZTSLibraryEvent::temperature(0)};
+}
+
+/// A retrieval of a mixture with a failure in it.
+void sRetrieve(ZTCFaultStage& arStage) {
+    arStage.agent().library().deliverAll(sMixture());
+    arStage.arm();
+    const std::vector<std::string> lTexts = arStage.retrieve();
+    arStage.disarm();
+    if (lTexts.size() != 6) {
+        throw ZTCFinding("the mixture came as" + sTexts(lTexts));
+    }
+    const std::vector<std::string> lNext = arStage.retrieve();
+    if (!lNext.empty()) {
+        throw ZTCFinding("delivered twice:" + sTexts(lNext));
+    }
+}
+
+void sBreakFrames(ZTCFaultStage& arStage) {
+    arStage.arm();
+    arStage.agent().pipes().sendRaw(bytesOf("00000000 0102"));
+    arStage.agent().pipes().waitUntilTaken();
+    arStage.probe();
+    arStage.disarm();
+    arStage.probe();
+}
+
+/// The blocks that the agent holds once its command thread has nothing to do.
+std::int64_t sSettledBlocks(ZTCFaultStage& arStage) {
+    const std::string lcWaits = "Waiting for control availability...";
+    const std::size_t lBefore = arStage.countInLog(lcWaits);
+    arStage.probe();
+    waitUntil([&] { return arStage.countInLog(lcWaits) > lBefore; }, "an idle command thread");
+    return arStage.faults().liveBlocks();
+}
+
+/// One event with a failure in it, between others. Either it is consolidated, or it is reported and as if it had not
+/// been: the others find the pending record and the lists sound.
+std::function<void(ZTCFaultStage&)> sDelivering(const ZTSLibraryEvent& acrEvent, bool aIsFirst = false) {
+    const ZTSLibraryEvent lOther = ZTSLibraryEvent::scope(0, 4, 0x02, scsiData(gcOtherPort, 9));
+    const ZTSLibraryEvent lEvent = acrEvent;
+    return [=](ZTCFaultStage& arStage) {
+        ZTCScriptedLibrary& lrLibrary = arStage.agent().library();
+        const auto lPlay = [&](bool aIsLeftOut, bool aIsArmed) {
+            lrLibrary.deliver(lOther);
+            if (aIsArmed) {
+                arStage.arm();
+            }
+            if (!aIsLeftOut) {
+                lrLibrary.deliver(lEvent);
+            }
+            arStage.disarm();
+            lrLibrary.deliver(lOther);
+            lrLibrary.deliver(lEvent);
+            lrLibrary.deliver(lEvent);
+            return arStage.retrieve();
+        };
+        const std::string lcReport = ", processing event callback";
+        std::int64_t lBlocksBefore = 0;
+        if (!aIsFirst) {
+            lPlay(false, false);
+            lBlocksBefore = sSettledBlocks(arStage);
+        }
+        const std::size_t lReportsBefore = arStage.countInLog(lcReport);
+        const std::vector<std::string> lTexts = lPlay(false, true);
+        const bool lIsReported = arStage.countInLog(lcReport) > lReportsBefore;
+        const std::vector<std::string> lWithout = lPlay(true, false);
+        const std::vector<std::string> lWhole = lPlay(false, false);
+        if (lTexts != (lIsReported ? lWithout : lWhole)) {
+            throw ZTCFinding(std::string("the event was ") + (lIsReported ? "reported, but" : "not reported, and") +
+                             " there is" + sTexts(lTexts) + "\n      in place of" +
+                             sTexts(lIsReported ? lWithout : lWhole));
+        }
+        const std::int64_t lBlocks = sSettledBlocks(arStage);
+        if (!aIsFirst && lBlocks > lBlocksBefore) {
+            throw ZTCFinding(std::to_string(lBlocks - lBlocksBefore) + " blocks of memory have leaked");
+        }
+    };
+}
+
+void sReopenLog(ZTCFaultStage& arStage) {
+    const std::size_t lBefore = arStage.countInLog("The log file was reopened");
+    arStage.arm();
+    arStage.agent().process().sendSignal(SIGHUP);
+    waitUntil([&] { return arStage.countInLog("The log file was reopened") > lBefore || !arStage.isRunning(); },
+              "the log's reopening");
+    arStage.disarm();
+    arStage.probe();
+}
+
+void sRotateLog(ZTCFaultStage& arStage) {
+    std::filesystem::resize_file(arStage.agent().agentLogPath(), 64u << 20);
+    arStage.arm();
+    arStage.probe();
+    arStage.disarm();
+    arStage.probe();
+}
+
+void sEndBySignal(ZTCFaultStage& arStage) {
+    arStage.arm();
+    arStage.agent().process().sendSignal(SIGTERM);
+    arStage.waitForEnd();
+    arStage.disarm();
+    arStage.checkNextStart();
+}
+
+void sEndByCommand(ZTCFaultStage& arStage) {
+    arStage.agent().library().deliverAll(sMixture());
+    arStage.arm();
+    const std::string lAnswer = arStage.agent().request("04");
+    if (lAnswer != gcSuccessHex) {
+        throw ZTCFinding("shut-down was answered " + lAnswer);
+    }
+    arStage.waitForEnd();
+    arStage.disarm();
+    arStage.checkNextStart();
+}
+
+/// A sensor that lives and does not touch its file: every period asks for its process.
+void sStartWithSilentSensor(ZTCFaultStage& arStage) {
+    writeFile(arStage.agent().sensorPidFilePath(), std::to_string(::getpid()) + "\n");
+    arStage.startUndisturbed({"-b", "1"});
+    waitUntil([&] { return arStage.countInLog("Sensor process still running") > 0 || !arStage.isRunning(); },
+              "the first question for the sensor's process");
+}
+
+void sBeat(ZTCFaultStage& arStage) {
+    const std::string lcWord = "Sensor process still running";
+    const std::size_t lBefore = arStage.countInLog(lcWord);
+    arStage.arm();
+    waitUntil([&] { return arStage.countInLog(lcWord) > lBefore || !arStage.isRunning(); }, "the next period");
+    arStage.disarm();
+    arStage.probe();
+}
+
+std::vector<std::string> sPlain(const ZTCFaultStage& acrStage) {
+    return acrStage.arguments();
+}
+
+std::vector<std::string> sAsDaemon(const ZTCFaultStage& acrStage) {
+    return acrStage.arguments({"-D", "true"});
+}
+
+}  // namespace
+
+std::vector<ZTSFaultPhase> faultPhases() {
+    const ZTCBytes lTargets =
+        ZTCAgentProcess::registerTargetsRequest({{makeWwn(gcRemoteNode), makeWwn(gcRemotePort), 0x010203},
+                                                 {makeWwn(gcOtherNode), makeWwn(gcOtherPort), 0x010204}});
+    std::vector<ZTSFaultPhase> lPhases = {
+        {"start", false, false, true, gcUnlimited, sNothing, sStarting(&sPlain)},
+        {"start as a daemon", false, false, true, gcUnlimited, sNothing, sStarting(&sAsDaemon)},
+        {"start without standard streams", false, false, false, gcUnlimited, sTakeStandardStreams, sStarting(&sPlain)},
+        {"a second start", false, false, false, gcUnlimited, sNothing, sRunningBeside("-S")},
+        {"option -s", false, false, false, gcUnlimited, sNothing, sRunningBeside("-s")},
+        {"command start", false, false, true, gcUnlimited, sStart,
+         sCommanding(ZTCAgentProcess::startScopeRequest(4096), gcSuccessHex)},
+        {"command start, again", true, false, false, gcUnlimited, sStartCollecting,
+         sCommanding(ZTCAgentProcess::startScopeRequest(4096), gcSuccessHex)},
+        {"command register-targets", false, false, true, gcUnlimited, sStart, sCommanding(lTargets, gcSuccessHex)},
+        {"command stop", true, false, false, gcUnlimited, sStartCollecting, sCommanding(bytesOf("02"), gcSuccessHex)},
+        {"command set-collection-period", true, false, false, gcUnlimited, sStart,
+         sCommanding(bytesOf("0500000001"), gcSuccessHex)},
+        {"broken frames", true, false, true, gcUnlimited, sStart, sBreakFrames},
+        {"retrieval", true, false, true, gcUnlimited, sStartCollecting, sRetrieve},
+    };
+    const std::map<std::string, ZTSLibraryEvent> lEvents = {
+        {"generic", ZTSLibraryEvent::bare(0, 2, 0x01)},
+        {"link", ZTSLibraryEvent::link(0, ZTCScriptedLibrary::portName(0))},
+        {"temperature", ZTSLibraryEvent::temperature(1)},
+        {"RSCN", ZTSLibraryEvent::rscn(0, rscnPayload({0x00010203}))},
+    };
+    for (const auto& [lName, lEvent] : lEvents) {
+        lPhases.push_back({"event: " + lName, true, true, false, gcUnlimited, sStartCollecting, sDelivering(lEvent)});
+    }
+    for (const ZTSDataKind& lcrKind : dataKinds()) {
+        const ZTSLibraryEvent lEvent =
+            ZTSLibraryEvent::scope(0, lcrKind.mCategory, lcrKind.mSubcategory, lcrKind.mData);
+        const bool lIsInQuickRun = lcrKind.mCategory == 1 && lcrKind.mSubcategory == 0x08;
+        lPhases.push_back({std::string("event: ") + lcrKind.mpName, true, true, lIsInQuickRun, gcUnlimited,
+                           sStartCollecting, sDelivering(lEvent)});
+        lPhases.push_back({std::string("event, first: ") + lcrKind.mpName, false, true, lIsInQuickRun, gcUnlimited,
+                           sStartCollecting, sDelivering(lEvent, true)});
+    }
+    lPhases.push_back({"heartbeat", true, false, false, 12, sStartWithSilentSensor, sBeat});
+    lPhases.push_back({"log reopening", true, false, true, gcUnlimited, sStart, sReopenLog});
+    lPhases.push_back({"log rotation", false, false, true, gcUnlimited, sStart, sRotateLog});
+    lPhases.push_back({"end by SIGTERM", false, false, true, gcUnlimited, sStartCollecting, sEndBySignal});
+    lPhases.push_back({"end by shut-down", false, false, true, gcUnlimited, sStartCollecting, sEndByCommand});
+    return lPhases;
+}

@@ -1,0 +1,26 @@
+/// What the agent does while a call fails.
+#ifndef TESTS_FAULTS_FAULTPHASES_H
+#define TESTS_FAULTS_FAULTPHASES_H
+
+#include <functional>
+#include <string>
+#include <vector>
+
+#include "tests/faults/FaultStage.h"
+
+struct ZTSFaultPhase {
+    std::string mName;
+    bool mKeepsAgent;    ///< an agent that went on serves for the next failure too
+    bool mAlwaysGoesOn;  ///< no failure in here may end the agent
+    bool mIsInQuickRun;
+    unsigned mMostFailures;  ///< n goes no further
+    /// Makes the agent ready; leaves it not started where the phase is its start.
+    std::function<void(ZTCFaultStage&)> mPrepare;
+    /// Arms, acts, disarms, checks. Throws ZTCFinding, or another exception where the agent does not answer: it has to
+    /// end then.
+    std::function<void(ZTCFaultStage&)> mRun;
+};
+
+std::vector<ZTSFaultPhase> faultPhases();
+
+#endif

@@ -1,0 +1,185 @@
+#include "tests/faults/FaultStage.h"
+
+#include <sys/stat.h>
+#include <unistd.h>
+
+#include <algorithm>
+#include <chrono>
+#include <csignal>
+#include <filesystem>
+#include <fstream>
+#include <iterator>
+
+/// What takes longer hangs.
+static constexpr std::chrono::seconds gcPatience{10};
+
+/// One of them is the last word of an agent that ends in order.
+static const char* const sLastWords[] = {
+    "Exit condition",
+    "Failed with error - ",
+    "Tavik System exiting",
+};
+
+std::vector<std::string> ZTCFaultStage::arguments(const std::vector<std::string>& acrMore) const {
+    std::vector<std::string> lArguments{"-D", "false", "-d", "127", "-l", mAgent.agentLogPath()};
+    lArguments.insert(lArguments.end(), acrMore.begin(), acrMore.end());
+    return lArguments;
+}
+
+void ZTCFaultStage::launch(const std::vector<std::string>& acrArguments) {
+    for (const std::string& lcrPath : {mAgent.agentLogPath(), mAgent.agentLogPath() + ".1", mAgent.defaultLogPath()}) {
+        std::filesystem::remove(lcrPath);
+    }
+    mIsDaemon = std::count(acrArguments.begin(), acrArguments.end(), "true") != 0;
+    mIsAdopted = false;
+    mHasStandardError = !mIsDaemon && mHasStandardStreams;
+    mAgent.start(acrArguments);
+}
+
+/// False where the agent has ended first.
+bool ZTCFaultStage::connect() {
+    if (!mAgent.pipes().openUnless([this] { return !isRunning(); }, ZTCDeadline(gcPatience))) {
+        return false;
+    }
+    if (mIsDaemon) {
+        waitUntil([this] { return !isRunning() || mIsAdopted; }, "the end of the daemon's first process");
+    }
+    mAgent.library().waitUntilOpen();  // with that, those that ended have left its queue
+    probe();
+    return true;
+}
+
+bool ZTCFaultStage::start(const std::vector<std::string>& acrArguments) {
+    mAgent.pipes().close();
+    launch(acrArguments);
+    return connect();
+}
+
+void ZTCFaultStage::startUndisturbed(const std::vector<std::string>& acrMore) {
+    disarm();
+    mAgent.pipes().close();
+    // With a reader there already, the agent need not wait for one.
+    if (!exists(mAgent.responseFifoPath())) {
+        mkfifo(mAgent.responseFifoPath().c_str(), 0600);
+    }
+    mAgent.pipes().openResponse();
+    launch(arguments(acrMore));
+    if (!connect()) {
+        throw ZTCFinding("an agent that nothing disturbs does not start: " + logText());
+    }
+}
+
+/// A daemon's first process has ended when this comes to be asked: the daemon is this process's child then.
+static pid_t sAdoptableChild() {
+    std::ifstream lFile("/proc/self/task/" + std::to_string(gettid()) + "/children");
+    pid_t lPid = 0;
+    return lFile >> lPid ? lPid : 0;
+}
+
+void ZTCFaultStage::setStandardStreams(bool aHasThem) {
+    mHasStandardStreams = aHasThem;
+    mAgent.setStandardStreams(aHasThem);
+}
+
+bool ZTCFaultStage::isRunning() {
+    if (!mAgent.isStarted()) {
+        return false;
+    }
+    if (!mAgent.process().hasEnded()) {
+        return true;
+    }
+    const pid_t lDaemon = sAdoptableChild();
+    if (lDaemon > 0) {
+        mAgent.adopt(lDaemon);
+        mIsAdopted = true;
+    }
+    return lDaemon > 0;
+}
+
+ZTEFaultEnd ZTCFaultStage::waitForEnd() {
+    try {
+        waitUntil([this] { return !isRunning(); }, "the end of the agent", ZTCDeadline(gcPatience));
+    } catch (const std::runtime_error&) {
+        const std::string lText = logText();
+        kill();
+        throw ZTCFinding("it hangs: " + lText);
+    }
+    const int lStatus = mAgent.waitForExit();
+    const std::string lText = logText();
+    mAgent.pipes().close();
+    if (lStatus == 1 && lText.find("Assertion [ ") != std::string::npos) {
+        return ZTEFaultEnd::Assertion;
+    }
+    if (lStatus != 0) {
+        throw ZTCFinding("it ended with " + std::to_string(lStatus) + ": " + lText);
+    }
+    // Before the log code of the command line is in force, the last word is not written; and who cannot write the log
+    // may have no standard error.
+    bool lHasLastWord = !mHasStandardError || !exists(mAgent.agentLogPath());
+    for (const char* lpWord : sLastWords) {
+        lHasLastWord = lHasLastWord || lText.find(lpWord) != std::string::npos;
+    }
+    if (!lHasLastWord) {
+        throw ZTCFinding("it ended without a last word: " + lText);
+    }
+    return ZTEFaultEnd::InOrder;
+}
+
+void ZTCFaultStage::stop() {
+    disarm();
+    mAgent.process().sendSignal(SIGTERM);
+    if (waitForEnd() != ZTEFaultEnd::InOrder) {
+        throw ZTCFinding("an agent that is stopped ends by an assertion: " + logText());
+    }
+}
+
+void ZTCFaultStage::kill() {
+    mAgent.kill();
+    mAgent.pipes().close();
+}
+
+void ZTCFaultStage::checkNextStart() {
+    startUndisturbed();
+    stop();
+    for (const std::string& lcrPath : {mAgent.commandFifoPath(), mAgent.responseFifoPath(), mAgent.pidFilePath()}) {
+        if (exists(lcrPath)) {
+            throw ZTCFinding("the next agent left " + lcrPath);
+        }
+    }
+}
+
+void ZTCFaultStage::probe() {
+    if (mAgent.request("0500000000") != gcInvalidHex) {
+        throw ZTCFinding("a command got a wrong answer");
+    }
+}
+
+std::size_t ZTCFaultStage::openDescriptors() {
+    const std::filesystem::directory_iterator lAll("/proc/" + std::to_string(mAgent.process().getPid()) + "/fd");
+    return static_cast<std::size_t>(std::distance(begin(lAll), end(lAll)));
+}
+
+std::string ZTCFaultStage::logText() {
+    return readFile(mAgent.defaultLogPath()) + readFile(mAgent.agentLogPath() + ".1") +
+           readFile(mAgent.agentLogPath()) + mAgent.process().standardError();
+}
+
+std::size_t ZTCFaultStage::countInLog(const std::string& acrText) {
+    const std::string lText = logText();
+    std::size_t lCount = 0;
+    for (std::size_t lAt = lText.find(acrText); lAt != std::string::npos; lAt = lText.find(acrText, lAt + 1)) {
+        ++lCount;
+    }
+    return lCount;
+}
+
+std::vector<std::string> ZTCFaultStage::retrieve() {
+    const ZTSScopeDataResponse lResponse = mAgent.retrieve();
+    std::vector<std::string> lTexts;
+    for (std::size_t lList = 0; lList < lResponse.mLists.size(); ++lList) {
+        for (const std::string& lcrText : lResponse.texts(lList)) {
+            lTexts.push_back(std::to_string(lList) + ": " + lcrText);
+        }
+    }
+    return lTexts;
+}

@@ -1,0 +1,141 @@
+#include <gtest/gtest.h>
+
+#include <cerrno>
+#include <stdexcept>
+#include <string>
+#include <vector>
+
+#include "tests/faults/FaultInjection.h"
+#include "tests/support/AgentProcess.h"
+#include "tests/system/AdapterEvents.h"
+
+using ZTCTexts = std::vector<std::string>;
+
+static ZTSLibraryEvent sQueueFull(std::uint64_t aPort, unsigned aLun) {
+    return ZTSLibraryEvent::scope(0, 4, 0x01, scsiData(aPort, aLun));
+}
+
+/// Runs the agent with a failure from its start on, until it has ended; it makes its FIFOs only where that is said.
+static int sStatusOfStartWith(ZTCAgentProcess& arAgent, ZTCFaultInjection& arFaults, const ZTSFaultPlan& acrPlan) {
+    arFaults.arm(acrPlan);
+    arAgent.start();
+    const int lStatus = arAgent.waitForExit();
+    arFaults.disarm();
+    EXPECT_TRUE(arFaults.hasFired()) << acrPlan.mCall;
+    return lStatus;
+}
+
+static void sExpectToServe(ZTCAgentProcess& arAgent) {
+    arAgent.startAndConnectQuietly();
+    EXPECT_EQ(arAgent.stop(), 0);
+    EXPECT_FALSE(exists(arAgent.commandFifoPath()));
+    EXPECT_FALSE(exists(arAgent.responseFifoPath()));
+    EXPECT_FALSE(exists(arAgent.pidFilePath()));
+}
+
+TEST(Fault, AStartThatCannotMakeTheCommandFifoEndsInOrderAndTheNextOneServes) {
+    ZTCAgentProcess lAgent;
+    ZTCFaultInjection lFaults(lAgent);
+    EXPECT_EQ(sStatusOfStartWith(lAgent, lFaults, {"mkfifo", 1, ENOSPC}), 0);
+    EXPECT_EQ(lAgent.log().containing("No space left on device, exiting abruptly").size(), 1u);
+    sExpectToServe(lAgent);
+}
+
+TEST(Fault, AStartWhoseSecondThreadCannotBeMadeStopsTheFirst) {
+    ZTCAgentProcess lAgent;
+    ZTCFaultInjection lFaults(lAgent);
+    lFaults.arm({"pthread_create", 3, EAGAIN});
+    lAgent.start();
+    lAgent.pipes().openResponse();
+    EXPECT_EQ(lAgent.waitForExit(), 0);
+    lFaults.disarm();
+    EXPECT_TRUE(lFaults.hasFired());
+    EXPECT_EQ(lAgent.log().containing("Starting the threads failed").size(), 1u);
+    EXPECT_TRUE(lAgent.log().has("Exiting Heartbeat Handler Thread as it is marked for exit.", "-H-"));
+    lAgent.pipes().close();
+    sExpectToServe(lAgent);
+}
+
+TEST(Fault, ACommandThatArrivesByteByByteAndIsInterruptedIsAnswered) {
+    ZTCAgentProcess lAgent;
+    ZTCFaultInjection lFaults(lAgent);
+    lAgent.startAndConnectQuietly();
+    lFaults.arm({"read", 1, 0, 1, true});
+    EXPECT_EQ(lAgent.request("0500000001"), gcSuccessHex);
+    EXPECT_TRUE(lFaults.hasFired());
+    for (unsigned lNth = 1; lNth <= 2; ++lNth) {
+        lFaults.arm({"read", lNth, EINTR});
+        EXPECT_EQ(lAgent.request("0500000001"), gcSuccessHex);
+        EXPECT_TRUE(lFaults.hasFired());
+        lFaults.arm({"poll", lNth, EINTR});
+        EXPECT_EQ(lAgent.request("0500000001"), gcSuccessHex);
+        EXPECT_TRUE(lFaults.hasFired());
+    }
+    lFaults.disarm();
+}
+
+TEST(Fault, AResponseThatLeavesByteByByteIsWholeAndHasEveryRecordOnce) {
+    ZTCAgentProcess lAgent;
+    ZTCFaultInjection lFaults(lAgent);
+    lAgent.startAndConnectQuietly();
+    lAgent.startScope();
+    lAgent.library().deliverAll({sQueueFull(gcRemotePort, 3), sQueueFull(gcOtherPort, 4)});
+    lFaults.arm({"writev", 1, 0, 1, true});
+    const ZTCTexts lTexts = lAgent.retrieve().texts();
+    lFaults.disarm();
+    EXPECT_TRUE(lFaults.hasFired());
+    EXPECT_EQ(lTexts,
+              (ZTCTexts{"4/1 x1 " + qFullRecord(gcRemotePort, {3}), "4/1 x1 " + qFullRecord(gcOtherPort, {4})}));
+    EXPECT_EQ(lAgent.retrieve().texts(), ZTCTexts{});
+}
+
+TEST(Fault, ACommandWhoseAnswerCannotBeWrittenEndsTheAgentInOrder) {
+    ZTCAgentProcess lAgent;
+    ZTCFaultInjection lFaults(lAgent);
+    lAgent.startAndConnect();
+    lFaults.arm({"writev", 1, EIO});
+    EXPECT_THROW(lAgent.request("0500000001"), std::runtime_error);
+    EXPECT_EQ(lAgent.waitForExit(), 0);
+    lFaults.disarm();
+    EXPECT_TRUE(lFaults.hasFired());
+    EXPECT_EQ(lAgent.log().containing("Exiting TavikCommandHandler thread with error").size(), 1u);
+    lAgent.pipes().close();
+    sExpectToServe(lAgent);
+}
+
+TEST(Fault, ALogThatCannotBeWrittenKeepsNothingFromHappeningAndTellsOfItsLoss) {
+    ZTCAgentProcess lAgent;
+    ZTCFaultInjection lFaults(lAgent);
+    lAgent.startAndConnect();
+    lAgent.startScope();
+    lFaults.arm({"write", 1, ENOSPC, 0, true});
+    lAgent.library().deliver(sQueueFull(gcRemotePort, 3));
+    EXPECT_EQ(lAgent.retrieve().texts(), ZTCTexts{"4/1 x1 " + qFullRecord(gcRemotePort, {3})});
+    lFaults.disarm();
+    EXPECT_TRUE(lFaults.hasFired());
+    EXPECT_EQ(lAgent.request("0500000001"), gcSuccessHex);
+    EXPECT_EQ(lAgent.log().containing("could not be written").size(), 1u);
+}
+
+TEST(Fault, ASensorsFileThatCannotBeLookedAtCountsAsALookWithoutProgress) {
+    ZTCAgentProcess lAgent;
+    ZTCFaultInjection lFaults(lAgent);
+    lAgent.startAndConnect({"-b", "1"});
+    lFaults.arm({"stat", 1, EACCES, 0, true});
+    EXPECT_EQ(lAgent.waitForExit(), 0);
+    lFaults.disarm();
+    EXPECT_EQ(lAgent.log().containing("Failed in stat on").size(), 2u);
+    EXPECT_TRUE(lAgent.log().has("Failed in getting the status of Sensor", "-H-"));
+}
+
+TEST(Fault, TheOwnPidFileThatCannotBeTouchedEndsTheAgentInOrder) {
+    ZTCAgentProcess lAgent;
+    ZTCFaultInjection lFaults(lAgent);
+    lAgent.startAndConnect({"-b", "1"});
+    lFaults.arm({"utime", 1, EACCES});
+    EXPECT_EQ(lAgent.waitForExit(), 0);
+    lFaults.disarm();
+    EXPECT_TRUE(lAgent.log().has("Failed in updating the status", "-H-"));
+    lAgent.pipes().close();
+    sExpectToServe(lAgent);
+}
