@@ -6,6 +6,7 @@
 #include "common/include/Exception.h"
 #include "common/include/Log.h"
 #include "os/common/include/Clib.h"
+#include "os/common/include/ProcessEvents.h"
 #include "system/include/SignalWaiter.h"
 #include "system/include/System.h"
 
@@ -79,6 +80,9 @@ void sRun(ZTCSystem& lrSystem) {
         lrSystem.systemDaemonize(ZTCString(""), lNull, lNull, lNull);
     }
     lrSystem.markAsRunning();
+    // Made here: whoever needs them to end the process must not be the first to ask for them.
+    getStopEvent();
+    getExitEvent();
     lrSystem.startSignalWaiter();
 
     lrSystem.init();

@@ -29,6 +29,9 @@ private:
     const int mDescriptor;
 };
 
+// Each is made when it is first asked for, which throws ZTCClibEventFailedEx where no descriptor can be had; the driver
+// asks for both before there is a thread.
+
 /// Somebody outside asked the process to stop (SIGTERM, SIGINT).
 ZTCProcessEvent& getStopEvent();
 

@@ -3,6 +3,7 @@
 #include <cerrno>
 #include <climits>
 #include <cstdint>
+#include <new>
 
 #include "os/common/include/Clib.h"
 
@@ -40,12 +41,16 @@ void ZTCProcessEvent::reset() noexcept {
     ClibResetEvent(mDescriptor);
 }
 
+// Both are never destroyed, and take no memory from the heap: they are what ends a process that has none left.
+
 ZTCProcessEvent& getStopEvent() {
-    static ZTCProcessEvent& srEvent = *new ZTCProcessEvent();
+    alignas(ZTCProcessEvent) static unsigned char slStorage[sizeof(ZTCProcessEvent)];
+    static ZTCProcessEvent& srEvent = *::new (slStorage) ZTCProcessEvent();
     return srEvent;
 }
 
 ZTCProcessEvent& getExitEvent() {
-    static ZTCProcessEvent& srEvent = *new ZTCProcessEvent();
+    alignas(ZTCProcessEvent) static unsigned char slStorage[sizeof(ZTCProcessEvent)];
+    static ZTCProcessEvent& srEvent = *::new (slStorage) ZTCProcessEvent();
     return srEvent;
 }

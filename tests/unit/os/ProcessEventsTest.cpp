@@ -2,7 +2,11 @@
 
 #include <gtest/gtest.h>
 
+#include <new>
+#include <string>
 #include <thread>
+
+#include "tests/support/FailingAllocation.h"
 
 TEST(ProcessEvents, AnEventStaysRaised) {
     ZTCProcessEvent lEvent;
@@ -30,6 +34,12 @@ TEST(ProcessEvents, RaisingWakesWhoWaits) {
     std::thread lThread([&] { EXPECT_TRUE(lEvent.waitFor(20000)); });
     lEvent.raise();
     lThread.join();
+}
+
+TEST(ProcessEvents, TheEventsOfTheProcessTakeNoMemory) {
+    EXPECT_FALSE(failAllocation(1, [] { getStopEvent(); }));
+    EXPECT_FALSE(failAllocation(1, [] { getExitEvent(); }));
+    EXPECT_TRUE(failAllocation(1, [] { EXPECT_THROW(std::string(100, 'x'), std::bad_alloc); }));
 }
 
 TEST(ProcessEvents, TheProcessHasOneStopEventAndOneExitEvent) {
