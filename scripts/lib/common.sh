@@ -10,6 +10,7 @@ gCompilerPackages=(g++ gcc cmake ninja-build)
 gClientPackages=(libcli11-dev nlohmann-json3-dev)
 gTestPackages=(libgtest-dev libgmock-dev)
 gClangPackages=(clang libclang-rt-14-dev llvm)
+gCoveragePackages=(gcovr)
 gStylePackages=(clang-format clang-tidy)
 gVmPackages=(make qemu-system-x86 busybox-static kmod cpio xz-utils iproute2 jq sg3-utils)
 
