@@ -9,6 +9,7 @@ cd "$gRoot"
 gCompilerPackages=(g++ gcc cmake ninja-build)
 gClientPackages=(libcli11-dev nlohmann-json3-dev)
 gTestPackages=(libgtest-dev libgmock-dev)
+gBenchPackages=(libbenchmark-dev prometheus-cpp-dev libspdlog-dev python3)
 gClangPackages=(clang libclang-rt-14-dev llvm)
 gCoveragePackages=(gcovr)
 gStylePackages=(clang-format clang-tidy)

@@ -1,0 +1,132 @@
+#include "bench/support/BenchAgent.h"
+
+#include <fcntl.h>
+#include <sys/stat.h>
+#include <unistd.h>
+
+#include <cstdlib>
+#include <filesystem>
+#include <map>
+#include <stdexcept>
+#include <system_error>
+#include <utility>
+
+#include "bench/support/BenchEvents.h"
+#include "common/include/Log.h"
+#include "system/include/SystemGlobals.h"
+
+namespace {
+
+constexpr unsigned gcRecordLimit = 4096;
+
+void sAppend32(std::vector<unsigned char>& arBytes, unsigned aValue) {
+    for (int lShift = 24; lShift >= 0; lShift -= 8) {
+        arBytes.push_back(static_cast<unsigned char>(aValue >> lShift));
+    }
+}
+
+void sAppendName(std::vector<unsigned char>& arBytes, std::uint64_t aValue) {
+    const HBA_wwn lName = makeBenchName(aValue);
+    arBytes.insert(arBytes.end(), lName.wwn, lName.wwn + sizeof lName.wwn);
+}
+
+std::string sMakeDirectory() {
+    std::string lPath = (std::filesystem::temp_directory_path() / "tavik-bench-XXXXXX").string();
+    if (mkdtemp(lPath.data()) == nullptr) {
+        throw std::runtime_error("mkdtemp " + lPath);
+    }
+    return lPath;
+}
+
+}  // namespace
+
+const std::string& ZTCBenchAgent::directory() {
+    static pid_t sOwner = 0;
+    static const std::string& srDirectory = *[] {
+        auto* const lpDirectory = new std::string(sMakeDirectory());
+        sOwner = getpid();
+        setLogFilePath((*lpDirectory + "/bench.log").c_str());
+        std::atexit([] {
+            // A child that was forked leaves its parent's files alone.
+            if (getpid() == sOwner) {
+                std::error_code lIgnored;
+                std::filesystem::remove_all(directory(), lIgnored);
+            }
+        });
+        return lpDirectory;
+    }();
+    return srDirectory;
+}
+
+ZTCBenchAgent::ZTCBenchAgent(unsigned aBoards, unsigned aTargets) : mpSystem(nullptr) {
+    static unsigned sAgents = 0;
+    const std::string lDirectory = directory() + "/agent-" + std::to_string(getpid()) + "-" + std::to_string(++sAgents);
+    std::filesystem::create_directory(lDirectory);
+    setenv("ZT_QRV_SENSOR_DIR", lDirectory.c_str(), 1);
+    setenv("ZT_LIBKPM_PATH", TAVIK_BENCH_LIBKPM, 1);
+    setenv("TAVIK_BENCH_ADAPTERS", std::to_string(aBoards).c_str(), 1);
+
+    // A reader of the response FIFO, so that init does not wait for one.
+    const std::string lFifo = lDirectory + "/qrvtvkout.fifo";
+    if (mkfifo(lFifo.c_str(), 0600) != 0) {
+        throw std::runtime_error("mkfifo " + lFifo);
+    }
+    mResponseReader = open(lFifo.c_str(), O_RDONLY | O_NONBLOCK | O_CLOEXEC);
+    if (mResponseReader < 0) {
+        throw std::runtime_error("open " + lFifo);
+    }
+    mpSystem = new ZTCTavikSystem(ZTCString(gcTavikName));
+    setSystemObject(mpSystem);
+    setLogCode(gcQuietLogCode);
+    mpSystem->preInit();
+    setLogCode(gcQuietLogCode);
+    mpSystem->init();
+    std::vector<unsigned char> lStart{0};
+    sAppend32(lStart, gcRecordLimit);
+    request(lStart);
+    if (aTargets != 0) {
+        request(makeRegisterTargets(aTargets));
+    }
+}
+
+ZTCBenchAgent::~ZTCBenchAgent() {
+    mDoScopeCollection = false;
+    gpTavikSystem = nullptr;
+    setSystemObject(nullptr);
+    delete mpSystem;
+    close(mResponseReader);
+}
+
+ZTCBenchAgent& ZTCBenchAgent::use(unsigned aBoards, unsigned aTargets, unsigned aLogCode) {
+    static auto& srAgents = *new std::map<std::pair<unsigned, unsigned>, ZTCBenchAgent*>();
+    ZTCBenchAgent*& lrpAgent = srAgents[{aBoards, aTargets}];
+    if (lrpAgent == nullptr) {
+        lrpAgent = new ZTCBenchAgent(aBoards, aTargets);
+    }
+    setenv("TAVIK_BENCH_ADAPTERS", std::to_string(aBoards).c_str(), 1);
+    gpTavikSystem = lrpAgent->mpSystem;
+    setSystemObject(lrpAgent->mpSystem);
+    mDoScopeCollection = true;
+    setLogCode(aLogCode);
+    lrpAgent->retrieve();
+    return *lrpAgent;
+}
+
+ZTCPointer<ZTCBuffer> ZTCBenchAgent::request(const std::vector<unsigned char>& acrBody) {
+    const ZTCPointer<ZTCBuffer> lRequest(new ZTCBuffer());
+    lRequest->append(acrBody.data(), static_cast<Size>(acrBody.size()));
+    ZTCPointer<ZTCBuffer> lResponse;
+    mpSystem->getProtocolHandler()->process(lRequest, lResponse);
+    return lResponse;
+}
+
+std::vector<unsigned char> ZTCBenchAgent::makeRegisterTargets(unsigned aTargets) {
+    std::vector<unsigned char> lBody{3};
+    sAppend32(lBody, aTargets);
+    for (unsigned lTarget = 0; lTarget < aTargets; ++lTarget) {
+        sAppendName(lBody, 0x2000000000000000 + lTarget);
+        sAppendName(lBody, gcBenchPortBase + lTarget);
+        sAppend32(lBody, lTarget + 1);
+    }
+    return lBody;
+}
