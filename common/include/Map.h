@@ -35,12 +35,21 @@ public:
     /// The value of a key. A key that is absent is logged at info level and is ZTCNotFoundEx, code 8.
     V& get(const K& acrKey) { return const_cast<V&>(static_cast<const ZTCMap&>(*this).get(acrKey)); }
     const V& get(const K& acrKey) const {
+        const V* const lpValue = get(acrKey, std::nothrow);
+        if (nullptr == lpValue) {
+            throw ZTCNotFoundEx("No element for the key exists in map", gcErrNotFound);
+        }
+        return *lpValue;
+    }
+
+    /// The same without an exception: null for a key that is absent, which is logged all the same.
+    const V* get(const K& acrKey, std::nothrow_t) const noexcept {
         const const_iterator lFound = mMap.find(acrKey);
         if (mMap.end() == lFound) {
             ZT_LOG_INFO("%s", "Element does not exist in the map");
-            throw ZTCNotFoundEx("No element for the key exists in map", gcErrNotFound);
+            return nullptr;
         }
-        return lFound->second;
+        return &lFound->second;
     }
 
     /// Whether a key is present.

@@ -2,8 +2,13 @@
 #ifndef TAVIK_EVENTDATABYTES_H
 #define TAVIK_EVENTDATABYTES_H
 
+#include <bit>
+#include <cstring>
+
 /// Sets one bit: bit n lives in byte n / 8 at position n mod 8. The field is long enough for it.
-void TavikSet_BitField(unsigned char* apField, unsigned int aBit);
+inline void TavikSet_BitField(unsigned char* apField, unsigned int aBit) {
+    apField[aBit / 8] = static_cast<unsigned char>(apField[aBit / 8] | 1U << aBit % 8);
+}
 
 /// Sets every bit of so many bytes.
 void TavikSet_AllBitField(unsigned char* apField, unsigned int aBytes);
@@ -15,6 +20,11 @@ bool TavikIsLittleEndian();
 void TavikReverseBytes(unsigned char* apBytes, unsigned int aCount);
 
 /// Stores a 32-bit integer little-endian in four bytes.
-void TavikStore32(unsigned char* apField, unsigned int aValue);
+inline void TavikStore32(unsigned char* apField, unsigned int aValue) {
+    std::memcpy(apField, &aValue, sizeof aValue);
+    if constexpr (std::endian::native != std::endian::little) {
+        TavikReverseBytes(apField, sizeof aValue);
+    }
+}
 
 #endif

@@ -95,6 +95,16 @@ public:
         return mTargetsWwpnMap.get(acrKey);
     }
 
+    /// The same without an exception, for the path of events, where an unknown port is an everyday thing: null then.
+    const ZTCTavikTarget* findFcTarget(unsigned int aFcId) ZT_REQUIRES(mPrevDataLock) {
+        const ZTCPointer<ZTCTavikTarget>* lpTarget = mTargetsMap.get(aFcId, std::nothrow);
+        return lpTarget == nullptr ? nullptr : lpTarget->get();
+    }
+    const ZTCTavikTarget* findWwpnTarget(unsigned long aKey) ZT_REQUIRES(mPrevDataLock) {
+        const ZTCPointer<ZTCTavikTarget>* lpTarget = mTargetsWwpnMap.get(aKey, std::nothrow);
+        return lpTarget == nullptr ? nullptr : lpTarget->get();
+    }
+
     // ---- Record lists: filled by callbacks, exchanged by the command thread.
 
     bool isRecordListExist(unsigned int aBoardId) ZT_REQUIRES(mPrevDataLock) { return mRecordsMap.hasKey(aBoardId); }

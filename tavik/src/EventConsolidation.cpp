@@ -79,9 +79,7 @@ void sFillRecord(const ZTSConsolidationKind& acrKind, const unsigned char* apPay
 const ZTCTavikTarget* sFindTarget(ZTCTavikSystem& arSystem, const ZTSConsolidationKind& acrKind,
                                   const unsigned char* apPayload) ZT_REQUIRES(arSystem.getPrevDataLock()) {
     try {
-        return arSystem.getWwpnTarget(ZTCWorldWideName(apPayload + gcRemotePortOffset).getKey()).get();
-    } catch (const ZTCNotFoundEx&) {
-        return nullptr;
+        return arSystem.findWwpnTarget(ZTCWorldWideName(apPayload + gcRemotePortOffset).getKey());
     } catch (const ZTCException&) {
         if (!acrKind.mIgnoresLookupFailures) {
             throw;

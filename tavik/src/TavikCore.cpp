@@ -1,6 +1,8 @@
 #include "tavik/include/TavikCore.h"
 
 #include <algorithm>
+#include <array>
+#include <bit>
 #include <cstdint>
 #include <cstring>
 #include <exception>
@@ -184,7 +186,7 @@ struct ZTSDispatch {
     const char* mpText;  ///< too short an event; for the generic member the notice in front
 };
 
-const ZTSDispatch gcDispatch[] = {
+constexpr ZTSDispatch gcDispatch[] = {
     {1, 0x01, &gcPlogiKind, sConsolidatePlogiEvents, "Not enough data in ELS PLOGI Event %u %u"},
     {1, 0x02, &gcPrloKind, sConsolidatePrloEvents, "Not enough data in ELS PRLO Event %u %u"},
     {1, 0x04, &gcAdiscKind, sConsolidateAdiscEvents, "Not enough data in ELS ADISC Event %u %u"},
@@ -207,55 +209,98 @@ const ZTSDispatch gcDispatch[] = {
     {16, 0x01, nullptr, nullptr, "Processing ADAPTER ARRIVAL Event Cat=%u SubCat=%u"},
 };
 
-const ZTSDispatch* sFindDispatch(unsigned char aCategory, unsigned char aSubcategory) {
-    for (const ZTSDispatch& lrDispatch : gcDispatch) {
-        if (lrDispatch.mCategory == aCategory && lrDispatch.mSubcategory == aSubcategory) {
-            return &lrDispatch;
-        }
+constexpr unsigned int gcCategoryBits = 5;
+constexpr unsigned int gcSubcategoryBits = 8;
+constexpr unsigned int gcSlots = gcCategoryBits * gcSubcategoryBits;
+
+/// Category and subcategory are one bit each: the number of the pair, or gcSlots where they are something else.
+constexpr unsigned int sGetSlot(unsigned char aCategory, unsigned char aSubcategory) {
+    const bool lIsOneBitEach = aCategory != 0 && (aCategory & (aCategory - 1)) == 0 && aSubcategory != 0 &&
+                               (aSubcategory & (aSubcategory - 1)) == 0;
+    if (!lIsOneBitEach || aCategory >= 1U << gcCategoryBits) {
+        return gcSlots;
     }
-    return nullptr;
+    return static_cast<unsigned int>(std::countr_zero(aCategory)) * gcSubcategoryBits +
+           static_cast<unsigned int>(std::countr_zero(aSubcategory));
+}
+
+/// The rows of the table by slot; the last slot is that of what has none.
+constexpr auto gcDispatchBySlot = [] {
+    std::array<const ZTSDispatch*, gcSlots + 1> lRows{};
+    for (const ZTSDispatch& lrDispatch : gcDispatch) {
+        lRows[sGetSlot(lrDispatch.mCategory, lrDispatch.mSubcategory)] = &lrDispatch;
+    }
+    return lRows;
+}();
+static_assert(gcDispatchBySlot[gcSlots] == nullptr);
+
+const ZTSDispatch* sFindDispatch(unsigned char aCategory, unsigned char aSubcategory) {
+    return gcDispatchBySlot[sGetSlot(aCategory, aSubcategory)];
+}
+
+/// Makes a kind that is never destroyed: callbacks may run while the process exits.
+const ZTCPointer<ZTCScopeEvent>* sMakeKind(unsigned char aCategory, unsigned char aSubcategory) {
+    const ZTCPointer<ZTCScopeEvent> lKind(NEW ZTCScopeEvent(aCategory, aSubcategory));
+    const auto* lpKind = NEW ZTCPointer<ZTCScopeEvent>(lKind);
+    if (lpKind == nullptr) {
+        throw ZTCNoMemoryEx();
+    }
+    return lpKind;
+}
+
+/// The kind of an event. It never changes, so that all events and records of one pair share it, from the first event
+/// on; a pair of no slot has its kind anew each time, in arHolder. Throws ZTCNoMemoryEx.
+const ZTCPointer<ZTCScopeEvent>& sGetKind(unsigned char aCategory, unsigned char aSubcategory,
+                                          ZTCPointer<ZTCScopeEvent>& arHolder)
+    ZT_REQUIRES(gpTavikSystem->getPrevDataLock()) {
+    static const ZTCPointer<ZTCScopeEvent>* spKinds[gcSlots];
+    const unsigned int lSlot = sGetSlot(aCategory, aSubcategory);
+    if (lSlot == gcSlots) {
+        return arHolder = ZTCPointer<ZTCScopeEvent>(NEW ZTCScopeEvent(aCategory, aSubcategory));
+    }
+    if (spKinds[lSlot] == nullptr) {
+        spKinds[lSlot] = sMakeKind(aCategory, aSubcategory);
+    }
+    return *spKinds[lSlot];
 }
 
 int sConsolidateEvents(const ZTCPointer<ZTCScopeEvent>& acrEvent, unsigned int aBoardId, const void* apData,
-                       unsigned int aLength) {
+                       unsigned int aLength) ZT_REQUIRES(gpTavikSystem->getPrevDataLock()) {
     ZT_ENTRY();
     const unsigned int lCategory = acrEvent->getCategory();
     const unsigned int lSubcategory = acrEvent->getSubcategory();
     const ZTSDispatch* lpDispatch = sFindDispatch(acrEvent->getCategory(), acrEvent->getSubcategory());
-    {
-        const ZTCPrevDataHold lHold(*gpTavikSystem);
-        const bool lIsNew = !gpTavikSystem->isPrevScopeDataSet() ||
-                            gpTavikSystem->getPrevScopeData()->getCategory() != lCategory ||
-                            gpTavikSystem->getPrevScopeData()->getSubcategory() != lSubcategory ||
-                            gpTavikSystem->getPrevBoardId() != aBoardId;
-        if (lpDispatch != nullptr && lpDispatch->mpKind == nullptr) {
-            ZT_LOG_NOTICE(lpDispatch->mpText, lCategory, lSubcategory);
-            sConsolidateGenericEvents(acrEvent, aBoardId, lIsNew);
-        } else if (lpDispatch != nullptr && aLength < lpDispatch->mpKind->mMinimumLength) {
-            ZT_LOG_WARN(lpDispatch->mpText, lpDispatch->mpKind->mMinimumLength, aLength);
-        } else if (lpDispatch != nullptr) {
-            lpDispatch->mpMember(acrEvent, aBoardId, apData, lIsNew);
-        } else {
-            switch (lCategory) {
-                case ZT_REG_ELS_EVENT:
-                    ZT_LOG_NOTICE("Unknown ELS Event subcategory = %u, ignored", lSubcategory);
-                    break;
-                case ZT_REG_FABRIC_EVENT:
-                    ZT_LOG_NOTICE("Unknown Fabric Event subcategory=%u, ignored", lSubcategory);
-                    break;
-                case ZT_REG_SCSI_EVENT:
-                    ZT_LOG_NOTICE("Unknown Scsi Event subcategory = %u, ignored", lSubcategory);
-                    break;
-                case ZT_REG_BOARD_EVENT:
-                    ZT_LOG_NOTICE("Unknown Board Evt catgory=%u subcatgory=%u ignored", lCategory, lSubcategory);
-                    break;
-                case ZT_REG_ADAPTER_EVENT:
-                    ZT_LOG_NOTICE("Unknown Adapter Evt catgory=%u subcatgory=%u ignored", lCategory, lSubcategory);
-                    break;
-                default:
-                    ZT_LOG_NOTICE("Unknown Category = %u SubCategory = %u, ignored", lCategory, lSubcategory);
-                    break;
-            }
+    const bool lIsNew = !gpTavikSystem->isPrevScopeDataSet() ||
+                        gpTavikSystem->getPrevScopeData()->getCategory() != lCategory ||
+                        gpTavikSystem->getPrevScopeData()->getSubcategory() != lSubcategory ||
+                        gpTavikSystem->getPrevBoardId() != aBoardId;
+    if (lpDispatch != nullptr && lpDispatch->mpKind == nullptr) {
+        ZT_LOG_NOTICE(lpDispatch->mpText, lCategory, lSubcategory);
+        sConsolidateGenericEvents(acrEvent, aBoardId, lIsNew);
+    } else if (lpDispatch != nullptr && aLength < lpDispatch->mpKind->mMinimumLength) {
+        ZT_LOG_WARN(lpDispatch->mpText, lpDispatch->mpKind->mMinimumLength, aLength);
+    } else if (lpDispatch != nullptr) {
+        lpDispatch->mpMember(acrEvent, aBoardId, apData, lIsNew);
+    } else {
+        switch (lCategory) {
+            case ZT_REG_ELS_EVENT:
+                ZT_LOG_NOTICE("Unknown ELS Event subcategory = %u, ignored", lSubcategory);
+                break;
+            case ZT_REG_FABRIC_EVENT:
+                ZT_LOG_NOTICE("Unknown Fabric Event subcategory=%u, ignored", lSubcategory);
+                break;
+            case ZT_REG_SCSI_EVENT:
+                ZT_LOG_NOTICE("Unknown Scsi Event subcategory = %u, ignored", lSubcategory);
+                break;
+            case ZT_REG_BOARD_EVENT:
+                ZT_LOG_NOTICE("Unknown Board Evt catgory=%u subcatgory=%u ignored", lCategory, lSubcategory);
+                break;
+            case ZT_REG_ADAPTER_EVENT:
+                ZT_LOG_NOTICE("Unknown Adapter Evt catgory=%u subcatgory=%u ignored", lCategory, lSubcategory);
+                break;
+            default:
+                ZT_LOG_NOTICE("Unknown Category = %u SubCategory = %u, ignored", lCategory, lSubcategory);
+                break;
         }
     }
     ZT_EXIT();
@@ -269,14 +314,6 @@ constexpr unsigned int gcRscnPageSize = 4;
 constexpr unsigned int gcRscnMinimumLength = gcRscnHeaderSize + gcRscnPageSize;
 constexpr unsigned int gcRscnFormatMask = 0x03000000;  // 0: a single port's address
 constexpr unsigned int gcRscnAddressMask = 0x00FFFFFF;
-
-const ZTCTavikTarget* sFindFcTarget(unsigned int aFcId) ZT_REQUIRES(gpTavikSystem->getPrevDataLock()) {
-    try {
-        return gpTavikSystem->getFcTarget(aFcId).get();
-    } catch (const ZTCNotFoundEx&) {
-        return nullptr;
-    }
-}
 
 void sConsolidateRscnEvent(const ZTCPointer<ZTCScopeEvent>& acrEvent, unsigned int aBoardId, unsigned int aFcId) {
     static unsigned int lPrevFcId = 0;
@@ -295,7 +332,7 @@ void sConsolidateRscnEvent(const ZTCPointer<ZTCScopeEvent>& acrEvent, unsigned i
             TavikStore32(lRecord + offsetof(TavikRscn, FcId), aFcId);
             const bool lIsPortAddress = (aFcId & gcRscnFormatMask) == 0;
             startScopeRecord(*gpTavikSystem, acrEvent, aBoardId, lRecord, sizeof lRecord,
-                             lIsPortAddress ? sFindFcTarget(aFcId & gcRscnAddressMask) : nullptr);
+                             lIsPortAddress ? gpTavikSystem->findFcTarget(aFcId & gcRscnAddressMask) : nullptr);
             lPrevFcId = aFcId;
         }
     }
@@ -336,28 +373,30 @@ void sProcessRscnEvent(unsigned int aBoardId, const void* apData, unsigned int a
 void sProcessScopeEvent(const ZTCCallbackEventData* apEventData) {
     ZT_ENTRY();
     const unsigned int lBoardId = apEventData->getBoardId();
+    const auto lCategory = static_cast<unsigned char>(apEventData->getCategory());
+    const auto lSubcategory = static_cast<unsigned char>(apEventData->getSubcategory());
+    const bool lIsRscn = lCategory == gcRscnCategory && lSubcategory == gcRscnSubcategory;
     bool lHasRecordList;
     {
+        // One hold for both: no list goes away between the test and the record.
         const ZTCPrevDataHold lHold(*gpTavikSystem);
         lHasRecordList = gpTavikSystem->isRecordListExist(lBoardId);
+        if (lHasRecordList && !lIsRscn) {
+            ZTCPointer<ZTCScopeEvent> lUnknown;
+            try {
+                sConsolidateEvents(sGetKind(lCategory, lSubcategory, lUnknown), lBoardId, apEventData->getEventData(),
+                                   apEventData->getEventDataLength());
+            } catch (const ZTCNotFoundEx&) {  // the event's port or board is gone: there is nothing to say about it
+            }
+        }
     }
     if (!lHasRecordList) {
         ZT_LOG_ERR("Bad boardid %d in event has been recieved. Event: wwn %s; cat %d; subcat %d.  Skip event!",
                    static_cast<int>(lBoardId), ZTCWorldWideName(apEventData->getWwpn()).getString().get(),
                    static_cast<int>(apEventData->getCategory()), static_cast<int>(apEventData->getSubcategory()));
-        ZT_EXIT();
-        return;
-    }
-    const ZTCPointer<ZTCScopeEvent> lEvent(
-        NEW ZTCScopeEvent(static_cast<unsigned char>(apEventData->getCategory()),
-                          static_cast<unsigned char>(apEventData->getSubcategory())));
-    if (lEvent->getCategory() == gcRscnCategory && lEvent->getSubcategory() == gcRscnSubcategory) {
-        sProcessRscnEvent(lBoardId, apEventData->getEventData(), apEventData->getEventDataLength(), lEvent);
-    } else {
-        try {
-            sConsolidateEvents(lEvent, lBoardId, apEventData->getEventData(), apEventData->getEventDataLength());
-        } catch (const ZTCNotFoundEx&) {  // the event's port or board is gone: there is nothing to say about it
-        }
+    } else if (lIsRscn) {
+        static const ZTCPointer<ZTCScopeEvent>& lRscnKind = *sMakeKind(gcRscnCategory, gcRscnSubcategory);
+        sProcessRscnEvent(lBoardId, apEventData->getEventData(), apEventData->getEventDataLength(), lRscnKind);
     }
     ZT_EXIT();
 }

@@ -69,6 +69,19 @@ TEST_F(Map, GettingAMissingKeyThrowsAndLogsOnlyAtInfoLevel) {
               withoutLineNumber(withoutStamp(lLines[0])));
 }
 
+TEST_F(Map, GettingWithoutThrowingYieldsNullAndTheSameLine) {
+    ZTCMap<int, int> lMap;
+    lMap.insert(1, 10);
+    ASSERT_NE(nullptr, lMap.get(1, std::nothrow));
+    EXPECT_EQ(10, *lMap.get(1, std::nothrow));
+    setLogCode(gcDefaultLogCode | ZTLL_Info);
+    EXPECT_EQ(nullptr, lMap.get(2, std::nothrow));
+    EXPECT_THROW(static_cast<void>(lMap.get(2)), ZTCNotFoundEx);
+    const std::vector<std::string> lLines = linesOfFile(mLogPath);
+    ASSERT_EQ(2u, lLines.size());
+    EXPECT_EQ(withoutStamp(lLines[0]), withoutStamp(lLines[1]));
+}
+
 TEST_F(Map, GetYieldsTheStoredValueItself) {
     ZTCMap<int, int> lMap;
     lMap.insert(1, 10);
