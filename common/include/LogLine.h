@@ -37,6 +37,7 @@ private:
     static constexpr std::size_t gcInlineSize = 2048;
 
     void add(const char* apBytes, std::size_t aCount) noexcept;
+    void formatAtLength(char* apShort, std::size_t aSize, const char* apFormat, std::va_list aArguments) noexcept;
     void addEscaped(const char* apText, std::size_t aLength) noexcept;
     bool makeRoomFor(std::size_t aCount) noexcept;
 

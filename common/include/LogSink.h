@@ -5,6 +5,8 @@
 /// write to a file opened for appending, so that it is with the kernel when the call returns and several processes can
 /// share a file. Where a write was cut, the next line starts on a line of its own all the same.
 ///
+/// Who opens a file ignores SIGXFSZ from then on, unless it has a handler: a limit on file sizes is a failed write.
+///
 /// If the file is renamed or removed by somebody else, lines go on into it until reopen() or the next rotation.
 
 #ifndef COMMON_INCLUDE_LOGSINK_H
@@ -88,6 +90,7 @@ private:
     void lose(const char* apLine, std::size_t aLength) noexcept ZT_REQUIRES(mMutex);
     bool reportLostLines() noexcept ZT_REQUIRES(mMutex);
     bool prepare(std::size_t aLength) noexcept ZT_REQUIRES(mMutex);
+    bool isSizeStale() const noexcept ZT_REQUIRES(mMutex);
     bool isRetryDue() noexcept ZT_REQUIRES(mMutex);
     void failToOpen(int aError) noexcept ZT_REQUIRES(mMutex);
     void sayOnStandardError(const char* apWhat, const char* apPath, const char* apWhy, const char* apNext) noexcept
@@ -96,6 +99,11 @@ private:
     bool rotate() noexcept ZT_REQUIRES(mMutex);
     bool writeWhole(const char* apBytes, std::size_t aCount) noexcept ZT_REQUIRES(mMutex);
     void closeDescriptor() noexcept ZT_REQUIRES(mMutex);
+
+    /// Within so many bytes of the bound, and after so many nanoseconds, the file's size is asked for anew: other
+    /// processes may write to it too. In between it is the size that was found and what was written since.
+    static constexpr std::uint64_t gcSizeSlack = std::uint64_t{64} * 1024;
+    static constexpr std::int64_t gcSizeAgeNs = 100000;
 
     ZTCLogSinkMutex mMutex;
 
@@ -106,6 +114,9 @@ private:
     std::uint64_t mLostLines ZT_GUARDED_BY(mMutex) = 0;
     int mLastError ZT_GUARDED_BY(mMutex) = 0;  ///< reason of the latest failure
     int mDescriptor ZT_GUARDED_BY(mMutex) = -1;
+    std::uint64_t mSize ZT_GUARDED_BY(mMutex) = 0;     ///< of the open file, as far as it is known
+    std::int64_t mSizeTime ZT_GUARDED_BY(mMutex) = 0;  ///< when it was asked for; on the clock of mNow
+    std::int64_t mNow ZT_GUARDED_BY(mMutex) = 0;       ///< nanoseconds of the latest stamp; 0: the line has none
     bool mIsRegularFile ZT_GUARDED_BY(mMutex) = false;
     bool mIsTorn ZT_GUARDED_BY(mMutex) = false;           ///< the file ends inside of a line
     bool mIsReopenPending ZT_GUARDED_BY(mMutex) = false;  ///< the descriptor is to be replaced when the path opens

@@ -58,9 +58,19 @@ private:
     sigset_t mFormerMask{};
 };
 
+/// Makes writes past the limit on file sizes fail for good, where they would end the process.
+void sIgnoreFileSizeSignal() noexcept {
+    struct sigaction lFormer {};
+    if (0 == sigaction(SIGXFSZ, nullptr, &lFormer) && 0 == (lFormer.sa_flags & SA_SIGINFO) &&
+        SIG_DFL == lFormer.sa_handler) {
+        struct sigaction lIgnore {};
+        lIgnore.sa_handler = SIG_IGN;
+        sigaction(SIGXFSZ, &lIgnore, nullptr);
+    }
+}
+
 /// Writes all bytes. Returns 0 or the error; arWritten counts what was written either way.
 int sWriteAll(int aDescriptor, const char* apBytes, std::size_t aCount, std::size_t& arWritten) noexcept {
-    ZTCWriteSignalGuard lGuard;
     arWritten = 0;
     while (arWritten < aCount) {
         const ssize_t lResult = ::write(aDescriptor, apBytes + arWritten, aCount - arWritten);
@@ -69,22 +79,26 @@ int sWriteAll(int aDescriptor, const char* apBytes, std::size_t aCount, std::siz
         } else if (0 == lResult) {
             return EIO;
         } else if (EINTR != errno) {
-            const int lError = errno;
-            lGuard.takeBackSignalOf(lError);
-            return lError;
+            return errno;
         }
     }
     return 0;
 }
 
 /// Drops what finds no room: a standard error that nobody reads holds up no thread. A pipe that is ready takes PIPE_BUF
-/// bytes without waiting.
+/// bytes without waiting; one without a reader raises a signal.
 void sWriteToStandardError(const char* apBytes, std::size_t aCount) noexcept {
+    ZTCWriteSignalGuard lGuard;
     while (aCount > 0) {
         struct pollfd lStandardError = {STDERR_FILENO, POLLOUT, 0};
         const std::size_t lPart = std::min(aCount, std::size_t{PIPE_BUF});
+        if (poll(&lStandardError, 1, 0) <= 0) {
+            return;
+        }
         std::size_t lWritten = 0;
-        if (poll(&lStandardError, 1, 0) <= 0 || 0 != sWriteAll(STDERR_FILENO, apBytes, lPart, lWritten)) {
+        const int lError = sWriteAll(STDERR_FILENO, apBytes, lPart, lWritten);
+        if (0 != lError) {
+            lGuard.takeBackSignalOf(lError);
             return;
         }
         apBytes += lPart;
@@ -214,6 +228,7 @@ void ZTCLogSink::setClock(MonotonicClock aClock) noexcept {
 
 void ZTCLogSink::write(ZTCLogLine& arLine) noexcept {
     ZTCLogSinkLock lLock(mMutex);
+    mNow = 0;
     if (arLine.isStamped()) {
         stamp(arLine.getData());
     }
@@ -265,6 +280,7 @@ void ZTCLogSink::stamp(char* apStamp) noexcept {
         mStampSecond = lNow.tv_sec;
         mHasStamp = true;
     }
+    mNow = std::int64_t{lNow.tv_sec} * 1000000000 + lNow.tv_nsec;
     std::memcpy(apStamp, mStamp, lcSecondsLength);
     sPutDigits(apStamp + lcSecondsLength, 6, lNow.tv_nsec / 1000);
 }
@@ -355,11 +371,21 @@ bool ZTCLogSink::prepare(std::size_t aLength) noexcept {
     if (!mIsRotationAllowed || !mIsRegularFile) {
         return true;
     }
-    struct stat lStatus {};
-    if (0 != fstat(mDescriptor, &lStatus) || lStatus.st_size <= 0) {
-        return true;
+    if (mSize + aLength + gcSizeSlack > mBound || isSizeStale()) {
+        struct stat lStatus {};
+        if (0 != fstat(mDescriptor, &lStatus)) {
+            return true;
+        }
+        mSize = static_cast<std::uint64_t>(lStatus.st_size);
+        mSizeTime = mNow;
     }
-    return static_cast<std::uint64_t>(lStatus.st_size) + aLength <= mBound || rotate();
+    return 0 == mSize || mSize + aLength <= mBound || rotate();
+}
+
+/// Whether others may have changed the file's size since it was asked for. A line without a stamp has no time.
+bool ZTCLogSink::isSizeStale() const noexcept {
+    const std::int64_t lAge = mNow - mSizeTime;
+    return 0 == mNow || lAge < 0 || lAge >= gcSizeAgeNs;
 }
 
 bool ZTCLogSink::isRetryDue() noexcept {
@@ -411,6 +437,7 @@ bool ZTCLogSink::openPath() noexcept {
     }
 
     closeDescriptor();
+    sIgnoreFileSizeSignal();
     mDescriptor = lDescriptor;
     mIsRegularFile = S_ISREG(lStatus.st_mode);
     char lLast = '\n';
@@ -452,6 +479,7 @@ bool ZTCLogSink::writeWhole(const char* apBytes, std::size_t aCount) noexcept {
     if (0 == lError) {
         lError = sWriteAll(mDescriptor, apBytes, aCount, lWritten);
         mIsTorn = lWritten > 0 && lWritten < aCount;
+        mSize += lWritten;
     }
     if (0 == lError) {
         return true;
@@ -469,6 +497,7 @@ void ZTCLogSink::closeDescriptor() noexcept {
         ::close(mDescriptor);
     }
     mDescriptor = -1;
+    mSizeTime = 0;
     mIsRegularFile = false;
     mIsTorn = false;
     mIsReopenPending = false;

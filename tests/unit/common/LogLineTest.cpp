@@ -2,6 +2,8 @@
 
 #include <gtest/gtest.h>
 
+#include <cstdio>
+#include <limits>
 #include <string>
 
 #include "tests/support/FailingAllocation.h"
@@ -88,4 +90,39 @@ TEST(LogLine, AFormatThatCannotBeCarriedOutIsShownAsItStands) {
     ZTCLogLine lLine("-M-");
     sFinish(lLine, "bad %ls", lBad);
     EXPECT_EQ("-M- bad %ls\n", sText(lLine));
+}
+
+TEST(LogLine, FormatsAsTheCLibraryDoes) {
+    const auto lHold = [](const char* apFormat, auto... aArguments) {
+#pragma GCC diagnostic push
+#pragma GCC diagnostic ignored "-Wformat-nonliteral"
+#pragma GCC diagnostic ignored "-Wformat-security"
+        char lWanted[256];
+        std::snprintf(lWanted, sizeof lWanted, apFormat, aArguments...);
+        ZTCLogLine lLine("-M-");
+        sFinish(lLine, apFormat, aArguments...);
+#pragma GCC diagnostic pop
+        EXPECT_EQ("-M- " + std::string(lWanted) + "\n", sText(lLine)) << apFormat;
+    };
+    lHold("plain");
+    lHold("%s|%s", "", "two");
+    lHold("%d %d %d %d", 0, -1, std::numeric_limits<int>::min(), std::numeric_limits<int>::max());
+    lHold("%u %u", 0u, std::numeric_limits<unsigned>::max());
+    lHold("%ld %ld", std::numeric_limits<long>::min(), std::numeric_limits<long>::max());
+    lHold("%lu", std::numeric_limits<unsigned long>::max());
+    lHold("<%u> at %s%%", 7u, "half");
+    lHold("%5u|%-5d|%05d|%.2s|%x|%c|%hu|%zu|%llu", 1u, 2, 3, "abc", 255u, 'c', static_cast<unsigned short>(9),
+          std::size_t{10}, 11ull);
+    lHold("%s then %08x", "late", 0xbeefu);
+}
+
+TEST(LogLine, FindsAControlCharacterAtEveryPlace) {
+    for (std::size_t lLength = 1; lLength <= 40; ++lLength) {
+        for (std::size_t lPlace = 0; lPlace < lLength; ++lPlace) {
+            std::string lText(lLength, '\xe9');
+            lText[lPlace] = '\x1f';
+            EXPECT_EQ("-M- " + std::string(lPlace, '\xe9') + "\\x1f" + std::string(lLength - lPlace - 1, '\xe9') + "\n",
+                      sLineOf(lText));
+        }
+    }
 }

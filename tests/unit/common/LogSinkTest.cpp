@@ -36,6 +36,18 @@ void sWriteTo(ZTCLogSink& arSink, const char* apFormat, ...) {
     arSink.write(lLine);
 }
 
+/// The same with a stamp; returns the length of the line.
+std::size_t sWriteStampedTo(ZTCLogSink& arSink, const char* apFormat, ...) __attribute__((format(printf, 2, 3)));
+std::size_t sWriteStampedTo(ZTCLogSink& arSink, const char* apFormat, ...) {
+    ZTCLogLine lLine("-M-", 1, "function", "file");
+    std::va_list lArguments;
+    va_start(lArguments, apFormat);
+    lLine.finish(apFormat, lArguments);
+    va_end(lArguments);
+    arSink.write(lLine);
+    return lLine.getLength();
+}
+
 /// The lines of a file; those that the log has written about itself are mark and text alone.
 std::vector<std::string> sLines(const std::string& acrPath) {
     std::vector<std::string> lLines;
@@ -402,6 +414,39 @@ TEST_F(LogSink, AtItsBoundTheFileIsRenamedAndBegunAnew) {
     EXPECT_EQ((Lines{"-M- 45678", "-M- 56789", "-M- 67890"}), sLines(mPath + ".1")) << "the one before is replaced";
     EXPECT_EQ((Lines{"-M- 78901"}), sLines(mPath));
     EXPECT_FALSE(std::filesystem::exists(mPath + ".2"));
+}
+
+TEST_F(LogSink, WhatOthersWriteIntoTheFileCountsTowardsTheBound) {
+    constexpr std::uint64_t lcBound = 1024 * 1024;
+    mpSink->allowRotation(true);
+    mpSink->setBound(lcBound);
+    mpSink->setPath(mPath.c_str());
+    sWriteTo(*mpSink, "one");
+    std::filesystem::resize_file(mPath, lcBound);
+    sWriteTo(*mpSink, "two");
+    EXPECT_EQ(lcBound, std::filesystem::file_size(mPath + ".1"));
+    EXPECT_EQ((Lines{"-M- two"}), sLines(mPath));
+
+    // A file that somebody has cut is far from the bound again.
+    std::filesystem::resize_file(mPath, lcBound - 1);
+    std::filesystem::resize_file(mPath, 0);
+    sWriteTo(*mpSink, "three");
+    EXPECT_EQ((Lines{"-M- three"}), sLines(mPath));
+    EXPECT_EQ(lcBound, std::filesystem::file_size(mPath + ".1"));
+}
+
+TEST_F(LogSink, ManyStampedLinesStayWithinTheBound) {
+    constexpr std::uint64_t lcBound = 200 * 1024;
+    mpSink->allowRotation(true);
+    mpSink->setBound(lcBound);
+    mpSink->setPath(mPath.c_str());
+    std::uint64_t lWritten = 0;
+    while (!std::filesystem::exists(mPath + ".1")) {
+        lWritten += sWriteStampedTo(*mpSink, "line");
+        ASSERT_LE(std::filesystem::file_size(mPath), lcBound);
+    }
+    EXPECT_EQ(lWritten, std::filesystem::file_size(mPath + ".1") + std::filesystem::file_size(mPath));
+    EXPECT_GT(std::filesystem::file_size(mPath + ".1") + 100, lcBound);
 }
 
 TEST_F(LogSink, ALineLongerThanTheBoundIsWrittenIntoAFileOfItsOwn) {
