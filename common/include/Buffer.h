@@ -3,6 +3,8 @@
 #ifndef COMMON_INCLUDE_BUFFER_H
 #define COMMON_INCLUDE_BUFFER_H
 
+#include <cstdint>
+
 #include "common/include/Types.h"
 
 /// A block of bytes with a size and a capacity, both below 4 GiB. A failed allocation is
@@ -29,6 +31,9 @@ public:
     /// Adds bytes at the end; they may lie in this very buffer. The capacity grows geometrically.
     void append(const void* apBytes, Size aCount);
 
+    /// Adds so many bytes at the end, which are for the caller to write; their address. Grows as append does.
+    unsigned char* extend(Size aCount);
+
     /// Cuts the buffer, or fills it up with zeros.
     void resize(Size aSize);
 
@@ -39,6 +44,7 @@ public:
     void clear() noexcept { mSize = 0; }
 
 private:
+    void makeRoomFor(std::uint64_t aNeeded);
     void growTo(Size aNeeded);
 
     unsigned char* mpData = nullptr;

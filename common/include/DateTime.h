@@ -3,6 +3,7 @@
 #ifndef COMMON_INCLUDE_DATETIME_H
 #define COMMON_INCLUDE_DATETIME_H
 
+#include <cstddef>
 #include <cstdint>
 #include <ctime>
 
@@ -37,7 +38,14 @@ public:
     /// Writes the fields in the order in which they stand here, 20 bytes. Failures are the stream's.
     void encode(ZTCEncodableOutStream& arStream) const;
 
+    /// Stores the same 20 bytes; returns the address behind them.
+    unsigned char* store(unsigned char* apBytes) const noexcept;
+
 private:
+    /// Everything but the local fields.
+    ZTCDateTime(const std::timespec& acrTime, const char* apSeparator, std::nullptr_t) noexcept;
+    void setLocalFields(const std::tm& acrLocal) noexcept;
+
     std::uint16_t mYear = 0;
     std::uint8_t mMonth = 0;
     std::uint8_t mDay = 0;

@@ -34,6 +34,12 @@ public:
     /// Writes bytes as they are, without a count.
     ZTCEncodableOutStream& writeBytes(const void* apBytes, Size aCount);
 
+    /// Adds so many bytes, which are for the caller to write at once; their address.
+    unsigned char* extend(Size aCount) { return mBuffer->extend(aCount); }
+
+    /// Makes room for so many bytes more.
+    void reserve(Size aCount) { mBuffer->reserve(mBuffer->getSize() + aCount); }
+
     /// The buffer that holds what was written so far; shared with the stream.
     ZTCPointer<ZTCBuffer> getBuffer() const { return mBuffer; }
 

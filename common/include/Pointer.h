@@ -9,7 +9,9 @@
 
 #include <cstddef>
 #include <cstdlib>
+#include <new>
 #include <type_traits>
+#include <utility>
 
 #include "common/include/Assert.h"
 #include "common/include/Exception.h"
@@ -32,11 +34,62 @@ enum ZTEPointerAllocType : unsigned char {
     ZTPAT_Max = 3
 };
 
+/// An object with its count, for an owner that holds it as a member and shares it through pointers, all of which go
+/// before the owner does.
+template <typename T>
+class ZTCCounted {
+public:
+    template <typename... Arguments>
+    explicit ZTCCounted(Arguments&&... arArguments)
+        : mCount(0, ZTOS_Foreign), mObject(std::forward<Arguments>(arArguments)...) {}
+    ZTCCounted(const ZTCCounted&) = delete;
+    ZTCCounted& operator=(const ZTCCounted&) = delete;
+
+private:
+    template <typename Other>
+    friend class ZTCPointer;
+
+    ZTCReferenceCount mCount;
+    T mObject;
+};
+
 // The log shows the conditions as they are written here: 0, not nullptr.
 
 template <typename T>
 class ZTCPointer {
 public:
+    /// Makes an object and the pointer to it with one allocation for the object and its count. Throws what the object's
+    /// constructor does, and ZTCNoMemoryEx("Out of Memory", 2).
+    template <typename... Arguments>
+    static ZTCPointer make(Arguments&&... arArguments) {
+        static_assert(alignof(ZTSJoined) <= __STDCPP_DEFAULT_NEW_ALIGNMENT__);
+        void* const lpBlock = ::operator new(sizeof(ZTSJoined), std::nothrow);
+        if (nullptr == lpBlock) {
+            throw ZTCNoMemoryEx("Out of Memory", gcErrNoMemory);
+        }
+        ZTCPointer lPointer;
+        try {
+            lPointer.mPointer = new (static_cast<unsigned char*>(lpBlock) + offsetof(ZTSJoined, mObject))
+                T(std::forward<Arguments>(arArguments)...);
+        } catch (...) {
+            ::operator delete(lpBlock);
+            throw;
+        }
+        lPointer.mReferenceCount = new (lpBlock) ZTCReferenceCount(1, ZTOS_Joined);
+        lPointer.mSizeType = ZTPST_Individual;
+        lPointer.mAllocType = ZTPAT_New;
+        return lPointer;
+    }
+
+    /// Shares an object that is part of its owner.
+    explicit ZTCPointer(ZTCCounted<T>& arCounted) noexcept
+        : mPointer(&arCounted.mObject),
+          mReferenceCount(&arCounted.mCount),
+          mSizeType(ZTPST_Individual),
+          mAllocType(ZTPAT_New) {
+        mReferenceCount->increment();
+    }
+
     /// An empty pointer.
     ZTCPointer() noexcept = default;
 
@@ -131,6 +184,12 @@ private:
     template <typename Other>
     friend class ZTCPointer;
 
+    /// The one allocation of make.
+    struct ZTSJoined {
+        alignas(ZTCReferenceCount) unsigned char mCount[sizeof(ZTCReferenceCount)];
+        alignas(T) unsigned char mObject[sizeof(T)];
+    };
+
     template <typename Other>
     void shareFieldsOf(const ZTCPointer<Other>& acrCopy) noexcept {
         mPointer = acrCopy.mPointer;
@@ -159,8 +218,16 @@ private:
     void _releaseMemory() {
         static_assert(
             requires { sizeof(T); }, "an object is released only where its type is complete");
-        delete mReferenceCount;
+        ZTCReferenceCount* const lpCount = mReferenceCount;
         mReferenceCount = nullptr;
+        if (nullptr != lpCount && ZTOS_Apart != lpCount->getStorage()) {
+            if (ZTOS_Joined == lpCount->getStorage()) {
+                mPointer->~T();
+                ::operator delete(lpCount);
+            }
+            return;
+        }
+        delete lpCount;
         if (nullptr == mPointer) {
             return;
         }

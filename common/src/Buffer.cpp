@@ -27,23 +27,28 @@ void ZTCBuffer::append(const void* apBytes, Size aCount) {
         return;
     }
     const std::uint64_t lNeeded = std::uint64_t{mSize} + aCount;
-    if (lNeeded > gcLargestBuffer) {
-        throw ZTCInvalidEx("Buffer cannot hold more than 4294967295 bytes", gcErrInvalid);
-    }
-
     const unsigned char* lpBytes = static_cast<const unsigned char*>(apBytes);
     if (lNeeded > mCapacity) {
         const std::less<const unsigned char*> lIsBefore;
         const bool lIsOwn = nullptr != mpData && !lIsBefore(lpBytes, mpData) && lIsBefore(lpBytes, mpData + mSize);
         const std::ptrdiff_t lOffset = lIsOwn ? lpBytes - mpData : 0;
-        const std::uint64_t lDoubled = ZT_MAX(std::uint64_t{mCapacity} * 2, gcLeastCapacity);
-        growTo(static_cast<Size>(ZT_MIN(ZT_MAX(lNeeded, lDoubled), gcLargestBuffer)));
+        makeRoomFor(lNeeded);
         if (lIsOwn) {
             lpBytes = mpData + lOffset;
         }
     }
     std::memmove(mpData + mSize, lpBytes, aCount);
     mSize = static_cast<Size>(lNeeded);
+}
+
+unsigned char* ZTCBuffer::extend(Size aCount) {
+    const std::uint64_t lNeeded = std::uint64_t{mSize} + aCount;
+    if (lNeeded > mCapacity) {
+        makeRoomFor(lNeeded);
+    }
+    unsigned char* const lpBytes = mpData + mSize;
+    mSize = static_cast<Size>(lNeeded);
+    return lpBytes;
 }
 
 void ZTCBuffer::resize(Size aSize) {
@@ -58,6 +63,14 @@ void ZTCBuffer::reserve(Size aCapacity) {
     if (aCapacity > mCapacity) {
         growTo(aCapacity);
     }
+}
+
+void ZTCBuffer::makeRoomFor(std::uint64_t aNeeded) {
+    if (aNeeded > gcLargestBuffer) {
+        throw ZTCInvalidEx("Buffer cannot hold more than 4294967295 bytes", gcErrInvalid);
+    }
+    const std::uint64_t lDoubled = ZT_MAX(std::uint64_t{mCapacity} * 2, gcLeastCapacity);
+    growTo(static_cast<Size>(ZT_MIN(ZT_MAX(aNeeded, lDoubled), gcLargestBuffer)));
 }
 
 void ZTCBuffer::growTo(Size aNeeded) {

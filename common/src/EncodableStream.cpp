@@ -3,38 +3,29 @@
 #include <cstdint>
 #include <cstring>
 #include <limits>
+#include <type_traits>
+
+#include "common/include/NetworkOrder.h"
 
 namespace {
 
 template <typename Number>
-void sToNetworkOrder(Number aValue, unsigned char* apBytes) {
-    for (std::size_t i = sizeof(Number); i > 0; --i) {
-        apBytes[i - 1] = static_cast<unsigned char>(aValue);
-        aValue = static_cast<Number>(static_cast<std::uint64_t>(aValue) >> 8);
-    }
-}
-
-template <typename Number>
-Number sFromNetworkOrder(const unsigned char* apBytes) {
-    std::uint64_t lValue = 0;
-    for (std::size_t i = 0; i < sizeof(Number); ++i) {
-        lValue = lValue << 8 | apBytes[i];
-    }
-    return static_cast<Number>(lValue);
-}
-
-template <typename Number>
 void sWriteNumber(ZTCEncodableOutStream& arStream, Number aValue) {
-    unsigned char lBytes[sizeof(Number)];
-    sToNetworkOrder(aValue, lBytes);
-    arStream.writeBytes(lBytes, sizeof(lBytes));
+    storeInNetworkOrder(arStream.extend(sizeof(Number)), aValue);
 }
 
 template <typename Number>
 void sReadNumber(ZTCEncodableInStream& arStream, Number& arValue) {
     unsigned char lBytes[sizeof(Number)];
     arStream.readBytes(lBytes, sizeof(lBytes));
-    arValue = sFromNetworkOrder<Number>(lBytes);
+    arValue = loadFromNetworkOrder<Number>(lBytes);
+}
+
+template <typename Number>
+void sReadSigned(ZTCEncodableInStream& arStream, Number& arValue) {
+    std::make_unsigned_t<Number> lValue = 0;
+    sReadNumber(arStream, lValue);
+    arValue = static_cast<Number>(lValue);
 }
 
 }  // namespace
@@ -116,17 +107,17 @@ ZTCEncodableInStream& ZTCEncodableInStream::operator>>(unsigned long& arValue) {
 }
 
 ZTCEncodableInStream& ZTCEncodableInStream::operator>>(int& arValue) {
-    sReadNumber(*this, arValue);
+    sReadSigned(*this, arValue);
     return *this;
 }
 
 ZTCEncodableInStream& ZTCEncodableInStream::operator>>(long& arValue) {
-    sReadNumber(*this, arValue);
+    sReadSigned(*this, arValue);
     return *this;
 }
 
 ZTCEncodableInStream& ZTCEncodableInStream::operator>>(ZTCString& arText) {
-    const Size lLength = sFromNetworkOrder<Size>(peek(sizeof(Size)));
+    const Size lLength = loadFromNetworkOrder<Size>(peek(sizeof(Size)));
     if (lLength > remaining() - sizeof(Size)) {
         throw ZTCInvalidEx("Not enough data in stream", gcErrInvalid);
     }

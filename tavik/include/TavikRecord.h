@@ -15,6 +15,8 @@ public:
     /// One occurrence, now. Shares the data. Throws ZTCNoMemoryEx.
     explicit ZTCTavikRecord(const ZTCPointer<ZTCScopeData>& acrData);
     virtual ~ZTCTavikRecord() = default;
+    ZTCTavikRecord(const ZTCTavikRecord&) = delete;
+    ZTCTavikRecord& operator=(const ZTCTavikRecord&) = delete;
 
     virtual const ZTCPointer<ZTCScopeData>& getScopeData() const { return mScopeData; }
     virtual ZTCPointer<ZTCScopeData>& getScopeData() { return mScopeData; }
@@ -26,6 +28,10 @@ public:
     void encode(ZTCEncodableOutStream& arStream) const;
 
 private:
+    // The times live in the record itself, and longer than the pointers to them.
+    ZTCCounted<ZTCDateTime> mBeginTime;
+    ZTCCounted<ZTCDateTime> mEndTime;
+
     ZTCPointer<ZTCDateTime> mBeginTimeStamp;
     ZTCPointer<ZTCDateTime> mEndTimeStamp;
     std::uint32_t mOccurences;

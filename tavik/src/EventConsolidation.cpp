@@ -134,9 +134,10 @@ void startScopeRecord(ZTCTavikSystem& arSystem, const ZTCPointer<ZTCScopeEvent>&
                       const unsigned char* apRecord, unsigned int aSize, const ZTCTavikTarget* apTarget) {
     ZT_ENTRY();
     const unsigned int lCapacity = arSystem.getMaxEventDataSize();
-    ZTCPointer<ZTCScopeData> lData(apTarget != nullptr ? NEW ZTCScopeData(acrEvent, apRecord, aSize, lCapacity,
+    ZTCPointer<ZTCScopeData> lData = apTarget != nullptr
+                                         ? ZTCPointer<ZTCScopeData>::make(acrEvent, apRecord, aSize, lCapacity,
                                                                           apTarget->getWwpn(), apTarget->getWwnn())
-                                                       : NEW ZTCScopeData(acrEvent, apRecord, aSize, lCapacity));
+                                         : ZTCPointer<ZTCScopeData>::make(acrEvent, apRecord, aSize, lCapacity);
     arSystem.setPrevScopeData(aBoardId, lData);
     ZT_EXIT();
 }

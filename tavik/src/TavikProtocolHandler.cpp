@@ -276,13 +276,13 @@ void ZTCTavikProtocolHandler::handleRegisterTargetsCommand(const ZTCPointer<ZTCB
         return;
     }
     for (unsigned int lIndex = 0; lIndex < lTargetCount; ++lIndex) {
-        ZTCPointer<ZTCWorldWideName> lWwnn(NEW ZTCWorldWideName());
-        ZTCPointer<ZTCWorldWideName> lWwpn(NEW ZTCWorldWideName());
+        auto lWwnn = ZTCPointer<ZTCWorldWideName>::make();
+        auto lWwpn = ZTCPointer<ZTCWorldWideName>::make();
         unsigned int lFcId = 0;
         lWwnn->decode(lStream);
         lWwpn->decode(lStream);
         lStream >> lFcId;
-        const ZTCPointer<ZTCTavikTarget> lTarget(NEW ZTCTavikTarget(lWwnn, lWwpn, lFcId));
+        const auto lTarget = ZTCPointer<ZTCTavikTarget>::make(lWwnn, lWwpn, lFcId);
         mpTavikSystem->addFcTarget(lTarget);
         mpTavikSystem->addWwpnTarget(lTarget);
     }

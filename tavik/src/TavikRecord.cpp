@@ -1,17 +1,22 @@
 #include "tavik/include/TavikRecord.h"
 
 #include "common/include/Log.h"
-#include "common/include/Memory.h"
+#include "common/include/NetworkOrder.h"
 
 namespace {
 
 constexpr char gcTimeSeparator[] = ".";
 
+/// Bytes of the occurrences and the times, encoded.
+constexpr Size gcFixedSize = sizeof(std::uint32_t) + 2 * ZTCDateTime::gcEncodedSize;
+
 }  // namespace
 
 ZTCTavikRecord::ZTCTavikRecord(const ZTCPointer<ZTCScopeData>& acrData)
-    : mBeginTimeStamp(NEW ZTCDateTime(gcTimeSeparator)),
-      mEndTimeStamp(NEW ZTCDateTime(gcTimeSeparator)),
+    : mBeginTime(gcTimeSeparator),
+      mEndTime(gcTimeSeparator),
+      mBeginTimeStamp(mBeginTime),
+      mEndTimeStamp(mEndTime),
       mOccurences(1),
       mScopeData(acrData) {
     ZT_ENTRY();
@@ -27,9 +32,11 @@ void ZTCTavikRecord::incrementOccurrences() noexcept {
 
 void ZTCTavikRecord::encode(ZTCEncodableOutStream& arStream) const {
     ZT_ENTRY();
-    arStream << mOccurences;
-    mBeginTimeStamp->encode(arStream);
-    mEndTimeStamp->encode(arStream);
-    mScopeData->encode(arStream);
+    const ZTCScopeData& lrData = *mScopeData;
+    unsigned char* lpBytes = arStream.extend(gcFixedSize + lrData.getEncodedSize());
+    lpBytes = storeInNetworkOrder(lpBytes, mOccurences);
+    lpBytes = mBeginTimeStamp->store(lpBytes);
+    lpBytes = mEndTimeStamp->store(lpBytes);
+    lrData.store(lpBytes);
     ZT_EXIT();
 }

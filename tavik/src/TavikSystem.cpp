@@ -437,7 +437,7 @@ void ZTCTavikSystem::filePrevScopeRecord() {
 
 void ZTCTavikSystem::setPrevScopeData(unsigned int aBoardId, ZTCPointer<ZTCScopeData>& arData) {
     ZT_ENTRY();
-    ZTCPointer<ZTCTavikRecord> lRecord(NEW ZTCTavikRecord(arData));
+    const auto lRecord = ZTCPointer<ZTCTavikRecord>::make(arData);
     if (mPrevScopeDataSet) {
         filePrevScopeRecord();
     }

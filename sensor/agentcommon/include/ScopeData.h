@@ -17,6 +17,9 @@ inline constexpr Size MAX_SCOPERECORD_SIZE = 900;
 /// No lock of its own: guarded by the lock of whoever holds it.
 class ZTCScopeData {
 public:
+    /// Encoded bytes beside the names and the data: category, subcategory, names (0 or 1), length.
+    static constexpr Size gcFixedSize = 7;
+
     /// A record without names. Copies aLength bytes of event data. aCapacity is the size in bytes up to which the event
     /// data are meant to grow: a bound that the holder tests before it appends, not a reservation; it may be smaller
     /// than the first data, 0 included. Throws ZTCNoMemoryEx.
@@ -41,6 +44,12 @@ public:
 
     /// Category, subcategory, names (0 or 1), with 1 port name and node name, then the data's length and the data.
     void encode(ZTCEncodableOutStream& arStream) const;
+
+    /// The bytes that encode writes, and storing them where there is room for so many; returns the address behind them.
+    Size getEncodedSize() const noexcept {
+        return (mHasNames ? gcFixedSize + 2 * ZTCWorldWideName::gcLength : gcFixedSize) + mEventData.getSize();
+    }
+    unsigned char* store(unsigned char* apBytes) const noexcept;
 
 private:
     ZTCPointer<ZTCScopeEvent> mEvent;

@@ -1,5 +1,9 @@
 #include "sensor/agentcommon/include/ScopeData.h"
 
+#include <cstring>
+
+#include "common/include/NetworkOrder.h"
+
 ZTCScopeData::ZTCScopeData(const ZTCPointer<ZTCScopeEvent>& acrEvent, const unsigned char* apData, unsigned int aLength,
                            unsigned int aCapacity)
     : mEvent(acrEvent), mEventData(aLength), mCapacity(aCapacity), mHasNames(false) {
@@ -18,11 +22,24 @@ void ZTCScopeData::appendEventData(const unsigned char* apData, unsigned int aLe
 }
 
 void ZTCScopeData::encode(ZTCEncodableOutStream& arStream) const {
-    arStream << getCategory() << getSubcategory() << static_cast<unsigned char>(mHasNames ? 1 : 0);
+    store(arStream.extend(getEncodedSize()));
+}
+
+unsigned char* ZTCScopeData::store(unsigned char* apBytes) const noexcept {
+    const ZTCScopeEvent& lrEvent = *mEvent;
+    *apBytes++ = lrEvent.getCategory();
+    *apBytes++ = lrEvent.getSubcategory();
+    *apBytes++ = mHasNames ? 1 : 0;
     if (mHasNames) {
-        mWwpn.encode(arStream);
-        mWwnn.encode(arStream);
+        for (const ZTCWorldWideName* lpName : {&mWwpn, &mWwnn}) {
+            std::memcpy(apBytes, lpName->getBytes(), ZTCWorldWideName::gcLength);
+            apBytes += ZTCWorldWideName::gcLength;
+        }
     }
-    arStream << mEventData.getSize();
-    arStream.writeBytes(mEventData.getData(), mEventData.getSize());
+    const Size lSize = mEventData.getSize();
+    apBytes = storeInNetworkOrder(apBytes, lSize);
+    if (lSize != 0) {
+        std::memcpy(apBytes, mEventData.getData(), lSize);
+    }
+    return apBytes + lSize;
 }

@@ -2,6 +2,8 @@
 
 #include <gtest/gtest.h>
 
+#include <cstring>
+
 #include <string>
 
 #include "common/include/Exception.h"
@@ -124,4 +126,17 @@ TEST(Buffer, EveryFailedAllocationIsOutOfMemoryAndChangesNothing) {
     ZTCFailingAllocation lFailure(1);
     EXPECT_THROW(lBuffer.resize(100000), ZTCNoMemoryEx);
     EXPECT_EQ(1002u, lBuffer.getSize());
+}
+
+TEST(Buffer, ExtendingGivesBytesToWriteAndGrowsAsAppendDoes) {
+    ZTCBuffer lBuffer;
+    std::memcpy(lBuffer.extend(2), "ab", 2);
+    const Size lCapacity = lBuffer.getCapacity();
+    std::memcpy(lBuffer.extend(lCapacity), std::string(lCapacity, 'x').c_str(), lCapacity);
+    EXPECT_EQ("ab" + std::string(lCapacity, 'x'), sText(lBuffer));
+    EXPECT_EQ(2 * lCapacity, lBuffer.getCapacity());
+    EXPECT_THROW(lBuffer.extend(0xFFFFFFFF), ZTCInvalidEx);
+    ZTCFailingAllocation lFailure(1);
+    EXPECT_THROW(lBuffer.extend(100000), ZTCNoMemoryEx);
+    EXPECT_EQ(2 + lCapacity, lBuffer.getSize());
 }
