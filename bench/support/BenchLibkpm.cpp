@@ -55,10 +55,18 @@ std::uint32_t sKpmUnregEvent(std::uint32_t, std::uint32_t) {
     return 0;
 }
 
-const KPM_FunctionList gcFunctions = {
-    KPM_INTERFACE_VERSION, sizeof(KPM_FunctionList), sInit,          sClose,           sGetNumberOfAdapters,
-    sIsZtapiSupported,     sGetAdapterInfo,          sZtapiRegEvent, sZtapiUnregEvent, sKpmRegEvent,
-    sKpmUnregEvent};
+const KPM_FunctionList gcFunctions = {KPM_INTERFACE_VERSION,
+                                      sizeof(KPM_FunctionList),
+                                      sInit,
+                                      sClose,
+                                      sGetNumberOfAdapters,
+                                      sIsZtapiSupported,
+                                      sGetAdapterInfo,
+                                      sZtapiRegEvent,
+                                      sZtapiUnregEvent,
+                                      sKpmRegEvent,
+                                      sKpmUnregEvent,
+                                      nullptr};
 
 }  // namespace
 

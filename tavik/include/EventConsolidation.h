@@ -11,7 +11,7 @@
 #include "sensor/agentcommon/include/WorldWideName.h"
 #include "tavik/include/ConsolidationKinds.h"
 #include "tavik/include/TavikSystem.h"
-#include "tavik/include/TavikTarget.h"
+#include "tavik/include/TavikTargetIndex.h"
 
 /// Where one consolidation member keeps the identity of the last record it started, in the order of the kind's table
 /// row. Names are made once and then assigned in place, so that noting a new identity cannot fail.
@@ -27,9 +27,9 @@ void consolidateEvent(ZTCTavikSystem& arSystem, const ZTSConsolidationKind& acrK
                       const ZTCPointer<ZTCScopeEvent>& acrEvent, unsigned int aBoardId, const void* apData, bool aIsNew)
     ZT_REQUIRES(arSystem.getPrevDataLock());
 
-/// Starts a new pending record with these bytes, which gets the target's names where apTarget is not null.
+/// Starts a new pending record with these bytes, which gets the remote port's names where apNames is not null.
 void startScopeRecord(ZTCTavikSystem& arSystem, const ZTCPointer<ZTCScopeEvent>& acrEvent, unsigned int aBoardId,
-                      const unsigned char* apRecord, unsigned int aSize, const ZTCTavikTarget* apTarget)
+                      const unsigned char* apRecord, unsigned int aSize, const ZTSRemotePortNames* apNames)
     ZT_REQUIRES(arSystem.getPrevDataLock());
 
 #endif

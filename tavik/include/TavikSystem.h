@@ -20,6 +20,7 @@
 #include "tavik/include/TavikRecord.h"
 #include "tavik/include/TavikRecordList.h"
 #include "tavik/include/TavikTarget.h"
+#include "tavik/include/TavikTargetIndex.h"
 
 class ZTCTavikProtocolHandler;
 
@@ -95,15 +96,12 @@ public:
         return mTargetsWwpnMap.get(acrKey);
     }
 
-    /// The same without an exception, for the path of events, where an unknown port is an everyday thing: null then.
+    /// For the path of events, where an unknown port is an everyday thing: null where there is no such target.
     const ZTCTavikTarget* findFcTarget(unsigned int aFcId) ZT_REQUIRES(mPrevDataLock) {
         const ZTCPointer<ZTCTavikTarget>* lpTarget = mTargetsMap.get(aFcId, std::nothrow);
         return lpTarget == nullptr ? nullptr : lpTarget->get();
     }
-    const ZTCTavikTarget* findWwpnTarget(unsigned long aKey) ZT_REQUIRES(mPrevDataLock) {
-        const ZTCPointer<ZTCTavikTarget>* lpTarget = mTargetsWwpnMap.get(aKey, std::nothrow);
-        return lpTarget == nullptr ? nullptr : lpTarget->get();
-    }
+    const ZTSRemotePortNames* findWwpnNames(unsigned long aKey) ZT_REQUIRES(mPrevDataLock);
 
     // ---- Record lists: filled by callbacks, exchanged by the command thread.
 
@@ -192,6 +190,7 @@ private:
     bool mPrevScopeDataSet ZT_GUARDED_BY(mPrevDataLock);
     ZTCPointer<ZTCScopeData> mPrevScopeData ZT_GUARDED_BY(mPrevDataLock);
     ZTCTavikTargetWwpnMap mTargetsWwpnMap ZT_GUARDED_BY(mPrevDataLock);
+    ZTCTavikTargetIndex mTargetIndex ZT_GUARDED_BY(mPrevDataLock);  ///< the names in mTargetsWwpnMap
     ZTCPointer<ZTCWorldWideName> mPrevPortName ZT_GUARDED_BY(mPrevDataLock);
     std::atomic<std::uint32_t> mTotalEventDataSize;  ///< written under mPrevDataLock
     unsigned int mPrevBoardId ZT_GUARDED_BY(mPrevDataLock);

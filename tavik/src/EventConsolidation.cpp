@@ -75,11 +75,11 @@ void sFillRecord(const ZTSConsolidationKind& acrKind, const unsigned char* apPay
     sSetBits(acrKind, apPayload, apRecord);
 }
 
-/// The registered target with the payload's remote port, or null.
-const ZTCTavikTarget* sFindTarget(ZTCTavikSystem& arSystem, const ZTSConsolidationKind& acrKind,
-                                  const unsigned char* apPayload) ZT_REQUIRES(arSystem.getPrevDataLock()) {
+/// The names of the registered target that is the payload's remote port, or null.
+const ZTSRemotePortNames* sFindNames(ZTCTavikSystem& arSystem, const ZTSConsolidationKind& acrKind,
+                                     const unsigned char* apPayload) ZT_REQUIRES(arSystem.getPrevDataLock()) {
     try {
-        return arSystem.findWwpnTarget(ZTCWorldWideName(apPayload + gcRemotePortOffset).getKey());
+        return arSystem.findWwpnNames(ZTCWorldWideName(apPayload + gcRemotePortOffset).getKey());
     } catch (const ZTCException&) {
         if (!acrKind.mIgnoresLookupFailures) {
             throw;
@@ -123,7 +123,7 @@ void consolidateEvent(ZTCTavikSystem& arSystem, const ZTSConsolidationKind& acrK
         unsigned char lRecord[gcMaxRecordDataSize] = {};
         sFillRecord(acrKind, lpPayload, lRecord);
         startScopeRecord(arSystem, acrEvent, aBoardId, lRecord, acrKind.mRecordSize,
-                         sFindTarget(arSystem, acrKind, lpPayload));
+                         sFindNames(arSystem, acrKind, lpPayload));
         // Only now: an identity without its record would let the next event extend the wrong one.
         sNoteIdentity(acrKind, acrPrev, lpPayload);
     }
@@ -131,13 +131,13 @@ void consolidateEvent(ZTCTavikSystem& arSystem, const ZTSConsolidationKind& acrK
 }
 
 void startScopeRecord(ZTCTavikSystem& arSystem, const ZTCPointer<ZTCScopeEvent>& acrEvent, unsigned int aBoardId,
-                      const unsigned char* apRecord, unsigned int aSize, const ZTCTavikTarget* apTarget) {
+                      const unsigned char* apRecord, unsigned int aSize, const ZTSRemotePortNames* apNames) {
     ZT_ENTRY();
     const unsigned int lCapacity = arSystem.getMaxEventDataSize();
-    ZTCPointer<ZTCScopeData> lData = apTarget != nullptr
-                                         ? ZTCPointer<ZTCScopeData>::make(acrEvent, apRecord, aSize, lCapacity,
-                                                                          apTarget->getWwpn(), apTarget->getWwnn())
-                                         : ZTCPointer<ZTCScopeData>::make(acrEvent, apRecord, aSize, lCapacity);
+    ZTCPointer<ZTCScopeData> lData =
+        apNames != nullptr
+            ? ZTCPointer<ZTCScopeData>::make(acrEvent, apRecord, aSize, lCapacity, apNames->mWwpn, apNames->mWwnn)
+            : ZTCPointer<ZTCScopeData>::make(acrEvent, apRecord, aSize, lCapacity);
     arSystem.setPrevScopeData(aBoardId, lData);
     ZT_EXIT();
 }

@@ -331,8 +331,14 @@ void sConsolidateRscnEvent(const ZTCPointer<ZTCScopeEvent>& acrEvent, unsigned i
             TavikStore32(lRecord + offsetof(TavikRscn, Version), EVENTDATA_VERSION);
             TavikStore32(lRecord + offsetof(TavikRscn, FcId), aFcId);
             const bool lIsPortAddress = (aFcId & gcRscnFormatMask) == 0;
+            const ZTCTavikTarget* lpTarget =
+                lIsPortAddress ? gpTavikSystem->findFcTarget(aFcId & gcRscnAddressMask) : nullptr;
+            ZTSRemotePortNames lNames;
+            if (lpTarget != nullptr) {
+                lNames = {*lpTarget->getWwpn(), *lpTarget->getWwnn()};
+            }
             startScopeRecord(*gpTavikSystem, acrEvent, aBoardId, lRecord, sizeof lRecord,
-                             lIsPortAddress ? gpTavikSystem->findFcTarget(aFcId & gcRscnAddressMask) : nullptr);
+                             lpTarget != nullptr ? &lNames : nullptr);
             lPrevFcId = aFcId;
         }
     }

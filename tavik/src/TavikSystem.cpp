@@ -372,7 +372,9 @@ void ZTCTavikSystem::addWwpnTarget(const ZTCPointer<ZTCTavikTarget>& acrTarget) 
         const ZTCPrevDataHold lHold(*this);
         lIsNew = !mTargetsWwpnMap.hasKey(lKey);
         if (lIsNew) {
+            mTargetIndex.reserveOne();
             mTargetsWwpnMap.insert(lKey, acrTarget);
+            mTargetIndex.insert({*acrTarget->getWwpn(), *acrTarget->getWwnn()});
         }
     }
     if (lIsNew) {
@@ -380,6 +382,15 @@ void ZTCTavikSystem::addWwpnTarget(const ZTCPointer<ZTCTavikTarget>& acrTarget) 
                       acrTarget->getWwpn()->getString().get(), acrTarget->getFcId());
     }
     ZT_EXIT();
+}
+
+const ZTSRemotePortNames* ZTCTavikSystem::findWwpnNames(unsigned long aKey) {
+    const ZTSRemotePortNames* lpNames = mTargetIndex.find(aKey);
+    if (lpNames == nullptr && isLogLevelEnabled(ZTLL_Info)) {
+        // The map does not have it either, and says so.
+        static_cast<void>(mTargetsWwpnMap.get(aKey, std::nothrow));
+    }
+    return lpNames;
 }
 
 // ---- Record lists and the pending record ----

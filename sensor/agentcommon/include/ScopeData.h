@@ -31,6 +31,10 @@ public:
                  unsigned int aCapacity, const ZTCPointer<ZTCWorldWideName>& acrWwpn,
                  const ZTCPointer<ZTCWorldWideName>& acrWwnn);
 
+    /// Likewise, with names that are copied.
+    ZTCScopeData(const ZTCPointer<ZTCScopeEvent>& acrEvent, const unsigned char* apData, unsigned int aLength,
+                 unsigned int aCapacity, const ZTCWorldWideName& acrWwpn, const ZTCWorldWideName& acrWwnn);
+
     unsigned char getCategory() const { return mEvent->getCategory(); }
     unsigned char getSubcategory() const { return mEvent->getSubcategory(); }
 

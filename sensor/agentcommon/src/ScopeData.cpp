@@ -13,7 +13,11 @@ ZTCScopeData::ZTCScopeData(const ZTCPointer<ZTCScopeEvent>& acrEvent, const unsi
 ZTCScopeData::ZTCScopeData(const ZTCPointer<ZTCScopeEvent>& acrEvent, const unsigned char* apData, unsigned int aLength,
                            unsigned int aCapacity, const ZTCPointer<ZTCWorldWideName>& acrWwpn,
                            const ZTCPointer<ZTCWorldWideName>& acrWwnn)
-    : mEvent(acrEvent), mEventData(aLength), mCapacity(aCapacity), mHasNames(true), mWwpn(*acrWwpn), mWwnn(*acrWwnn) {
+    : ZTCScopeData(acrEvent, apData, aLength, aCapacity, *acrWwpn, *acrWwnn) {}
+
+ZTCScopeData::ZTCScopeData(const ZTCPointer<ZTCScopeEvent>& acrEvent, const unsigned char* apData, unsigned int aLength,
+                           unsigned int aCapacity, const ZTCWorldWideName& acrWwpn, const ZTCWorldWideName& acrWwnn)
+    : mEvent(acrEvent), mEventData(aLength), mCapacity(aCapacity), mHasNames(true), mWwpn(acrWwpn), mWwnn(acrWwnn) {
     mEventData.append(apData, aLength);
 }
 

@@ -1,0 +1,44 @@
+/// The names of the registered targets by port name, in one flat table: an event's look-up reads one place of memory,
+/// however many targets there are.
+#ifndef TAVIK_TAVIKTARGETINDEX_H
+#define TAVIK_TAVIKTARGETINDEX_H
+
+#include <cstddef>
+#include <vector>
+
+#include "sensor/agentcommon/include/WorldWideName.h"
+
+/// A remote port's names.
+struct ZTSRemotePortNames {
+    ZTCWorldWideName mWwpn;
+    ZTCWorldWideName mWwnn;
+};
+
+/// Not locked: its owner guards it. Names are added and never removed.
+class ZTCTavikTargetIndex {
+public:
+    /// Makes room for one port more. Throws ZTCNoMemoryEx and changes nothing then.
+    void reserveOne();
+
+    /// Adds a port whose name is not there yet; room was made for it.
+    void insert(const ZTSRemotePortNames& acrNames) noexcept;
+
+    /// The names of the port with this key (ZTCWorldWideName::getKey), or null. Valid until reserveOne.
+    const ZTSRemotePortNames* find(unsigned long aKey) const noexcept;
+
+private:
+    /// Where the search for a key begins.
+    std::size_t getFirstSlot(unsigned long aKey) const noexcept {
+        return static_cast<std::size_t>(aKey * 0x9e3779b97f4a7c15 >> mShift);
+    }
+
+    /// A slot whose port name is that of no port is free, so that a port of that name stands by itself. The number of
+    /// slots is a power of 2, and at most two thirds of them are taken.
+    std::vector<ZTSRemotePortNames> mSlots;
+    ZTSRemotePortNames mNoPort;
+    bool mHasNoPort = false;
+    std::size_t mTaken = 0;
+    unsigned mShift = 0;  ///< the hash's highest bits are the slot
+};
+
+#endif
