@@ -116,7 +116,7 @@ private:
 };
 
 void LogTexts::driveStart() {
-    drivePast("preInit and the options, with everything logged", [this] {
+    drivePast("preInit and the options, with everything logged", [] {
         const ZTCKeptLogCode lKept;
         ZTCTestTavikSystem lSystem;
         lSystem.preInit();
@@ -261,9 +261,10 @@ void LogTexts::drivePointers() {
         {"*", [](ZTCIntPointer& arForged) { static_cast<void>(*arForged); }},
         {"get", [](ZTCIntPointer& arForged) { static_cast<void>(arForged.get()); }},
     };
-    for (const auto& [lpWhat, lcrUse] : lUses) {
+    for (const auto& lcrNamedUse : lUses) {
+        const auto& lcrUse = lcrNamedUse.second;
         for (const void* lpObject : {static_cast<const void*>(nullptr), static_cast<const void*>(&sObject)}) {
-            driveToTheEnd(lpWhat, [&] {
+            driveToTheEnd(lcrNamedUse.first, [&] {
                 ZTCForgedObject<ZTCIntPointer> lForged(lpObject);
                 lcrUse(lForged.get());
             });

@@ -74,7 +74,7 @@ std::string sRegisteredText(unsigned aBoard, const ZTSScopeEventKind& acrKind) {
 }
 
 unsigned sKeyForm(const ZTSScopeEventKind& acrKind) {
-    return acrKind.mRegisteredCategory << 8 | acrKind.mRegisteredSubcategory;
+    return unsigned{acrKind.mRegisteredCategory} << 8 | acrKind.mRegisteredSubcategory;
 }
 
 ZTCRegistrationKey sKey(unsigned aBoard, const ZTSScopeEventKind& acrKind) {
