@@ -54,7 +54,7 @@ const std::vector<ZTSFaultWay>& faultWays() {
             {"signalfd", "EMFILE", EMFILE, 0, false, false, true},
             {"stat", "EACCES", EACCES, 0, false, false, true},
             {"unlink", "EACCES", EACCES, 0, false, false, true},
-            {"utime", "EACCES", EACCES, 0, false, false, true},
+            {"utimensat", "EACCES", EACCES, 0, false, false, true},
             {"write", "EINTR", EINTR, 0, false, true, false},
             {"write", "one byte", 0, 1, false, true, true},
             {"write", "ENOSPC", ENOSPC, 0, false, true, true},

@@ -10,7 +10,6 @@
 #include <sys/uio.h>
 #include <time.h>
 #include <unistd.h>
-#include <utime.h>
 
 #include <cerrno>
 #include <cstdarg>
@@ -105,7 +104,7 @@ ZT_INTERPOSE(setsid, pid_t, -1, (), ())
 ZT_INTERPOSE(signalfd, int, -1, (int aFile, const sigset_t* apSignals, int aFlags), (aFile, apSignals, aFlags))
 ZT_INTERPOSE(stat, int, -1, (const char* apPath, struct stat* apStatus), (apPath, apStatus))
 ZT_INTERPOSE(unlink, int, -1, (const char* apPath), (apPath))
-ZT_INTERPOSE(utime, int, -1, (const char* apPath, const struct utimbuf* apTimes), (apPath, apTimes))
+ZT_INTERPOSE(utimensat, int, -1, (int aDirectory, const char* apPath, const struct timespec* apTimes, int aFlags), (aDirectory, apPath, apTimes, aFlags))
 
 ZT_INTERPOSE_TRANSFER(pread, (int aFile, void* apTo, std::size_t aSize, off_t aFrom), (aFile, apTo, aSize, aFrom))
 ZT_INTERPOSE_TRANSFER(pwrite, (int aFile, const void* apFrom, std::size_t aSize, off_t aTo), (aFile, apFrom, aSize, aTo))

@@ -27,7 +27,7 @@ double sSecondsSince(std::chrono::steady_clock::time_point aBegin) {
 int sSoak(double aSeconds) {
     ZTCAgentProcess lAgent(gcBoards);
     const ZTCFaultInjection lBlocks(lAgent);  // it counts them
-    lAgent.startAndConnectQuietly(63);
+    lAgent.startAndConnectQuietly(63, {"-b", "2"});
     ZTCSoakLoad lLoad(lAgent, gcBoards);
 
     const std::vector<std::string> lFiles = {lAgent.agentLogPath(), lAgent.agentLogPath() + ".1",

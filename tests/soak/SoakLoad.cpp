@@ -1,5 +1,7 @@
 #include "tests/soak/SoakLoad.h"
 
+#include <unistd.h>
+
 #include <csignal>
 #include <stdexcept>
 #include <string>
@@ -80,6 +82,10 @@ void ZTCSoakLoad::countExactly() {
 
 void ZTCSoakLoad::playRound() {
     ++mRound;
+    // The sensor's sign of life: touched for a while, and then there, for its process is.
+    if (mRound % 100 < 50) {
+        writeFile(mrAgent.sensorPidFilePath(), std::to_string(::getpid()) + "\n");
+    }
     command(ZTCAgentProcess::startScopeRequest(mRound % 2 == 0 ? 4096 : 256), gcSuccessHex);
     mrAgent.library().startStorm(6, 2, mEvents);
     retrieve();
