@@ -51,8 +51,6 @@ bool sRun(ZTCFaultStage& arStage, const ZTSFaultPhase& acrPhase, const ZTSFaultW
         if (!arStage.isRunning()) {
             acrPhase.mPrepare(arStage);
         }
-        const bool lIsKept = acrPhase.mKeepsAgent;
-        const std::size_t lDescriptors = lIsKept ? arStage.openDescriptors() : 0;
         arStage.plan({acrWay.mpCall, aNth, acrWay.mErrno, acrWay.mCount, acrWay.mIsLasting});
         bool lDoesNotAnswer = false;
         std::string lWhy;
@@ -68,9 +66,9 @@ bool sRun(ZTCFaultStage& arStage, const ZTSFaultPhase& acrPhase, const ZTSFaultW
         lHasFired = arStage.faults().hasFired();
         if (!lDoesNotAnswer) {
             arRow.mWentOn += lHasFired;
-            if (lIsKept && arStage.openDescriptors() > lDescriptors) {
+            if (acrPhase.mKeepsAgent && arStage.openDescriptors() > arStage.descriptorsAtFirst()) {
                 throw ZTCFinding("it has " + std::to_string(arStage.openDescriptors()) + " descriptors and had " +
-                                 std::to_string(lDescriptors));
+                                 std::to_string(arStage.descriptorsAtFirst()));
             }
         } else {
             const ZTEFaultEnd lEnd = arStage.waitForEnd();

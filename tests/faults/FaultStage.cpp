@@ -67,6 +67,7 @@ void ZTCFaultStage::startUndisturbed(const std::vector<std::string>& acrMore) {
     if (!connect()) {
         throw ZTCFinding("an agent that nothing disturbs does not start: " + logText());
     }
+    mDescriptorsAtFirst = openDescriptors();
 }
 
 /// A daemon's first process has ended when this comes to be asked: the daemon is this process's child then.

@@ -56,6 +56,8 @@ public:
 
     // ---- what it holds ----
     std::size_t openDescriptors();
+    /// What it held when it had started undisturbed.
+    std::size_t descriptorsAtFirst() const { return mDescriptorsAtFirst; }
     std::string logText();
     std::size_t countInLog(const std::string& acrText);
 
@@ -69,6 +71,7 @@ private:
     ZTCAgentProcess mAgent{2};
     ZTCFaultInjection mFaults;
     ZTSFaultPlan mPlan;
+    std::size_t mDescriptorsAtFirst = 0;
     bool mIsDaemon = false;
     bool mHasStandardStreams = true;
     bool mHasStandardError = true;

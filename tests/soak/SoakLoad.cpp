@@ -56,7 +56,8 @@ void ZTCSoakLoad::reconnect() {
 }
 
 void ZTCSoakLoad::sendBrokenFrame() {
-    static const char* const slFrames[] = {"00000000 00", "ffffffff 0102030405", "7fffffff",
+    // Each with bytes behind its length: when they are gone, the agent throws away nothing any more that comes then.
+    static const char* const slFrames[] = {"00000000 00", "ffffffff 0102030405", "7fffffff 00",
                                            "00000000 ffffffffffffffff"};
     mrAgent.pipes().sendRaw(bytesOf(slFrames[mRound % std::size(slFrames)]));
     mrAgent.pipes().waitUntilTaken();
