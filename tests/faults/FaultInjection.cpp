@@ -25,9 +25,7 @@ ZTCFaultInjection::ZTCFaultInjection(ZTCAgentProcess& arAgent)
     }
     mpControl = new (lpMapped) ZTSFaultControl{};
 
-    // A sanitizer's library insists on being the first.
-    const std::string lRuntime = TAVIK_SANITIZER_RUNTIME;
-    arAgent.setEnvironment("LD_PRELOAD", lRuntime + (lRuntime.empty() ? "" : ":") + TAVIK_INTERPOSER);
+    arAgent.setEnvironment("LD_PRELOAD", TAVIK_INTERPOSER);
     attach();
 }
 
@@ -58,8 +56,4 @@ void ZTCFaultInjection::arm(const ZTSFaultPlan& acrPlan) {
     mpControl->mFired.store(0);
     mpControl->mPlace.store(0);
     mpControl->mIsArmed.store(1);
-}
-
-bool ZTCFaultInjection::isForAllocations() {
-    return std::string(TAVIK_SANITIZER_RUNTIME).empty();
 }

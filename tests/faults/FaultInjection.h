@@ -41,9 +41,6 @@ public:
     /// Whether an agent has run with the interposed calls.
     bool isAttached() const { return mpControl->mIsAttached.load() != 0; }
 
-    /// Whether allocations and look-ups can be made to fail: they cannot in a build with a sanitizer.
-    static bool isForAllocations();
-
 private:
     ZTCAgentProcess& mrAgent;
     std::string mPath;
