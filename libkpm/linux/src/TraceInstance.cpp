@@ -240,7 +240,12 @@ ZTETraceRead ZTCTraceInstance::read(std::size_t aBuffer, std::span<std::uint8_t>
         arSize = static_cast<std::size_t>(lRead);
         return ZTTR_Page;
     }
-    return lRead == 0 || errno == EAGAIN ? ZTTR_Empty : ZTTR_Failed;
+    return judgeEmptyTraceRead(lRead, errno);
+}
+
+ZTETraceRead judgeEmptyTraceRead(std::int64_t aRead, int aError) {
+    // No such device: the buffer of a processor that is not up, which may come up later.
+    return aRead == 0 || aError == EAGAIN || aError == ENODEV ? ZTTR_Empty : ZTTR_Failed;
 }
 
 std::optional<std::uint64_t> ZTCTraceInstance::takeLosses(std::size_t aBuffer) {

@@ -27,6 +27,9 @@ public:
 
 enum ZTETraceRead : std::uint8_t { ZTTR_Page, ZTTR_Empty, ZTTR_Failed };
 
+/// What a read of a buffer that gave nothing means: what it returned, and the error number where that is negative.
+ZTETraceRead judgeEmptyTraceRead(std::int64_t aRead, int aError);
+
 /// One thread at a time.
 class ZTCTraceInstance {
 public:

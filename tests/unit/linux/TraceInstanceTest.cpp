@@ -85,6 +85,16 @@ TEST_F(TraceInstance, PagesAreReadWithoutWaiting) {
     }
 }
 
+TEST_F(TraceInstance, ABufferWithNothingInItAndOneOfAProcessorThatIsNotUpAreEmptyAndNoFailure) {
+    EXPECT_EQ(judgeEmptyTraceRead(0, 0), ZTTR_Empty);
+    EXPECT_EQ(judgeEmptyTraceRead(0, EIO), ZTTR_Empty) << "an error number of something else";
+    EXPECT_EQ(judgeEmptyTraceRead(-1, EAGAIN), ZTTR_Empty);
+    EXPECT_EQ(judgeEmptyTraceRead(-1, ENODEV), ZTTR_Empty);
+    for (const int lError : {EIO, EBADF, ENOMEM, EINVAL}) {
+        EXPECT_EQ(judgeEmptyTraceRead(-1, lError), ZTTR_Failed) << lError;
+    }
+}
+
 TEST_F(TraceInstance, LossesAreToldOnceAndACountThatGoesBackBeginsAnew) {
     mKernel.mProcessors = 1;
     const auto lpInstance = open();
