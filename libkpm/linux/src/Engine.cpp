@@ -182,6 +182,10 @@ void ZTCLinuxEngine::runRound() {
         mNextLook = Clock::now() + mOptions.mPollInterval;
         mHasLookedForHost = false;
         look();
+        // With messages on their way that the state read is ahead of, the links go on counting them.
+        for (std::size_t lBoard = 0; mIsSocketDrained && lBoard < mLinks.size(); ++lBoard) {
+            mLinks[lBoard].forgetMessages();
+        }
         readTraceLosses();
     }
 }
@@ -225,9 +229,6 @@ void ZTCLinuxEngine::look() {
     }
     handleHostChanges(lChanges);
     lookAtLinks();
-    for (ZTCLinuxLinkState& lrLink : mLinks) {
-        lrLink.forgetMessages();
-    }
 }
 
 void ZTCLinuxEngine::handleHostChanges(const ZTCLinuxBoards::Changes& acrChanges) {
@@ -295,6 +296,7 @@ void ZTCLinuxEngine::lookAtLink(std::uint32_t aBoard) {
 
 void ZTCLinuxEngine::readMessages() {
     bool lIsStateInDoubt = false;
+    mIsSocketDrained = false;
     for (unsigned lCount = 0; lCount < scDatagramsInARound; ++lCount) {
         const ZTSLinuxReceived lReceived = mpMessages->receive(mDatagram);
         if (lReceived.mOutcome == ZTLR_Datagram) {
@@ -311,6 +313,7 @@ void ZTCLinuxEngine::readMessages() {
                 mLosses.count(ZTLO_Failure);
             }
             // Readable with nothing to read, it would wake the watcher again at once.
+            mIsSocketDrained = true;
             mIsSocketResting = lReceived.mOutcome == ZTLR_Failed || lCount == 0;
             break;
         }

@@ -146,6 +146,7 @@ private:
     bool mHasLookedForHost =
         false;  // a message of an unknown host has made a look of its own since the last regular one
     bool mIsSocketReady = false;
+    bool mIsSocketDrained = true;  // nothing was left to read when it was last read
     bool mIsSocketResting = false;
     std::unique_ptr<ZTCFcEventSource> mpMessages;
     std::unique_ptr<ZTCTraceInstance> mpTrace;

@@ -1,14 +1,14 @@
 #include "libkpm/linux/src/LinkState.h"
 
 void ZTCLinuxLinkState::noteMessage(bool aIsUp) {
-    if (mState == ZTLK_Unknown) {
+    if (mState == ZTLK_Unknown || aIsUp == mIsToldUp) {
         return;
     }
-    if (aIsUp != isUp()) {
-        mWasToldOther = true;
-    } else if (mWasToldOther) {
-        mWasToldOther = false;
-        mHasFlapped = true;
+    mIsToldUp = aIsUp;
+    if (mAhead != 0) {
+        --mAhead;
+    } else {
+        ++mUntold;
     }
 }
 
@@ -19,21 +19,31 @@ ZTSLinuxLinkChange ZTCLinuxLinkState::makeChange(bool aIsUp) {
 
 std::vector<ZTSLinuxLinkChange> ZTCLinuxLinkState::noteReading(ZTELinuxLink aState) {
     std::vector<ZTSLinuxLinkChange> lChanges;
-    if (mHasFlapped) {
-        lChanges.push_back(makeChange(!isUp()));
-        lChanges.push_back(makeChange(isUp()));
-        mHasFlapped = false;
-    }
-    if (aState != ZTLK_Unknown && aState != mState) {
-        if (mState != ZTLK_Unknown) {
-            lChanges.push_back(makeChange(aState == ZTLK_Up));
-        }
+    if (mState == ZTLK_Unknown) {
         mState = aState;
-        mWasToldOther = false;
+        forgetMessages();
+        return lChanges;
+    }
+    const bool lIsOther = aState != ZTLK_Unknown && aState != mState;
+    // Between two readings of one state lies an even number of changes, between differing ones an odd number: one
+    // change more is a reading ahead of its message, or a message ahead of its reading.
+    std::uint32_t lCount = mUntold;
+    if (lIsOther && mUntold % 2 == 0) {
+        ++lCount;
+        ++mAhead;
+    } else if (!lIsOther) {
+        lCount -= mUntold % 2;
+    }
+    mUntold -= lCount < mUntold ? lCount : mUntold;
+    for (; lCount != 0; --lCount) {
+        mState = isUp() ? ZTLK_Down : ZTLK_Up;
+        lChanges.push_back(makeChange(isUp()));
     }
     return lChanges;
 }
 
 void ZTCLinuxLinkState::forgetMessages() {
-    mWasToldOther = false;
+    mIsToldUp = isUp();
+    mUntold = 0;
+    mAhead = 0;
 }

@@ -1,6 +1,6 @@
-/// The state of one board's link, and which changes of it are to be told. It follows two witnesses: the state that is
-/// read, which counts, and messages that a link went up or down, which only show a change that came and went between
-/// two readings. Pure.
+/// The state of one board's link, and which changes of it are to be told. It follows two witnesses of the same changes:
+/// the state that is read, and messages that the link went up or down. Either may be ahead of the other, a change may
+/// have several messages or none, and one that came and went between two readings has only messages. Pure.
 #ifndef LIBKPM_LINUX_SRC_LINKSTATE_H
 #define LIBKPM_LINUX_SRC_LINKSTATE_H
 
@@ -22,11 +22,11 @@ public:
     /// A message said that the link went up, or down. Followed by a reading.
     void noteMessage(bool aIsUp);
 
-    /// The state was read. The first state that is known is no change; after that, each differing one is. A message of
-    /// the other state and then one of this state, with this state read throughout, are two changes.
+    /// The state was read. The first state that is known is no change; after that, each differing one is, and so are
+    /// those that only messages told of, in pairs, where the state read is again what it was.
     std::vector<ZTSLinuxLinkChange> noteReading(ZTELinuxLink aState);
 
-    /// Messages before this say nothing about what comes.
+    /// No message that was sent before the last reading is still to come.
     void forgetMessages();
 
     bool isUp() const { return mState == ZTLK_Up; }
@@ -35,8 +35,9 @@ private:
     ZTSLinuxLinkChange makeChange(bool aIsUp);
 
     ZTELinuxLink mState = ZTLK_Unknown;
-    bool mWasToldOther = false;
-    bool mHasFlapped = false;
+    bool mIsToldUp = false;     // what the last message said, or would have said
+    std::uint32_t mUntold = 0;  // changes that messages told of and no reading has shown
+    std::uint32_t mAhead = 0;   // changes that a reading has shown and no message has told of
     std::uint32_t mUp = 0;
     std::uint32_t mDown = 0;
 };
