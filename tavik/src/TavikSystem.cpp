@@ -34,6 +34,11 @@ constexpr unsigned gcDefaultHbTimeout = 240;
 // Hexadecimal: 03567, the sticky bit and no read for the owner's group. The umask applies.
 constexpr int gcRuntimeDirMode = 0x777;
 
+/// Who changes the total holds the lock, so that nobody comes in between; its readers without the lock need no order.
+void sAddToTotal(std::atomic<std::uint32_t>& arTotal, unsigned int aBytes) noexcept {
+    arTotal.store(arTotal.load(std::memory_order_relaxed) + aBytes, std::memory_order_relaxed);
+}
+
 void sCreateRtdir() {
     ZT_ENTRY();
     ZT_TRACE_MSG("Trying to create '%s'", gRtDir);
@@ -457,7 +462,7 @@ void ZTCTavikSystem::setPrevScopeData(unsigned int aBoardId, ZTCPointer<ZTCScope
     mPrevScopeRecord = lRecord;
     mPrevBoardId = aBoardId;
     mPrevScopeDataSet = true;
-    mTotalEventDataSize += arData->getEventDataSize();
+    sAddToTotal(mTotalEventDataSize, arData->getEventDataSize());
     ZT_EXIT();
 }
 
@@ -474,7 +479,7 @@ void ZTCTavikSystem::appendEventData(unsigned char* apData, unsigned int aLength
     ZT_ENTRY();
     mPrevScopeData->appendEventData(apData, aLength);
     mPrevScopeRecord->incrementOccurrences();
-    mTotalEventDataSize += aLength;
+    sAddToTotal(mTotalEventDataSize, aLength);
     ZT_EXIT();
 }
 
