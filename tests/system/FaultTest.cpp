@@ -67,13 +67,15 @@ TEST(Fault, ACommandThatArrivesByteByByteAndIsInterruptedIsAnswered) {
     lFaults.arm({"read", 1, 0, 1, true});
     EXPECT_EQ(lAgent.request("0500000001"), gcSuccessHex);
     EXPECT_TRUE(lFaults.hasFired());
-    for (unsigned lNth = 1; lNth <= 2; ++lNth) {
-        lFaults.arm({"read", lNth, EINTR});
-        EXPECT_EQ(lAgent.request("0500000001"), gcSuccessHex);
-        EXPECT_TRUE(lFaults.hasFired());
-        lFaults.arm({"poll", lNth, EINTR});
-        EXPECT_EQ(lAgent.request("0500000001"), gcSuccessHex);
-        EXPECT_TRUE(lFaults.hasFired());
+    for (const char* lpCall : {"read", "poll"}) {
+        for (unsigned lNth = 1; lNth <= 2; ++lNth) {
+            lFaults.arm({lpCall, lNth, EINTR});
+            // The agent may be in the call already when it is told: the second one may belong to the next request.
+            for (int i = 0; i < 3 && !lFaults.hasFired(); ++i) {
+                EXPECT_EQ(lAgent.request("0500000001"), gcSuccessHex);
+            }
+            EXPECT_TRUE(lFaults.hasFired()) << lpCall;
+        }
     }
     lFaults.disarm();
 }
