@@ -292,6 +292,7 @@ void sRegister() {
                     benchmark::RegisterBenchmark((lcrWhat.mpName + lEnd).c_str(), sHandOver, lcrWhat.mWhat,
                                                  lcrLoad.mLoad, lBoards)
                         ->UseManualTime()
+                        ->Iterations(40)
                         ->Unit(benchmark::kMicrosecond);
                 }
             }
