@@ -1,4 +1,6 @@
-# The agent in the guest, and tavikctl as its sensor. Sourced after fabric.sh.
+# The agent in the guest, and tavikctl as its sensor. Sourced by what runs in the guest, its shell included.
+
+. /vm/fabric.sh
 
 export ZT_QRV_SENSOR_DIR=/tmp/agent ZT_LIBKPM_PATH=/vm/lib/libkpm-linux.so
 gLog=/tmp/agent/agent.log

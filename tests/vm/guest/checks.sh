@@ -1,7 +1,6 @@
 # The checks: each is a function check_NAME with what it shows behind it, and gets an agent that collects. They write one line an
 # expectation to the second serial port: ok or FAIL, the check, what was looked at, what was expected, what came, with the
 # character 037 in between.
-. /vm/fabric.sh
 . /vm/agent.sh
 exec 3>/dev/ttyS1
 gBad=0

@@ -1,5 +1,4 @@
 # What scripts/demo --vm shows: real FC ports of this kernel, an agent over them, and what it has to tell.
-. /vm/fabric.sh
 . /vm/agent.sh
 exec 3>/dev/ttyS1
 
