@@ -8,7 +8,7 @@ namespace {
 constexpr char gcTimeSeparator[] = ".";
 
 /// Bytes of the occurrences and the times, encoded.
-constexpr Size gcFixedSize = sizeof(std::uint32_t) + 2 * ZTCDateTime::gcEncodedSize;
+constexpr Size gcFixedSize = sizeof(std::uint32_t) + ZTCDateTime::gcEncodedSize + ZTCDateTime::gcEncodedSize;
 
 }  // namespace
 

@@ -83,9 +83,11 @@ static void sRemoveLeftOvers(const std::string& acrInstances, ZTCTraceDirectorie
         if (!isTraceInstanceLeftOver(lrName)) {
             continue;
         }
-        const int lError = arDirectories.remove(acrInstances + "/" + lrName);
+        const int lError = arDirectories.remove(std::string(acrInstances).append("/").append(lrName));
         if (lError == 0) {
-            logLinuxLine(KPM_LOG_NOTICE, "removed the trace instance " + lrName + ", which a killed run has left");
+            logLinuxLine(
+                KPM_LOG_NOTICE,
+                std::string("removed the trace instance ").append(lrName).append(", which a killed run has left"));
         } else if (lError != EBUSY && lError != ENOENT) {
             logLinuxLine(KPM_LOG_WARNING, "the trace instance " + lrName +
                                               ", which a killed run has left, stays: " + std::strerror(lError));
