@@ -50,10 +50,18 @@ std::uint32_t sKpmUnregEvent(std::uint32_t, std::uint32_t) {
     return 0;
 }
 
-const KPM_FunctionList scList = {
-    KPM_INTERFACE_VERSION, sizeof(KPM_FunctionList), sInit,          sClose,           sGetNumberOfAdapters,
-    sIsZtapiSupported,     sGetAdapterInfo,          sZtapiRegEvent, sZtapiUnregEvent, sKpmRegEvent,
-    sKpmUnregEvent};
+const KPM_FunctionList scList = {KPM_INTERFACE_VERSION,
+                                 sizeof(KPM_FunctionList),
+                                 sInit,
+                                 sClose,
+                                 sGetNumberOfAdapters,
+                                 sIsZtapiSupported,
+                                 sGetAdapterInfo,
+                                 sZtapiRegEvent,
+                                 sZtapiUnregEvent,
+                                 sKpmRegEvent,
+                                 sKpmUnregEvent,
+                                 nullptr};
 
 }  // namespace
 
