@@ -14,6 +14,14 @@ std::vector<std::int64_t>& sHolds() {
     return srHolds;
 }
 
+/// After an attempt to lock: where it was the watched mutex, and has succeeded, the hold begins.
+int sNote(pthread_mutex_t* apMutex, int aResult) {
+    if (apMutex == spWatched && aResult == 0) {
+        sSince = benchNow();
+    }
+    return aResult;
+}
+
 }  // namespace
 
 ZTCWatchedLock::ZTCWatchedLock(pthread_mutex_t* apMutex) {
@@ -44,16 +52,18 @@ double benchPercentile(std::vector<std::int64_t>& arValues, double aPercent) {
 
 extern "C" {
 int __real_pthread_mutex_lock(pthread_mutex_t*);
+int __real_pthread_mutex_trylock(pthread_mutex_t*);
 int __real_pthread_mutex_unlock(pthread_mutex_t*);
 int __wrap_pthread_mutex_lock(pthread_mutex_t*);
+int __wrap_pthread_mutex_trylock(pthread_mutex_t*);
 int __wrap_pthread_mutex_unlock(pthread_mutex_t*);
 
 int __wrap_pthread_mutex_lock(pthread_mutex_t* apMutex) {
-    const int lResult = __real_pthread_mutex_lock(apMutex);
-    if (apMutex == spWatched) {
-        sSince = benchNow();
-    }
-    return lResult;
+    return sNote(apMutex, __real_pthread_mutex_lock(apMutex));
+}
+
+int __wrap_pthread_mutex_trylock(pthread_mutex_t* apMutex) {
+    return sNote(apMutex, __real_pthread_mutex_trylock(apMutex));
 }
 
 int __wrap_pthread_mutex_unlock(pthread_mutex_t* apMutex) {
