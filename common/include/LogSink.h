@@ -103,7 +103,7 @@ private:
     /// Within so many bytes of the bound, and after so many nanoseconds, the file's size is asked for anew: other
     /// processes may write to it too. In between it is the size that was found and what was written since.
     static constexpr std::uint64_t gcSizeSlack = std::uint64_t{64} * 1024;
-    static constexpr std::int64_t gcSizeAgeNs = 100000;
+    static constexpr std::int64_t gcSizeAgeNs = 1000000;
 
     ZTCLogSinkMutex mMutex;
 
