@@ -89,20 +89,26 @@ double sThreadSeconds() {
 
 /// The steps of the command up to the encoded bytes; the lists taken stay with the caller.
 Size sRetrieve(ZTCTavikSystem& arSystem, ZTCTavikRecordsMap& arTaken) {
+    constexpr Size lcKeySize = 128;
     ZTCEncodableOutStream lStream(1024);
     lStream << static_cast<unsigned char>(ZTRO_ScopeData) << arSystem.getNumRecordLists();
     ZTCTavikRecordsMap lFresh;
     arSystem.makeRecordLists(lFresh);
+    Size lRoom;
     {
         const ZTCPrevDataHold lHold(arSystem);
+        lRoom = arSystem.getTotalEventDataSize();
         arSystem.clearPrevScopeData();
         arSystem.clearRecordsMap(arTaken);
         arSystem.addNewRecordListsToRecordsMap(lFresh);
         arSystem.resetTotalEventDataSize();
     }
     for (const auto& lrEntry : arTaken) {
-        const ZTCPointer<ZTCTavikInitiator>& lrInitiator = arSystem.getFcInitiator(lrEntry.first);
-        lStream << lrInitiator->getWwnn()->getString() + "." + lrInitiator->getWwpn()->getString();
+        lRoom += lcKeySize + lrEntry.second->size() * ZTCTavikRecord::gcMostBesideData;
+    }
+    lStream.reserve(lRoom);
+    for (const auto& lrEntry : arTaken) {
+        lStream << arSystem.getFcInitiator(lrEntry.first)->getKey();
         lrEntry.second->encode(lStream);
     }
     return lStream.getBuffer()->getSize();

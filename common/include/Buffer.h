@@ -4,6 +4,7 @@
 #define COMMON_INCLUDE_BUFFER_H
 
 #include <cstdint>
+#include <cstring>
 
 #include "common/include/Types.h"
 
@@ -29,10 +30,24 @@ public:
     Size getCapacity() const noexcept { return mCapacity; }
 
     /// Adds bytes at the end; they may lie in this very buffer. The capacity grows geometrically.
-    void append(const void* apBytes, Size aCount);
+    void append(const void* apBytes, Size aCount) {
+        if (aCount <= mCapacity - mSize && 0 != aCount) {
+            std::memmove(mpData + mSize, apBytes, aCount);
+            mSize += aCount;
+        } else {
+            growAndAppend(apBytes, aCount);
+        }
+    }
 
     /// Adds so many bytes at the end, which are for the caller to write; their address. Grows as append does.
-    unsigned char* extend(Size aCount);
+    unsigned char* extend(Size aCount) {
+        if (aCount > mCapacity - mSize) {
+            makeRoomFor(std::uint64_t{mSize} + aCount);
+        }
+        unsigned char* const lpBytes = mpData + mSize;
+        mSize += aCount;
+        return lpBytes;
+    }
 
     /// Cuts the buffer, or fills it up with zeros.
     void resize(Size aSize);
@@ -44,6 +59,7 @@ public:
     void clear() noexcept { mSize = 0; }
 
 private:
+    void growAndAppend(const void* apBytes, Size aCount);
     void makeRoomFor(std::uint64_t aNeeded);
     void growTo(Size aNeeded);
 

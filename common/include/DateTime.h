@@ -46,6 +46,9 @@ private:
     ZTCDateTime(const std::timespec& acrTime, const char* apSeparator, std::nullptr_t) noexcept;
     void setLocalFields(const std::tm& acrLocal) noexcept;
 
+    /// Bytes of the local fields, which stand first and without gaps.
+    static constexpr std::size_t gcLocalSize = 7;
+
     std::uint16_t mYear = 0;
     std::uint8_t mMonth = 0;
     std::uint8_t mDay = 0;

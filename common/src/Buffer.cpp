@@ -22,33 +22,20 @@ ZTCBuffer::~ZTCBuffer() {
     std::free(mpData);
 }
 
-void ZTCBuffer::append(const void* apBytes, Size aCount) {
+void ZTCBuffer::growAndAppend(const void* apBytes, Size aCount) {
     if (0 == aCount) {
         return;
     }
-    const std::uint64_t lNeeded = std::uint64_t{mSize} + aCount;
     const unsigned char* lpBytes = static_cast<const unsigned char*>(apBytes);
-    if (lNeeded > mCapacity) {
-        const std::less<const unsigned char*> lIsBefore;
-        const bool lIsOwn = nullptr != mpData && !lIsBefore(lpBytes, mpData) && lIsBefore(lpBytes, mpData + mSize);
-        const std::ptrdiff_t lOffset = lIsOwn ? lpBytes - mpData : 0;
-        makeRoomFor(lNeeded);
-        if (lIsOwn) {
-            lpBytes = mpData + lOffset;
-        }
+    const std::less<const unsigned char*> lIsBefore;
+    const bool lIsOwn = nullptr != mpData && !lIsBefore(lpBytes, mpData) && lIsBefore(lpBytes, mpData + mSize);
+    const std::ptrdiff_t lOffset = lIsOwn ? lpBytes - mpData : 0;
+    makeRoomFor(std::uint64_t{mSize} + aCount);
+    if (lIsOwn) {
+        lpBytes = mpData + lOffset;
     }
     std::memmove(mpData + mSize, lpBytes, aCount);
-    mSize = static_cast<Size>(lNeeded);
-}
-
-unsigned char* ZTCBuffer::extend(Size aCount) {
-    const std::uint64_t lNeeded = std::uint64_t{mSize} + aCount;
-    if (lNeeded > mCapacity) {
-        makeRoomFor(lNeeded);
-    }
-    unsigned char* const lpBytes = mpData + mSize;
-    mSize = static_cast<Size>(lNeeded);
-    return lpBytes;
+    mSize += aCount;
 }
 
 void ZTCBuffer::resize(Size aSize) {

@@ -1,5 +1,8 @@
 #include "common/include/DateTime.h"
 
+#include <cstring>
+#include <type_traits>
+
 #include "common/include/EncodableStream.h"
 #include "common/include/NetworkOrder.h"
 
@@ -9,8 +12,8 @@ namespace {
 /// come in numbers many of them fall into one second.
 struct ZTSLocalSecond {
     bool mIsKnown = false;
-    std::time_t mSecond = 0;
-    std::tm mFields{};
+    unsigned char mFields[7] = {};
+    std::uint64_t mSecond = 0;
 };
 
 constinit thread_local ZTSLocalSecond sLatest;
@@ -24,13 +27,19 @@ std::timespec sNow() noexcept {
 }  // namespace
 
 ZTCDateTime::ZTCDateTime(const char* apSeparator) noexcept : ZTCDateTime(sNow(), apSeparator, nullptr) {
-    const auto lSecond = static_cast<std::time_t>(mSecondsSinceEpoch);
-    if (!sLatest.mIsKnown || sLatest.mSecond != lSecond) [[unlikely]] {
-        sLatest.mIsKnown = nullptr != localtime_r(&lSecond, &sLatest.mFields);
-        sLatest.mSecond = lSecond;
+    static_assert(offsetof(ZTCDateTime, mSeparator) == gcLocalSize && std::is_trivially_copyable_v<ZTCDateTime>);
+    static_assert(sizeof sLatest.mFields == gcLocalSize);
+    if (sLatest.mIsKnown && sLatest.mSecond == mSecondsSinceEpoch) [[likely]] {
+        std::memcpy(static_cast<void*>(this), sLatest.mFields, gcLocalSize);
+        return;
     }
+    const auto lSecond = static_cast<std::time_t>(mSecondsSinceEpoch);
+    std::tm lLocal{};
+    sLatest.mIsKnown = nullptr != localtime_r(&lSecond, &lLocal);
     if (sLatest.mIsKnown) {
-        setLocalFields(sLatest.mFields);
+        setLocalFields(lLocal);
+        std::memcpy(sLatest.mFields, this, gcLocalSize);
+        sLatest.mSecond = mSecondsSinceEpoch;
     }
 }
 
@@ -65,14 +74,10 @@ void ZTCDateTime::encode(ZTCEncodableOutStream& arStream) const {
 }
 
 unsigned char* ZTCDateTime::store(unsigned char* apBytes) const noexcept {
-    apBytes = storeInNetworkOrder(apBytes, mYear);
-    *apBytes++ = mMonth;
-    *apBytes++ = mDay;
-    *apBytes++ = mHour;
-    *apBytes++ = mMinute;
-    *apBytes++ = mSecond;
-    *apBytes++ = static_cast<unsigned char>(mSeparator);
-    apBytes = storeInNetworkOrder(apBytes, mMilliSeconds);
+    // From the month to the separator the fields lie as they do on the wire.
+    std::memcpy(apBytes, this, gcLocalSize + 1);
+    storeInNetworkOrder(apBytes, mYear);
+    apBytes = storeInNetworkOrder(apBytes + gcLocalSize + 1, mMilliSeconds);
     apBytes = storeInNetworkOrder(apBytes, mMicroSeconds);
     return storeInNetworkOrder(apBytes, mSecondsSinceEpoch);
 }

@@ -27,6 +27,15 @@ public:
     const ZTCPointer<ZTCWorldWideName>& getWwnn() const { return mWwnn; }
     const ZTCPointer<ZTCWorldWideName>& getWwpn() const { return mWwpn; }
 
+    /// The node name, a dot and the port name: by this the sensor tells the boards' record lists apart.
+    ZTCString getKey() const {
+        char lKey[ZTCWorldWideName::gcStringLength + 1 + ZTCWorldWideName::gcStringLength];
+        char* lpEnd = mWwnn->storeString(lKey);
+        *lpEnd++ = '.';
+        lpEnd = mWwpn->storeString(lpEnd);
+        return ZTCString(lKey, static_cast<std::size_t>(lpEnd - lKey));
+    }
+
     /// The registrations in the order of their key forms.
     auto r_begin() const { return mRegMap.begin(); }
     auto r_end() const { return mRegMap.end(); }

@@ -12,6 +12,12 @@
 /// No lock of its own: guarded by the system's previous-data lock until a retrieval has taken it out of the maps.
 class ZTCTavikRecord {
 public:
+    /// Encoded bytes of the occurrences and the times.
+    static constexpr Size gcFixedSize = sizeof(std::uint32_t) + 2 * ZTCDateTime::gcEncodedSize;
+
+    /// Encoded bytes beside the event data, at most.
+    static constexpr Size gcMostBesideData = gcFixedSize + ZTCScopeData::gcFixedSizeWithNames;
+
     /// One occurrence, now. Shares the data. Throws ZTCNoMemoryEx.
     explicit ZTCTavikRecord(const ZTCPointer<ZTCScopeData>& acrData);
     virtual ~ZTCTavikRecord() = default;

@@ -1,7 +1,6 @@
 #include "tavik/include/TavikProtocolHandler.h"
 
 #include <cstdint>
-#include <cstdio>
 
 #include "common/include/Assert.h"
 #include "common/include/EncodableStream.h"
@@ -19,7 +18,8 @@ std::atomic<bool> mDoScopeCollection(false);
 namespace {
 
 constexpr Size gcResponseCapacity = 1024;
-constexpr unsigned gcInitiatorKeySize = 128;
+/// More bytes than the key of a board takes in a response.
+constexpr Size gcInitiatorKeySize = 128;
 
 using ZTPCommandHandler = void (ZTCTavikProtocolHandler::*)(const ZTCPointer<ZTCBuffer>&, ZTCPointer<ZTCBuffer>&);
 
@@ -177,23 +177,27 @@ void ZTCTavikProtocolHandler::handleGetScopeDataCommand(const ZTCPointer<ZTCBuff
     ZTCTavikRecordsMap lFreshLists;
     ZTCTavikRecordsMap lTakenLists;
     mpTavikSystem->makeRecordLists(lFreshLists);
+    Size lRoom;
     {
         const ZTCPrevDataHold lHold(*mpTavikSystem);
+        lRoom = mpTavikSystem->getTotalEventDataSize();
         mpTavikSystem->clearPrevScopeData();
         mpTavikSystem->clearRecordsMap(lTakenLists);
         mpTavikSystem->addNewRecordListsToRecordsMap(lFreshLists);
         mpTavikSystem->resetTotalEventDataSize();
     }
 
+    // All of the room at once: growing step by step would copy the response again and again.
+    for (const auto& lrEntry : lTakenLists) {
+        lRoom += gcInitiatorKeySize + lrEntry.second->size() * ZTCTavikRecord::gcMostBesideData;
+    }
+    lOutStream.reserve(lRoom);
+
     unsigned int lTotalRecords = 0;
     for (const auto& lrEntry : lTakenLists) {
         const ZTCPointer<ZTCTavikRecordList>& lrList = lrEntry.second;
         try {
-            const ZTCPointer<ZTCTavikInitiator>& lrInitiator = mpTavikSystem->getFcInitiator(lrList->getBoardId());
-            char lKey[gcInitiatorKeySize] = {};
-            std::snprintf(lKey, sizeof lKey, "%s.%s", lrInitiator->getWwnn()->getString().get(),
-                          lrInitiator->getWwpn()->getString().get());
-            lOutStream << ZTCString(lKey);
+            lOutStream << mpTavikSystem->getFcInitiator(lrList->getBoardId())->getKey();
         } catch (const ZTCNotFoundEx&) {
             // The list count in front still counts this list.
             ZT_LOG_ERR("Bad boardid %d detected during handle GetScopeDataCommand command",

@@ -7,9 +7,6 @@ namespace {
 
 constexpr char gcTimeSeparator[] = ".";
 
-/// Bytes of the occurrences and the times, encoded.
-constexpr Size gcFixedSize = sizeof(std::uint32_t) + ZTCDateTime::gcEncodedSize + ZTCDateTime::gcEncodedSize;
-
 }  // namespace
 
 ZTCTavikRecord::ZTCTavikRecord(const ZTCPointer<ZTCScopeData>& acrData)

@@ -20,6 +20,9 @@ public:
     /// Encoded bytes beside the names and the data: category, subcategory, names (0 or 1), length.
     static constexpr Size gcFixedSize = 7;
 
+    /// The same with names.
+    static constexpr Size gcFixedSizeWithNames = gcFixedSize + 2 * ZTCWorldWideName::gcLength;
+
     /// A record without names. Copies aLength bytes of event data. aCapacity is the size in bytes up to which the event
     /// data are meant to grow: a bound that the holder tests before it appends, not a reservation; it may be smaller
     /// than the first data, 0 included. Throws ZTCNoMemoryEx.
@@ -51,7 +54,7 @@ public:
 
     /// The bytes that encode writes, and storing them where there is room for so many; returns the address behind them.
     Size getEncodedSize() const noexcept {
-        return (mHasNames ? gcFixedSize + 2 * ZTCWorldWideName::gcLength : gcFixedSize) + mEventData.getSize();
+        return (mHasNames ? gcFixedSizeWithNames : gcFixedSize) + mEventData.getSize();
     }
     unsigned char* store(unsigned char* apBytes) const noexcept;
 

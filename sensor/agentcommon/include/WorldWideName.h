@@ -35,6 +35,12 @@ public:
     /// The string form: lower-case hex pairs with colons, "50:06:01:60:3b:a0:12:34".
     ZTCString getString() const;
 
+    /// Writes the characters of the string form, without an end, and returns the address behind them.
+    char* storeString(char* apText) const noexcept;
+
+    /// The length of the string form.
+    static constexpr unsigned gcStringLength = 3 * gcLength - 1;
+
     void encode(ZTCEncodableOutStream& arStream) const { arStream.writeBytes(mBytes, gcLength); }
 
     /// Throws ZTCInvalidEx and leaves the name as it was where the stream holds fewer than eight bytes.

@@ -1,12 +1,19 @@
 #include "sensor/agentcommon/include/WorldWideName.h"
 
 ZTCString ZTCWorldWideName::getString() const {
+    char lText[gcStringLength];
+    storeString(lText);
+    return ZTCString(lText, sizeof lText);
+}
+
+char* ZTCWorldWideName::storeString(char* apText) const noexcept {
     static constexpr char lcDigits[] = "0123456789abcdef";
-    char lText[3 * gcLength];
-    for (std::size_t lByte = 0; lByte < gcLength; ++lByte) {
-        lText[3 * lByte] = lcDigits[mBytes[lByte] >> 4];
-        lText[3 * lByte + 1] = lcDigits[mBytes[lByte] & 0x0F];
-        lText[3 * lByte + 2] = lByte + 1 < gcLength ? ':' : '\0';
+    for (unsigned lByte = 0; lByte < gcLength; ++lByte) {
+        if (lByte != 0) {
+            *apText++ = ':';
+        }
+        *apText++ = lcDigits[mBytes[lByte] >> 4];
+        *apText++ = lcDigits[mBytes[lByte] & 0x0F];
     }
-    return ZTCString(lText);
+    return apText;
 }

@@ -3,6 +3,7 @@
 #include <gtest/gtest.h>
 
 #include <cstring>
+#include <string>
 
 #include "common/include/Exception.h"
 #include "tests/unit/agentcommon/support/BufferBytes.h"
@@ -18,6 +19,13 @@ TEST(WorldWideName, PrintsAsLowerCaseHexPairsWithColons) {
     EXPECT_STREQ("50:06:01:60:3b:a0:12:34", ZTCWorldWideName(scBytes).getString().get());
     const unsigned char lHigh[] = {0xff, 0xfe, 0x0a, 0xa0, 0x09, 0x90, 0xbc, 0xde};
     EXPECT_STREQ("ff:fe:0a:a0:09:90:bc:de", ZTCWorldWideName(lHigh).getString().get());
+}
+
+TEST(WorldWideName, StoresItsTextWithoutAnEnd) {
+    char lText[ZTCWorldWideName::gcStringLength + 1];
+    std::memset(lText, '#', sizeof lText);
+    EXPECT_EQ(lText + ZTCWorldWideName::gcStringLength, ZTCWorldWideName(scBytes).storeString(lText));
+    EXPECT_EQ("50:06:01:60:3b:a0:12:34#", std::string(lText, sizeof lText));
 }
 
 TEST(WorldWideName, KeyIsTheEightBytesCopiedInHostOrder) {

@@ -3,6 +3,7 @@
 #include <gtest/gtest.h>
 
 #include <map>
+#include <string>
 
 #include "common/include/Log.h"
 #include "tests/support/Bytes.h"
@@ -47,6 +48,10 @@ TEST_F(TavikInitiator, SharesItsNamesAndStartsWithoutRegistrations) {
     EXPECT_EQ(mNode.get(), mInitiator.getWwnn().get());
     EXPECT_EQ(mPort.get(), mInitiator.getWwpn().get());
     EXPECT_TRUE(registrations().empty());
+}
+
+TEST_F(TavikInitiator, KeyIsTheNodeNameADotAndThePortName) {
+    EXPECT_EQ(std::string(mNode->getString().get()) + "." + mPort->getString().get(), mInitiator.getKey().get());
 }
 
 TEST_F(TavikInitiator, WalksItsRegistrationsInTheOrderOfTheirKeyForms) {
