@@ -17,6 +17,7 @@
 #include <thread>
 #include <vector>
 
+#include "libkpm/common/include/LibraryStatus.h"
 #include "libkpm/include/libkpm.h"
 #include "libkpm/linux/src/Boards.h"
 #include "libkpm/linux/src/Descriptor.h"
@@ -30,19 +31,6 @@
 #include "libkpm/linux/src/ScsiOutcome.h"
 #include "libkpm/linux/src/Sysfs.h"
 #include "libkpm/linux/src/TraceInstance.h"
-
-/// Statuses of the library's own. None of them counts as success with an agent.
-enum ZTELinuxStatus : std::uint32_t {
-    ZTLST_Success = 0,
-    ZTLST_AlreadyOpen = 4,    ///< Init: the library is open
-    ZTLST_NoResources = 8,    ///< out of memory, descriptors or threads
-    ZTLST_NotOpen = 9,        ///< the library is not open
-    ZTLST_NoSuchBoard = 10,   ///< no board of that number
-    ZTLST_NotItsPort = 11,    ///< the port is not the board's
-    ZTLST_NoSuchKind = 12,    ///< no event kind of that category and subcategory
-    ZTLST_NullPointer = 13,   ///< a pointer is missing
-    ZTLST_NoSuchHandle = 14,  ///< no registration of that handle
-};
 
 /// Opens the sources that need rights; tests have their own.
 class ZTCLinuxSources : public ZTCTraceDirectories {

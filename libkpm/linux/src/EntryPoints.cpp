@@ -3,11 +3,10 @@
 #include <cstdlib>
 #include <exception>
 #include <memory>
-#include <mutex>
-#include <new>
 #include <string>
 #include <utility>
 
+#include "libkpm/common/include/OpenLibrary.h"
 #include "libkpm/linux/src/Engine.h"
 #include "libkpm/linux/src/Report.h"
 
@@ -19,26 +18,21 @@ struct ZTSLinuxSession {
     ZTCLinuxEngine mEngine;
 };
 
-struct ZTSLinuxLibrary {
-    std::mutex mLock;
-    std::shared_ptr<ZTSLinuxSession> mpSession;  // guarded by mLock; null: not open
-    bool mIsOpening = false;                     // guarded by mLock: an Init is under way
-};
+using ZTCLinuxLibrary = ZTCOpenLibrary<ZTSLinuxSession>;
 
-/// Never destroyed: a process may end with the library open and its thread running. In static memory, so that unloading
-/// the library leaks nothing.
-static ZTSLinuxLibrary& sLibrary() {
-    alignas(ZTSLinuxLibrary) static unsigned char sMemory[sizeof(ZTSLinuxLibrary)];
-    static ZTSLinuxLibrary& srLibrary = *new (sMemory) ZTSLinuxLibrary;
-    return srLibrary;
+static void sReportAs(const char* apPrefix, const char* apWhat) noexcept {
+    try {
+        logLinuxLine(KPM_LOG_ERROR, std::string(apPrefix) + apWhat);
+    } catch (const std::exception&) {  // out of memory: the status alone has to tell of it
+        return;
+    }
 }
 
-/// The session is used without the lock, and lives as long as someone uses it.
-static std::shared_ptr<ZTSLinuxSession> sSession() {
-    ZTSLinuxLibrary& lrLibrary = sLibrary();
-    const std::lock_guard<std::mutex> lGuard(lrLibrary.mLock);
-    return lrLibrary.mpSession;
+static void sReport(const char* apWhat) noexcept {
+    sReportAs("", apWhat);
 }
+
+using ZTCLinuxEntries = ZTCEngineEntries<ZTSLinuxSession, sReport>;
 
 static ZTSLinuxOptions sOptions() {
     ZTSLinuxOptions lOptions;
@@ -53,103 +47,34 @@ static ZTSLinuxOptions sOptions() {
     return lOptions;
 }
 
-/// Ends what an Init has begun: the library is open with this session, or, without one, as it was before.
-static void sEndOpening(std::shared_ptr<ZTSLinuxSession> apSession) {
-    ZTSLinuxLibrary& lrLibrary = sLibrary();
-    const std::lock_guard<std::mutex> lGuard(lrLibrary.mLock);
-    lrLibrary.mpSession = std::move(apSession);
-    lrLibrary.mIsOpening = false;
-}
-
-static bool sBeginOpening() {
-    ZTSLinuxLibrary& lrLibrary = sLibrary();
-    const std::lock_guard<std::mutex> lGuard(lrLibrary.mLock);
-    if (lrLibrary.mpSession != nullptr || lrLibrary.mIsOpening) {
-        return false;
-    }
-    lrLibrary.mIsOpening = true;
-    return true;
-}
-
-/// The lock is not held while the session starts: it writes to the agent's log.
+/// The engine writes to the agent's log while it starts.
 static std::uint32_t sInit() {
-    if (!sBeginOpening()) {
-        logLinuxLine(KPM_LOG_ERROR, "Init: the library is open");
+    ZTCLinuxLibrary& lrLibrary = ZTCLinuxLibrary::get();
+    if (!lrLibrary.beginOpening()) {
+        sReportAs("Init: ", "the library is open");
         return ZTLST_AlreadyOpen;
     }
     try {
         auto lpSession = std::make_shared<ZTSLinuxSession>(sOptions());
         lpSession->mEngine.start();
-        sEndOpening(std::move(lpSession));
+        lrLibrary.endOpening(std::move(lpSession));
         return ZTLST_Success;
     } catch (const std::exception& lrException) {
-        sEndOpening(nullptr);
-        logLinuxLine(KPM_LOG_ERROR, std::string("Init: ") + lrException.what());
+        lrLibrary.endOpening(nullptr);
+        sReportAs("Init: ", lrException.what());
         return ZTLST_NoResources;
     }
 }
 
 static void sClose() {
-    std::shared_ptr<ZTSLinuxSession> lpSession;
-    {
-        ZTSLinuxLibrary& lrLibrary = sLibrary();
-        const std::lock_guard<std::mutex> lGuard(lrLibrary.mLock);
-        lpSession.swap(lrLibrary.mpSession);
-    }
+    const std::shared_ptr<ZTSLinuxSession> lpSession = ZTCLinuxLibrary::get().takeSession();
     if (lpSession != nullptr) {
         lpSession->mEngine.stop();
     }
 }
 
-static std::uint32_t sGetNumberOfAdapters() {
-    const std::shared_ptr<ZTSLinuxSession> lpSession = sSession();
-    return lpSession == nullptr ? 0 : lpSession->mEngine.getNumberOfAdapters();
-}
-
 static std::uint32_t sIsZtapiSupported() {
-    return sSession() != nullptr ? 1 : 0;
-}
-
-/// Calls `aCall` on the open engine; `aNotOpen` where there is none, `aFailed` where memory has run out.
-template <class Call>
-static std::uint32_t sOnEngine(std::uint32_t aNotOpen, std::uint32_t aFailed, Call aCall) {
-    try {
-        const std::shared_ptr<ZTSLinuxSession> lpSession = sSession();
-        return lpSession == nullptr ? aNotOpen : aCall(lpSession->mEngine);
-    } catch (const std::exception& lrException) {
-        logLinuxLine(KPM_LOG_ERROR, lrException.what());
-        return aFailed;
-    }
-}
-
-static std::uint32_t sGetAdapterInfo(std::uint32_t aIndex, HBA_wwn* apNodeName, HBA_wwn* apPortName) {
-    return sOnEngine(ZTLST_NotOpen, ZTLST_NoResources,
-                     [&](ZTCLinuxEngine& arEngine) { return arEngine.getAdapterInfo(aIndex, apNodeName, apPortName); });
-}
-
-static std::uint32_t sZtapiRegEvent(std::uint32_t aBoard, HBA_wwn aPort, std::uint32_t aCategory,
-                                    std::uint32_t aSubcategory, void* apContext, std::uint32_t* apHandle,
-                                    KPM_ScopeCallback apCallback) {
-    return sOnEngine(ZTLST_NotOpen, ZTLST_NoResources, [&](ZTCLinuxEngine& arEngine) {
-        return arEngine.registerForPort(aBoard, aPort, aCategory, aSubcategory, apContext, apHandle, apCallback);
-    });
-}
-
-static std::uint32_t sZtapiUnregEvent(std::uint32_t aBoard, HBA_wwn aPort, std::uint32_t aHandle) {
-    return sOnEngine(ZTLST_NotOpen, ZTLST_NoResources,
-                     [&](ZTCLinuxEngine& arEngine) { return arEngine.unregisterForPort(aBoard, aPort, aHandle); });
-}
-
-static std::uint32_t sKpmRegEvent(std::uint32_t aBoard, std::uint32_t aEventType, void* apContext,
-                                  std::uint32_t /*aSize*/, KPM_EventCallback apCallback) {
-    return sOnEngine(0, 0, [&](ZTCLinuxEngine& arEngine) {
-        return arEngine.registerForBoard(aBoard, aEventType, apContext, apCallback);
-    });
-}
-
-static std::uint32_t sKpmUnregEvent(std::uint32_t aBoard, std::uint32_t aHandle) {
-    return sOnEngine(ZTLST_NotOpen, ZTLST_NoResources,
-                     [&](ZTCLinuxEngine& arEngine) { return arEngine.unregisterForBoard(aBoard, aHandle); });
+    return ZTCLinuxLibrary::get().getSession() != nullptr ? 1 : 0;
 }
 
 static void sSetLog(KPM_LogFunction apLog) {
@@ -161,13 +86,13 @@ const KPM_FunctionList* getLinuxFunctionList() {
                                              sizeof(KPM_FunctionList),
                                              sInit,
                                              sClose,
-                                             sGetNumberOfAdapters,
+                                             ZTCLinuxEntries::getNumberOfAdapters,
                                              sIsZtapiSupported,
-                                             sGetAdapterInfo,
-                                             sZtapiRegEvent,
-                                             sZtapiUnregEvent,
-                                             sKpmRegEvent,
-                                             sKpmUnregEvent,
+                                             ZTCLinuxEntries::getAdapterInfo,
+                                             ZTCLinuxEntries::registerForPort,
+                                             ZTCLinuxEntries::unregisterForPort,
+                                             ZTCLinuxEntries::registerForBoard,
+                                             ZTCLinuxEntries::unregisterForBoard,
                                              sSetLog};
     return &scList;
 }

@@ -334,18 +334,18 @@ std::optional<ZTSSimAnswer> ZTCSimEngine::findAnswer(ZTESimOperation aOperation,
 
 std::uint32_t ZTCSimEngine::getAdapterInfo(std::uint32_t aIndex, HBA_wwn* apNodeName, HBA_wwn* apPortName) {
     if (apNodeName == nullptr || apPortName == nullptr) {
-        return ZTSST_NullPointer;
+        return ZTLST_NullPointer;
     }
     if (aIndex >= getNumberOfAdapters()) {
-        return ZTSST_NoSuchBoard;
+        return ZTLST_NoSuchBoard;
     }
     const std::optional<ZTSSimAnswer> lAnswer = findAnswer(ZTSO_GetAdapterInfo, std::nullopt, aIndex);
-    if (lAnswer && lAnswer->mStatus != ZTSST_Success) {
+    if (lAnswer && lAnswer->mStatus != ZTLST_Success) {
         return lAnswer->mStatus;
     }
     std::memcpy(apNodeName, &mScenario.mAdapters[aIndex].mWwnn, sizeof *apNodeName);
     std::memcpy(apPortName, &mScenario.mAdapters[aIndex].mWwpn, sizeof *apPortName);
-    return ZTSST_Success;
+    return ZTLST_Success;
 }
 
 void ZTCSimEngine::noteRegistration(std::uint32_t aBoard, std::size_t aKind) {
@@ -359,17 +359,17 @@ std::uint32_t ZTCSimEngine::registerForPort(std::uint32_t aBoard, const HBA_wwn&
                                             std::uint32_t aSubcategory, void* apContext, std::uint32_t* apHandle,
                                             KPM_ScopeCallback apCallback) {
     if (apHandle == nullptr || apCallback == nullptr) {
-        return ZTSST_NullPointer;
+        return ZTLST_NullPointer;
     }
     if (aBoard >= getNumberOfAdapters()) {
-        return ZTSST_NoSuchBoard;
+        return ZTLST_NoSuchBoard;
     }
     if (!sIsSameName(acrPort, mScenario.mAdapters[aBoard].mWwpn)) {
-        return ZTSST_NotItsPort;
+        return ZTLST_NotItsPort;
     }
     const std::optional<std::size_t> lKind = findSimKindByRegistration(aCategory, aSubcategory);
     if (!lKind || getSimKind(*lKind).mDelivery != ZTSD_Scope) {
-        return ZTSST_NoSuchKind;
+        return ZTLST_NoSuchKind;
     }
     const ZTSSimAnswer lAnswer = findAnswer(ZTSO_Register, lKind, aBoard).value_or(ZTSSimAnswer{});
     if (!sIsAccepted(lAnswer.mStatus)) {
@@ -405,37 +405,37 @@ std::uint32_t ZTCSimEngine::registerForBoard(std::uint32_t aBoard, std::uint32_t
 
 std::uint32_t ZTCSimEngine::unregisterForPort(std::uint32_t aBoard, const HBA_wwn& acrPort, std::uint32_t aHandle) {
     if (aBoard >= mScenario.mAdapters.size()) {
-        return ZTSST_NoSuchBoard;
+        return ZTLST_NoSuchBoard;
     }
     if (!sIsSameName(acrPort, mScenario.mAdapters[aBoard].mWwpn)) {
-        return ZTSST_NotItsPort;
+        return ZTLST_NotItsPort;
     }
     const std::optional<std::size_t> lKind = mRegistry.findKind(aBoard, aHandle);
     if (!lKind || getSimKind(*lKind).mDelivery != ZTSD_Scope) {
-        return ZTSST_NoSuchHandle;
+        return ZTLST_NoSuchHandle;
     }
     const std::optional<ZTSSimAnswer> lAnswer = findAnswer(ZTSO_Unregister, lKind, aBoard);
-    if (lAnswer && lAnswer->mStatus != ZTSST_Success) {
+    if (lAnswer && lAnswer->mStatus != ZTLST_Success) {
         return lAnswer->mStatus;
     }
     mRegistry.remove(aBoard, *lKind, aHandle);
-    return ZTSST_Success;
+    return ZTLST_Success;
 }
 
 std::uint32_t ZTCSimEngine::unregisterForBoard(std::uint32_t aBoard, std::uint32_t aHandle) {
     if (aBoard >= mScenario.mAdapters.size()) {
-        return ZTSST_NoSuchBoard;
+        return ZTLST_NoSuchBoard;
     }
     const std::optional<std::size_t> lKind = mRegistry.findKind(aBoard, aHandle);
     if (!lKind || getSimKind(*lKind).mDelivery == ZTSD_Scope) {
-        return ZTSST_NoSuchHandle;
+        return ZTLST_NoSuchHandle;
     }
     const std::optional<ZTSSimAnswer> lAnswer = findAnswer(ZTSO_Unregister, lKind, aBoard);
-    if (lAnswer && lAnswer->mStatus != ZTSST_Success) {
+    if (lAnswer && lAnswer->mStatus != ZTLST_Success) {
         return lAnswer->mStatus;
     }
     mRegistry.remove(aBoard, *lKind, aHandle);
-    return ZTSST_Success;
+    return ZTLST_Success;
 }
 
 ZTSSimStatus ZTCSimEngine::getStatus() const {

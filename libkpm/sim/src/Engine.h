@@ -20,26 +20,11 @@
 #include <thread>
 #include <vector>
 
+#include "libkpm/common/include/LibraryStatus.h"
 #include "libkpm/include/libkpm.h"
 #include "libkpm/sim/src/Delivery.h"
 #include "libkpm/sim/src/Registry.h"
 #include "libkpm/sim/src/Scenario.h"
-
-/// Statuses of the simulated library's own. None of them counts as success with an agent.
-enum ZTESimStatus : std::uint32_t {
-    ZTSST_Success = 0,
-    ZTSST_NoScenario = 1,    ///< Init: the scenario's file cannot be read
-    ZTSST_BadScenario = 2,   ///< Init: the scenario does not parse
-    ZTSST_NoSocket = 3,      ///< Init: the socket cannot be made
-    ZTSST_AlreadyOpen = 4,   ///< Init: the library is open
-    ZTSST_NoResources = 8,   ///< Init: out of memory or threads
-    ZTSST_NotOpen = 9,       ///< the library is not open
-    ZTSST_NoSuchBoard = 10,  ///< no board of that number
-    ZTSST_NotItsPort = 11,   ///< the port is not the board's
-    ZTSST_NoSuchKind = 12,   ///< no event kind of that category and subcategory
-    ZTSST_NullPointer = 13,  ///< a pointer is missing
-    ZTSST_NoSuchHandle = 14  ///< no registration of that handle
-};
 
 enum ZTESimSchedule : std::uint8_t { ZTSSC_Waiting, ZTSSC_Running, ZTSSC_Done };
 

@@ -3,12 +3,11 @@
 #include <cstdlib>
 #include <exception>
 #include <memory>
-#include <mutex>
-#include <new>
 #include <string>
 #include <string_view>
 #include <utility>
 
+#include "libkpm/common/include/OpenLibrary.h"
 #include "libkpm/sim/src/Control.h"
 #include "libkpm/sim/src/ControlSocket.h"
 #include "libkpm/sim/src/Engine.h"
@@ -23,25 +22,21 @@ struct ZTSSimSession {
     std::unique_ptr<ZTCSimControlSocket> mpSocket;
 };
 
-struct ZTSSimLibrary {
-    std::mutex mLock;
-    std::shared_ptr<ZTSSimSession> mpSession;  // guarded by mLock; null: not open
-};
+using ZTCSimLibrary = ZTCOpenLibrary<ZTSSimSession>;
 
-/// Never destroyed: a process may end with the library open and its threads running. In static memory, so that
-/// unloading the library leaks nothing.
-static ZTSSimLibrary& sLibrary() {
-    alignas(ZTSSimLibrary) static unsigned char sMemory[sizeof(ZTSSimLibrary)];
-    static ZTSSimLibrary& srLibrary = *new (sMemory) ZTSSimLibrary;
-    return srLibrary;
+static void sReportAs(const char* apPrefix, const char* apWhat) noexcept {
+    try {
+        reportSimProblem(std::string(apPrefix) + apWhat);
+    } catch (const std::exception&) {  // out of memory: the status alone has to tell of it
+        return;
+    }
 }
 
-/// The session is used without the lock, and lives as long as someone uses it.
-static std::shared_ptr<ZTSSimSession> sSession() {
-    ZTSSimLibrary& lrLibrary = sLibrary();
-    const std::lock_guard<std::mutex> lGuard(lrLibrary.mLock);
-    return lrLibrary.mpSession;
+static void sReport(const char* apWhat) noexcept {
+    sReportAs("libkpm-sim: ", apWhat);
 }
+
+using ZTCSimEntries = ZTCEngineEntries<ZTSSimSession, sReport>;
 
 static std::string sEnvironment(const char* apName) {
     const char* lpValue = std::getenv(apName);
@@ -61,9 +56,9 @@ static ZTSSimScenario sReadScenario() {
     }
 }
 
-static std::uint32_t sOpen(ZTSSimLibrary& arLibrary) {
+static std::uint32_t sOpen(std::shared_ptr<ZTSSimSession>& arpSession) {
     ZTSSimScenario lScenario = sReadScenario();
-    if (lScenario.mInitStatus != ZTSST_Success) {
+    if (lScenario.mInitStatus != ZTLST_Success) {
         return lScenario.mInitStatus;
     }
     auto lpSession = std::make_shared<ZTSSimSession>(std::move(lScenario));
@@ -76,41 +71,42 @@ static std::uint32_t sOpen(ZTSSimLibrary& arLibrary) {
                 lSocket, [&lrEngine](std::string_view aLine) { return answerSimLine(lrEngine, aLine); });
         } catch (const std::exception& lrException) {
             reportSimProblem(lrException.what());
-            return ZTSST_NoSocket;
+            return ZTLST_NoSocket;
         }
     }
-    arLibrary.mpSession = std::move(lpSession);
-    return ZTSST_Success;
+    arpSession = std::move(lpSession);
+    return ZTLST_Success;
+}
+
+/// The status of sOpen, or that of the exception by which it ended.
+static std::uint32_t sTryToOpen(std::shared_ptr<ZTSSimSession>& arpSession) {
+    try {
+        return sOpen(arpSession);
+    } catch (const ZTCSimUnreadable& lrUnreadable) {
+        sReportAs("", lrUnreadable.what());
+        return ZTLST_NoScenario;
+    } catch (const ZTCSimRefusal& lrRefusal) {
+        sReportAs("", lrRefusal.what());
+        return ZTLST_BadScenario;
+    } catch (const std::exception& lrException) {
+        sReportAs("libkpm-sim: Init: ", lrException.what());
+        return ZTLST_NoResources;
+    }
 }
 
 static std::uint32_t sInit() {
-    try {
-        ZTSSimLibrary& lrLibrary = sLibrary();
-        const std::lock_guard<std::mutex> lGuard(lrLibrary.mLock);
-        if (lrLibrary.mpSession != nullptr) {
-            reportSimProblem("libkpm-sim: Init: the library is open");
-            return ZTSST_AlreadyOpen;
-        }
-        return sOpen(lrLibrary);
-    } catch (const ZTCSimUnreadable& lrUnreadable) {
-        reportSimProblem(lrUnreadable.what());
-        return ZTSST_NoScenario;
-    } catch (const ZTCSimRefusal& lrRefusal) {
-        reportSimProblem(lrRefusal.what());
-        return ZTSST_BadScenario;
-    } catch (const std::exception& lrException) {
-        reportSimProblem(std::string("libkpm-sim: Init: ") + lrException.what());
-        return ZTSST_NoResources;
+    if (!ZTCSimLibrary::get().beginOpening()) {
+        sReportAs("libkpm-sim: Init: ", "the library is open");
+        return ZTLST_AlreadyOpen;
     }
+    std::shared_ptr<ZTSSimSession> lpSession;
+    const std::uint32_t lStatus = sTryToOpen(lpSession);
+    ZTCSimLibrary::get().endOpening(std::move(lpSession));
+    return lStatus;
 }
 
 static void sClose() {
-    std::shared_ptr<ZTSSimSession> lpSession;
-    {
-        ZTSSimLibrary& lrLibrary = sLibrary();
-        const std::lock_guard<std::mutex> lGuard(lrLibrary.mLock);
-        lpSession.swap(lrLibrary.mpSession);
-    }
+    const std::shared_ptr<ZTSSimSession> lpSession = ZTCSimLibrary::get().takeSession();
     if (lpSession == nullptr) {
         return;
     }
@@ -127,56 +123,9 @@ static void sClose() {
     }
 }
 
-static std::uint32_t sGetNumberOfAdapters() {
-    const std::shared_ptr<ZTSSimSession> lpSession = sSession();
-    return lpSession == nullptr ? 0 : lpSession->mEngine.getNumberOfAdapters();
-}
-
 static std::uint32_t sIsZtapiSupported() {
-    const std::shared_ptr<ZTSSimSession> lpSession = sSession();
+    const std::shared_ptr<ZTSSimSession> lpSession = ZTCSimLibrary::get().getSession();
     return lpSession != nullptr && lpSession->mEngine.getScenario().mIsZtapiSupported ? 1 : 0;
-}
-
-/// Calls `aCall` on the open engine; `aFailed` where there is none or memory has run out.
-template <class Call>
-static std::uint32_t sOnEngine(std::uint32_t aNotOpen, std::uint32_t aFailed, Call aCall) {
-    try {
-        const std::shared_ptr<ZTSSimSession> lpSession = sSession();
-        return lpSession == nullptr ? aNotOpen : aCall(lpSession->mEngine);
-    } catch (const std::exception& lrException) {
-        reportSimProblem(std::string("libkpm-sim: ") + lrException.what());
-        return aFailed;
-    }
-}
-
-static std::uint32_t sGetAdapterInfo(std::uint32_t aIndex, HBA_wwn* apNodeName, HBA_wwn* apPortName) {
-    return sOnEngine(ZTSST_NotOpen, ZTSST_NoResources,
-                     [&](ZTCSimEngine& arEngine) { return arEngine.getAdapterInfo(aIndex, apNodeName, apPortName); });
-}
-
-static std::uint32_t sZtapiRegEvent(std::uint32_t aBoard, HBA_wwn aPort, std::uint32_t aCategory,
-                                    std::uint32_t aSubcategory, void* apContext, std::uint32_t* apHandle,
-                                    KPM_ScopeCallback apCallback) {
-    return sOnEngine(ZTSST_NotOpen, ZTSST_NoResources, [&](ZTCSimEngine& arEngine) {
-        return arEngine.registerForPort(aBoard, aPort, aCategory, aSubcategory, apContext, apHandle, apCallback);
-    });
-}
-
-static std::uint32_t sZtapiUnregEvent(std::uint32_t aBoard, HBA_wwn aPort, std::uint32_t aHandle) {
-    return sOnEngine(ZTSST_NotOpen, ZTSST_NoResources,
-                     [&](ZTCSimEngine& arEngine) { return arEngine.unregisterForPort(aBoard, aPort, aHandle); });
-}
-
-static std::uint32_t sKpmRegEvent(std::uint32_t aBoard, std::uint32_t aEventType, void* apContext,
-                                  std::uint32_t /*aSize*/, KPM_EventCallback apCallback) {
-    return sOnEngine(0, 0, [&](ZTCSimEngine& arEngine) {
-        return arEngine.registerForBoard(aBoard, aEventType, apContext, apCallback);
-    });
-}
-
-static std::uint32_t sKpmUnregEvent(std::uint32_t aBoard, std::uint32_t aHandle) {
-    return sOnEngine(ZTSST_NotOpen, ZTSST_NoResources,
-                     [&](ZTCSimEngine& arEngine) { return arEngine.unregisterForBoard(aBoard, aHandle); });
 }
 
 const KPM_FunctionList* getSimFunctionList() {
@@ -184,13 +133,13 @@ const KPM_FunctionList* getSimFunctionList() {
                                              sizeof(KPM_FunctionList),
                                              sInit,
                                              sClose,
-                                             sGetNumberOfAdapters,
+                                             ZTCSimEntries::getNumberOfAdapters,
                                              sIsZtapiSupported,
-                                             sGetAdapterInfo,
-                                             sZtapiRegEvent,
-                                             sZtapiUnregEvent,
-                                             sKpmRegEvent,
-                                             sKpmUnregEvent,
+                                             ZTCSimEntries::getAdapterInfo,
+                                             ZTCSimEntries::registerForPort,
+                                             ZTCSimEntries::unregisterForPort,
+                                             ZTCSimEntries::registerForBoard,
+                                             ZTCSimEntries::unregisterForBoard,
                                              nullptr};
     return &scList;
 }

@@ -109,13 +109,13 @@ TEST(Engine, WhatIsUnregisteredIsNotDelivered) {
     const HBA_wwn lOther = lEngine.getScenario().mAdapters[1].mWwpn;
     const std::uint32_t lPlogi = lRecorder.registerKind(lEngine, 0, "plogi");
     const std::uint32_t lLink = lRecorder.registerKind(lEngine, 0, "link");
-    EXPECT_EQ(lEngine.unregisterForPort(7, lPort, lPlogi), ZTSST_NoSuchBoard);
-    EXPECT_EQ(lEngine.unregisterForPort(0, lOther, lPlogi), ZTSST_NotItsPort);
-    EXPECT_EQ(lEngine.unregisterForPort(0, lPort, lLink), ZTSST_NoSuchHandle);
-    EXPECT_EQ(lEngine.unregisterForBoard(0, lPlogi), ZTSST_NoSuchHandle);
-    EXPECT_EQ(lEngine.unregisterForPort(0, lPort, lPlogi), ZTSST_Success);
-    EXPECT_EQ(lEngine.unregisterForBoard(0, lLink), ZTSST_Success);
-    EXPECT_EQ(lEngine.unregisterForPort(0, lPort, lPlogi), ZTSST_NoSuchHandle);
+    EXPECT_EQ(lEngine.unregisterForPort(7, lPort, lPlogi), ZTLST_NoSuchBoard);
+    EXPECT_EQ(lEngine.unregisterForPort(0, lOther, lPlogi), ZTLST_NotItsPort);
+    EXPECT_EQ(lEngine.unregisterForPort(0, lPort, lLink), ZTLST_NoSuchHandle);
+    EXPECT_EQ(lEngine.unregisterForBoard(0, lPlogi), ZTLST_NoSuchHandle);
+    EXPECT_EQ(lEngine.unregisterForPort(0, lPort, lPlogi), ZTLST_Success);
+    EXPECT_EQ(lEngine.unregisterForBoard(0, lLink), ZTLST_Success);
+    EXPECT_EQ(lEngine.unregisterForPort(0, lPort, lPlogi), ZTLST_NoSuchHandle);
     EXPECT_EQ(sInject(lEngine, "plogi") + sInject(lEngine, "link"), 0u);
 }
 
@@ -129,12 +129,12 @@ TEST(Engine, RegistrationsOfWhatDoesNotExistAreRefused) {
         return lEngine.registerForPort(aBoard, acrPort, aCategory, aSubcategory, nullptr, &lHandle,
                                        ZTCRecorder::onScope);
     };
-    EXPECT_EQ(lRegister(2, lPort, 1, 1), ZTSST_NoSuchBoard);
-    EXPECT_EQ(lRegister(0, lOther, 1, 1), ZTSST_NotItsPort);
-    EXPECT_EQ(lRegister(0, lPort, 1, 0x20), ZTSST_NoSuchKind);
-    EXPECT_EQ(lRegister(0, lPort, 0, FC_REG_LINK_EVENT), ZTSST_NoSuchKind);
-    EXPECT_EQ(lEngine.registerForPort(0, lPort, 1, 1, nullptr, &lHandle, nullptr), ZTSST_NullPointer);
-    EXPECT_EQ(lEngine.registerForPort(0, lPort, 1, 1, nullptr, nullptr, ZTCRecorder::onScope), ZTSST_NullPointer);
+    EXPECT_EQ(lRegister(2, lPort, 1, 1), ZTLST_NoSuchBoard);
+    EXPECT_EQ(lRegister(0, lOther, 1, 1), ZTLST_NotItsPort);
+    EXPECT_EQ(lRegister(0, lPort, 1, 0x20), ZTLST_NoSuchKind);
+    EXPECT_EQ(lRegister(0, lPort, 0, FC_REG_LINK_EVENT), ZTLST_NoSuchKind);
+    EXPECT_EQ(lEngine.registerForPort(0, lPort, 1, 1, nullptr, &lHandle, nullptr), ZTLST_NullPointer);
+    EXPECT_EQ(lEngine.registerForPort(0, lPort, 1, 1, nullptr, nullptr, ZTCRecorder::onScope), ZTLST_NullPointer);
     const KPM_EventCallback lpCallback = ZTCRecorder::getEventCallback(FC_REG_LINK_EVENT);
     EXPECT_EQ(lEngine.registerForBoard(2, FC_REG_LINK_EVENT, nullptr, lpCallback), 0u);
     EXPECT_EQ(lEngine.registerForBoard(0, 3, nullptr, lpCallback), 0u);
@@ -193,13 +193,13 @@ TEST(Engine, PlaysAnAdapterWithoutNames) {
     ZTCSimEngine lEngine(sScenario("info board=1 status=23\n"));
     HBA_wwn lNode{};
     HBA_wwn lPort{};
-    EXPECT_EQ(lEngine.getAdapterInfo(0, &lNode, &lPort), ZTSST_Success);
+    EXPECT_EQ(lEngine.getAdapterInfo(0, &lNode, &lPort), ZTLST_Success);
     EXPECT_EQ(lNode.wwn[7], 0x81);
     EXPECT_EQ(lPort.wwn[7], 0x01);
     EXPECT_EQ(lEngine.getAdapterInfo(1, &lNode, &lPort), 23u);
     EXPECT_EQ(lPort.wwn[7], 0x01);
-    EXPECT_EQ(lEngine.getAdapterInfo(2, &lNode, &lPort), ZTSST_NoSuchBoard);
-    EXPECT_EQ(lEngine.getAdapterInfo(0, nullptr, &lPort), ZTSST_NullPointer);
+    EXPECT_EQ(lEngine.getAdapterInfo(2, &lNode, &lPort), ZTLST_NoSuchBoard);
+    EXPECT_EQ(lEngine.getAdapterInfo(0, nullptr, &lPort), ZTLST_NullPointer);
 }
 
 TEST(Engine, TheScheduleStartsWithTheLastKindOfTheLastBoard) {

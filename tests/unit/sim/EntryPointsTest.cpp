@@ -78,9 +78,9 @@ TEST_F(EntryPoints, BeforeInitAndAfterCloseNothingIsThere) {
         EXPECT_EQ(mrList.GetNumberOfAdapters(), 0u);
         EXPECT_EQ(mrList.IsZtapiSupported(), 0u);
         HBA_wwn lName{};
-        EXPECT_EQ(mrList.GetAdapterInfo(0, &lName, &lName), ZTSST_NotOpen);
+        EXPECT_EQ(mrList.GetAdapterInfo(0, &lName, &lName), ZTLST_NotOpen);
         EXPECT_EQ(mrList.KpmRegEvent(0, FC_REG_LINK_EVENT, nullptr, 168, nullptr), 0u);
-        EXPECT_EQ(mrList.KpmUnregEvent(0, 1), ZTSST_NotOpen);
+        EXPECT_EQ(mrList.KpmUnregEvent(0, 1), ZTLST_NotOpen);
         mrList.Close();
         EXPECT_EQ(init(), 0u);
         EXPECT_EQ(mrList.GetNumberOfAdapters(), 2u);
@@ -91,7 +91,7 @@ TEST_F(EntryPoints, BeforeInitAndAfterCloseNothingIsThere) {
 TEST_F(EntryPoints, AScenarioThatDoesNotParseIsRefusedWithItsLine) {
     useScenario("ztapi yes\nqueue-ful board=0\n");
     ::setenv("KPM_SIM_LOG", mDirectory.path("log").c_str(), 1);
-    EXPECT_EQ(init(), ZTSST_BadScenario);
+    EXPECT_EQ(init(), ZTLST_BadScenario);
     const std::string lExpected =
         mDirectory.path("s.kpm") + ":2: \"queue-ful\" is neither a directive nor an event kind\n";
     EXPECT_EQ(mErrors, lExpected);
@@ -102,10 +102,10 @@ TEST_F(EntryPoints, AScenarioThatDoesNotParseIsRefusedWithItsLine) {
 TEST_F(EntryPoints, AScenarioThatIsNotThereIsRefused) {
     const std::string lPath = mDirectory.path("none.kpm");
     ::setenv("KPM_SIM_SCENARIO", lPath.c_str(), 1);
-    EXPECT_EQ(init(), ZTSST_NoScenario);
+    EXPECT_EQ(init(), ZTLST_NoScenario);
     EXPECT_EQ(mErrors, lPath + ": No such file or directory\n");
     ::setenv("KPM_SIM_SCENARIO", mDirectory.path().c_str(), 1);
-    EXPECT_EQ(init(), ZTSST_NoScenario);
+    EXPECT_EQ(init(), ZTLST_NoScenario);
     EXPECT_EQ(mErrors, mDirectory.path() + ": is no regular file\n");
 }
 
@@ -119,7 +119,7 @@ TEST_F(EntryPoints, InitFailsAsToldAndCanBeCalledAgain) {
 
 TEST_F(EntryPoints, ASecondInitIsRefusedAndChangesNothing) {
     EXPECT_EQ(init(), 0u);
-    EXPECT_EQ(init(), ZTSST_AlreadyOpen);
+    EXPECT_EQ(init(), ZTLST_AlreadyOpen);
     EXPECT_EQ(mrList.GetNumberOfAdapters(), 2u);
 }
 
@@ -159,7 +159,7 @@ TEST_F(EntryPoints, CloseRemovesTheSocketAndEndsItsClients) {
 TEST_F(EntryPoints, ASocketThatCannotBeMadeFailsInit) {
     writeFile(mDirectory.path("file"), "");
     ::setenv("KPM_SIM_SOCKET", mDirectory.path("file").c_str(), 1);
-    EXPECT_EQ(init(), ZTSST_NoSocket);
+    EXPECT_EQ(init(), ZTLST_NoSocket);
     EXPECT_EQ(mErrors, mDirectory.path("file") + ": exists and is no socket\n");
     EXPECT_EQ(mrList.GetNumberOfAdapters(), 0u);
 }

@@ -144,9 +144,9 @@ TEST(SimulatedLibraryPage, HasTheLimits) {
 }
 
 TEST(SimulatedLibraryPage, HasTheStatuses) {
-    for (const ZTESimStatus lStatus :
-         {ZTSST_NoScenario, ZTSST_BadScenario, ZTSST_NoSocket, ZTSST_AlreadyOpen, ZTSST_NoResources, ZTSST_NotOpen,
-          ZTSST_NoSuchBoard, ZTSST_NotItsPort, ZTSST_NoSuchKind, ZTSST_NullPointer, ZTSST_NoSuchHandle}) {
+    for (const ZTELibraryStatus lStatus :
+         {ZTLST_NoScenario, ZTLST_BadScenario, ZTLST_NoSocket, ZTLST_AlreadyOpen, ZTLST_NoResources, ZTLST_NotOpen,
+          ZTLST_NoSuchBoard, ZTLST_NotItsPort, ZTLST_NoSuchKind, ZTLST_NullPointer, ZTLST_NoSuchHandle}) {
         EXPECT_TRUE(sHasRow("| " + std::to_string(lStatus) + " | ")) << lStatus;
     }
 }
