@@ -10,6 +10,7 @@
 #include "common/include/Exception.h"
 #include "common/include/Log.h"
 #include "os/common/include/Clib.h"
+#include "os/common/include/Descriptor.h"
 
 namespace {
 
@@ -90,27 +91,6 @@ bool sIsAtPath(const char* apPath, int aDescriptor) {
     return ClibLstat(apPath, &lOfPath) && lOfPath.st_dev == lOfFile.st_dev && lOfPath.st_ino == lOfFile.st_ino;
 }
 
-/// Closes a descriptor at the end of a scope.
-class ZTCOpenFile {
-public:
-    explicit ZTCOpenFile(int aDescriptor) : mDescriptor(aDescriptor) {}
-    ~ZTCOpenFile() { ClibClose(mDescriptor); }
-
-    ZTCOpenFile(const ZTCOpenFile&) = delete;
-    ZTCOpenFile& operator=(const ZTCOpenFile&) = delete;
-
-    int get() const { return mDescriptor; }
-
-    int release() {
-        const int lDescriptor = mDescriptor;
-        mDescriptor = -1;
-        return lDescriptor;
-    }
-
-private:
-    int mDescriptor;
-};
-
 struct ZTSHolder {
     bool mIsThere;
     std::int32_t mProcessId;  // above 0, gcNoPid or gcBadPid
@@ -127,7 +107,7 @@ bool sIsProcessOf(::uid_t aUser, std::int32_t aProcessId) {
 
 /// Who holds the lock of the pid file.
 ZTSHolder sLookUp(const char* apPath) {
-    const ZTCOpenFile lFile(ClibTryOpen(apPath, O_RDONLY | O_NONBLOCK | O_NOFOLLOW));
+    const ZTCDescriptor lFile(ClibTryOpen(apPath, O_RDONLY | O_NONBLOCK | O_NOFOLLOW));
     if (lFile.get() == -ENOENT) {
         return {false, gcNoPid, 0};
     }
@@ -167,7 +147,7 @@ bool ZTCProcessInstanceManager::isAnInstanceRunning() {
     const char* lpPath = mPidFilePath.get();
     int lLockTries = 0;
     for (int lReplacedTries = 0; lReplacedTries < gcReplacedTries;) {
-        ZTCOpenFile lFile(ClibOpen(lpPath, O_RDWR | O_CREAT | O_NONBLOCK | O_NOFOLLOW, gcPidFileMode));
+        ZTCDescriptor lFile(ClibOpen(lpPath, O_RDWR | O_CREAT | O_NONBLOCK | O_NOFOLLOW, gcPidFileMode));
         const struct stat lStatus = sRequireRegularFile(lpPath, lFile.get());
         if (!ClibTryLock(lFile.get())) {
             if (++lLockTries < gcLockTries) {
@@ -261,7 +241,7 @@ void ZTCProcessInstanceManager::exitInstanceManagement() {
         return;
     }
     // The lock goes last: whoever gets it then finds that the file is not at its path any more.
-    const ZTCOpenFile lFile(mDescriptor);
+    const ZTCDescriptor lFile(mDescriptor);
     mDescriptor = -1;
     mIsLocked = false;
     if (sIsAtPath(mPidFilePath.get(), lFile.get())) {
@@ -273,7 +253,7 @@ void ZTCProcessInstanceManager::exitInstanceManagement() {
 
 void ZTCProcessInstanceManager::getProcStatus(const ZTCString& acrPidFilePath) const {
     const char* lpPath = acrPidFilePath.get();
-    const ZTCOpenFile lFile(ClibTryOpen(lpPath, O_RDONLY | O_NONBLOCK));
+    const ZTCDescriptor lFile(ClibTryOpen(lpPath, O_RDONLY | O_NONBLOCK));
     if (lFile.get() < 0) {
         sThrowNoStatus(lpPath, ZTCErrnoText(-lFile.get()).get());
     }

@@ -11,6 +11,7 @@
 #include "common/include/Log.h"
 #include "common/include/Memory.h"
 #include "os/common/include/Clib.h"
+#include "os/common/include/Descriptor.h"
 #include "os/common/include/ProcessEvents.h"
 
 namespace {
@@ -19,27 +20,6 @@ constexpr ::mode_t gcFifoMode = 0600;
 constexpr int gcRetryMilliseconds = 100;
 constexpr int gcWriterMilliseconds = 100;  // a writer that found room goes on within
 constexpr int gcNotOpen = 0;
-
-/// Closes a descriptor unless it is released.
-class ZTCDescriptorGuard {
-public:
-    explicit ZTCDescriptorGuard(int aDescriptor) : mDescriptor(aDescriptor) {}
-    ~ZTCDescriptorGuard() { ClibClose(mDescriptor); }
-
-    ZTCDescriptorGuard(const ZTCDescriptorGuard&) = delete;
-    ZTCDescriptorGuard& operator=(const ZTCDescriptorGuard&) = delete;
-
-    int get() const { return mDescriptor; }
-
-    int release() {
-        const int lDescriptor = mDescriptor;
-        mDescriptor = -1;
-        return lDescriptor;
-    }
-
-private:
-    int mDescriptor;
-};
 
 [[noreturn]] void sThrowNoFifo(const char* apPath, ::mode_t aMode) {
     char lText[512];
@@ -154,10 +134,10 @@ void ZTCNamedPipe::open() {
 void ZTCNamedPipe::openForReading() {
     const char* lpPath = mPath.get();
     sRequireFifo(lpPath);
-    ZTCDescriptorGuard lReader(ClibOpen(lpPath, O_RDONLY | O_NONBLOCK | O_NOFOLLOW));
+    ZTCDescriptor lReader(ClibOpen(lpPath, O_RDONLY | O_NONBLOCK | O_NOFOLLOW));
     const struct stat lReaderStatus = sStatusOfFifo(lpPath, lReader.get());
 
-    ZTCDescriptorGuard lWriter(ClibOpen(lpPath, O_WRONLY | O_NONBLOCK | O_NOFOLLOW));
+    ZTCDescriptor lWriter(ClibOpen(lpPath, O_WRONLY | O_NONBLOCK | O_NOFOLLOW));
     const struct stat lWriterStatus = sStatusOfFifo(lpPath, lWriter.get());
     if (lReaderStatus.st_dev != lWriterStatus.st_dev || lReaderStatus.st_ino != lWriterStatus.st_ino) {
         sThrowOpenFailed(lpPath, "it was replaced meanwhile");
@@ -173,7 +153,7 @@ void ZTCNamedPipe::openForWriting() {
         sRequireFifo(lpPath);
         const int lDescriptor = ClibTryOpen(lpPath, O_WRONLY | O_NONBLOCK | O_NOFOLLOW);
         if (lDescriptor >= 0) {
-            ZTCDescriptorGuard lWriter(lDescriptor);
+            ZTCDescriptor lWriter(lDescriptor);
             sStatusOfFifo(lpPath, lWriter.get());
             mDescriptor = lWriter.release();
             return;
