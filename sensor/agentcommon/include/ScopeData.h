@@ -47,7 +47,7 @@ public:
     unsigned int getCapacity() const { return mCapacity; }
 
     /// Adds bytes behind the stored ones. Throws ZTCNoMemoryEx and changes nothing where there is no memory.
-    void appendEventData(const unsigned char* apData, unsigned int aLength);
+    void appendEventData(const unsigned char* apData, unsigned int aLength) { mEventData.append(apData, aLength); }
 
     /// Category, subcategory, names (0 or 1), with 1 port name and node name, then the data's length and the data.
     void encode(ZTCEncodableOutStream& arStream) const;

@@ -21,10 +21,6 @@ ZTCScopeData::ZTCScopeData(const ZTCPointer<ZTCScopeEvent>& acrEvent, const unsi
     mEventData.append(apData, aLength);
 }
 
-void ZTCScopeData::appendEventData(const unsigned char* apData, unsigned int aLength) {
-    mEventData.append(apData, aLength);
-}
-
 void ZTCScopeData::encode(ZTCEncodableOutStream& arStream) const {
     store(arStream.extend(getEncodedSize()));
 }
