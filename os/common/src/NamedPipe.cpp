@@ -19,6 +19,7 @@ namespace {
 constexpr ::mode_t gcFifoMode = 0600;
 constexpr int gcRetryMilliseconds = 100;
 constexpr int gcWriterMilliseconds = 100;  // a writer that found room goes on within
+constexpr int gcNoTimeLimit = -1;
 constexpr int gcNotOpen = 0;
 
 [[noreturn]] void sThrowNoFifo(const char* apPath, ::mode_t aMode) {
@@ -67,14 +68,16 @@ struct stat sStatusOfFifo(const char* apPath, int aDescriptor) {
     return lStatus;
 }
 
-/// Waits for room in the pipe. False when the exit event comes first.
-bool sWaitForRoom(int aDescriptor) {
+/// Waits until the pipe can be read or written, as aEvents says. False when the exit event or the end of the time comes
+/// first; a signal begins the time anew.
+bool sWaitFor(int aDescriptor, short aEvents, int aMilliseconds) {
     for (;;) {
-        struct pollfd lDescriptors[2] = {{aDescriptor, POLLOUT, 0}, {getExitEvent().getDescriptor(), POLLIN, 0}};
-        if (ClibPoll(lDescriptors, 2, -1) == -EINTR) {
+        struct pollfd lDescriptors[2] = {{aDescriptor, aEvents, 0}, {getExitEvent().getDescriptor(), POLLIN, 0}};
+        const int lReady = ClibPoll(lDescriptors, 2, aMilliseconds);
+        if (lReady == -EINTR) {
             continue;
         }
-        if (lDescriptors[1].revents != 0) {
+        if (lReady == 0 || lDescriptors[1].revents != 0) {
             return false;
         }
         if (lDescriptors[0].revents != 0) {
@@ -252,7 +255,7 @@ void ZTCNamedPipe::write(const ZTCPointer<ZTCBuffer>& acrBuffer, unsigned& arCou
             continue;
         } else if (lResult == -EPIPE) {
             sThrowWriteFailed(mPath.get(), lWritten, lWanted, "its reader has gone");
-        } else if (!sWaitForRoom(mDescriptor)) {
+        } else if (!sWaitFor(mDescriptor, POLLOUT, gcNoTimeLimit)) {
             sThrowWriteFailed(mPath.get(), lWritten, lWanted, "the threads are to exit and its reader does not read");
         }
     }
@@ -340,24 +343,21 @@ std::size_t ZTCNamedPipe::drain(std::uint64_t aMost) {
     std::size_t lWaiting = ClibBytesWaiting(mDescriptor);
     const bool lIsWriterBusy = lWaiting + PIPE_BUF >= ClibPipeCapacity(mDescriptor);
     while (lWaiting > 0) {
-        const std::size_t lEnd = lDrained + lWaiting;
-        while (lDrained < lEnd) {
-            unsigned char lScrap[4096];
-            const ::ssize_t lCount = ClibRead(mDescriptor, lScrap, ZT_MIN(lEnd - lDrained, sizeof(lScrap)));
-            if (lCount == -EINTR) {
-                continue;
-            }
-            if (lCount <= 0) {
-                return lDrained;
-            }
-            lDrained += static_cast<std::size_t>(lCount);
-        }
-        struct pollfd lDescriptors[2] = {{mDescriptor, POLLIN, 0}, {getExitEvent().getDescriptor(), POLLIN, 0}};
-        if (!lIsWriterBusy || lDrained >= aMost || ClibPoll(lDescriptors, 2, gcWriterMilliseconds) <= 0 ||
-            lDescriptors[1].revents != 0) {
+        unsigned char lScrap[4096];
+        const ::ssize_t lCount = ClibRead(mDescriptor, lScrap, ZT_MIN(lWaiting, sizeof(lScrap)));
+        if (lCount == 0) {
             break;
         }
-        lWaiting = ClibBytesWaiting(mDescriptor);
+        if (lCount > 0) {
+            lDrained += static_cast<std::size_t>(lCount);
+            lWaiting -= static_cast<std::size_t>(lCount);
+        } else {
+            // Interrupted, or another reader has taken some.
+            lWaiting = ZT_MIN(lWaiting, ClibBytesWaiting(mDescriptor));
+        }
+        if (lWaiting == 0 && lIsWriterBusy && lDrained < aMost && sWaitFor(mDescriptor, POLLIN, gcWriterMilliseconds)) {
+            lWaiting = ClibBytesWaiting(mDescriptor);
+        }
     }
     return lDrained;
 }
