@@ -200,9 +200,14 @@ void sReopenLog(ZTCFaultStage& arStage) {
 }
 
 void sRotateLog(ZTCFaultStage& arStage) {
-    std::filesystem::resize_file(arStage.agent().agentLogPath(), 64u << 20);
+    const std::string lFormer = arStage.agent().agentLogPath() + ".1";
+    std::filesystem::remove(lFormer);
     arStage.arm();
-    arStage.probe();
+    std::filesystem::resize_file(arStage.agent().agentLogPath(), 64u << 20);
+    // The agent looks at the file's size now and then.
+    do {
+        arStage.probe();
+    } while (!std::filesystem::exists(lFormer) && !arStage.faults().hasFired());
     arStage.disarm();
     arStage.probe();
 }

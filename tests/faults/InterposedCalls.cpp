@@ -24,17 +24,18 @@ Function* sNext(Function* /*apSame*/, const char* apName) {
     return reinterpret_cast<Function*>(dlsym(RTLD_NEXT, apName));
 }
 
-/// Whether the planned failure is one that this file, being none in a file system, never has.
+/// Whether the planned failure is one that this file never has: any but EINTR where it is none in a file system, EAGAIN
+/// where it is a regular one.
 bool sIsOutOfQuestion(int aFile) noexcept {
     if (getPlannedErrno() == EINTR) {
         return false;
     }
     struct stat lStatus {};
     const int lErrno = errno;
-    const bool lIsAnonymous =
-        syscall(SYS_fstat, aFile, &lStatus) == 0 && (lStatus.st_mode & static_cast<mode_t>(S_IFMT)) == 0;
+    const bool lIsKnown = syscall(SYS_fstat, aFile, &lStatus) == 0;
     errno = lErrno;
-    return lIsAnonymous;
+    const bool lIsAnonymous = (lStatus.st_mode & static_cast<mode_t>(S_IFMT)) == 0;
+    return lIsKnown && (lIsAnonymous || (S_ISREG(lStatus.st_mode) && getPlannedErrno() == EAGAIN));
 }
 
 }  // namespace
