@@ -34,12 +34,12 @@ static std::string_view sTake(std::string_view& arText, char aSeparator) {
     return lTaken;
 }
 
-/// The name in a declaration such as "unsigned char name[16]".
+/// The name in a declaration such as "unsigned char name[2][16]".
 static std::string_view sDeclaredName(std::string_view aDeclaration) {
-    const std::size_t lBracket = aDeclaration.rfind('[');
-    const std::size_t lLastSpace = aDeclaration.find_last_of(" \t");
-    if (lBracket != std::string_view::npos && (lLastSpace == std::string_view::npos || lBracket > lLastSpace)) {
-        aDeclaration = aDeclaration.substr(0, lBracket);
+    std::size_t lBracket = aDeclaration.rfind('[');
+    while (aDeclaration.ends_with(']') && lBracket != std::string_view::npos) {
+        aDeclaration = sTrimmed(aDeclaration.substr(0, lBracket));
+        lBracket = aDeclaration.rfind('[');
     }
     const std::size_t lBegin = aDeclaration.find_last_of(" \t*");
     return lBegin == std::string_view::npos ? aDeclaration : aDeclaration.substr(lBegin + 1);

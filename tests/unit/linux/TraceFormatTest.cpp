@@ -39,12 +39,15 @@ TEST(TraceFormat, EveryFieldIsFoundWithItsPlace) {
 TEST(TraceFormat, NamesAreTakenOutOfAnyDeclaration) {
     const ZTSTraceFormat lFormat = parseTraceFormat(
         "field:char comm[16];offset:1;size:16;signed:0;\n field:const char * text;\toffset:2;\tsize:8;\tsigned:0;\n"
-        "field:const char *name;offset:3;size:8;\nfield:__data_loc char[] data;offset:4;size:4;\r\n");
-    ASSERT_EQ(lFormat.mFields.size(), 4u);
+        "field:const char *name;offset:3;size:8;\nfield:__data_loc char[] data;offset:4;size:4;\r\n"
+        "field:u8 table[2][16];offset:5;size:32;\nfield:u8 spaced [4];offset:6;size:4;\n");
+    ASSERT_EQ(lFormat.mFields.size(), 6u);
     EXPECT_EQ(lFormat.mFields[0].mName, "comm");
     EXPECT_EQ(lFormat.mFields[1].mName, "text");
     EXPECT_EQ(lFormat.mFields[2].mName, "name");
     EXPECT_EQ(lFormat.mFields[3].mName, "data");
+    EXPECT_EQ(lFormat.mFields[4].mName, "table");
+    EXPECT_EQ(lFormat.mFields[5].mName, "spaced");
 }
 
 TEST(TraceFormat, LinesThatAreNoFieldsArePassedOver) {
@@ -59,6 +62,7 @@ TEST(TraceFormat, LinesThatAreNoFieldsArePassedOver) {
                                   "field:int x; offset:99999999999999999999; size:4;",
                                   "field:int x; offset:0; size:1048577;",
                                   "; offset:0; size:4;",
+                                  "field:[][4]; offset:0; size:4;",
                                   "ID: x",
                                   "ID: 4294967296",
                                   ":::;;;"};
