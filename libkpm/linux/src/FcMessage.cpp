@@ -70,13 +70,15 @@ std::optional<std::vector<std::uint8_t>> makeLinuxRscn(ZTCByteSpan aData, std::e
         return std::nullopt;
     }
     const std::size_t lLength = scHeader + aData.size();
-    std::vector<std::uint8_t> lPayload{0x61, scPage, static_cast<std::uint8_t>(lLength >> 8),
-                                       static_cast<std::uint8_t>(lLength)};
-    lPayload.reserve(lLength);
+    std::vector<std::uint8_t> lPayload(lLength);
+    lPayload[0] = 0x61;
+    lPayload[1] = scPage;
+    lPayload[2] = static_cast<std::uint8_t>(lLength >> 8);
+    lPayload[3] = static_cast<std::uint8_t>(lLength);
     for (std::size_t lOffset = 0; lOffset < aData.size(); lOffset += scPage) {
         const std::uint64_t lPage = sLoad(aData, lOffset, scPage, aOrder);
-        for (const unsigned lShift : {24u, 16u, 8u, 0u}) {
-            lPayload.push_back(static_cast<std::uint8_t>(lPage >> lShift));
+        for (std::size_t lByte = 0; lByte < scPage; ++lByte) {
+            lPayload[scHeader + lOffset + lByte] = static_cast<std::uint8_t>(lPage >> (24 - 8 * lByte));
         }
     }
     return lPayload;

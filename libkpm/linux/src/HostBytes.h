@@ -6,27 +6,47 @@
 #include <bit>
 #include <cstddef>
 #include <cstdint>
+#include <cstring>
 #include <optional>
 #include <span>
 
 using ZTCByteSpan = std::span<const std::uint8_t>;
 
+/// The number of a type's size that stands at a place, in that order of its bytes.
+template <class Number>
+std::uint64_t loadNumber(const std::uint8_t* apPlace, std::endian aOrder) {
+    Number lNumber = 0;
+    std::memcpy(&lNumber, apPlace, sizeof lNumber);
+    if (aOrder == std::endian::native) {
+        return lNumber;
+    }
+    std::uint64_t lSwapped = 0;
+    for (std::size_t lByte = 0; lByte < sizeof lNumber; ++lByte) {
+        lSwapped = lSwapped << 8 | (std::uint64_t{lNumber} >> (8 * lByte) & 0xFF);
+    }
+    return lSwapped;
+}
+
 /// The `aSize` bytes (1, 2, 4 or 8) from `aOffset` on as a number; nothing where they are not all inside, or of another
 /// size.
 inline std::optional<std::uint64_t> loadUnsigned(ZTCByteSpan aBytes, std::size_t aOffset, std::size_t aSize,
                                                  std::endian aOrder) {
-    if (aSize != 1 && aSize != 2 && aSize != 4 && aSize != 8) {
-        return std::nullopt;
-    }
     if (aOffset > aBytes.size() || aSize > aBytes.size() - aOffset) {
         return std::nullopt;
     }
-    std::uint64_t lValue = 0;
-    for (std::size_t lByte = 0; lByte < aSize; ++lByte) {
-        const std::size_t lPlace = aOrder == std::endian::big ? lByte : aSize - 1 - lByte;
-        lValue = lValue << 8 | aBytes[aOffset + lPlace];
+    const std::uint8_t* lpPlace = aBytes.data() + aOffset;
+    switch (aSize) {
+        case 1:
+            return *lpPlace;
+        case 2:
+            return loadNumber<std::uint16_t>(lpPlace, aOrder);
+        case 4:
+            return loadNumber<std::uint32_t>(lpPlace, aOrder);
+        case 8:
+            return loadNumber<std::uint64_t>(lpPlace, aOrder);
+        default:
+            return std::nullopt;
     }
-    return lValue;
 }
 
 #endif
