@@ -44,3 +44,41 @@ logged() { sed -n 's/^[^ ]* [^ ]* -\(.\)- [^ ]* [^ ]*: /-\1- /p' $gLog | sed 's/
 lost() { logged "$1" | sed -n 's/.*(\([0-9]*\) since the start).*/\1/p' | tail -n 1 | grep . || echo 0; }
 
 instances() { ls $gTracing/instances | grep -c . ; }
+
+# now: milliseconds since the boot.
+now() { sed 's/\([0-9]*\)\.\([0-9][0-9]\).*/\1\20/' /proc/uptime; }
+
+# recorded: the SCSI outcomes that the kernel's filter has let through to the agent so far, read or not.
+recorded() {
+  cat $gTracing/instances/*/per_cpu/cpu*/stats |
+    awk -F ': ' '/^(entries|overrun|commit overrun|dropped events|read events):/ {n += $2} END {print n + 0}'
+}
+
+# agent_time: nanoseconds of processor time of all its threads. agent_wakes: how often they have waited.
+agent_time() { cat /proc/$gAgent/task/*/schedstat | awk '{n += $1} END {printf "%.0f\n", n}'; }
+agent_wakes() { cat /proc/$gAgent/task/*/status | awk '/^voluntary_ctxt_switches/ {n += $2} END {print n}'; }
+
+processors() { grep -c ^processor /proc/cpuinfo; }
+
+# repeated TIMES DEVICE EACH BYTE...: so many senders at once, each of which sends the command so many times.
+repeated() {
+  local lPids= lLeft=$1
+  shift
+  while [ $lLeft -gt 0 ]; do
+    scsi-repeat "$@" &
+    lPids="$lPids $!"
+    lLeft=$((lLeft - 1))
+  done
+  wait $lPids
+}
+gGood='00 00 00 00 00 00'               # TEST UNIT READY
+gPastEnd='28 00 0f ff ff ff 00 00 01 00' # READ(10)
+
+# other_disk: a SCSI device that is no FC host's.
+other_disk() {
+  local lPath
+  for lPath in /sys/bus/pseudo/devices/adapter*/host*/target*/*:*:*:0/scsi_generic/*; do
+    [ -e "$lPath" ] && echo "/dev/${lPath##*/}" && return
+  done
+  return 1
+}

@@ -93,7 +93,6 @@ many() {
 }
 
 fabric_up || exit 1
-dmesg -n 1
 rm -rf "$gOut"
 mkdir -p "$gOut/netlink" "$gOut/tracing/events/scsi" /tmp/messages
 uname -r >"$gOut/release"

@@ -193,6 +193,25 @@ check_command_storm() { # a storm of failing commands is counted whole; where th
   expect_text "something was lost" yes "$([ $gLost -gt 0 ] && echo yes)"
 }
 
+check_healthy() { # good commands, and those of other kinds of hosts, never reach the agent, however many there are
+  local lRecorded lWakes
+  modprobe scsi_debug max_luns=1 delay=0 ndelay=0
+  wait_until 20 other_disk
+  lRecorded=$(recorded)
+  lWakes=$(agent_wakes)
+  repeated 4 $(sg_of 0) 500 $gGood
+  repeated 2 $(other_disk) 10000 $gGood
+  expect_text "2000 good commands, 20000 of another host: records for the agent" 0 $(($(recorded) - lRecorded))
+  lWakes=$(($(agent_wakes) - lWakes))
+  expect_text "its wake-ups ($lWakes), fewer than one for 100 commands" yes "$([ $lWakes -lt 220 ] && echo yes)"
+  repeated 1 $(other_disk) 100 $gPastEnd
+  expect_text "100 failed ones of another host: records" 0 $(($(recorded) - lRecorded))
+  repeated 1 $(sg_of 0) 1 $gPastEnd
+  expect "events, after one failed command of the FC host" 1 '[.[].occurrences] | add'
+  expect_text "records of it" 1 $(($(recorded) - lRecorded))
+  modprobe -r scsi_debug
+}
+
 check_unmapped() { # a LUN that is taken away answers with check conditions of its own LUN
   lun_unmap 1
   unknown_command 1

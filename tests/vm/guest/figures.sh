@@ -1,0 +1,85 @@
+# What scripts/test-vm --figures prints: what the agent costs on this machine while nothing, or nothing of interest, happens, and what
+# it takes before something is lost.
+. /vm/agent.sh
+exec 3>/dev/ttyS1
+
+# ratio A B [PLACES]
+ratio() { awk "BEGIN {printf \"%.${3:-2}f\", $1 / $2}"; }
+
+# costs WHAT COMMANDS COMMAND...: one line of what the agent took while the command ran, which makes so many SCSI commands.
+costs() {
+  local lWhat=$1 lCommands=$2 lRecorded lTime lWakes lBegin lTook
+  shift 2
+  lRecorded=$(recorded)
+  lTime=$(agent_time)
+  lWakes=$(agent_wakes)
+  lBegin=$(now)
+  "$@"
+  lTook=$(($(now) - lBegin))
+  lWakes=$(($(agent_wakes) - lWakes))
+  lTime=$(($(agent_time) - lTime))
+  printf '%-44s %9s %10s %9s %9s\n' "$lWhat" "$(ratio $((lCommands * 1000)) $lTook 0)" \
+    "$(ratio $lTime $((lTook * 1000)))" "$(ratio $((lWakes * 1000)) $lTook 1)" $(($(recorded) - lRecorded)) >&3
+}
+
+# all_came KIND EXPECTED LOSS: collects until what came and what is said to be lost are as many as that: gCame, gLost.
+all_came() {
+  collect
+  gCame=$(query "$(total $1)")
+  gLost=$(($(lost "$3") - gLostBefore))
+  [ $((gCame + gLost)) -ge $2 ]
+}
+# storm WHAT KIND LOSS EVENTS COMMAND...: the line of a storm that the agent reads as it comes.
+storm() {
+  local lWhat=$1 lKind=$2 lLoss=$3 lEvents=$4 lBegin lTime lTook
+  shift 4
+  collect
+  : >$gRecords
+  gLostBefore=$(lost "$lLoss")
+  lTime=$(agent_time)
+  lBegin=$(now)
+  "$@"
+  lTook=$(($(now) - lBegin))
+  wait_until 60 all_came $lKind $lEvents "$lLoss"
+  lTime=$(($(agent_time) - lTime))
+  printf '%-44s %9s %10s %9s %9s\n' "$lWhat" "$(ratio $((lEvents * 1000)) $lTook 0)" "$(ratio $lTime $((lEvents * 1000)))" \
+    $gCame $gLost >&3
+}
+
+# unread WHAT KIND LOSS EVENTS COMMAND...: the same while the agent is stopped.
+unread() {
+  local lWhat=$1 lKind=$2 lLoss=$3 lEvents=$4
+  shift 4
+  collect
+  : >$gRecords
+  gLostBefore=$(lost "$lLoss")
+  kill -STOP $gAgent
+  "$@"
+  kill -CONT $gAgent
+  usleep 5000000
+  post_event $gTarget 500 1 00000000 # the gap in the messages' numbers shows with the next one
+  wait_until 60 all_came $lKind $lEvents "$lLoss"
+  printf '%-44s %9s %10s %9s %9s\n' "$lWhat" "" "" $gCame $gLost >&3
+}
+
+on_one_processor() { taskset 1 scsi-repeat $(sg_of 1) $1 $gPastEnd; }
+rscns() { post_event $gInitiator 5 $1 03020100; }
+
+fabric_up || exit 1
+modprobe scsi_debug max_luns=1 delay=0 ndelay=0
+wait_until 20 other_disk
+start_agent || exit 1
+printf 'Linux %s, %s processors, emulated\n\n' "$(uname -r)" "$(processors)" >&3
+printf '%-44s %9s %10s %9s %9s\n' "" commands/s "agent ms/s" wakes/s records >&3
+costs "idle" 0 usleep 20000000
+costs "good commands of the FC host" 40000 repeated 8 $(sg_of 0) 5000 $gGood
+costs "good commands of another host" 200000 repeated 2 $(other_disk) 100000 $gGood
+echo 'result & 42' >$(echo $gTracing/instances/*)/events/scsi/scsi_dispatch_cmd_done/filter
+costs "the same with no host in the filter" 200000 repeated 2 $(other_disk) 100000 $gGood
+printf '\n%-44s %9s %10s %9s %9s\n' "" events/s "us an event" came lost >&3
+storm "failed commands of the FC host" check-condition 'SCSI outcomes are lost' 8000 repeated 8 $(sg_of 1) 1000 $gPastEnd
+storm "RSCNs, 2000 at once" rscn 'were passed over' 2000 rscns 2000
+unread "outcomes on one processor, agent stopped" check-condition 'SCSI outcomes are lost' 5000 on_one_processor 5000
+unread "RSCNs, agent stopped" rscn 'were passed over' 20000 rscns 20000
+stop_agent
+[ "$gAgentStatus" = 0 ]
