@@ -1,3 +1,4 @@
+/* clang-format off */
 /*
  * libkpm.h - the interface between the agent and an adapters' library
  *
@@ -7,35 +8,37 @@
  * contract: a library that does what the comments here say works with the agent.
  *
  * WORDS
- *   board       one local adapter port (an initiator), named by its index: 0 to GetNumberOfAdapters() - 1. A board
- * keeps its index for as long as the library is open. WWN         an 8-byte Fibre Channel world wide name, in the byte
- * order of the wire. WWNN: a node's, WWPN: a port's. kind        a category and a subcategory: what happened. A
- * subcategory is a single bit of its category's mask.
+ *   board   one local adapter port (an initiator), named by its index: 0 to GetNumberOfAdapters() - 1. A board keeps
+ *           its index for as long as the library is open.
+ *   WWN     an 8-byte Fibre Channel world wide name, in the byte order of the wire. WWNN: a node's, WWPN: a port's.
+ *   kind    a category and a subcategory: what happened. A subcategory is a single bit of its category's mask.
  *
  * THREADS
  *   Init, GetNumberOfAdapters, IsZtapiSupported and GetAdapterInfo are first called by the agent's main thread, one
- * after the other. From then on one thread at a time calls GetNumberOfAdapters, the registrations and Close: the
- * agent's command thread. No entry is called from inside a callback. The library calls the callbacks on threads of its
- * own, from as many at once as it likes, also before the registration call that asked for them has returned. It holds
- * none of its own locks while it does: a callback may wait for a lock that a caller of GetNumberOfAdapters holds. The
- * agent blocks the signals that stop it before it loads the library, so that the library's threads inherit that; a
- *   library does not unblock them.
+ *   after the other. From then on one thread at a time calls GetNumberOfAdapters, the registrations and Close: the
+ *   agent's command thread. No entry is called from inside a callback.
+ *   The library calls the callbacks on threads of its own, from as many at once as it likes, also before the
+ *   registration call that asked for them has returned. It holds none of its own locks while it does: a callback may
+ *   wait for a lock that a caller of GetNumberOfAdapters holds.
+ *   The agent blocks the signals that stop it before it loads the library, so that the library's threads inherit that;
+ *   a library does not unblock them.
  *
  * OWNERSHIP
  *   Everything is borrowed for the length of one call, in both directions: what a callback's pointers point to may be
- * gone when the callback returns (the agent copies), and so may what an entry's pointers point to when the entry
- * returns. The exceptions are the function table and the code behind it, which live until the library is unloaded, the
- * context pointers, which the library hands back and never reads, and the callbacks themselves, which live until Close
- * returns. Nothing that is pointed to need be aligned.
+ *   gone when the callback returns (the agent copies), and so may what an entry's pointers point to when the entry
+ *   returns. The exceptions are the function table and the code behind it, which live until the library is unloaded,
+ *   the context pointers, which the library hands back and never reads, and the callbacks themselves, which live until
+ *   Close returns. Nothing that is pointed to need be aligned.
  *
  * EXIT
  *   The agent closes and unloads the library when it is told to shut down. When it ends for another reason (a stop
- * signal, a sensor that died) the process exits with the library open and its threads running: code that the library
- * runs at exit (destructors of static objects, atexit) neither joins its threads nor frees what they use.
+ *   signal, a sensor that died) the process exits with the library open and its threads running: code that the library
+ *   runs at exit (destructors of static objects, atexit) neither joins its threads nor frees what they use.
  *
  * BYTE ORDER
  *   Integers are in the host's order, except inside an RSCN payload, which stands as on the wire.
  */
+/* clang-format on */
 #ifndef LIBKPM_H
 #define LIBKPM_H
 
@@ -45,8 +48,7 @@
 extern "C" {
 #endif
 
-/* ---- Names and events
- * ------------------------------------------------------------------------------------------------ */
+/* ---- Names and events ---- */
 
 /* A world wide name as on the wire (the shape of the common HBA API, SNIA FC-HBA). Passed by value. */
 typedef struct HBA_wwn {
@@ -204,8 +206,7 @@ typedef struct LINKINFO {
     HBA_wwn a_wwnName;
 } LINKINFO;
 
-/* ---- Callbacks
- * ------------------------------------------------------------------------------------------------------- */
+/* ---- Callbacks ---- */
 
 /*
  * Called for every event that was registered with ZtapiRegEvent: board, local port, category, subcategory, the context
@@ -214,20 +215,23 @@ typedef struct LINKINFO {
 typedef void (*KPM_ScopeCallback)(unsigned board, HBA_wwn port, unsigned category, unsigned subcategory, void* context,
                                   ZT_event* event);
 
+/* clang-format off */
 /*
  * A generic function pointer for the events of KpmRegEvent. The library converts it back to the type of the event it
- * was registered for before it calls it: FC_REG_LINK_EVENT         KPM_LinkCallback         board, a LINKINFO (never
- * null) FC_REG_RSCN_EVENT         KPM_RscnCallback         board, the payload from its command code on, its length in
- * bytes. The payload is whole: as many bytes as its own length field says. FC_REG_TEMPERATURE_EVENT
- * KPM_TemperatureCallback  board, and two values that the agent does not keep
+ * was registered for before it calls it:
+ *   FC_REG_LINK_EVENT         KPM_LinkCallback         board, a LINKINFO (never null)
+ *   FC_REG_RSCN_EVENT         KPM_RscnCallback         board, the payload from its command code on, its length in
+ *                                                      bytes. The payload is whole: as many bytes as its own length
+ *                                                      field says.
+ *   FC_REG_TEMPERATURE_EVENT  KPM_TemperatureCallback  board, and two values that the agent does not keep
  */
+/* clang-format on */
 typedef void (*KPM_EventCallback)(unsigned board, ...);
 typedef void (*KPM_LinkCallback)(unsigned board, void* linkInfo);
 typedef void (*KPM_RscnCallback)(unsigned board, void* payload, unsigned length);
 typedef void (*KPM_TemperatureCallback)(unsigned board, unsigned first, unsigned second);
 
-/* ---- Registration statuses
- * ------------------------------------------------------------------------------------------- */
+/* ---- Registration statuses ---- */
 
 /*
  * ZtapiRegEvent answers 0, or one of three informational statuses that count as success, or any other value for a
@@ -238,8 +242,7 @@ typedef void (*KPM_TemperatureCallback)(unsigned board, unsigned first, unsigned
 #define KPM_STATUS_NO_SOURCE 6u /* accepted and never delivered: this library has no source for that kind here */
 #define KPM_STATUS_INFO_7 7u    /* accepted; the library's own remark */
 
-/* ---- The table of functions
- * ------------------------------------------------------------------------------------------ */
+/* ---- The table of functions ---- */
 
 #define KPM_INTERFACE_VERSION 1u
 

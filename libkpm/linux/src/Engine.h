@@ -41,8 +41,8 @@ public:
 
 struct ZTSLinuxOptions {
     std::string mSysfsRoot = "/sys";
-    std::vector<std::string> mTracefsRoots{"/sys/kernel/tracing", "/sys/kernel/debug/tracing"};  ///< the first is used
-                                                                                                 ///< that has instances
+    /// The first is used that has instances.
+    std::vector<std::string> mTracefsRoots{"/sys/kernel/tracing", "/sys/kernel/debug/tracing"};
     std::chrono::milliseconds mPollInterval{2000};
 };
 
@@ -131,8 +131,7 @@ private:
     };
 
     bool mAreSourcesOpen = false;
-    bool mHasLookedForHost =
-        false;  // a message of an unknown host has made a look of its own since the last regular one
+    bool mHasLookedForHost = false;  // a message of an unknown host has made a look since the last regular one
     bool mIsSocketReady = false;
     bool mIsSocketDrained = true;  // nothing was left to read when it was last read
     bool mIsSocketResting = false;

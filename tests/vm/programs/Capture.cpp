@@ -1,9 +1,8 @@
 // fc-capture: writes down what the kernel's interfaces say, byte for byte.
-//   fc-capture netlink DIRECTORY     each message of the FC events' group into DIRECTORY/NN.bin, and a line in
-//   DIRECTORY/index: the
-//                                    file, the sender's port number, the length; until it is killed
-//   fc-capture pages RAW FILE        the ring-buffer pages that trace_pipe_raw RAW has now, into FILE
-//   fc-capture forge CODE            multicasts a message of that event code in the kernel's stead
+//   fc-capture netlink DIRECTORY    until it is killed, each message of the FC events' group into DIRECTORY/NN.bin, and
+//                                   a line in DIRECTORY/index: the file, the sender's port number, the length
+//   fc-capture pages RAW FILE       the ring-buffer pages that trace_pipe_raw RAW has now, into FILE
+//   fc-capture forge CODE           multicasts a message of that event code in the kernel's stead
 #include <fcntl.h>
 #include <linux/netlink.h>
 #include <sys/socket.h>
