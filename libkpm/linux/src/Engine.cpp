@@ -83,7 +83,12 @@ void ZTCLinuxEngine::stop() {
     static_cast<void>(lWritten);
     if (mThread.joinable()) {
         mThread.join();
-        mLosses.tellAll();
+        try {
+            readTraceLosses();
+            mLosses.tellAll();
+        } catch (const std::exception&) {
+            mLosses.count(ZTLO_Failure);  // without memory, there is nothing to say it with
+        }
     }
     mpMessages.reset();
     mpTrace.reset();
@@ -202,8 +207,13 @@ void ZTCLinuxEngine::waitForWork() {
         mPolls[lBuffer + 2] = {mBuffers[lBuffer].mIsResting ? -1 : mpTrace->getDescriptor(lBuffer), POLLIN, 0};
     }
     const auto lLeft = std::chrono::duration_cast<std::chrono::milliseconds>(mNextLook - Clock::now()).count() + 1;
-    ::poll(mPolls.data(), mPolls.size(),
-           static_cast<int>(std::clamp<long long>(lLeft, 0, mOptions.mPollInterval.count() + 1)));
+    const auto lTimeout = static_cast<int>(std::clamp<long long>(lLeft, 0, mOptions.mPollInterval.count() + 1));
+    if (::poll(mPolls.data(), mPolls.size(), lTimeout) < 0) {
+        // Memory is short, or fewer descriptors are allowed than are open: until the next look, only a stop is waited
+        // for.
+        mLosses.count(ZTLO_Failure);
+        ::poll(mPolls.data(), 1, lTimeout);
+    }
     const bool lIsLookDue = Clock::now() >= mNextLook;
     mIsSocketReady = mPolls[1].revents != 0;
     for (std::size_t lBuffer = 0; lBuffer < mBuffers.size(); ++lBuffer) {
@@ -221,11 +231,18 @@ void ZTCLinuxEngine::look() {
         lrBuffer.mIsResting = false;
     }
     mRemotePorts.forget();
-    const std::vector<ZTSLinuxHost> lHosts = mSysfs.readHosts();
+    const std::optional<std::vector<ZTSLinuxHost>> lHosts = mSysfs.readHosts();
+    if (!lHosts) {
+        // With descriptors or memory short, for one: the hosts have not left for that.
+        mLosses.count(ZTLO_Failure);
+        return;
+    }
+    // As many as there may be boards then, and before there are: with memory short, there is no board without its link.
+    mLinks.resize(mBoards.size() + lHosts->size());
     ZTCLinuxBoards::Changes lChanges;
     {
         const std::lock_guard<std::mutex> lGuard(mLock);
-        lChanges = mBoards.update(lHosts);
+        lChanges = mBoards.update(*lHosts);
     }
     handleHostChanges(lChanges);
     lookAtLinks();
@@ -235,7 +252,6 @@ void ZTCLinuxEngine::handleHostChanges(const ZTCLinuxBoards::Changes& acrChanges
     if (acrChanges.isEmpty()) {
         return;
     }
-    mLinks.resize(mBoards.size());
     for (const std::uint32_t lBoard : acrChanges.mLeft) {
         logLinuxLine(KPM_LOG_NOTICE, "board " + std::to_string(lBoard) + ": its host is gone");
         for (const ZTSLinuxLinkChange& lrChange : mLinks[lBoard].noteReading(ZTLK_Down)) {
@@ -400,7 +416,7 @@ bool ZTCLinuxEngine::readPage(ZTCByteSpan aPage) {
         if (lId && *lId != lrLayout.mId) {
             continue;
         }
-        const std::optional<ZTSScsiOutcome> lOutcome = parseScsiOutcome(*lRecord, lrLayout);
+        const std::optional<ZTSScsiOutcome> lOutcome = lId ? parseScsiOutcome(*lRecord, lrLayout) : std::nullopt;
         if (lOutcome) {
             handleOutcome(*lOutcome);
         } else {

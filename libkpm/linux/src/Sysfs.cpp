@@ -35,21 +35,25 @@ std::optional<std::string> readSmallFile(const std::string& acrPath, std::size_t
     }
 }
 
-std::vector<std::string> listDirectory(const std::string& acrPath) {
+std::optional<std::vector<std::string>> listDirectory(const std::string& acrPath) {
     struct Closer {
         void operator()(DIR* apDirectory) const { ::closedir(apDirectory); }
     };
     std::vector<std::string> lNames;
     const std::unique_ptr<DIR, Closer> lpDirectory(::opendir(acrPath.c_str()));
     if (lpDirectory == nullptr) {
-        return lNames;
+        return errno == ENOENT ? std::optional(lNames) : std::nullopt;
     }
-    while (const dirent* lpEntry = ::readdir(lpDirectory.get())) {
+    while (true) {
+        errno = 0;
+        const dirent* lpEntry = ::readdir(lpDirectory.get());
+        if (lpEntry == nullptr) {
+            return errno == 0 ? std::optional(lNames) : std::nullopt;
+        }
         if (lpEntry->d_name[0] != '.') {
             lNames.emplace_back(lpEntry->d_name);
         }
     }
-    return lNames;
 }
 
 static std::string sHostDirectory(std::uint32_t aHost) {
@@ -61,13 +65,17 @@ std::optional<std::string> ZTCSysfs::readAttribute(const std::string& acrName) c
     return readSmallFile(mRoot + "/class/" + acrName, scPage);
 }
 
-std::vector<std::string> ZTCSysfs::listClass(const std::string& acrName) const {
+std::optional<std::vector<std::string>> ZTCSysfs::listClass(const std::string& acrName) const {
     return listDirectory(mRoot + "/class/" + acrName);
 }
 
-std::vector<ZTSLinuxHost> ZTCSysfs::readHosts() const {
+std::optional<std::vector<ZTSLinuxHost>> ZTCSysfs::readHosts() const {
+    const std::optional<std::vector<std::string>> lNames = listClass("fc_host");
+    if (!lNames) {
+        return std::nullopt;
+    }
     std::vector<ZTSLinuxHost> lHosts;
-    for (const std::string& lrName : listClass("fc_host")) {
+    for (const std::string& lrName : *lNames) {
         const std::optional<std::uint32_t> lNumber = parseSysfsHostName(lrName);
         if (!lNumber) {
             continue;
@@ -133,7 +141,9 @@ HBA_wwn ZTCLinuxRemotePorts::read(const Key& acrKey) {
     // The target's own directory may be gone when its last command ends: its remote port stays longer.
     if (!mHasIndex) {
         mHasIndex = true;
-        for (const std::string& lrName : mrSysfs.listClass("fc_remote_ports")) {
+        const std::vector<std::string> lNames =
+            mrSysfs.listClass("fc_remote_ports").value_or(std::vector<std::string>());
+        for (const std::string& lrName : lNames) {
             const std::optional<ZTSLinuxRportName> lRport = parseSysfsRportName(lrName);
             const std::optional<std::string> lId =
                 lRport ? mrSysfs.readAttribute("fc_remote_ports/" + lrName + "/scsi_target_id") : std::nullopt;

@@ -17,15 +17,16 @@
 /// The content of a small file; nothing where it cannot be read at once or is longer than `aLimit`.
 std::optional<std::string> readSmallFile(const std::string& acrPath, std::size_t aLimit);
 
-/// The names in a directory, without those that begin with a dot, in no order; none where it cannot be read.
-std::vector<std::string> listDirectory(const std::string& acrPath);
+/// The names in a directory, without those that begin with a dot, in no order. None where there is no such directory;
+/// nothing where it cannot be read, as with descriptors or memory short.
+std::optional<std::vector<std::string>> listDirectory(const std::string& acrPath);
 
 class ZTCSysfs {
 public:
     explicit ZTCSysfs(std::string aRoot) : mRoot(std::move(aRoot)) {}
 
-    /// All FC hosts, in ascending order.
-    std::vector<ZTSLinuxHost> readHosts() const;
+    /// All FC hosts, in ascending order; nothing where it cannot be told which there are.
+    std::optional<std::vector<ZTSLinuxHost>> readHosts() const;
 
     ZTELinuxLink readPortState(std::uint32_t aHost) const;
 
@@ -35,7 +36,7 @@ public:
     /// An attribute of the class, such as "fc_host/host0/port_state".
     std::optional<std::string> readAttribute(const std::string& acrName) const;
 
-    std::vector<std::string> listClass(const std::string& acrName) const;
+    std::optional<std::vector<std::string>> listClass(const std::string& acrName) const;
 
 private:
     const std::string mRoot;

@@ -79,7 +79,8 @@ static std::string sExplain(const std::string& acrWhat, int aError) {
 
 /// Instances of killed runs; one that is in use after all (a process of another namespace) the kernel keeps.
 static void sRemoveLeftOvers(const std::string& acrInstances, ZTCTraceDirectories& arDirectories) {
-    for (const std::string& lrName : listDirectory(acrInstances)) {
+    const std::vector<std::string> lNames = listDirectory(acrInstances).value_or(std::vector<std::string>());
+    for (const std::string& lrName : lNames) {
         if (!isTraceInstanceLeftOver(lrName)) {
             continue;
         }
@@ -166,7 +167,8 @@ bool ZTCTraceInstance::openBuffers(std::string& arProblem) {
     mWakesAtOnce = write("buffer_percent", "0") == 0;
     int lError = 0;
     std::size_t lMissing = 0;
-    for (const std::string& lrName : listDirectory(mPath + "/per_cpu")) {
+    const std::vector<std::string> lNames = listDirectory(mPath + "/per_cpu").value_or(std::vector<std::string>());
+    for (const std::string& lrName : lNames) {
         const std::string lBuffer = mPath + "/per_cpu/" + lrName;
         Buffer lNew;
         lNew.mPipe = ZTCLinuxDescriptor(

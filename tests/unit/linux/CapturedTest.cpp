@@ -191,7 +191,7 @@ TEST_P(Captured, AnOverrunIsMarkedOnItsFirstPageAndTheRestIsRead) {
 
 TEST_P(Captured, HostsAndRemotePortsAreFoundInSysfs) {
     const ZTCSysfs lSysfs(path("sysfs-online"));
-    const std::vector<ZTSLinuxHost> lHosts = lSysfs.readHosts();
+    const std::vector<ZTSLinuxHost> lHosts = lSysfs.readHosts().value();
     ASSERT_EQ(lHosts.size(), 2u);
     EXPECT_TRUE(isSameName(lHosts[0].mPortName, HBA_wwn{{0x20, 0, 2, 0, 0, 0, 0, 1}}));
     EXPECT_TRUE(isSameName(lHosts[1].mPortName, HBA_wwn{{0x20, 0, 2, 0, 0, 0, 0, 2}}));

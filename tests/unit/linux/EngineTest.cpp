@@ -1,9 +1,13 @@
 #include "libkpm/linux/src/Engine.h"
 
+#include <fcntl.h>
 #include <gtest/gtest.h>
 #include <signal.h>
+#include <sys/resource.h>
 
 #include <atomic>
+#include <chrono>
+#include <cstdio>
 #include <filesystem>
 #include <memory>
 #include <string>
@@ -120,6 +124,51 @@ TEST_F(LinuxEngine, AHostWithoutReadableAttributesIsABoardAndStopsNothing) {
     EXPECT_EQ(registerPort(0, HBA_wwn{}, 4, 1), KPM_STATUS_SUCCESS) << "by the name that it was given out with";
     mKernel.setState(1, "Linkdown");
     EXPECT_EQ(mRecorder.waitFor(1), ZTCTexts{"1 link down tag=1 up=0 down=1 id=0 2 2"});
+}
+
+TEST_F(LinuxEngine, AClassThatCannotBeReadForAWhileTakesNoHostAway) {
+    mKernel.addHost(0);
+    const std::string lClass = mKernel.sysfs() + "/class/fc_host";
+    const std::string lLoop = mKernel.sysfs() + "/loop";
+    std::filesystem::create_symlink("fc_host", lLoop);
+    const auto lExchange = [&] {
+        return ::renameat2(AT_FDCWD, lClass.c_str(), AT_FDCWD, lLoop.c_str(), RENAME_EXCHANGE);
+    };
+    start();
+    ASSERT_EQ(lExchange(), 0);
+    waitForLog("events are lost: they could not be read or handled");
+    ASSERT_EQ(lExchange(), 0);
+    mKernel.setState(0, "Linkdown");
+    EXPECT_EQ(mRecorder.waitFor(1), ZTCTexts{"0 link down tag=1 up=0 down=1 id=0 1 1"});
+    EXPECT_EQ(mLog.count("its host is gone"), 0u);
+}
+
+/// Allows no descriptor more than those of the lowest numbers, while it is there.
+class ZTCDescriptorLimit {
+public:
+    explicit ZTCDescriptorLimit(rlim_t aDescriptors) {
+        EXPECT_EQ(::getrlimit(RLIMIT_NOFILE, &mBefore), 0);
+        const rlimit lLimit{aDescriptors, mBefore.rlim_max};
+        EXPECT_EQ(::setrlimit(RLIMIT_NOFILE, &lLimit), 0);
+    }
+    ~ZTCDescriptorLimit() { ::setrlimit(RLIMIT_NOFILE, &mBefore); }
+    ZTCDescriptorLimit(const ZTCDescriptorLimit&) = delete;
+    ZTCDescriptorLimit& operator=(const ZTCDescriptorLimit&) = delete;
+
+private:
+    rlimit mBefore{};
+};
+
+TEST_F(LinuxEngine, WithFewerDescriptorsAllowedThanAreOpenItWaitsForMoreAndSaysSo) {
+    mKernel.addHost(0);
+    start();
+    {
+        const ZTCDescriptorLimit lLimit(1);
+        waitForLog("events are lost: they could not be read or handled");
+    }
+    mKernel.sendDone({.mResult = 0x28});
+    EXPECT_EQ(mRecorder.waitFor(1), ZTCTexts{"0 queue-full 0 0"});
+    EXPECT_EQ(mLog.count("its host is gone"), 0u);
 }
 
 // ---- Links ----
@@ -361,6 +410,16 @@ TEST_F(LinuxEngine, WhatDoesNotParseInATracePageIsCountedAndTheNextPageIsServed)
               "both to be told");
 }
 
+TEST_F(LinuxEngine, ARecordThatIsTooShortToTellItsEventIsCounted) {
+    const std::string lPlace = "common_type;\toffset:0;";
+    mKernel.mFormat.replace(mKernel.mFormat.find(lPlace), lPlace.size(), "common_type;\toffset:200;");
+    mKernel.addHost(0);
+    start();
+    mKernel.sendDone({.mResult = 0x28});
+    waitForLog("2 1 trace records are dropped: they do not parse");
+    EXPECT_EQ(mRecorder.count(), 0u);
+}
+
 TEST_F(LinuxEngine, AnOverrunOfTheTraceIsCounted) {
     mKernel.addHost(0);
     start();
@@ -567,4 +626,19 @@ TEST_F(LinuxEngine, WhatIsLostAtTheEndIsStillTold) {
     waitUntil([&] { return mKernel.isFcDrained(); }, "all messages to be read");
     mpEngine->stop();
     EXPECT_EQ(mLog.count("the kernel did not send them (10 since the start)"), 1u) << mLog.all();
+}
+
+TEST_F(LinuxEngine, AnOverrunThatNoLookHasFoundIsToldAtTheEnd) {
+    mKernel.addHost(0);
+    ZTSLinuxOptions lOptions = mKernel.options();
+    lOptions.mPollInterval = std::chrono::hours(1);
+    mpEngine = std::make_unique<ZTCLinuxEngine>(lOptions, mKernel);
+    mpEngine->start();
+    mRecorder.registerAll(*mpEngine, 0);
+    writeFile(mKernel.instance() + "/per_cpu/cpu0/stats", "overrun: 7\n");
+    mKernel.sendDone({.mResult = 0x28});
+    mRecorder.waitFor(1);
+    EXPECT_EQ(mLog.count("a trace buffer overran"), 0u);
+    mpEngine->stop();
+    EXPECT_EQ(mLog.count("2 7 SCSI outcomes are lost: a trace buffer overran (7 since the start)"), 1u) << mLog.all();
 }

@@ -216,7 +216,7 @@ std::string ZTCFakeKernel::instance() const {
 }
 
 std::vector<std::string> ZTCFakeKernel::instances() const {
-    return listDirectory(tracefs() + "/instances");
+    return listDirectory(tracefs() + "/instances").value();
 }
 
 // ---- The log ----

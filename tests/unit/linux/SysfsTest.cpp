@@ -12,7 +12,8 @@ class Sysfs : public testing::Test {
 protected:
     std::vector<std::uint32_t> numbers() const {
         std::vector<std::uint32_t> lNumbers;
-        for (const ZTSLinuxHost& lrHost : mSysfs.readHosts()) {
+        const std::vector<ZTSLinuxHost> lHosts = mSysfs.readHosts().value();
+        for (const ZTSLinuxHost& lrHost : lHosts) {
             lNumbers.push_back(lrHost.mNumber);
         }
         return lNumbers;
@@ -27,16 +28,20 @@ TEST_F(Sysfs, HostsAreFoundInOrderOfTheirNumbersWithTheirNames) {
         mKernel.addHost(lHost);
     }
     EXPECT_EQ(numbers(), (std::vector<std::uint32_t>{1, 2, 10, 21}));
-    EXPECT_TRUE(isSameName(mSysfs.readHosts()[2].mPortName, portName(11)));
-    EXPECT_TRUE(isSameName(mSysfs.readHosts()[2].mNodeName, nodeName(11)));
+    EXPECT_TRUE(isSameName(mSysfs.readHosts().value()[2].mPortName, portName(11)));
+    EXPECT_TRUE(isSameName(mSysfs.readHosts().value()[2].mNodeName, nodeName(11)));
 }
 
 TEST_F(Sysfs, WithoutTheClassThereAreNoHosts) {
-    EXPECT_TRUE(ZTCSysfs("/nowhere").readHosts().empty());
+    EXPECT_TRUE(ZTCSysfs("/nowhere").readHosts().value().empty());
     mKernel.removeClass("fc_host");
     EXPECT_TRUE(numbers().empty());
+}
+
+TEST_F(Sysfs, WhereTheClassCannotBeReadItIsNotTakenForEmpty) {
+    mKernel.removeClass("fc_host");
     mKernel.setAttribute("fc_host", "a file in place of the directory");
-    EXPECT_TRUE(numbers().empty());
+    EXPECT_FALSE(mSysfs.readHosts().has_value());
 }
 
 TEST_F(Sysfs, WhatIsNoHostIsPassedOver) {
@@ -57,7 +62,7 @@ TEST_F(Sysfs, MissingOrGarbledNamesAreZeroAndTheHostIsThere) {
     mKernel.addHost(3);
     mKernel.setHost(3, "port_name", "");
     std::filesystem::create_directory(mKernel.sysfs() + "/class/fc_host/host4");
-    const auto lHosts = mSysfs.readHosts();
+    const auto lHosts = mSysfs.readHosts().value();
     ASSERT_EQ(lHosts.size(), 5u);
     EXPECT_TRUE(isZeroName(lHosts[0].mPortName));
     EXPECT_TRUE(isSameName(lHosts[0].mNodeName, nodeName(1)));
