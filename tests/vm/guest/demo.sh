@@ -45,4 +45,4 @@ stop_agent
 echo "agent: status $gAgentStatus; trace instances: $(instances)" | show
 
 grep -q 'queue-full .* 12 ' /tmp/first && grep -q 'device-busy .* 3 ' /tmp/first && grep -q ' check-condition ' /tmp/first &&
-  grep -q ' link ' /tmp/second && grep -q ' rscn .*0x00010203' /tmp/second && [ "$gAgentStatus $(instances)" = "0 0" ]
+  grep -q ' link ' /tmp/second && grep -q ' rscn .*fcAddress=0x010203' /tmp/second && [ "$gAgentStatus $(instances)" = "0 0" ]
