@@ -7,7 +7,7 @@
 #include <cstring>
 #include <filesystem>
 #include <fstream>
-#include <iterator>
+#include <sstream>
 #include <stdexcept>
 #include <system_error>
 
@@ -24,8 +24,15 @@ ZTCTemporaryDirectory::~ZTCTemporaryDirectory() {
 }
 
 std::string readFile(const std::string& acrPath) {
+    return readFileFrom(acrPath, 0);
+}
+
+std::string readFileFrom(const std::string& acrPath, std::size_t aOffset) {
     std::ifstream lFile(acrPath, std::ios::binary);
-    return std::string(std::istreambuf_iterator<char>(lFile), std::istreambuf_iterator<char>());
+    lFile.seekg(static_cast<std::streamoff>(aOffset));
+    std::ostringstream lContent;
+    lContent << lFile.rdbuf();
+    return lContent.str();
 }
 
 void writeFile(const std::string& acrPath, const std::string& acrContent) {

@@ -2,6 +2,7 @@
 #ifndef TESTS_SUPPORT_TEMPORARYDIRECTORY_H
 #define TESTS_SUPPORT_TEMPORARYDIRECTORY_H
 
+#include <cstddef>
 #include <string>
 
 class ZTCTemporaryDirectory {
@@ -20,6 +21,8 @@ private:
 
 /// The file's content; empty where there is no such file.
 std::string readFile(const std::string& acrPath);
+/// The same from an offset on.
+std::string readFileFrom(const std::string& acrPath, std::size_t aOffset);
 /// Makes the file anew with this content; throws std::runtime_error where that fails.
 void writeFile(const std::string& acrPath, const std::string& acrContent);
 bool exists(const std::string& acrPath);

@@ -1,7 +1,10 @@
 #include "tests/unit/agentcommon/support/TestLog.h"
 
 #include <algorithm>
+#include <cstdint>
+#include <filesystem>
 #include <stdexcept>
+#include <system_error>
 
 #include "common/include/Log.h"
 #include "tests/support/TemporaryDirectory.h"
@@ -17,9 +20,9 @@ ZTCTestLog::~ZTCTestLog() {
 }
 
 std::vector<ZTSLogLine> ZTCTestLog::lines() const {
-    const std::string lContent = readFile(mPath);
+    const std::string lContent = readFileFrom(mPath, mOffset);
     std::vector<ZTSLogLine> lLines;
-    std::size_t lBegin = mOffset;
+    std::size_t lBegin = 0;
     for (std::size_t lEnd = lContent.find('\n', lBegin); lEnd != std::string::npos;
          lEnd = lContent.find('\n', lBegin)) {
         const std::string lLine = lContent.substr(lBegin, lEnd - lBegin);
@@ -58,7 +61,9 @@ std::optional<ZTSLogLine> ZTCTestLog::find(const std::string& acrMarkedText) con
 }
 
 void ZTCTestLog::forget() {
-    mOffset = readFile(mPath).size();
+    std::error_code lError;
+    const std::uintmax_t lSize = std::filesystem::file_size(mPath, lError);
+    mOffset = lError ? 0 : lSize;
 }
 
 void ZTCTestLog::sendToStandardError() {
