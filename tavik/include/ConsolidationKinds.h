@@ -53,9 +53,6 @@ struct ZTSConsolidationKind {
     unsigned int mAppendedSize;
     ZTSFieldCopy mAppendedFields[3];
     ZTSBitFieldCopy mBitFields[4];
-
-    /// Any failure of the look-up of the remote port, and not only that it is unknown, yields a record without names.
-    bool mIgnoresLookupFailures;
 };
 
 extern const ZTSConsolidationKind gcPlogiKind;

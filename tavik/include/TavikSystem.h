@@ -101,7 +101,7 @@ public:
         const ZTCPointer<ZTCTavikTarget>* lpTarget = mTargetsMap.get(aFcId, std::nothrow);
         return lpTarget == nullptr ? nullptr : lpTarget->get();
     }
-    const ZTSRemotePortNames* findWwpnNames(unsigned long aKey) ZT_REQUIRES(mPrevDataLock);
+    const ZTSRemotePortNames* findWwpnNames(unsigned long aKey) noexcept ZT_REQUIRES(mPrevDataLock);
 
     // ---- Record lists: filled by callbacks, exchanged by the command thread.
 

@@ -48,8 +48,7 @@ const ZTSConsolidationKind gcPlogiKind = {
                       ZT_COPY(zt_plogi_rcv_v0, zt_plogir_nodename, TavikPlogi, PayloadWwpn)},
     .mAppendedSize = 0,
     .mAppendedFields = {},
-    .mBitFields = {},
-    .mIgnoresLookupFailures = false};
+    .mBitFields = {}};
 
 const ZTSConsolidationKind gcPrloKind = {
     .mMinimumLength = sizeof(zt_prlo_rcv_v0),
@@ -60,8 +59,7 @@ const ZTSConsolidationKind gcPrloKind = {
     .mRecordFields = {ZT_COPY(zt_prlo_rcv_v0, zt_prlor_remoteport, TavikPrlo, Wwpn)},
     .mAppendedSize = 0,
     .mAppendedFields = {},
-    .mBitFields = {},
-    .mIgnoresLookupFailures = false};
+    .mBitFields = {}};
 
 const ZTSConsolidationKind gcAdiscKind = {
     .mMinimumLength = sizeof(zt_adisc_rcv_v0),
@@ -73,8 +71,7 @@ const ZTSConsolidationKind gcAdiscKind = {
                       ZT_COPY(zt_adisc_rcv_v0, zt_adiscr_nodename, TavikAdisc, Wwnn)},
     .mAppendedSize = 0,
     .mAppendedFields = {},
-    .mBitFields = {},
-    .mIgnoresLookupFailures = false};
+    .mBitFields = {}};
 
 const ZTSConsolidationKind gcLsRjtKind = {
     .mMinimumLength = sizeof(zt_lsrjt_rcv_v0),
@@ -89,8 +86,7 @@ const ZTSConsolidationKind gcLsRjtKind = {
     .mAppendedSize = sizeof(TavikConsLsRjt),
     .mAppendedFields = {ZT_COPY(zt_lsrjt_rcv_v0, zt_lsrjtr_reasoncode, TavikConsLsRjt, ReasonCode),
                         ZT_COPY(zt_lsrjt_rcv_v0, zt_lsrjtr_reasoncodeexpl, TavikConsLsRjt, ReasonCodeExpl)},
-    .mBitFields = {},
-    .mIgnoresLookupFailures = false};
+    .mBitFields = {}};
 
 const ZTSConsolidationKind gcLogoKind = {
     .mMinimumLength = sizeof(zt_logo_rcv_v0),
@@ -102,8 +98,7 @@ const ZTSConsolidationKind gcLogoKind = {
                       ZT_COPY(zt_logo_rcv_v0, zt_logo_payloadwwpn, TavikLogo, PayloadWwpn)},
     .mAppendedSize = 0,
     .mAppendedFields = {},
-    .mBitFields = {},
-    .mIgnoresLookupFailures = false};
+    .mBitFields = {}};
 
 const ZTSConsolidationKind gcPortBusyKind = {
     .mMinimumLength = sizeof(zt_pbsy_rcv_v0),
@@ -114,8 +109,7 @@ const ZTSConsolidationKind gcPortBusyKind = {
     .mRecordFields = {ZT_COPY(zt_pbsy_rcv_v0, zt_pbsyr_rport, TavikPortBusy, Wwpn)},
     .mAppendedSize = 0,
     .mAppendedFields = {},
-    .mBitFields = {},
-    .mIgnoresLookupFailures = false};
+    .mBitFields = {}};
 
 const ZTSConsolidationKind gcFcprdChkErrKind = {
     .mMinimumLength = sizeof(zt_fcprdchkerr_v0),
@@ -130,8 +124,7 @@ const ZTSConsolidationKind gcFcprdChkErrKind = {
                       ZT_COPY(zt_fcprdchkerr_v0, zt_fcprdchkerr_fcpiparam, TavikFcprdChkErr, FcpiParam)},
     .mAppendedSize = sizeof(TavikConsFcprdChkErr),
     .mAppendedFields = {ZT_COPY(zt_fcprdchkerr_v0, zt_fcprdchkerr_fcpiparam, TavikConsFcprdChkErr, FcpiParam)},
-    .mBitFields = {},
-    .mIgnoresLookupFailures = false};
+    .mBitFields = {}};
 
 const ZTSConsolidationKind gcQFullKind = {
     .mMinimumLength = sizeof(ZT_scsi_generic_v0),
@@ -142,8 +135,7 @@ const ZTSConsolidationKind gcQFullKind = {
     .mRecordFields = {ZT_COPY(ZT_scsi_generic_v0, zt_scsi_generic_rport, TavikQFull, Wwpn)},
     .mAppendedSize = 0,
     .mAppendedFields = {},
-    .mBitFields = {ZT_SET_BIT(ZT_scsi_generic_v0, zt_scsi_generic_lun, TavikQFull, LenOsLun, OsLun, true)},
-    .mIgnoresLookupFailures = false};
+    .mBitFields = {ZT_SET_BIT(ZT_scsi_generic_v0, zt_scsi_generic_lun, TavikQFull, LenOsLun, OsLun, true)}};
 
 const ZTSConsolidationKind gcDevBsyKind = {
     .mMinimumLength = sizeof(ZT_scsi_generic_v0),
@@ -154,8 +146,7 @@ const ZTSConsolidationKind gcDevBsyKind = {
     .mRecordFields = {ZT_COPY(ZT_scsi_generic_v0, zt_scsi_generic_rport, TavikDevBsy, Wwpn)},
     .mAppendedSize = 0,
     .mAppendedFields = {},
-    .mBitFields = {ZT_SET_BIT(ZT_scsi_generic_v0, zt_scsi_generic_lun, TavikDevBsy, LenOsLun, OsLun, true)},
-    .mIgnoresLookupFailures = false};
+    .mBitFields = {ZT_SET_BIT(ZT_scsi_generic_v0, zt_scsi_generic_lun, TavikDevBsy, LenOsLun, OsLun, true)}};
 
 const ZTSConsolidationKind gcCheckCondKind = {
     .mMinimumLength = sizeof(zt_scsi_checkcondition_v0),
@@ -169,11 +160,10 @@ const ZTSConsolidationKind gcCheckCondKind = {
                       ZT_COPY(zt_scsi_checkcondition_v0, zt_checkcondition_asc, TavikCheckCond, Asc)},
     .mAppendedSize = 0,
     .mAppendedFields = {},
-    .mBitFields = {ZT_SET_BIT(zt_scsi_checkcondition_v0, zt_checkcondition_lun, TavikCheckCond, OsLunLen, OsLun, true),
-                   ZT_SET_BIT(zt_scsi_checkcondition_v0, zt_checkcondition_cmdcode, TavikCheckCond, CmdCodeLen, CmdCode,
-                              false),
-                   ZT_SET_BIT(zt_scsi_checkcondition_v0, zt_checkcondition_ascq, TavikCheckCond, AscqLen, Ascq, false)},
-    .mIgnoresLookupFailures = true};
+    .mBitFields = {
+        ZT_SET_BIT(zt_scsi_checkcondition_v0, zt_checkcondition_lun, TavikCheckCond, OsLunLen, OsLun, true),
+        ZT_SET_BIT(zt_scsi_checkcondition_v0, zt_checkcondition_cmdcode, TavikCheckCond, CmdCodeLen, CmdCode, false),
+        ZT_SET_BIT(zt_scsi_checkcondition_v0, zt_checkcondition_ascq, TavikCheckCond, AscqLen, Ascq, false)}};
 
 const ZTSConsolidationKind gcLunResetKind = {
     .mMinimumLength = sizeof(ZT_scsi_generic_v0),
@@ -185,8 +175,7 @@ const ZTSConsolidationKind gcLunResetKind = {
                       ZT_COPY(ZT_scsi_generic_v0, zt_scsi_generic_lun, TavikLunReset, OsLun)},
     .mAppendedSize = sizeof(TavikConsLunReset),
     .mAppendedFields = {ZT_COPY(ZT_scsi_generic_v0, zt_scsi_generic_lun, TavikConsLunReset, OsLun)},
-    .mBitFields = {},
-    .mIgnoresLookupFailures = false};
+    .mBitFields = {}};
 
 const ZTSConsolidationKind gcTargetResetKind = {
     .mMinimumLength = sizeof(ZT_scsi_generic_v0),
@@ -198,8 +187,7 @@ const ZTSConsolidationKind gcTargetResetKind = {
                       ZT_COPY(ZT_scsi_generic_v0, zt_scsi_generic_lun, TavikTargetReset, OsLun)},
     .mAppendedSize = sizeof(TavikConsTargetReset),
     .mAppendedFields = {ZT_COPY(ZT_scsi_generic_v0, zt_scsi_generic_lun, TavikConsTargetReset, OsLun)},
-    .mBitFields = {},
-    .mIgnoresLookupFailures = false};
+    .mBitFields = {}};
 
 const ZTSConsolidationKind gcVarQDepthKind = {
     .mMinimumLength = sizeof(zt_scsi_varquedepth_v0),
@@ -213,5 +201,4 @@ const ZTSConsolidationKind gcVarQDepthKind = {
     .mAppendedSize = sizeof(TavikConsQChange),
     .mAppendedFields = {ZT_COPY(zt_scsi_varquedepth_v0, zt_varquedepth_lun, TavikConsQChange, OsLun),
                         ZT_COPY(zt_scsi_varquedepth_v0, zt_varquedepth_newval, TavikConsQChange, NewVal)},
-    .mBitFields = {},
-    .mIgnoresLookupFailures = false};
+    .mBitFields = {}};

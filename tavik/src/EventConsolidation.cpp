@@ -2,7 +2,6 @@
 
 #include <cstring>
 
-#include "common/include/Exception.h"
 #include "common/include/Log.h"
 #include "common/include/Memory.h"
 #include "sensor/agentcommon/include/EventDataRecords.h"
@@ -75,19 +74,6 @@ void sFillRecord(const ZTSConsolidationKind& acrKind, const unsigned char* apPay
     sSetBits(acrKind, apPayload, apRecord);
 }
 
-/// The names of the registered target that is the payload's remote port, or null.
-const ZTSRemotePortNames* sFindNames(ZTCTavikSystem& arSystem, const ZTSConsolidationKind& acrKind,
-                                     const unsigned char* apPayload) ZT_REQUIRES(arSystem.getPrevDataLock()) {
-    try {
-        return arSystem.findWwpnNames(ZTCWorldWideName(apPayload + gcRemotePortOffset).getKey());
-    } catch (const ZTCException&) {
-        if (!acrKind.mIgnoresLookupFailures) {
-            throw;
-        }
-        return nullptr;
-    }
-}
-
 /// True where the event went into the pending record, whose identity it has.
 bool sContinue(ZTCTavikSystem& arSystem, const ZTSConsolidationKind& acrKind, const unsigned char* apPayload)
     ZT_REQUIRES(arSystem.getPrevDataLock()) {
@@ -123,7 +109,7 @@ void consolidateEvent(ZTCTavikSystem& arSystem, const ZTSConsolidationKind& acrK
         unsigned char lRecord[gcMaxRecordDataSize] = {};
         sFillRecord(acrKind, lpPayload, lRecord);
         startScopeRecord(arSystem, acrEvent, aBoardId, lRecord, acrKind.mRecordSize,
-                         sFindNames(arSystem, acrKind, lpPayload));
+                         arSystem.findWwpnNames(ZTCWorldWideName(lpPayload + gcRemotePortOffset).getKey()));
         // Only now: an identity without its record would let the next event extend the wrong one.
         sNoteIdentity(acrKind, acrPrev, lpPayload);
     }

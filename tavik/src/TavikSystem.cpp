@@ -389,7 +389,7 @@ void ZTCTavikSystem::addWwpnTarget(const ZTCPointer<ZTCTavikTarget>& acrTarget) 
     ZT_EXIT();
 }
 
-const ZTSRemotePortNames* ZTCTavikSystem::findWwpnNames(unsigned long aKey) {
+const ZTSRemotePortNames* ZTCTavikSystem::findWwpnNames(unsigned long aKey) noexcept {
     const ZTSRemotePortNames* lpNames = mTargetIndex.find(aKey);
     if (lpNames == nullptr && isLogLevelEnabled(ZTLL_Info)) {
         // The map does not have it either, and says so.
