@@ -4,6 +4,7 @@
 #include <cerrno>
 #include <stdexcept>
 #include <string>
+#include <utility>
 #include <vector>
 
 #include "tests/faults/FaultInjection.h"
@@ -58,6 +59,83 @@ TEST(Fault, AStartWhoseSecondThreadCannotBeMadeStopsTheFirst) {
               1);
     lAgent.pipes().close();
     sExpectToServe(lAgent);
+}
+
+TEST(Fault, WhateverIsInterruptedInAStartIsDoneAgainAndTheAgentServes) {
+    for (const char* lpCall : {"open", "flock", "ftruncate", "pwrite", "write", "poll"}) {
+        for (unsigned lNth = 1; lNth <= 4; ++lNth) {
+            SCOPED_TRACE(lpCall + std::string(" number ") + std::to_string(lNth));
+            ZTCAgentProcess lAgent;
+            ZTCFaultInjection lFaults(lAgent);
+            lFaults.arm({lpCall, lNth, EINTR});
+            lAgent.startAndConnectQuietly();
+            EXPECT_TRUE(lFaults.hasFired() || lNth > 1);
+            lFaults.disarm();
+            EXPECT_EQ(lAgent.stop(), 0);
+        }
+    }
+}
+
+TEST(Fault, AStartThatCannotTakeSignalsSaysWhyAndEndsInOrder) {
+    const struct {
+        ZTSFaultPlan mPlan;
+        const char* mpText;
+    } lcRows[] = {
+        {{"signalfd", 1, EMFILE}, "qrv-tvk ends: signalfd failed: Too many open files"},
+        {{"pthread_create", 1, EAGAIN}, "qrv-tvk ends: pthread_create failed: Resource temporarily unavailable"},
+    };
+    for (const auto& lcrRow : lcRows) {
+        ZTCAgentProcess lAgent;
+        ZTCFaultInjection lFaults(lAgent);
+        EXPECT_EQ(sStatusOfStartWith(lAgent, lFaults, lcrRow.mPlan), 0);
+        EXPECT_TRUE(lAgent.log().has(lcrRow.mpText, "-E-")) << lcrRow.mpText;
+        sExpectToServe(lAgent);
+    }
+}
+
+TEST(Fault, ADaemonThatCannotBeMadeSaysWhyAndLeavesNothing) {
+    for (const char* lpCall : {"fork", "setsid"}) {
+        ZTCChildProcess::becomeReaper();
+        ZTCAgentProcess lAgent;
+        ZTCFaultInjection lFaults(lAgent);
+        lFaults.arm({lpCall, 1, EAGAIN});
+        EXPECT_EQ(lAgent.run({"-D", "true", "-l", lAgent.agentLogPath()}).mStatus, 0);
+        const std::string lcEnd = " failed: Resource temporarily unavailable";
+        lAgent.log().waitForLine([&](const ZTSLogLine& acrLine) { return acrLine.mText.ends_with(lcEnd); }, lpCall);
+        lFaults.disarm();
+        waitUntil([&] { return !exists(lAgent.pidFilePath()); }, "the pid file to be removed");
+        sExpectToServe(lAgent);
+    }
+}
+
+TEST(Fault, ACommandFifoThatEndsAndAResponseFifoThatTakesNothingEndTheAgentInOrder) {
+    const std::pair<const char*, const char*> lcRows[] = {{"read", "unexpected end of file"},
+                                                          {"writev", "it takes nothing"}};
+    for (const auto& [lpCall, lpText] : lcRows) {
+        ZTCAgentProcess lAgent;
+        ZTCFaultInjection lFaults(lAgent);
+        lAgent.startAndConnect();
+        lFaults.arm({lpCall, 1, 0, 0, true});
+        lAgent.pipes().sendRequest(bytesOf("0500000001"));
+        EXPECT_EQ(lAgent.waitForExit(), 0);
+        lFaults.disarm();
+        EXPECT_TRUE(lFaults.hasFired());
+        EXPECT_GE(lAgent.log().containing(lpText).size(), 1u) << lpText;
+        lAgent.pipes().close();
+        sExpectToServe(lAgent);
+    }
+}
+
+TEST(Fault, AnAnswerThatIsInterruptedIsWhole) {
+    ZTCAgentProcess lAgent;
+    ZTCFaultInjection lFaults(lAgent);
+    lAgent.startAndConnectQuietly();
+    for (const int lErrno : {EINTR, EAGAIN}) {
+        lFaults.arm({"writev", 1, lErrno});
+        EXPECT_EQ(lAgent.request("0500000001"), gcSuccessHex);
+        EXPECT_TRUE(lFaults.hasFired());
+    }
+    lFaults.disarm();
 }
 
 TEST(Fault, ACommandThatArrivesByteByByteAndIsInterruptedIsAnswered) {

@@ -222,6 +222,18 @@ static std::string sLinkOf(pid_t aPid, const std::string& acrName) {
     return std::filesystem::read_symlink("/proc/" + std::to_string(aPid) + "/" + acrName).string();
 }
 
+TEST(Instance, AStartBesideOneThatHasNotWrittenItsNumberYetSaysSo) {
+    ZTCAgentProcess lAgent;
+    const ZTCPidFileLock lLock(lAgent.pidFilePath());
+    const ZTSRunResult lResult = lAgent.run(lAgent.defaultArguments());
+    EXPECT_EQ(lResult.mStatus, 0);
+    const std::string lText =
+        "qrv-tvk is being started already by a process that holds the pid file '" + lAgent.pidFilePath() + "'";
+    EXPECT_NE(lResult.mError.find(lText), std::string::npos) << lResult.mError;
+    EXPECT_TRUE(lAgent.log().has(lText, "-E-"));
+    EXPECT_TRUE(exists(lAgent.pidFilePath()));
+}
+
 TEST(Instance, ADaemonKeepsItsDirectoryAndHasLeftItsTerminal) {
     ZTCChildProcess::becomeReaper();
     ZTCAgentProcess lAgent;

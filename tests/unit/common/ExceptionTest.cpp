@@ -1,7 +1,9 @@
 #include "common/include/Exception.h"
 
+#include <gmock/gmock.h>
 #include <gtest/gtest.h>
 
+#include <set>
 #include <string>
 #include <type_traits>
 
@@ -75,6 +77,21 @@ TEST(Exception, FrameworkClassesCarryTheirSegment) {
     EXPECT_EQ(2u, ZT_ERRCODE_SEGMENT(ZTCTimeOutEx().getError()));
     EXPECT_EQ(2u, ZT_ERRCODE_SEGMENT(ZTCOsMutexEx().getError()));
     EXPECT_EQ(3u, ZT_ERRCODE_SEGMENT(ZTCHeartbeatFailedEx().getError()));
+}
+
+TEST(Exception, EveryClibExceptionSaysWhatFailedUnderACodeOfItsOwn) {
+    const ZTCClibEx lcExceptions[] = {
+        ZTCClibStatFailedEx(),  ZTCClibUtimeFailedEx(),    ZTCClibGetProcStatusFailedEx(), ZTCClibOpenFailedEx(),
+        ZTCClibCloseFailedEx(), ZTCClibReadFailedEx(),     ZTCClibWriteFailedEx(),         ZTCClibMkfifoFailedEx(),
+        ZTCClibMkdirFailedEx(), ZTCClibUnlinkFailedEx(),   ZTCClibLockFailedEx(),          ZTCClibForkFailedEx(),
+        ZTCClibPollFailedEx(),  ZTCClibSignalFailedEx(),   ZTCClibKillFailedEx(),          ZTCClibEventFailedEx(),
+        ZTCClibDupFailedEx(),   ZTCClibTruncateFailedEx(), ZTCClibSessionFailedEx()};
+    std::set<unsigned> lCodes;
+    for (const ZTCClibEx& lcrException : lcExceptions) {
+        EXPECT_THAT(lcrException.what(), testing::HasSubstr(" failed"));
+        EXPECT_EQ(1u, ZT_ERRCODE_SEGMENT(lcrException.getError())) << lcrException.what();
+        EXPECT_TRUE(lCodes.insert(lcrException.getError()).second) << lcrException.what();
+    }
 }
 
 TEST(Exception, AClibExceptionHasBothBasesAndOneText) {

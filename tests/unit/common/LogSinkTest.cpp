@@ -10,9 +10,11 @@
 #include <csignal>
 #include <cstdio>
 #include <filesystem>
+#include <fstream>
 #include <memory>
 #include <string>
 #include <thread>
+#include <utility>
 #include <vector>
 
 #include "tests/support/FailingAllocation.h"
@@ -643,6 +645,52 @@ TEST_F(LogSink, ALineSurvivesTheProcessBeingKilledRightAfterTheCall) {
     ASSERT_EQ(lPid, waitpid(lPid, &lStatus, 0));
     EXPECT_TRUE(WIFSIGNALED(lStatus));
     EXPECT_EQ((Lines{"-M- last words"}), sLines(mPath));
+}
+
+TEST_F(LogSink, APathFromAnywhereInTheTreeIsTheSameAfterTheDirectoryWasLeft) {
+    const std::filesystem::path lFormer = std::filesystem::current_path();
+    const std::pair<const char*, std::string> lcRows[] = {{"/", mPath.substr(1)}, {mDirectory.path().c_str(), "other"}};
+    for (const auto& [lpDirectory, lcrPath] : lcRows) {
+        std::filesystem::current_path(lpDirectory);
+        mpSink->setPath(lcrPath.c_str());
+        std::filesystem::current_path(lFormer);
+        sWriteTo(*mpSink, "%s", lcrPath.c_str());
+    }
+    EXPECT_EQ(Lines{"-M- " + mPath.substr(1)}, sLines(mPath));
+    EXPECT_EQ(Lines{"-M- other"}, sLines(mDirectory.path("other")));
+}
+
+TEST_F(LogSink, WithoutACurrentDirectoryARelativePathIsUsedAsItStandsAndThatIsSaid) {
+    const std::filesystem::path lFormer = std::filesystem::current_path();
+    const std::string lGone = mDirectory.path("gone");
+    std::filesystem::create_directory(lGone);
+    std::filesystem::current_path(lGone);
+    std::filesystem::remove(lGone);
+    mpSink->setPath("relative.log");
+    std::filesystem::current_path(mDirectory.path());
+    sNowMs += 60000;
+    sWriteTo(*mpSink, "a line");
+    std::filesystem::current_path(lFormer);
+    EXPECT_EQ(Lines{"-M- a line"}, sLines(mDirectory.path("relative.log")));
+    EXPECT_NE(std::string::npos, mStandardError.take().find("Cannot make the path of the log file absolute "
+                                                            "'relative.log': no current directory"));
+}
+
+TEST_F(LogSink, AFileThatMayOnlyBeWrittenIsWritten) {
+    const uid_t lFormer = geteuid();
+    std::filesystem::permissions(mDirectory.path(), std::filesystem::perms::all);
+    { std::ofstream lFile(mPath); }
+    ASSERT_EQ(0, chmod(mPath.c_str(), 0222));
+    if (lFormer == 0) {
+        // Root may read everything.
+        ASSERT_EQ(0, seteuid(65534));
+    }
+    mpSink->setPath(mPath.c_str());
+    sWriteTo(*mpSink, "a line");
+    ASSERT_EQ(0, seteuid(lFormer));
+    ASSERT_EQ(0, chmod(mPath.c_str(), 0644));
+    EXPECT_EQ(Lines{"-M- a line"}, sLines(mPath));
+    EXPECT_EQ("", mStandardError.take());
 }
 
 TEST_F(LogSink, StampsAreLocalTimeAndNeverGoBack) {

@@ -88,6 +88,7 @@ protected:
     void driveToTheEnd(const char* apWhat, const std::function<void()>& acrDo) { drive(1, apWhat, acrDo); }
     void drivePast(const char* apWhat, const std::function<void()>& acrDo) { drive(0, apWhat, acrDo); }
 
+    void driveAll();
     void driveStart();
     void driveEvents();
     void driveCommands();
@@ -102,6 +103,8 @@ protected:
         return lSeen;
     }
 
+    const std::string mTextsPath = mDirectory.path("texts.log");
+
 private:
     template <typename TDo>
     void driveForgedString(const char* apWhat, TDo aDo) {
@@ -111,9 +114,17 @@ private:
             aDo(lForged.get(), lString);
         });
     }
-
-    const std::string mTextsPath = mDirectory.path("texts.log");
 };
+
+void LogTexts::driveAll() {
+    driveStart();
+    driveEvents();
+    driveCommands();
+    driveThreadProcedures();
+    driveFramework();
+    drivePointers();
+    driveStrings();
+}
 
 void LogTexts::driveStart() {
     drivePast("preInit and the options, with everything logged", [] {
@@ -304,13 +315,14 @@ void LogTexts::driveStrings() {
 }  // namespace
 
 TEST_F(LogTexts, EveryTextThatNoPathOfTheAgentLeadsToIsFoundInARealLog) {
-    driveStart();
-    driveEvents();
-    driveCommands();
-    driveThreadProcedures();
-    driveFramework();
-    drivePointers();
-    driveStrings();
+    driveAll();
     EXPECT_EQ(std::vector<std::string>{}, seen().unseen(ZTELogTextPath::Process));
     EXPECT_EQ(std::set<std::string>{}, seen().strangers());
+}
+
+TEST_F(LogTexts, WithALogCodeOfZeroAllOfItEndsAlikeAndNothingIsWritten) {
+    setLogCode(0);
+    const ZTCKeptLogCode lKept;
+    driveAll();
+    EXPECT_EQ("", readFile(mTextsPath));
 }

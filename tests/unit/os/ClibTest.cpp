@@ -3,14 +3,59 @@
 #include <fcntl.h>
 #include <gtest/gtest.h>
 #include <signal.h>
+#include <sys/resource.h>
 #include <sys/wait.h>
 #include <unistd.h>
 
 #include <cerrno>
 #include <cstring>
+#include <filesystem>
+#include <functional>
 #include <string>
 
 #include "tests/support/TemporaryDirectory.h"
+
+namespace {
+
+/// The text of the exception of this class that the call throws.
+template <typename Exception>
+std::string sTextOf(const std::function<void()>& acrCall) {
+    try {
+        acrCall();
+    } catch (const Exception& acrException) {
+        return acrException.what();
+    }
+    return "nothing was thrown";
+}
+
+/// The exit status of a child process that runs the function, or -1.
+int sStatusOfChild(const std::function<int()>& acrFunction) {
+    const pid_t lChild = fork();
+    if (lChild == 0) {
+        _exit(acrFunction());
+    }
+    int lStatus = -1;
+    return lChild > 0 && waitpid(lChild, &lStatus, 0) == lChild && WIFEXITED(lStatus) ? WEXITSTATUS(lStatus) : -1;
+}
+
+/// While it lives, the process has no more of a resource than this.
+class ZTCLimit {
+public:
+    ZTCLimit(__rlimit_resource_t aResource, rlim_t aMost) : mResource(aResource) {
+        getrlimit(mResource, &mFormer);
+        const struct rlimit lLimit = {aMost, mFormer.rlim_max};
+        setrlimit(mResource, &lLimit);
+    }
+    ~ZTCLimit() { setrlimit(mResource, &mFormer); }
+    ZTCLimit(const ZTCLimit&) = delete;
+    ZTCLimit& operator=(const ZTCLimit&) = delete;
+
+private:
+    const __rlimit_resource_t mResource;
+    struct rlimit mFormer {};
+};
+
+}  // namespace
 
 TEST(Clib, GetenvYieldsTheValueAndCopiesItWhereABufferIsGiven) {
     ASSERT_EQ(setenv("ZT_CLIB_TEST", "a value", 1), 0);
@@ -41,6 +86,20 @@ TEST(Clib, SprintfCutsWhatDoesNotFit) {
     EXPECT_EQ(ClibSprintf(lBuffer, sizeof(lBuffer), "%s", "ab"), 2);
     EXPECT_STREQ(lBuffer, "ab");
     EXPECT_EQ(ClibSprintf(nullptr, 0, "%s", "ab"), 0);
+}
+
+TEST(Clib, SprintfOfWhatHasNoCharactersHereIsEmpty) {
+    char lBuffer[16] = "former";
+    EXPECT_EQ(ClibSprintf(lBuffer, sizeof(lBuffer), "a %ls", L"\x1234"), 0);
+    EXPECT_STREQ(lBuffer, "");
+}
+
+TEST(Clib, NoBytesMayBeNowhere) {
+    char lByte = 'x';
+    EXPECT_EQ(ClibMemcpy(nullptr, nullptr, 0), nullptr);
+    EXPECT_EQ(ClibMemcpy(&lByte, nullptr, 0), &lByte);
+    EXPECT_EQ(ClibMemset(nullptr, 'y', 0), nullptr);
+    EXPECT_EQ(lByte, 'x');
 }
 
 TEST(Clib, NetworkOrderIsTheOrderOfTheBytes) {
@@ -234,4 +293,119 @@ TEST(Clib, AProcessThatMayNotBeSignalledIsAlive) {
     int lStatus = -1;
     ASSERT_EQ(waitpid(lChild, &lStatus, 0), lChild);
     EXPECT_EQ(lStatus, 0);
+}
+
+TEST(Clib, AFailureNamesItsDescriptorAndTheReason) {
+    const std::string lcReason = std::string(" -1 failed: ") + std::strerror(EBADF);
+    struct stat lStatus {};
+    EXPECT_EQ(sTextOf<ZTCClibStatFailedEx>([&] { ClibFstat(-1, &lStatus); }),
+              "Getting the status of descriptor" + lcReason);
+    EXPECT_EQ(sTextOf<ZTCClibReadFailedEx>([] { ClibBytesWaiting(-1); }),
+              "Counting the bytes of descriptor" + lcReason);
+    EXPECT_EQ(sTextOf<ZTCClibReadFailedEx>([] { ClibPipeCapacity(-1); }),
+              "Getting the capacity of descriptor" + lcReason);
+    EXPECT_EQ(sTextOf<ZTCClibLockFailedEx>([] { ClibTryLock(-1); }), "Locking descriptor" + lcReason);
+    EXPECT_EQ(sTextOf<ZTCClibTruncateFailedEx>([] { ClibFtruncate(-1, 0); }), "Cutting descriptor" + lcReason);
+    EXPECT_EQ(sTextOf<ZTCClibWriteFailedEx>([] { ClibPwriteAll(-1, "x", 1, 0); }), "Writing to descriptor" + lcReason);
+}
+
+TEST(Clib, AFailureNamesItsPathAndTheReason) {
+    const std::string lcReason = std::string(" '/dev/null/none' failed: ") + std::strerror(ENOTDIR);
+    struct stat lStatus {};
+    EXPECT_EQ(sTextOf<ZTCClibStatFailedEx>([&] { ClibLstat("/dev/null/none", &lStatus); }),
+              "Getting the status of" + lcReason);
+    EXPECT_EQ(sTextOf<ZTCClibUnlinkFailedEx>([] { ClibUnlink("/dev/null/none"); }), "Removing" + lcReason);
+    EXPECT_EQ(sTextOf<ZTCClibMkfifoFailedEx>([] { ClibMkfifo("/dev/null/none", 0600); }), "Making the FIFO" + lcReason);
+    EXPECT_EQ(sTextOf<ZTCClibOpenFailedEx>([] { ClibChdir("/dev/null/none"); }),
+              "Changing into the directory" + lcReason);
+    EXPECT_EQ(sTextOf<ZTCClibDupFailedEx>([] { ClibRedirect(-1, "/dev/null", O_RDONLY); }),
+              std::string("Replacing a standard stream by '/dev/null' failed: ") + std::strerror(EBADF));
+}
+
+TEST(Clib, ChdirChangesTheWorkingDirectoryOfTheProcess) {
+    const ZTCTemporaryDirectory lDirectory;
+    EXPECT_EQ(sStatusOfChild([&] {
+                  ClibChdir(lDirectory.path().c_str());
+                  return std::filesystem::equivalent(std::filesystem::current_path(), lDirectory.path()) ? 0 : 1;
+              }),
+              0);
+}
+
+TEST(Clib, AnEventWhoseCounterIsFullStaysRaised) {
+    const int lEvent = ClibEventFd();
+    const std::uint64_t lcMost = UINT64_MAX - 1;
+    ASSERT_EQ(write(lEvent, &lcMost, sizeof(lcMost)), static_cast<ssize_t>(sizeof(lcMost)));
+    ClibRaiseEvent(lEvent);
+    std::uint64_t lCount = 0;
+    EXPECT_EQ(read(lEvent, &lCount, sizeof(lCount)), static_cast<ssize_t>(sizeof(lCount)));
+    EXPECT_EQ(lCount, lcMost);
+    ClibClose(lEvent);
+}
+
+TEST(Clib, WithoutADescriptorLeftEachCallSaysSo) {
+    const ZTCLimit lLimit(RLIMIT_NOFILE, 0);
+    EXPECT_EQ(ClibTryOpen("/dev/null", O_RDONLY), -EMFILE);
+    EXPECT_EQ(sTextOf<ZTCClibEventFailedEx>([] { ClibEventFd(); }),
+              std::string("Making an event counter failed: ") + std::strerror(EMFILE));
+}
+
+TEST(Clib, ADescriptorThatCannotBeLiftedIsClosedAndAnError) {
+    EXPECT_EQ(sStatusOfChild([] {
+                  close(0);
+                  const ZTCLimit lLimit(RLIMIT_NOFILE, 3);
+                  return ClibTryOpen("/dev/null", O_RDONLY) < 0 && fcntl(0, F_GETFD) < 0 && errno == EBADF ? 0 : 1;
+              }),
+              0);
+}
+
+TEST(Clib, OneWhoLeadsASessionCannotMakeAnotherOne) {
+    EXPECT_EQ(sStatusOfChild([] {
+                  ClibSetsid();
+                  if (getsid(0) != getpid()) {
+                      return 1;
+                  }
+                  return sTextOf<ZTCClibSessionFailedEx>([] { ClibSetsid(); }) ==
+                                 std::string("Making a session failed: ") + std::strerror(EPERM)
+                             ? 0
+                             : 2;
+              }),
+              0);
+}
+
+TEST(Clib, WhoMayNeitherForkNorSignalIsToldSo) {
+    EXPECT_EQ(sStatusOfChild([] {
+                  // Root is not bound by the limit; and nobody else may signal the first process.
+                  const uid_t lFormer = geteuid();
+                  if (lFormer == 0 && setresuid(65534, 65534, 0) != 0) {
+                      return 1;
+                  }
+                  const ZTCLimit lLimit(RLIMIT_NPROC, 0);
+                  const std::string lFork = sTextOf<ZTCClibForkFailedEx>([] {
+                      if (ClibFork() == 0) {
+                          _exit(0);
+                      }
+                  });
+                  const std::string lKill = sTextOf<ZTCClibKillFailedEx>([] { ClibKill(1, 0); });
+                  if (lFormer == 0 && setresuid(0, 0, 0) != 0) {
+                      return 2;
+                  }
+                  return lFork == std::string("Making a process failed: ") + std::strerror(EAGAIN) &&
+                                 lKill == std::string("Signalling process 1 failed: ") + std::strerror(EPERM)
+                             ? 0
+                             : 3;
+              }),
+              0);
+}
+
+TEST(Clib, AWaitOnMoreDescriptorsThanAProcessMayHaveIsAnError) {
+    const ZTCLimit lLimit(RLIMIT_NOFILE, 0);
+    struct pollfd lDescriptor = {-1, POLLIN, 0};
+    EXPECT_EQ(sTextOf<ZTCClibPollFailedEx>([&] { ClibPoll(&lDescriptor, 1, 0); }),
+              std::string("Waiting on 1 descriptors failed: ") + std::strerror(EINVAL));
+}
+
+TEST(Clib, AProcessWhoseStateCannotBeReadIsTakenForAlive) {
+    const ZTCLimit lLimit(RLIMIT_NOFILE, 0);
+    EXPECT_TRUE(ClibIsProcessAlive(getpid()));
+    EXPECT_FALSE(ClibIsProcessAlive(0x7fffffff));
 }

@@ -1,7 +1,10 @@
 #include "os/common/include/ProcessEvents.h"
 
 #include <gtest/gtest.h>
+#include <pthread.h>
+#include <signal.h>
 
+#include <atomic>
 #include <new>
 #include <string>
 #include <thread>
@@ -34,6 +37,29 @@ TEST(ProcessEvents, RaisingWakesWhoWaits) {
     std::thread lThread([&] { EXPECT_TRUE(lEvent.waitFor(20000)); });
     lEvent.raise();
     lThread.join();
+}
+
+static std::atomic<int> sSignals{0};
+
+TEST(ProcessEvents, ASignalToTheThreadEndsNoWaitBeforeItsTime) {
+    struct sigaction lAction {};
+    lAction.sa_handler = [](int) { ++sSignals; };
+    ASSERT_EQ(sigaction(SIGUSR1, &lAction, nullptr), 0);
+    for (const int lMilliseconds : {-1, 20000}) {
+        ZTCProcessEvent lEvent;
+        std::atomic<bool> lHasReturned{false};
+        std::thread lThread([&] {
+            EXPECT_TRUE(lEvent.waitFor(lMilliseconds));
+            lHasReturned = true;
+        });
+        for (const int lWanted = sSignals + 20; sSignals < lWanted;) {
+            ASSERT_EQ(pthread_kill(lThread.native_handle(), SIGUSR1), 0);
+            std::this_thread::yield();
+        }
+        EXPECT_FALSE(lHasReturned);
+        lEvent.raise();
+        lThread.join();
+    }
 }
 
 TEST(ProcessEvents, TheEventsOfTheProcessTakeNoMemory) {

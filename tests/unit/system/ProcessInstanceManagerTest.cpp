@@ -7,7 +7,9 @@
 #include <sys/wait.h>
 #include <unistd.h>
 
+#include <cerrno>
 #include <chrono>
+#include <cstring>
 #include <string>
 
 #include "common/include/Exception.h"
@@ -66,7 +68,7 @@ static std::string sStatusError(const std::string& acrPath) {
 TEST_F(ProcessInstanceManager, APidFileThatTakesNoByteIsAnErrorThatNamesIt) {
     ZTCForkedProcess lChild([this](ZTCForkedProcess&) {
         signal(SIGXFSZ, SIG_IGN);
-        const rlimit lNone{0, 0};
+        const rlimit lNone{0, RLIM_INFINITY};
         const ZTCPointer<ZTCProcessInstanceManager> lManager(newManager());
         if (lManager->isAnInstanceRunning() || setrlimit(RLIMIT_FSIZE, &lNone) != 0) {
             return 2;
@@ -413,4 +415,17 @@ TEST_F(ProcessInstanceManager, TheStatusOfAProcessThatMayNotBeSignalledIsNoError
         return sStatusError(mPath).empty() ? 0 : 1;
     });
     EXPECT_EQ(lChild.waitForExit(), 0);
+}
+
+TEST_F(ProcessInstanceManager, APidFileThatCannotBeOpenedIsAnErrorThatNamesItAndNothingIsStopped) {
+    // Links are not followed.
+    ASSERT_EQ(symlink(mDirectory.path("elsewhere").c_str(), mPath.c_str()), 0);
+    const ZTCPointer<ZTCProcessInstanceManager> lManager(newManager());
+    try {
+        lManager->killRunningInstance();
+        FAIL() << "a link was followed";
+    } catch (const ZTCClibOpenFailedEx& acrException) {
+        EXPECT_EQ(std::string(acrException.what()),
+                  "Opening the pid file '" + mPath + "' failed: " + std::strerror(ELOOP));
+    }
 }

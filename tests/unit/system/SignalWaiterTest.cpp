@@ -73,7 +73,7 @@ TEST(SignalWaiter, ALimitOnFileSizesIsNoSignal) {
     ZTCTemporaryDirectory lDirectory;
     ZTCForkedProcess lChild([&](ZTCForkedProcess&) {
         ZTCSignalWaiter::blockSignals();
-        const rlimit lNone{0, 0};
+        const rlimit lNone{0, RLIM_INFINITY};
         const int lFile = open(lDirectory.path("file").c_str(), O_WRONLY | O_CREAT | O_CLOEXEC, 0600);
         if (lFile < 0 || setrlimit(RLIMIT_FSIZE, &lNone) != 0) {
             return 2;

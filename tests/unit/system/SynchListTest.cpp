@@ -7,6 +7,7 @@
 
 #include "common/include/Exception.h"
 #include "common/include/Memory.h"
+#include "tests/support/FailingAllocation.h"
 
 class ZTCNumber : public ZTCQueueable {
 public:
@@ -42,6 +43,16 @@ TEST(SynchList, TakingFromAnEmptyListIsNotFound) {
     EXPECT_THROW(lList.popFront(), ZTCNotFoundEx);
     EXPECT_THROW(lList.popBack(), ZTCNotFoundEx);
     EXPECT_THROW(lList.front(), ZTCNotFoundEx);
+}
+
+TEST(SynchList, AnItemThatFindsNoMemoryIsNotInTheList) {
+    ZTCSynchList lList;
+    lList.pushBack(sItem(1));
+    const ZTCPointer<ZTCQueueable> lItem = sItem(2);
+    EXPECT_TRUE(failAllocation(1, [&] { EXPECT_THROW(lList.pushBack(lItem), ZTCNoMemoryEx); }));
+    EXPECT_TRUE(failAllocation(1, [&] { EXPECT_THROW(lList.pushFront(lItem), ZTCNoMemoryEx); }));
+    EXPECT_EQ(lList.size(), 1u);
+    EXPECT_EQ(sNumber(lList.popFront()), 1);
 }
 
 TEST(SynchList, ItCanBeWalkedAndItemsErased) {

@@ -4,6 +4,8 @@
 
 #include <atomic>
 #include <chrono>
+#include <filesystem>
+#include <iostream>
 #include <stdexcept>
 #include <string>
 #include <thread>
@@ -289,6 +291,41 @@ TEST(System, HelpVersionConfigurationAndStopWinInThisOrder) {
         EXPECT_EQ(readFile(lDirectory.path("child.out")), lcrRow.mOutput);
         EXPECT_EQ(readFile(lDirectory.path("child.err")), "");
     }
+}
+
+TEST(System, ABareSystemKnowsNoOptionAndNoConfigurationAndHasNoHelp) {
+    ZTCSystem lSystem(ZTCString("bare"));
+    lSystem.setCmdLineArgDescs();
+    char lProgram[] = "program";
+    char lHelp[] = "-h";
+    char* lArguments[] = {lProgram, lHelp, nullptr};
+    testing::internal::CaptureStdout();
+    testing::internal::CaptureStderr();
+    EXPECT_NO_THROW(lSystem.processCommandLine(1, lArguments));
+    EXPECT_THROW(lSystem.processCommandLine(2, lArguments), ZTCInvalidEx);
+    EXPECT_THROW(lSystem.processConfigFile(ZTCString("file")), ZTCNotImplementedEx);
+    lSystem.displayHelp();
+    lSystem.createStartUpEvent();
+    lSystem.createShutDownEvent();
+    EXPECT_EQ(testing::internal::GetCapturedStdout(), "");
+    EXPECT_NE(testing::internal::GetCapturedStderr().find("-h"), std::string::npos);
+}
+
+TEST(System, ADaemonLeadsASessionInTheDirectoryThatItIsGiven) {
+    const ZTCTemporaryDirectory lDirectory;
+    const std::string lOutput = lDirectory.path("output");
+    writeFile(lOutput, "");
+    ZTCForkedProcess lChild([&](ZTCForkedProcess&) {
+        ZTCTestSystem lSystem;
+        lSystem.systemDaemonize(ZTCString(lDirectory.path().c_str()), ZTCString("/dev/null"),
+                                ZTCString(lOutput.c_str()), ZTCString("/dev/null"));
+        std::cout << (getsid(0) == getpid()) << ' ' << std::filesystem::current_path().string() << std::endl;
+        return 7;
+    });
+    EXPECT_EQ(lChild.waitForExit(), 0) << "the calling process ends silently";
+    const std::string lWanted = "1 " + lDirectory.path() + "\n";
+    waitUntil([&] { return readFile(lOutput).size() >= lWanted.size(); }, "the daemon's words");
+    EXPECT_EQ(readFile(lOutput), lWanted);
 }
 
 // ---- Threads ----

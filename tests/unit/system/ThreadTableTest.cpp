@@ -3,6 +3,7 @@
 #include <gtest/gtest.h>
 
 #include "common/include/Exception.h"
+#include "tests/support/FailingAllocation.h"
 
 static ZTCThreadTable* sTable = nullptr;
 
@@ -37,4 +38,13 @@ TEST(ThreadTable, AThreadThatIsNotThereCannotBeStarted) {
     EXPECT_FALSE(lTable.isStarted(0));
     EXPECT_THROW(lTable.start(0, sEnd), ZTCInvalidEx);
     lTable.joinAll();
+}
+
+TEST(ThreadTable, AThreadThatFindsNoMemoryIsNotInTheTable) {
+    ZTCThreadTable lTable;
+    ZTCSystemInterface lSystem;
+    ZTCThreadComponent lComponent(sEnd, ZTCString("a thread"), &lSystem);
+    EXPECT_TRUE(failAllocation(1, [&] { EXPECT_THROW(lTable.add(&lComponent, &lSystem), ZTCNoMemoryEx); }));
+    EXPECT_EQ(lTable.size(), 0u);
+    EXPECT_TRUE(lTable.haveAllEnded());
 }
