@@ -35,6 +35,14 @@ else()
   target_link_options(tavik_options INTERFACE -Wl,-z,relro,-z,now -Wl,-z,noexecstack)
 endif()
 
+# Everything counts what it reaches, for scripts/coverage. Each program has a line of its own for ends by _exit.
+if(TAVIK_COVERAGE)
+  target_compile_options(tavik_options INTERFACE --coverage -fprofile-update=atomic)
+  target_link_options(tavik_options INTERFACE --coverage)
+  target_sources(tavik_options INTERFACE
+    $<$<STREQUAL:$<TARGET_PROPERTY:TYPE>,EXECUTABLE>:${PROJECT_SOURCE_DIR}/cmake/CoverageExit.cpp>)
+endif()
+
 # Everything counts its edges for libFuzzer; the fuzzers themselves link the engine (fuzz/CMakeLists.txt).
 if(TAVIK_FUZZ)
   if(NOT CMAKE_CXX_COMPILER_ID STREQUAL "Clang")

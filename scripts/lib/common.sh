@@ -11,7 +11,7 @@ gClientPackages=(libcli11-dev nlohmann-json3-dev)
 gTestPackages=(libgtest-dev libgmock-dev)
 gBenchPackages=(libbenchmark-dev prometheus-cpp-dev libspdlog-dev python3)
 gClangPackages=(clang libclang-rt-14-dev llvm)
-gCoveragePackages=(gcovr)
+gCoveragePackages=(gcovr python3)
 gStylePackages=(clang-format clang-tidy)
 gVmPackages=(make qemu-system-x86 busybox-static kmod cpio xz-utils iproute2 jq sg3-utils)
 
