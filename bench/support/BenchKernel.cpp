@@ -101,7 +101,7 @@ int ZTCBenchKernel::make(const std::string& acrPath) {
     if (::mkfifo(lPipe.c_str(), 0600) != 0) {
         return errno;
     }
-    mPipe = ZTCLinuxDescriptor(::open(lPipe.c_str(), O_RDWR | O_NONBLOCK | O_CLOEXEC));
+    mPipe = ZTCLibraryDescriptor(::open(lPipe.c_str(), O_RDWR | O_NONBLOCK | O_CLOEXEC));
     // Without the right to more, the pipe holds fewer pages.
     static_cast<void>(::fcntl(mPipe.get(), F_SETPIPE_SZ, scPipeBytes));
     return 0;

@@ -59,8 +59,8 @@ private:
     const std::string mKernel;
     const ZTCBenchBytes mPage;
     std::string mDirectory;
-    ZTCLinuxDescriptor mPipe;
-    ZTCLinuxDescriptor mWake;
+    ZTCLibraryDescriptor mPipe;
+    ZTCLibraryDescriptor mWake;
 
     std::mutex mLock;
     std::condition_variable mChanged;

@@ -17,10 +17,10 @@
 #include <thread>
 #include <vector>
 
+#include "libkpm/common/include/Descriptor.h"
 #include "libkpm/common/include/LibraryStatus.h"
 #include "libkpm/include/libkpm.h"
 #include "libkpm/linux/src/Boards.h"
-#include "libkpm/linux/src/Descriptor.h"
 #include "libkpm/linux/src/EventSequence.h"
 #include "libkpm/linux/src/FcEventSocket.h"
 #include "libkpm/linux/src/FcMessage.h"
@@ -107,7 +107,7 @@ private:
     const ZTSLinuxOptions mOptions;
     ZTCLinuxSources& mrSources;
     const ZTCSysfs mSysfs;
-    const ZTCLinuxDescriptor mWake;  // an eventfd that is readable once the engine stops
+    const ZTCLibraryDescriptor mWake;  // an eventfd that is readable once the engine stops
 
     // With synchronisation of their own.
     ZTCLinuxRegistry mRegistry;

@@ -8,12 +8,12 @@
 static std::atomic<int> sFile{-1};
 static std::atomic<bool> sIsPulled{false};
 
-void armLinuxExitSwitch(ZTCLinuxDescriptor aFile) noexcept {
-    const ZTCLinuxDescriptor lBefore(sFile.exchange(aFile.release()));
+void armLinuxExitSwitch(ZTCLibraryDescriptor aFile) noexcept {
+    const ZTCLibraryDescriptor lBefore(sFile.exchange(aFile.release()));
 }
 
 void disarmLinuxExitSwitch() noexcept {
-    const ZTCLinuxDescriptor lFile(sFile.exchange(-1));
+    const ZTCLibraryDescriptor lFile(sFile.exchange(-1));
 }
 
 void pullLinuxExitSwitch() noexcept {

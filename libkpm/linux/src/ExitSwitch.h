@@ -3,10 +3,10 @@
 #ifndef LIBKPM_LINUX_SRC_EXITSWITCH_H
 #define LIBKPM_LINUX_SRC_EXITSWITCH_H
 
-#include "libkpm/linux/src/Descriptor.h"
+#include "libkpm/common/include/Descriptor.h"
 
 /// The file to write "0" to at exit. Replaces the one before.
-void armLinuxExitSwitch(ZTCLinuxDescriptor aFile) noexcept;
+void armLinuxExitSwitch(ZTCLibraryDescriptor aFile) noexcept;
 
 /// Closes the file, unless the process is already at its exit.
 void disarmLinuxExitSwitch() noexcept;

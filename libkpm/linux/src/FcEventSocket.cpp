@@ -24,7 +24,7 @@ static std::string sExplain(const char* apWhat, int aError) {
 }
 
 std::unique_ptr<ZTCFcEventSource> ZTCFcEventSocket::open(std::string& arProblem) {
-    ZTCLinuxDescriptor lSocket(::socket(AF_NETLINK, SOCK_RAW | SOCK_CLOEXEC | SOCK_NONBLOCK, scScsiTransportFamily));
+    ZTCLibraryDescriptor lSocket(::socket(AF_NETLINK, SOCK_RAW | SOCK_CLOEXEC | SOCK_NONBLOCK, scScsiTransportFamily));
     if (!lSocket.isOpen()) {
         arProblem = sExplain("the socket for FC events cannot be made", errno);
         return nullptr;

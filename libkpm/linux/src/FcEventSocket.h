@@ -8,7 +8,7 @@
 #include <span>
 #include <string>
 
-#include "libkpm/linux/src/Descriptor.h"
+#include "libkpm/common/include/Descriptor.h"
 
 enum ZTELinuxReceived : std::uint8_t {
     ZTLR_Datagram,   ///< mSize bytes, from the kernel
@@ -45,9 +45,9 @@ public:
     ZTSLinuxReceived receive(std::span<std::uint8_t> aBuffer) override;
 
 private:
-    explicit ZTCFcEventSocket(ZTCLinuxDescriptor aSocket) : mSocket(std::move(aSocket)) {}
+    explicit ZTCFcEventSocket(ZTCLibraryDescriptor aSocket) : mSocket(std::move(aSocket)) {}
 
-    ZTCLinuxDescriptor mSocket;
+    ZTCLibraryDescriptor mSocket;
 };
 
 #endif

@@ -8,10 +8,10 @@
 #include <cerrno>
 #include <memory>
 
-#include "libkpm/linux/src/Descriptor.h"
+#include "libkpm/common/include/Descriptor.h"
 
 std::optional<std::string> readSmallFile(const std::string& acrPath, std::size_t aLimit) {
-    const ZTCLinuxDescriptor lFile(::open(acrPath.c_str(), O_RDONLY | O_CLOEXEC | O_NONBLOCK | O_NOCTTY));
+    const ZTCLibraryDescriptor lFile(::open(acrPath.c_str(), O_RDONLY | O_CLOEXEC | O_NONBLOCK | O_NOCTTY));
     if (!lFile.isOpen()) {
         return std::nullopt;
     }

@@ -171,7 +171,7 @@ bool ZTCTraceInstance::openBuffers(std::string& arProblem) {
     for (const std::string& lrName : lNames) {
         const std::string lBuffer = mPath + "/per_cpu/" + lrName;
         Buffer lNew;
-        lNew.mPipe = ZTCLinuxDescriptor(
+        lNew.mPipe = ZTCLibraryDescriptor(
             ::open((lBuffer + "/trace_pipe_raw").c_str(), O_RDONLY | O_NONBLOCK | O_CLOEXEC | O_NOCTTY));
         if (!lNew.mPipe.isOpen()) {
             lError = errno;
@@ -197,7 +197,7 @@ bool ZTCTraceInstance::openBuffers(std::string& arProblem) {
 
 /// Writes all of a text at once, as the kernel's control files want it. 0, or the error number.
 int ZTCTraceInstance::write(const std::string& acrName, const std::string& acrText) const {
-    const ZTCLinuxDescriptor lFile(
+    const ZTCLibraryDescriptor lFile(
         ::open((mPath + "/" + acrName).c_str(), O_WRONLY | O_CLOEXEC | O_NONBLOCK | O_NOCTTY | O_TRUNC));
     if (!lFile.isOpen()) {
         return errno;
@@ -220,8 +220,8 @@ bool ZTCTraceInstance::watchHosts(const std::vector<std::uint32_t>& acrHosts, st
     }
     int lError = write(std::string(scDoneEvent) + "/filter", makeScsiFilter(acrHosts));
     if (lError == 0) {
-        armLinuxExitSwitch(
-            ZTCLinuxDescriptor(::open((mPath + "/" + lEnable).c_str(), O_WRONLY | O_CLOEXEC | O_NONBLOCK | O_NOCTTY)));
+        armLinuxExitSwitch(ZTCLibraryDescriptor(
+            ::open((mPath + "/" + lEnable).c_str(), O_WRONLY | O_CLOEXEC | O_NONBLOCK | O_NOCTTY)));
         lError = write(lEnable, "1");
         if (isLinuxExitSwitchPulled()) {
             write(lEnable, "0");

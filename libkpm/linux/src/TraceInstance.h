@@ -11,7 +11,7 @@
 #include <string>
 #include <vector>
 
-#include "libkpm/linux/src/Descriptor.h"
+#include "libkpm/common/include/Descriptor.h"
 #include "libkpm/linux/src/TraceFormat.h"
 
 /// Makes and removes directories of instances; on tracefs that makes and removes the instance with all its files. Tests
@@ -68,7 +68,7 @@ public:
 
 private:
     struct Buffer {
-        ZTCLinuxDescriptor mPipe;
+        ZTCLibraryDescriptor mPipe;
         std::string mStatsPath;
         std::uint64_t mLosses = 0;
     };

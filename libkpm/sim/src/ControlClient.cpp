@@ -11,7 +11,7 @@
 
 ZTCSimControlClient::ZTCSimControlClient(const std::string& acrPath) : mPath(acrPath) {
     const sockaddr_un lAddress = makeSimSocketAddress(mPath);
-    mSocket = ZTCSimDescriptor(::socket(AF_UNIX, SOCK_STREAM | SOCK_CLOEXEC, 0));
+    mSocket = ZTCLibraryDescriptor(::socket(AF_UNIX, SOCK_STREAM | SOCK_CLOEXEC, 0));
     if (!mSocket.isOpen() ||
         ::connect(mSocket.get(), reinterpret_cast<const sockaddr*>(&lAddress), sizeof lAddress) != 0) {
         throw ZTCSimNobodyListens(mPath + ": no library listens: " + std::system_category().message(errno));

@@ -5,7 +5,7 @@
 #include <stdexcept>
 #include <string>
 
-#include "libkpm/sim/src/Descriptor.h"
+#include "libkpm/common/include/Descriptor.h"
 
 /// No library listens on the path, or it has gone.
 class ZTCSimNobodyListens : public std::runtime_error {
@@ -24,7 +24,7 @@ public:
 
 private:
     const std::string mPath;
-    ZTCSimDescriptor mSocket;
+    ZTCLibraryDescriptor mSocket;
     std::string mIn;
 };
 

@@ -82,7 +82,7 @@ void ZTCSimControlSocket::removeStale() const {
     if (!S_ISSOCK(lFound.st_mode)) {
         sRefuse(mPath, "exists and is no socket");
     }
-    const ZTCSimDescriptor lProbe(::socket(AF_UNIX, SOCK_STREAM | SOCK_CLOEXEC | SOCK_NONBLOCK, 0));
+    const ZTCLibraryDescriptor lProbe(::socket(AF_UNIX, SOCK_STREAM | SOCK_CLOEXEC | SOCK_NONBLOCK, 0));
     if (!lProbe.isOpen()) {
         sRefuse(mPath, "socket", errno);
     }
@@ -100,7 +100,7 @@ void ZTCSimControlSocket::removeStale() const {
 }
 
 void ZTCSimControlSocket::listenOn(const sockaddr_un& acrAddress) {
-    mListener = ZTCSimDescriptor(::socket(AF_UNIX, SOCK_STREAM | SOCK_CLOEXEC | SOCK_NONBLOCK, 0));
+    mListener = ZTCLibraryDescriptor(::socket(AF_UNIX, SOCK_STREAM | SOCK_CLOEXEC | SOCK_NONBLOCK, 0));
     if (!mListener.isOpen()) {
         sRefuse(mPath, "socket", errno);
     }
@@ -173,7 +173,7 @@ bool ZTCSimControlSocket::serveClient(Client& arClient) const {
 
 /// False: the process has no descriptor or memory left for a client.
 bool ZTCSimControlSocket::acceptClient() {
-    ZTCSimDescriptor lSocket(::accept4(mListener.get(), nullptr, nullptr, SOCK_CLOEXEC | SOCK_NONBLOCK));
+    ZTCLibraryDescriptor lSocket(::accept4(mListener.get(), nullptr, nullptr, SOCK_CLOEXEC | SOCK_NONBLOCK));
     if (!lSocket.isOpen()) {
         return errno == EINTR || errno == EAGAIN || errno == ECONNABORTED;
     }

@@ -12,7 +12,7 @@
 #include <string_view>
 #include <thread>
 
-#include "libkpm/sim/src/Descriptor.h"
+#include "libkpm/common/include/Descriptor.h"
 
 /// Fills in the address of a socket's path. Throws std::runtime_error for a path that is empty or too long for it.
 sockaddr_un makeSimSocketAddress(const std::string& acrPath);
@@ -33,7 +33,7 @@ public:
 
 private:
     struct Client {
-        ZTCSimDescriptor mSocket;
+        ZTCLibraryDescriptor mSocket;
         std::string mIn;
         std::string mOut;
         bool mIsAtEnd = false;  ///< nothing more is read from it
@@ -50,8 +50,8 @@ private:
 
     const std::string mPath;
     const Answer mAnswer;
-    ZTCSimDescriptor mQuit;
-    ZTCSimDescriptor mListener;
+    ZTCLibraryDescriptor mQuit;
+    ZTCLibraryDescriptor mListener;
     struct stat mIdentity {};
     std::list<Client> mClients;  ///< of the serving thread
     std::thread mThread;

@@ -7,14 +7,14 @@
 #include <cstddef>
 #include <system_error>
 
-#include "libkpm/sim/src/Descriptor.h"
+#include "libkpm/common/include/Descriptor.h"
 
 [[noreturn]] static void sRefuse(const std::string& acrPath, const std::string& acrReason) {
     throw ZTCSimUnreadable(acrPath + ": " + acrReason);
 }
 
 std::string readSimFile(const std::string& acrPath) {
-    const ZTCSimDescriptor lFile(::open(acrPath.c_str(), O_RDONLY | O_CLOEXEC | O_NONBLOCK | O_NOCTTY));
+    const ZTCLibraryDescriptor lFile(::open(acrPath.c_str(), O_RDONLY | O_CLOEXEC | O_NONBLOCK | O_NOCTTY));
     if (!lFile.isOpen()) {
         sRefuse(acrPath, std::system_category().message(errno));
     }

@@ -195,7 +195,7 @@ int ZTCFakeKernel::make(const std::string& acrPath) {
             return errno;
         }
         // Open for both, so that the reader never sees an end.
-        mPipes[lProcessor] = ZTCLinuxDescriptor(::open((lBuffer + "/trace_pipe_raw").c_str(), O_RDWR | O_CLOEXEC));
+        mPipes[lProcessor] = ZTCLibraryDescriptor(::open((lBuffer + "/trace_pipe_raw").c_str(), O_RDWR | O_CLOEXEC));
     }
     return 0;
 }

@@ -77,11 +77,11 @@ private:
     friend class ZTCFakeFcSource;
 
     ZTCTemporaryDirectory mDirectory;
-    std::map<unsigned, ZTCLinuxDescriptor> mPipes;
+    std::map<unsigned, ZTCLibraryDescriptor> mPipes;
     std::string mInstance;
 
     mutable std::mutex mLock;
-    ZTCLinuxDescriptor mFcWake;
+    ZTCLibraryDescriptor mFcWake;
     bool mIsHeld = false;                                         // guarded by mLock
     std::deque<std::pair<ZTELinuxReceived, ZTCBytes>> mOutcomes;  // guarded by mLock
 };

@@ -33,15 +33,15 @@ static std::string sRefusal(const std::string& acrPath) {
 }
 
 /// A connection that sends bytes as they are told.
-static ZTCSimDescriptor sConnect(const std::string& acrPath) {
-    ZTCSimDescriptor lSocket(::socket(AF_UNIX, SOCK_STREAM | SOCK_CLOEXEC, 0));
+static ZTCLibraryDescriptor sConnect(const std::string& acrPath) {
+    ZTCLibraryDescriptor lSocket(::socket(AF_UNIX, SOCK_STREAM | SOCK_CLOEXEC, 0));
     const sockaddr_un lAddress = makeSimSocketAddress(acrPath);
     EXPECT_EQ(::connect(lSocket.get(), reinterpret_cast<const sockaddr*>(&lAddress), sizeof lAddress), 0);
     return lSocket;
 }
 
 /// Everything until the other side closes.
-static std::string sReadAll(const ZTCSimDescriptor& acrSocket) {
+static std::string sReadAll(const ZTCLibraryDescriptor& acrSocket) {
     std::string lText;
     char lBytes[4096];
     ssize_t lCount = 0;
@@ -57,7 +57,7 @@ TEST(ControlSocket, AnswersEachLineInOrder) {
     ZTCSimControlClient lClient(lDirectory.path("s"));
     EXPECT_EQ(lClient.ask("one"), "ok <one>");
     EXPECT_EQ(lClient.ask(""), "ok <>");
-    const ZTCSimDescriptor lRaw = sConnect(lDirectory.path("s"));
+    const ZTCLibraryDescriptor lRaw = sConnect(lDirectory.path("s"));
     ASSERT_EQ(::send(lRaw.get(), "a\nb\nc\nrest", 10, 0), 10);
     ASSERT_EQ(::shutdown(lRaw.get(), SHUT_WR), 0);
     EXPECT_EQ(sReadAll(lRaw), "ok <a>\nok <b>\nok <c>\n");
@@ -66,7 +66,7 @@ TEST(ControlSocket, AnswersEachLineInOrder) {
 TEST(ControlSocket, PutsLinesTogetherHoweverTheyAreSplit) {
     const ZTCTemporaryDirectory lDirectory;
     const ZTCSimControlSocket lSocket(lDirectory.path("s"), sEcho);
-    const ZTCSimDescriptor lRaw = sConnect(lDirectory.path("s"));
+    const ZTCLibraryDescriptor lRaw = sConnect(lDirectory.path("s"));
     for (const char lByte : std::string("split\nline\n")) {
         ASSERT_EQ(::send(lRaw.get(), &lByte, 1, 0), 1);
     }
@@ -99,7 +99,7 @@ TEST(ControlSocket, ServesSeveralClientsAtOnce) {
 TEST(ControlSocket, AClientThatDoesNotReadHoldsUpNobody) {
     const ZTCTemporaryDirectory lDirectory;
     const ZTCSimControlSocket lSocket(lDirectory.path("s"), [](std::string_view) { return std::string(1 << 20, 'y'); });
-    const ZTCSimDescriptor lDeaf = sConnect(lDirectory.path("s"));
+    const ZTCLibraryDescriptor lDeaf = sConnect(lDirectory.path("s"));
     ASSERT_EQ(::send(lDeaf.get(), "a\nb\nc\n", 6, 0), 6);
     ZTCSimControlClient lClient(lDirectory.path("s"));
     EXPECT_EQ(lClient.ask("hello").size(), std::size_t{1} << 20);
@@ -134,7 +134,7 @@ TEST(ControlSocket, TakesOverAStaleSocket) {
     const ZTCTemporaryDirectory lDirectory;
     const std::string lPath = lDirectory.path("s");
     {
-        const ZTCSimDescriptor lDead(::socket(AF_UNIX, SOCK_STREAM | SOCK_CLOEXEC, 0));
+        const ZTCLibraryDescriptor lDead(::socket(AF_UNIX, SOCK_STREAM | SOCK_CLOEXEC, 0));
         const sockaddr_un lAddress = makeSimSocketAddress(lPath);
         ASSERT_EQ(::bind(lDead.get(), reinterpret_cast<const sockaddr*>(&lAddress), sizeof lAddress), 0);
     }

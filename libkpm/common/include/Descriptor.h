@@ -1,0 +1,37 @@
+/// An open file descriptor that is closed with its owner.
+#ifndef LIBKPM_COMMON_INCLUDE_DESCRIPTOR_H
+#define LIBKPM_COMMON_INCLUDE_DESCRIPTOR_H
+
+#include <unistd.h>
+
+#include <utility>
+
+class ZTCLibraryDescriptor {
+public:
+    ZTCLibraryDescriptor() = default;
+    explicit ZTCLibraryDescriptor(int aDescriptor) : mDescriptor(aDescriptor) {}
+    ZTCLibraryDescriptor(ZTCLibraryDescriptor&& arOther) noexcept
+        : mDescriptor(std::exchange(arOther.mDescriptor, -1)) {}
+    ZTCLibraryDescriptor& operator=(ZTCLibraryDescriptor&& arOther) noexcept {
+        std::swap(mDescriptor, arOther.mDescriptor);
+        return *this;
+    }
+    ZTCLibraryDescriptor(const ZTCLibraryDescriptor&) = delete;
+    ZTCLibraryDescriptor& operator=(const ZTCLibraryDescriptor&) = delete;
+    ~ZTCLibraryDescriptor() {
+        if (mDescriptor >= 0) {
+            ::close(mDescriptor);
+        }
+    }
+
+    int get() const { return mDescriptor; }
+    bool isOpen() const { return mDescriptor >= 0; }
+
+    /// Gives it to the caller, who closes it.
+    int release() { return std::exchange(mDescriptor, -1); }
+
+private:
+    int mDescriptor = -1;
+};
+
+#endif
