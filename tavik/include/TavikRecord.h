@@ -13,7 +13,7 @@
 class ZTCTavikRecord {
 public:
     /// Encoded bytes of the occurrences and the times.
-    static constexpr Size gcFixedSize = sizeof(std::uint32_t) + 2 * ZTCDateTime::gcEncodedSize;
+    static constexpr Size gcFixedSize = sizeof(std::uint32_t) + ZTCDateTime::gcEncodedSize + ZTCDateTime::gcEncodedSize;
 
     /// Encoded bytes beside the event data, at most.
     static constexpr Size gcMostBesideData = gcFixedSize + ZTCScopeData::gcFixedSizeWithNames;

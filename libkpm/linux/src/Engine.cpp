@@ -208,7 +208,7 @@ void ZTCLinuxEngine::waitForWork() {
     }
     const auto lLeft = std::chrono::duration_cast<std::chrono::milliseconds>(mNextLook - Clock::now()).count() + 1;
     const auto lTimeout = static_cast<int>(std::clamp<long long>(lLeft, 0, mOptions.mPollInterval.count() + 1));
-    if (::poll(mPolls.data(), mPolls.size(), lTimeout) < 0) {
+    if (::poll(mPolls.data(), mPolls.size(), lTimeout) < 0 && errno != EINTR) {
         // Memory is short, or fewer descriptors are allowed than are open: until the next look, only a stop is waited
         // for.
         mLosses.count(ZTLO_Failure);
