@@ -11,6 +11,7 @@
 #include <vector>
 
 #include "tests/support/AgentProcess.h"
+#include "tests/support/ResourceLimit.h"
 #include "tests/support/SmallFileSystem.h"
 
 // Files and directories in trouble while the agent starts or runs: each outcome is one that docs/operations.md names.
@@ -144,12 +145,10 @@ TEST(Trouble, ALimitOnFileSizesSendsLinesToStandardErrorAndTheyAreCounted) {
 #ifndef __SANITIZE_THREAD__  // its runtime writes a file of its own, larger than any such limit, before main
 TEST(Trouble, ALimitOnFileSizesThatTakesNoPidFileEndsTheStartInOrder) {
     ZTCAgentProcess lAgent;
-    rlimit lFormer{};
-    ASSERT_EQ(getrlimit(RLIMIT_FSIZE, &lFormer), 0);
-    const rlimit lNone{0, lFormer.rlim_max};
-    ASSERT_EQ(setrlimit(RLIMIT_FSIZE, &lNone), 0);
-    lAgent.start();  // it inherits the limit
-    ASSERT_EQ(setrlimit(RLIMIT_FSIZE, &lFormer), 0);
+    {
+        const ZTCResourceLimit lNone(RLIMIT_FSIZE, 0);
+        lAgent.start();
+    }
     EXPECT_EQ(lAgent.waitForExit(), 0);
     EXPECT_TRUE(lAgent.library().calls().empty());
     EXPECT_FALSE(exists(lAgent.pidFilePath()));

@@ -2,7 +2,6 @@
 
 #include <fcntl.h>
 #include <gtest/gtest.h>
-#include <sys/resource.h>
 #include <sys/stat.h>
 #include <sys/wait.h>
 #include <unistd.h>
@@ -18,6 +17,7 @@
 #include <vector>
 
 #include "tests/support/FailingAllocation.h"
+#include "tests/support/ResourceLimit.h"
 #include "tests/unit/common/LogTesting.h"
 
 namespace {
@@ -85,22 +85,6 @@ protected:
     std::string mPath = mDirectory.path("log");
     ZTCCapturedStandardError mStandardError;
     std::unique_ptr<ZTCLogSink> mpSink = std::make_unique<ZTCLogSink>();
-};
-
-/// A limit on the size of files, for as long as it lives.
-class ZTCFileSizeLimit {
-public:
-    explicit ZTCFileSizeLimit(rlim_t aBytes) {
-        getrlimit(RLIMIT_FSIZE, &mFormer);
-        const rlimit lLimit{aBytes, mFormer.rlim_max};
-        EXPECT_EQ(0, setrlimit(RLIMIT_FSIZE, &lLimit));
-    }
-    ZTCFileSizeLimit(const ZTCFileSizeLimit&) = delete;
-    ZTCFileSizeLimit& operator=(const ZTCFileSizeLimit&) = delete;
-    ~ZTCFileSizeLimit() { setrlimit(RLIMIT_FSIZE, &mFormer); }
-
-private:
-    rlimit mFormer{};
 };
 
 }  // namespace
@@ -290,7 +274,7 @@ TEST_F(LogSink, LostLinesGoToStandardErrorAreCountedAndReportedWhenWritingWorksA
     mpSink->setPath(mPath.c_str());
     sWriteTo(*mpSink, "12345");  // 10 bytes with mark and line break
     {
-        ZTCFileSizeLimit lLimit(10);
+        const ZTCResourceLimit lLimit(RLIMIT_FSIZE, 10);
         sWriteTo(*mpSink, "lost one");
         sWriteTo(*mpSink, "lost two");
     }
@@ -307,7 +291,7 @@ TEST_F(LogSink, AStandardErrorThatNobodyReadsHoldsNothingUp) {
     mpSink->setPath(mPath.c_str());
     const std::string lText(1019, 'x');
     {
-        ZTCFileSizeLimit lLimit(0);
+        const ZTCResourceLimit lLimit(RLIMIT_FSIZE, 0);
         for (int i = 0; i < 100; ++i) {
             sWriteTo(*mpSink, "%s", lText.c_str());
         }
@@ -323,7 +307,7 @@ TEST_F(LogSink, AStandardErrorThatNobodyReadsHoldsNothingUp) {
 TEST_F(LogSink, ALineThatIsCutByTheFileIsEndedBeforeTheNextOne) {
     mpSink->setPath(mPath.c_str());
     {
-        ZTCFileSizeLimit lLimit(10);
+        const ZTCResourceLimit lLimit(RLIMIT_FSIZE, 10);
         sWriteTo(*mpSink, "a long line");
         EXPECT_EQ("-M- a long", readFile(mPath));
     }

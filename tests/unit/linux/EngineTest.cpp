@@ -3,7 +3,6 @@
 #include <fcntl.h>
 #include <gtest/gtest.h>
 #include <signal.h>
-#include <sys/resource.h>
 
 #include <atomic>
 #include <chrono>
@@ -13,6 +12,7 @@
 #include <string>
 #include <thread>
 
+#include "tests/support/ResourceLimit.h"
 #include "tests/support/Waiting.h"
 #include "tests/unit/linux/FakeKernel.h"
 #include "tests/unit/linux/LinuxRecorder.h"
@@ -143,28 +143,12 @@ TEST_F(LinuxEngine, AClassThatCannotBeReadForAWhileTakesNoHostAway) {
     EXPECT_EQ(mLog.count("its host is gone"), 0u);
 }
 
-/// Allows no descriptor more than those of the lowest numbers, while it is there.
-class ZTCDescriptorLimit {
-public:
-    explicit ZTCDescriptorLimit(rlim_t aDescriptors) {
-        EXPECT_EQ(::getrlimit(RLIMIT_NOFILE, &mBefore), 0);
-        const rlimit lLimit{aDescriptors, mBefore.rlim_max};
-        EXPECT_EQ(::setrlimit(RLIMIT_NOFILE, &lLimit), 0);
-    }
-    ~ZTCDescriptorLimit() { ::setrlimit(RLIMIT_NOFILE, &mBefore); }
-    ZTCDescriptorLimit(const ZTCDescriptorLimit&) = delete;
-    ZTCDescriptorLimit& operator=(const ZTCDescriptorLimit&) = delete;
-
-private:
-    rlimit mBefore{};
-};
-
 #ifndef __SANITIZE_ADDRESS__  // its runtime takes a descriptor to look at memory with
 TEST_F(LinuxEngine, WithFewerDescriptorsAllowedThanAreOpenItWaitsForMoreAndSaysSo) {
     mKernel.addHost(0);
     start();
     {
-        const ZTCDescriptorLimit lLimit(1);
+        const ZTCResourceLimit lLimit(RLIMIT_NOFILE, 1);
         waitForLog("events are lost: they could not be read or handled");
     }
     mKernel.sendDone({.mResult = 0x28});

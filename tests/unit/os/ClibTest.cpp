@@ -3,7 +3,6 @@
 #include <fcntl.h>
 #include <gtest/gtest.h>
 #include <signal.h>
-#include <sys/resource.h>
 #include <sys/wait.h>
 #include <unistd.h>
 
@@ -13,6 +12,7 @@
 #include <functional>
 #include <string>
 
+#include "tests/support/ResourceLimit.h"
 #include "tests/support/TemporaryDirectory.h"
 
 namespace {
@@ -37,23 +37,6 @@ int sStatusOfChild(const std::function<int()>& acrFunction) {
     int lStatus = -1;
     return lChild > 0 && waitpid(lChild, &lStatus, 0) == lChild && WIFEXITED(lStatus) ? WEXITSTATUS(lStatus) : -1;
 }
-
-/// While it lives, the process has no more of a resource than this.
-class ZTCLimit {
-public:
-    ZTCLimit(__rlimit_resource_t aResource, rlim_t aMost) : mResource(aResource) {
-        getrlimit(mResource, &mFormer);
-        const struct rlimit lLimit = {aMost, mFormer.rlim_max};
-        setrlimit(mResource, &lLimit);
-    }
-    ~ZTCLimit() { setrlimit(mResource, &mFormer); }
-    ZTCLimit(const ZTCLimit&) = delete;
-    ZTCLimit& operator=(const ZTCLimit&) = delete;
-
-private:
-    const __rlimit_resource_t mResource;
-    struct rlimit mFormer {};
-};
 
 }  // namespace
 
@@ -344,7 +327,7 @@ TEST(Clib, AnEventWhoseCounterIsFullStaysRaised) {
 
 #ifndef __SANITIZE_ADDRESS__  // its runtime takes a descriptor to look at memory with
 TEST(Clib, WithoutADescriptorLeftEachCallSaysSo) {
-    const ZTCLimit lLimit(RLIMIT_NOFILE, 0);
+    const ZTCResourceLimit lLimit(RLIMIT_NOFILE, 0);
     EXPECT_EQ(ClibTryOpen("/dev/null", O_RDONLY), -EMFILE);
     EXPECT_EQ(sTextOf<ZTCClibEventFailedEx>([] { ClibEventFd(); }),
               std::string("Making an event counter failed: ") + std::strerror(EMFILE));
@@ -354,7 +337,7 @@ TEST(Clib, WithoutADescriptorLeftEachCallSaysSo) {
 TEST(Clib, ADescriptorThatCannotBeLiftedIsClosedAndAnError) {
     EXPECT_EQ(sStatusOfChild([] {
                   close(0);
-                  const ZTCLimit lLimit(RLIMIT_NOFILE, 3);
+                  const ZTCResourceLimit lLimit(RLIMIT_NOFILE, 3);
                   return ClibTryOpen("/dev/null", O_RDONLY) < 0 && fcntl(0, F_GETFD) < 0 && errno == EBADF ? 0 : 1;
               }),
               0);
@@ -381,7 +364,7 @@ TEST(Clib, WhoMayNeitherForkNorSignalIsToldSo) {
                   if (lFormer == 0 && setresuid(65534, 65534, 0) != 0) {
                       return 1;
                   }
-                  const ZTCLimit lLimit(RLIMIT_NPROC, 0);
+                  const ZTCResourceLimit lLimit(RLIMIT_NPROC, 0);
                   const std::string lFork = sTextOf<ZTCClibForkFailedEx>([] {
                       if (ClibFork() == 0) {
                           _exit(0);
@@ -401,7 +384,7 @@ TEST(Clib, WhoMayNeitherForkNorSignalIsToldSo) {
 
 #ifndef __SANITIZE_ADDRESS__  // its runtime takes a descriptor to look at memory with
 TEST(Clib, AWaitOnMoreDescriptorsThanAProcessMayHaveIsAnError) {
-    const ZTCLimit lLimit(RLIMIT_NOFILE, 0);
+    const ZTCResourceLimit lLimit(RLIMIT_NOFILE, 0);
     struct pollfd lDescriptor = {-1, POLLIN, 0};
     EXPECT_EQ(sTextOf<ZTCClibPollFailedEx>([&] { ClibPoll(&lDescriptor, 1, 0); }),
               std::string("Waiting on 1 descriptors failed: ") + std::strerror(EINVAL));
@@ -409,7 +392,7 @@ TEST(Clib, AWaitOnMoreDescriptorsThanAProcessMayHaveIsAnError) {
 #endif
 
 TEST(Clib, AProcessWhoseStateCannotBeReadIsTakenForAlive) {
-    const ZTCLimit lLimit(RLIMIT_NOFILE, 0);
+    const ZTCResourceLimit lLimit(RLIMIT_NOFILE, 0);
     EXPECT_TRUE(ClibIsProcessAlive(getpid()));
     EXPECT_FALSE(ClibIsProcessAlive(0x7fffffff));
 }
