@@ -4,6 +4,7 @@
 
 #include <cerrno>
 
+#include "common/include/Memory.h"
 #include "os/common/include/Clib.h"
 
 namespace {
@@ -36,10 +37,12 @@ void sPause() noexcept {
 }
 
 /// Locks as pthread_mutex_lock does. Most holds end sooner than a thread falls asleep and is woken up again, so the
-/// lock is tried a few times first, after waits that double: about a microsecond in all.
+/// lock is tried a few times first, for about a microsecond in all.
 int sLock(pthread_mutex_t* apMutex) noexcept {
-    constexpr unsigned lcMostPauses = 32;
-    for (unsigned lPauses = 1; lPauses <= lcMostPauses; lPauses *= 2) {
+    constexpr unsigned lcTries = 10;
+    constexpr unsigned lcMostPauses = 8;
+    unsigned lPauses = 1;
+    for (unsigned lTry = 0; lTry < lcTries; ++lTry) {
         const int lError = pthread_mutex_trylock(apMutex);
         if (lError != EBUSY) {
             return lError;
@@ -47,6 +50,7 @@ int sLock(pthread_mutex_t* apMutex) noexcept {
         for (unsigned i = 0; i < lPauses; ++i) {
             sPause();
         }
+        lPauses = ZT_MIN(2 * lPauses, lcMostPauses);
     }
     return pthread_mutex_lock(apMutex);
 }
