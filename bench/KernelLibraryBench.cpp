@@ -255,6 +255,25 @@ void sRscnCallback(unsigned /*aBoard*/, void* apPayload, unsigned /*aLength*/) {
     gDeliveries.note();
 }
 
+/// Has the engine deliver what aFill puts into its sources while they are held, again and again. aFill returns how many
+/// events that makes.
+template <typename Fill>
+void sMeasureDeliveries(benchmark::State& arState, ZTCBenchKernel& arKernel, Fill aFill) {
+    double lSeconds = 0;
+    std::size_t lEvents = 0;
+    for (auto lUnused : arState) {
+        arKernel.hold();
+        const std::size_t lCount = aFill();
+        gDeliveries.expect(lCount);
+        arKernel.release();
+        const double lTime = gDeliveries.wait();
+        arState.SetIterationTime(lTime);
+        lSeconds += lTime;
+        lEvents += lCount;
+    }
+    sSetTime(arState, lSeconds, lEvents);
+}
+
 void sPageDelivered(benchmark::State& arState, const char* apKernel) {
     ZTCBenchKernel lKernel(apKernel);
     ZTCLinuxEngine lEngine(lKernel.options(), lKernel);
@@ -267,20 +286,8 @@ void sPageDelivered(benchmark::State& arState, const char* apKernel) {
                  ZTLST_Success,
              "check conditions have no source");
     const std::size_t lInPage = sCountOutcomes(apKernel);
-    double lSeconds = 0;
-    std::size_t lEvents = 0;
-    for (auto lUnused : arState) {
-        lKernel.hold();
-        const std::size_t lCount = lKernel.fillTrace() * lInPage;
-        gDeliveries.expect(lCount);
-        lKernel.release();
-        const double lTime = gDeliveries.wait();
-        arState.SetIterationTime(lTime);
-        lSeconds += lTime;
-        lEvents += lCount;
-    }
+    sMeasureDeliveries(arState, lKernel, [&] { return lKernel.fillTrace() * lInPage; });
     lEngine.stop();
-    sSetTime(arState, lSeconds, lEvents);
 }
 
 void sPipeOverlay(benchmark::State& arState, const char* apKernel) {
@@ -326,20 +333,11 @@ void sMessageDelivered(benchmark::State& arState) {
     const auto lpGeneric = reinterpret_cast<KPM_EventCallback>(reinterpret_cast<void (*)()>(sRscnCallback));
     sRequire(lEngine.registerForBoard(0, FC_REG_RSCN_EVENT, nullptr, lpGeneric) != 0, "RSCNs have no source");
     const ZTCBenchBytes lMessage = readCapture("6.12", "netlink/post-rscn-port.bin");
-    double lSeconds = 0;
-    std::size_t lEvents = 0;
-    for (auto lUnused : arState) {
-        lKernel.hold();
+    sMeasureDeliveries(arState, lKernel, [&] {
         lKernel.addMessages(lMessage, gcMessages);
-        gDeliveries.expect(gcMessages);
-        lKernel.release();
-        const double lTime = gDeliveries.wait();
-        arState.SetIterationTime(lTime);
-        lSeconds += lTime;
-        lEvents += gcMessages;
-    }
+        return std::size_t{gcMessages};
+    });
     lEngine.stop();
-    sSetTime(arState, lSeconds, lEvents);
 }
 
 }  // namespace
