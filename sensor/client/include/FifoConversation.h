@@ -1,8 +1,9 @@
 /// Frames to and from an agent over its two FIFOs.
 ///
 /// Connecting opens the response FIFO for reading first (an agent that starts waits for that reader), takes the
-/// client's lock, opens the command FIFO without blocking, and throws away what stands in the response FIFO. What is
-/// missing is tried again until the time limit, so that an agent that is just starting is met. Any failure disconnects:
+/// client's lock, opens the command FIFO without blocking, and throws away what stands in the response FIFO: where
+/// there is something, up to the refusal of a collection period of 0, which it sends for that. What is missing is tried
+/// again until the time limit, so that an agent that is just starting is met. Any failure disconnects:
 /// what the agent still sends then belongs to no request of ours.
 ///
 /// One thread at a time. Signals: SIGPIPE is kept from the process by the calls themselves; EINTR never shows.
@@ -53,6 +54,7 @@ private:
     bool tryOpenCommandFifo();
     ZTCFileDescriptor openFifo(const std::string& acrPath, int aFlags);
     void discardStaleBytes(const ZTCTimeLimit& acrLimit);
+    void discardSome(ZTCWireBytes& arTail);
     void writeAll(std::span<const std::uint8_t> aFrame, const ZTCTimeLimit& acrLimit);
     void readExactly(ZTCWireBytes& arBytes, std::size_t aCount, const char* apWhat, const ZTCTimeLimit& acrLimit);
     /// As read(): bytes, 0 = no writer, -1 = nothing yet.

@@ -14,8 +14,11 @@
 /// Pause between two tries to connect, and between two looks where poll() has nothing to wait for.
 static constexpr int scRetryMilliseconds = 20;
 
-/// For how long nothing more may come before stale bytes that have been seen count as all.
+/// For how long nothing more may come behind the mark before stale bytes count as all.
 static constexpr int scQuietMilliseconds = 50;
+
+/// For how long nothing may come before a peer counts as one that does not answer what marks the end of stale bytes.
+static constexpr int scSilentMilliseconds = 1000;
 
 static constexpr std::size_t scReadSize = 65536;
 
@@ -157,19 +160,39 @@ ssize_t ZTCFifoConversation::readSome(std::span<std::uint8_t> aPlace) {
     return lCount;
 }
 
+/// The frame that answers a collection period of 0: "failed", status ZTSAPS_Invalid.
+static constexpr std::array<std::uint8_t, 7> scRefusalFrame{0, 0, 0, 3, ZTRO_Failed, 0, ZTSAPS_Invalid};
+
+/// Somebody has given an answer up, and the agent may still be writing it, with pauses of any length. Answers come in
+/// order: a collection period of 0, which the agent always refuses, marks the end of what is stale.
 void ZTCFifoConversation::discardStaleBytes(const ZTCTimeLimit& acrLimit) {
-    std::array<std::uint8_t, 4096> lBytes;
-    bool lHasSeenBytes = false;
     pollfd lResponse{.fd = mResponseFifo.get(), .events = POLLIN, .revents = 0};
-    while (sPoll({&lResponse, 1}, lHasSeenBytes ? scQuietMilliseconds : 0) && (lResponse.revents & POLLIN) != 0) {
-        mDiscardedBytes += static_cast<std::uint64_t>(std::max<ssize_t>(readSome(lBytes), 0));
-        lHasSeenBytes = true;
+    if (!sPoll({&lResponse, 1}, 0) || (lResponse.revents & POLLIN) == 0) {
+        return;
+    }
+    writeAll(makeRequestFrame(encodeCollectionPeriod(0)), acrLimit);
+    ZTCWireBytes lTail;
+    const auto lHasMark = [&] { return std::ranges::equal(lTail, scRefusalFrame); };
+    while (sPoll({&lResponse, 1}, lHasMark() ? scQuietMilliseconds : scSilentMilliseconds) &&
+           (lResponse.revents & POLLIN) != 0) {
+        discardSome(lTail);
         if (acrLimit.hasPassed()) {
             throw ZTCNoAnswerEx(ZTNA_Silence, "the agent in " + mDirectory +
                                                   " is still sending an answer that nobody waits for, after " +
                                                   acrLimit.describeSpan());
         }
     }
+    mDiscardedBytes -= lHasMark() ? lTail.size() : 0;
+}
+
+/// Reads once, and keeps the last bytes of the stream, as many as a refusal has.
+void ZTCFifoConversation::discardSome(ZTCWireBytes& arTail) {
+    std::array<std::uint8_t, 4096> lBytes;
+    const std::size_t lCount = static_cast<std::size_t>(std::max<ssize_t>(readSome(lBytes), 0));
+    arTail.insert(arTail.end(), lBytes.begin(), lBytes.begin() + static_cast<std::ptrdiff_t>(lCount));
+    arTail.erase(arTail.begin(),
+                 arTail.end() - static_cast<std::ptrdiff_t>(std::min(arTail.size(), scRefusalFrame.size())));
+    mDiscardedBytes += lCount;
 }
 
 void ZTCFifoConversation::send(std::span<const std::uint8_t> aBody, const ZTCTimeLimit& acrLimit) {

@@ -1,5 +1,8 @@
+#include <limits.h>
+#include <poll.h>
 #include <unistd.h>
 
+#include <algorithm>
 #include <cerrno>
 
 #include "sensor/client/include/RecordTable.h"
@@ -11,20 +14,40 @@ void complain(const std::string& acrText) {
     [[maybe_unused]] const ssize_t lWritten = write(STDERR_FILENO, lLine.data(), lLine.size());
 }
 
+/// One write. Returns the bytes written, 0 after an interruption; throws ZTCSystemCallEx.
+static std::size_t sWriteSome(const std::string& acrText, std::size_t aWritten, std::size_t aMost) {
+    const ssize_t lCount = write(STDOUT_FILENO, acrText.data() + aWritten, std::min(acrText.size() - aWritten, aMost));
+    if (lCount < 0 && (errno == EINTR || errno == EAGAIN)) {
+        return 0;
+    }
+    if (lCount <= 0) {
+        throw ZTCSystemCallEx("cannot write standard output: " + std::to_string(aWritten) + " of " +
+                                  std::to_string(acrText.size()) + " bytes written",
+                              lCount < 0 ? errno : ENOSPC);
+    }
+    return static_cast<std::size_t>(lCount);
+}
+
 void writeOutput(const std::string& acrText) {
-    std::size_t lWritten = 0;
-    while (lWritten < acrText.size()) {
-        const ssize_t lCount = write(STDOUT_FILENO, acrText.data() + lWritten, acrText.size() - lWritten);
-        if (lCount > 0) {
-            lWritten += static_cast<std::size_t>(lCount);
-        } else if (lCount < 0 && errno == EINTR) {
-            continue;
-        } else {
-            throw ZTCSystemCallEx("cannot write standard output: " + std::to_string(lWritten) + " of " +
-                                      std::to_string(acrText.size()) + " bytes written",
-                                  lCount < 0 ? errno : ENOSPC);
+    for (std::size_t lWritten = 0; lWritten < acrText.size();) {
+        lWritten += sWriteSome(acrText, lWritten, acrText.size());
+    }
+}
+
+bool writeOutputPatiently(const std::string& acrText, const std::function<bool()>& acrPause) {
+    static constexpr int scPauseMilliseconds = 1000;
+    for (std::size_t lWritten = 0; lWritten < acrText.size();) {
+        pollfd lOutput{.fd = STDOUT_FILENO, .events = POLLOUT, .revents = 0};
+        const bool lIsReady = poll(&lOutput, 1, scPauseMilliseconds) > 0;
+        const bool lMayGoOn = acrPause();
+        if (lIsReady) {
+            // A pipe that is ready takes this much without blocking.
+            lWritten += sWriteSome(acrText, lWritten, PIPE_BUF);
+        } else if (!lMayGoOn) {
+            return false;
         }
     }
+    return true;
 }
 
 ZTEExitStatus reportAnswer(const ZTSToolOptions& acrOptions, const std::string& acrCommand,

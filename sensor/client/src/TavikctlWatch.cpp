@@ -12,7 +12,7 @@
 #include "sensor/client/include/SensorPidFile.h"
 #include "sensor/client/src/Tavikctl.h"
 
-/// The pid file is touched this often, so that it moves in every heartbeat period that an agent can have.
+/// The pid file is touched at least this often, so that it moves in every heartbeat period that an agent can have.
 static constexpr std::chrono::milliseconds scTouchPeriod{1000};
 
 /// A descriptor that is readable once SIGINT, SIGTERM or SIGHUP has come.
@@ -47,6 +47,9 @@ public:
             try {
                 lWasAnswered = tryCycle(lIsStart);
             } catch (const ZTCCancelledEx&) {
+                break;
+            }
+            if (mHasUnprinted) {
                 break;
             }
             if (mRetrievals == mrWatch.mCount && mrWatch.mCount != 0) {
@@ -144,9 +147,20 @@ private:
         if (mrOptions.mIsJson) {
             nlohmann::ordered_json lDocument{{"command", "watch"}, {"retrieval", aRetrieval}};
             lDocument.update(toJson(lrResponse));
-            writeOutput(dumpJson(lDocument, -1) + "\n");
+            write(lrResponse, dumpJson(lDocument, -1) + "\n");
         } else {
-            writeOutput("-- " + acrTitle + "\n" + formatTable(lrResponse, lrResponse.countRecords() != 0));
+            write(lrResponse, "-- " + acrTitle + "\n" + formatTable(lrResponse, lrResponse.countRecords() != 0));
+        }
+    }
+
+    /// A reader that has stopped keeps neither the pid file from being touched nor a signal from ending the watch.
+    void write(const ZTSResponse& acrResponse, const std::string& acrText) {
+        if (mHasUnprinted || !writeOutputPatiently(acrText, [this] { return waitUntil({}); })) {
+            mHasUnprinted = true;
+            note(ZTXS_LocalFailure);
+            complain(
+                "ended by a signal while nobody read standard output: " + std::to_string(acrResponse.countRecords()) +
+                " records were taken from the agent and could not be printed in full");
         }
     }
 
@@ -163,6 +177,7 @@ private:
     bool mHasStarted = false;
     long mAgentPid = 0;
     bool mIsOutage = false;
+    bool mHasUnprinted = false;  ///< a signal came while the reader of standard output did not read
 };
 
 ZTEExitStatus runWatch(const ZTSToolOptions& acrOptions, const ZTSWatchOptions& acrWatch) {

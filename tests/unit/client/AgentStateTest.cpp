@@ -52,6 +52,15 @@ TEST(AgentState, AStalePidFileIsNoAgentEvenWhereItsPidIsInUseAgain) {
     EXPECT_EQ(lookAtAgent(lDirectory.path()).mPresence, ZTAP_None);
 }
 
+TEST(AgentState, TwoThatLookAtTheSameTimeDoNotTakeEachOtherForAnAgent) {
+    const ZTCTemporaryDirectory lDirectory;
+    const std::string lPath = lDirectory.path("qrv-tvk.pid");
+    writeFile(lPath, std::to_string(getpid()) + "\n");
+    const ZTCFileDescriptor lOtherLook = ZTCFileDescriptor::open(lPath.c_str(), O_RDONLY);
+    ASSERT_EQ(flock(lOtherLook.get(), LOCK_SH | LOCK_NB), 0);
+    EXPECT_EQ(lookAtAgent(lDirectory.path()).mPresence, ZTAP_None);
+}
+
 TEST(AgentState, ASymbolicLinkIsNoPidFileOfAnAgent) {
     const ZTCTemporaryDirectory lDirectory;
     const ZTCTemporaryDirectory lOther;

@@ -1,11 +1,59 @@
 #include "sensor/client/include/ClientLock.h"
 
 #include <gtest/gtest.h>
+#include <sys/file.h>
 #include <sys/stat.h>
+#include <sys/syscall.h>
 #include <unistd.h>
+
+#include <functional>
+#include <utility>
 
 #include "sensor/client/include/ClientErrors.h"
 #include "tests/support/TemporaryDirectory.h"
+
+/// Runs between the opening of a lock file and its lock, in place of what another process may do there.
+static std::function<void()> sBeforeLock;
+
+/// In place of the C library's.
+extern "C" int flock(int aDescriptor, int aOperation) noexcept {
+    if (sBeforeLock) {
+        std::exchange(sBeforeLock, nullptr)();
+    }
+    return static_cast<int>(syscall(SYS_flock, aDescriptor, aOperation));
+}
+
+TEST(ClientLock, AFileThatIsReplacedBeforeItIsLockedIsNotTheLock) {
+    const ZTCTemporaryDirectory lDirectory;
+    const std::string lPath = lDirectory.path("qrv-sn.lock");
+    ZTCClientLock lLock(lDirectory.path());
+    sBeforeLock = [&] {
+        ASSERT_EQ(unlink(lPath.c_str()), 0);
+        writeFile(lPath, "");
+    };
+    EXPECT_FALSE(lLock.tryAcquire());
+    EXPECT_FALSE(lLock.isHeld());
+    EXPECT_TRUE(lLock.tryAcquire());
+}
+
+TEST(ClientLock, NobodyElseMayOpenTheFile) {
+    const mode_t lMask = umask(0);
+    const ZTCTemporaryDirectory lDirectory;
+    ZTCClientLock lLock(lDirectory.path());
+    EXPECT_TRUE(lLock.tryAcquire());
+    umask(lMask);
+    struct stat lStatus {};
+    ASSERT_EQ(stat(lLock.getPath().c_str(), &lStatus), 0);
+    EXPECT_EQ(lStatus.st_mode & 0777U, 0600U);
+}
+
+TEST(ClientLock, ASymbolicLinkIsNotFollowed) {
+    const ZTCTemporaryDirectory lDirectory;
+    ASSERT_EQ(symlink(lDirectory.path("elsewhere").c_str(), lDirectory.path("qrv-sn.lock").c_str()), 0);
+    ZTCClientLock lLock(lDirectory.path());
+    EXPECT_THROW(lLock.tryAcquire(), ZTCSystemCallEx);
+    EXPECT_FALSE(exists(lDirectory.path("elsewhere")));
+}
 
 TEST(ClientLock, OneClientAtATimeHoldsIt) {
     const ZTCTemporaryDirectory lDirectory;

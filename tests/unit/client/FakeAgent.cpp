@@ -5,6 +5,7 @@
 #include <pthread.h>
 #include <signal.h>
 #include <sys/eventfd.h>
+#include <sys/file.h>
 #include <sys/stat.h>
 #include <unistd.h>
 
@@ -23,6 +24,7 @@ void makeFifos(const std::string& acrDirectory) {
 ZTCFakeAgent::ZTCFakeAgent(std::string aDirectory, std::deque<ZTCStep> aSteps)
     : mDirectory(std::move(aDirectory)), mSteps(std::move(aSteps)), mStop(eventfd(0, EFD_CLOEXEC)) {
     makeFifos(mDirectory);
+    holdPidFile();
     mCommandFifo = ZTCFileDescriptor::open((mDirectory + gcCommandFifoName).c_str(), O_RDONLY | O_NONBLOCK);
     // Held so that the FIFO never shows an end of file between two clients.
     mOwnCommandWriter = ZTCFileDescriptor::open((mDirectory + gcCommandFifoName).c_str(), O_WRONLY | O_NONBLOCK);
@@ -30,6 +32,16 @@ ZTCFakeAgent::ZTCFakeAgent(std::string aDirectory, std::deque<ZTCStep> aSteps)
         throw std::runtime_error("the fake agent cannot open its command FIFO");
     }
     mThread = std::thread([this] { run(); });
+}
+
+/// Keeps the pid that a test has put into the file; else writes that of the test.
+void ZTCFakeAgent::holdPidFile() {
+    mPidFile = ZTCFileDescriptor::open((mDirectory + gcAgentPidFileName).c_str(), O_RDWR | O_CREAT, 0600);
+    const std::string lPid = std::to_string(getpid()) + "\n";
+    if (!mPidFile.isOpen() || flock(mPidFile.get(), LOCK_EX | LOCK_NB) != 0 ||
+        (lseek(mPidFile.get(), 0, SEEK_END) == 0 && write(mPidFile.get(), lPid.data(), lPid.size()) < 0)) {
+        throw std::runtime_error("the fake agent cannot hold its pid file");
+    }
 }
 
 ZTCFakeAgent::~ZTCFakeAgent() {
@@ -113,6 +125,10 @@ void ZTCFakeAgent::run() {
         if (!readExactly(lBody, lLength)) {
             break;
         }
+        if (lBody == encodeCollectionPeriod(0) && mRefusesPeriodOfZero) {
+            sendFrame({1, 0, 6});
+            continue;
+        }
         {
             const std::lock_guard lLock(mMutex);
             mRequests.push_back(lBody);
@@ -126,6 +142,7 @@ void ZTCFakeAgent::run() {
     mCommandFifo.reset();
     mOwnCommandWriter.reset();
     mResponseFifo.reset();
+    mPidFile.reset();
 }
 
 ZTCFakeAgent::ZTCStep ZTCFakeAgent::answering(const ZTCWireBytes& acrBody) {

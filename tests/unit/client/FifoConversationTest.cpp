@@ -242,7 +242,8 @@ TEST(FifoConversation, WritingToADeadAgentRaisesNoSignal) {
 
 TEST(FifoConversation, StaleBytesAreThrownAwayBeforeTheFirstRequest) {
     const ZTCTemporaryDirectory lDirectory;
-    const ZTCFakeAgent lAgent(lDirectory.path(), {ZTCFakeAgent::answering({6})});
+    ZTCFakeAgent lAgent(lDirectory.path(), {ZTCFakeAgent::answering({6})});
+    lAgent.refusePeriodOfZero();
     // Bytes stay in a FIFO as long as somebody has it open.
     const ZTCFileDescriptor lReader =
         ZTCFileDescriptor::open(lDirectory.path("qrvtvkout.fifo").c_str(), O_RDONLY | O_NONBLOCK);
@@ -258,8 +259,9 @@ TEST(FifoConversation, StaleBytesAreThrownAwayBeforeTheFirstRequest) {
 TEST(FifoConversation, AnAnswerThatIsStillBeingSentIsThrownAwayWhole) {
     // The agent sends what the FIFO does not hold at once; the client that asked for it is gone.
     const ZTCTemporaryDirectory lDirectory;
-    const ZTCFakeAgent lAgent(lDirectory.path(),
-                              {ZTCFakeAgent::answering(ZTCWireBytes(1000000, 0x11)), ZTCFakeAgent::answering({6})});
+    ZTCFakeAgent lAgent(lDirectory.path(),
+                        {ZTCFakeAgent::answering(ZTCWireBytes(1000000, 0x11)), ZTCFakeAgent::answering({6})});
+    lAgent.refusePeriodOfZero();
     const ZTCFileDescriptor lOtherReader =
         ZTCFileDescriptor::open(lDirectory.path("qrvtvkout.fifo").c_str(), O_RDONLY | O_NONBLOCK);
     {
@@ -271,6 +273,50 @@ TEST(FifoConversation, AnAnswerThatIsStillBeingSentIsThrownAwayWhole) {
     ZTCFifoConversation lConversation(lDirectory.path());
     EXPECT_EQ(sAsk(lConversation), (ZTCWireBytes{6}));
     EXPECT_EQ(lConversation.getDiscardedBytes(), 1000004U);
+}
+
+TEST(FifoConversation, AnAnswerThatPausesWhileItIsSentIsThrownAwayWhole) {
+    const ZTCTemporaryDirectory lDirectory;
+    std::promise<void> lMayGoOn;
+    ZTCFakeAgent lAgent(lDirectory.path(), {[&](ZTCFakeAgent& arAgent, const ZTCWireBytes&) {
+                                                arAgent.sendRaw({0, 0, 0, 8, 2, 0});
+                                                lMayGoOn.get_future().wait();
+                                                arAgent.sendRaw({0, 0, 0, 0, 0, 0});
+                                            },
+                                            ZTCFakeAgent::answering({6})});
+    lAgent.refusePeriodOfZero();
+    const ZTCFileDescriptor lOtherReader =
+        ZTCFileDescriptor::open(lDirectory.path("qrvtvkout.fifo").c_str(), O_RDONLY | O_NONBLOCK);
+    {
+        ZTCFifoConversation lGone(lDirectory.path());
+        lGone.send(scGet, sPatience());
+    }
+    pollfd lStale{.fd = lOtherReader.get(), .events = POLLIN, .revents = 0};
+    ASSERT_EQ(poll(&lStale, 1, 20000), 1);
+    // The rest comes when the next client has taken what was there.
+    auto lRest = std::async(std::launch::async, [&] {
+        int lWaiting = 1;
+        waitUntil([&] { return ioctl(lOtherReader.get(), FIONREAD, &lWaiting) == 0 && lWaiting == 0; }, "the drain");
+        poll(nullptr, 0, 200);  // longer than the quiet that a client takes for the end
+        lMayGoOn.set_value();
+    });
+    ZTCFifoConversation lConversation(lDirectory.path());
+    EXPECT_EQ(sAsk(lConversation), (ZTCWireBytes{6}));
+    EXPECT_EQ(lConversation.getDiscardedBytes(), 12U);
+    lRest.get();
+}
+
+TEST(FifoConversation, StaleBytesOfAPeerThatMarksNoEndAreThrownAwayAllTheSame) {
+    const ZTCTemporaryDirectory lDirectory;
+    const ZTCFakeAgent lAgent(lDirectory.path(), {ZTCFakeAgent::silent(), ZTCFakeAgent::answering({6})});
+    const ZTCFileDescriptor lReader =
+        ZTCFileDescriptor::open(lDirectory.path("qrvtvkout.fifo").c_str(), O_RDONLY | O_NONBLOCK);
+    const ZTCFileDescriptor lWriter =
+        ZTCFileDescriptor::open(lDirectory.path("qrvtvkout.fifo").c_str(), O_WRONLY | O_NONBLOCK);
+    ASSERT_EQ(write(lWriter.get(), "stale", 5), 5);
+    ZTCFifoConversation lConversation(lDirectory.path());
+    EXPECT_EQ(sAsk(lConversation), (ZTCWireBytes{6}));
+    EXPECT_EQ(lConversation.getDiscardedBytes(), 5U);
 }
 
 TEST(FifoConversation, ASecondClientWaitsForTheLock) {

@@ -82,6 +82,49 @@ TEST(SensorPidFile, AnotherOnesFileIsNotRemoved) {
     EXPECT_EQ(readFile(lPath), "1\n");
 }
 
+TEST(SensorPidFile, TheOwnFileStaysWhereItNamesAnotherProcess) {
+    const ZTCTemporaryDirectory lDirectory;
+    const std::string lPath = lDirectory.path("qrv-sn.pid");
+    {
+        const ZTCSensorPidFile lFile(lDirectory.path());
+        writeFile(lPath, "1\n");  // the same file, with another content
+    }
+    EXPECT_EQ(readFile(lPath), "1\n");
+}
+
+TEST(SensorPidFile, AFileThatReplacedTheOwnOneStaysEvenWhereItHasTheSameContent) {
+    const ZTCTemporaryDirectory lDirectory;
+    const std::string lPath = lDirectory.path("qrv-sn.pid");
+    {
+        const ZTCSensorPidFile lFile(lDirectory.path());
+        ASSERT_EQ(unlink(lPath.c_str()), 0);
+        writeFile(lPath, sPidLine());
+    }
+    EXPECT_EQ(readFile(lPath), sPidLine());
+}
+
+TEST(SensorPidFile, ASymbolicLinkIsNotFollowed) {
+    const ZTCTemporaryDirectory lDirectory;
+    writeFile(lDirectory.path("precious"), "precious");
+    ASSERT_EQ(symlink(lDirectory.path("precious").c_str(), lDirectory.path("qrv-sn.pid").c_str()), 0);
+    EXPECT_THROW(ZTCSensorPidFile{lDirectory.path()}, ZTCSystemCallEx);
+    EXPECT_EQ(readFile(lDirectory.path("precious")), "precious");
+}
+
+TEST(SensorPidFile, AProcessOfAnotherUserIsAlive) {
+    // The superuser may signal everybody: an ordinary user looks at process 1 in its place.
+    const pid_t lChild = fork();
+    if (lChild == 0) {
+        if (geteuid() == 0 && setuid(65534) != 0) {
+            _exit(2);
+        }
+        _exit(isProcessAlive(1) ? 0 : 1);
+    }
+    int lStatus = 0;
+    ASSERT_EQ(waitpid(lChild, &lStatus, 0), lChild);
+    EXPECT_EQ(lStatus, 0);
+}
+
 TEST(SensorPidFile, AZombieIsNotAlive) {
     EXPECT_TRUE(isProcessAlive(getpid()));
     EXPECT_FALSE(isProcessAlive(0));

@@ -1,83 +1,21 @@
 #include <fcntl.h>
-#include <gmock/gmock.h>
-#include <gtest/gtest.h>
-#include <signal.h>
-#include <sys/file.h>
 #include <unistd.h>
 
-#include <atomic>
-#include <nlohmann/json.hpp>
-#include <sstream>
-
-#include "tests/support/ChildProcess.h"
-#include "tests/support/TemporaryDirectory.h"
-#include "tests/unit/client/FakeAgent.h"
-#include "tests/unit/client/WireSamples.h"
+#include "tests/unit/client/TavikctlFixture.h"
 
 using testing::AllOf;
 using testing::HasSubstr;
 using testing::StartsWith;
 
-static const ZTCWireBytes scSuccess{0, 0, 0, 0, 0};
-static const ZTCWireBytes scInvalid{1, 0, 6};
-static const char* const scTarget = "50:06:01:60:bb:a0:12:34,50:06:01:60:3b:a0:12:34,0x010203";
-
-/// One run of the tool in a directory of its own.
-class Tavikctl : public testing::Test {
-protected:
-    struct ZTSRun {
-        int mStatus;
-        std::string mOutput;
-        std::string mErrors;
-    };
-
-    std::string dir() const { return mDirectory.path(); }
-
-    ZTSChildProcessSetup setup(const std::vector<std::string>& acrArguments) {
-        return {.mProgram = TAVIKCTL_PROGRAM,
-                .mArguments = acrArguments,
-                .mEnvironment = {{"ZT_QRV_SENSOR_DIR", dir()}},
-                .mWorkingDirectory = mOther.path(),
-                .mOutputPrefix = mOther.path("run" + std::to_string(++mRuns))};
-    }
-
-    ZTSRun run(const std::vector<std::string>& acrArguments) {
-        ZTCChildProcess lProcess(setup(acrArguments));
-        const int lStatus = lProcess.waitForExit();
-        return {lStatus, lProcess.standardOutput(), lProcess.standardError()};
-    }
-
-    /// The tool behind a shell, for what only a shell can do to its standard streams.
-    ZTSRun runShell(const std::string& acrScript) {
-        ZTSChildProcessSetup lSetup = setup({"-c", acrScript, TAVIKCTL_PROGRAM});
-        lSetup.mProgram = "/bin/sh";
-        lSetup.mEnvironment["PATH"] = "/usr/bin:/bin";
-        ZTCChildProcess lProcess(lSetup);
-        const int lStatus = lProcess.waitForExit();
-        return {lStatus, lProcess.standardOutput(), lProcess.standardError()};
-    }
-
-    static void expectOneLine(const std::string& acrErrors) {
-        EXPECT_THAT(acrErrors, StartsWith("tavikctl: "));
-        EXPECT_EQ(std::count(acrErrors.begin(), acrErrors.end(), '\n'), 1) << acrErrors;
-    }
-
-    const ZTCTemporaryDirectory mDirectory;
-    const ZTCTemporaryDirectory mOther;
-    int mRuns = 0;
-};
-
-static nlohmann::json sParse(const std::string& acrText) {
-    return nlohmann::json::parse(acrText);
-}
+using Tavikctl = ZTCTavikctlFixture;
 
 TEST_F(Tavikctl, EachCommandSendsItsRequestAndEndsWith0) {
-    const ZTCFakeAgent lAgent(dir(), {ZTCFakeAgent::answering(scSuccess)});
+    const ZTCFakeAgent lAgent(dir(), {ZTCFakeAgent::answering(gcSuccess)});
     const std::pair<std::vector<std::string>, ZTCWireBytes> lCommands[] = {
         {{"start"}, bytesOf("0000000384")},
         {{"start", "--max-record-bytes", "4096"}, bytesOf("0000001000")},
         {{"stop"}, bytesOf("02")},
-        {{"targets", scTarget}, bytesOf("03 00000001 50060160bba01234 500601603ba01234 00010203")},
+        {{"targets", gcTarget}, bytesOf("03 00000001 50060160bba01234 500601603ba01234 00010203")},
         {{"period", "3600"}, bytesOf("0500000e10")},
         {{"shutdown"}, bytesOf("04")},
     };
@@ -91,7 +29,7 @@ TEST_F(Tavikctl, EachCommandSendsItsRequestAndEndsWith0) {
 }
 
 TEST_F(Tavikctl, ARefusalEndsWith1AndNamesTheStatus) {
-    const ZTCFakeAgent lAgent(dir(), {ZTCFakeAgent::answering(scInvalid)});
+    const ZTCFakeAgent lAgent(dir(), {ZTCFakeAgent::answering(gcInvalid)});
     const ZTSRun lRun = run({"period", "0"});
     EXPECT_EQ(lRun.mStatus, 1);
     EXPECT_EQ(lRun.mOutput, "");
@@ -101,12 +39,12 @@ TEST_F(Tavikctl, ARefusalEndsWith1AndNamesTheStatus) {
 
     const ZTSRun lJsonRun = run({"--json", "period", "0"});
     EXPECT_EQ(lJsonRun.mStatus, 1);
-    EXPECT_EQ(sParse(lJsonRun.mOutput), sParse(R"({"command":"period","outcome":"failed","lateAnswers":[],
+    EXPECT_EQ(parseJson(lJsonRun.mOutput), parseJson(R"({"command":"period","outcome":"failed","lateAnswers":[],
                                                   "status":{"code":6,"name":"ZTSAPS_Invalid"}})"));
 }
 
 TEST_F(Tavikctl, WrongUseEndsWith2AndSendsNothing) {
-    const ZTCFakeAgent lAgent(dir(), {ZTCFakeAgent::answering(scSuccess)});
+    const ZTCFakeAgent lAgent(dir(), {ZTCFakeAgent::answering(gcSuccess)});
     const std::vector<std::string> lLines[] = {
         {},
         {"frobnicate"},
@@ -144,12 +82,32 @@ TEST_F(Tavikctl, WithoutADirectoryItNamesTheVariable) {
     EXPECT_THAT(lProcess.standardError(), HasSubstr("ZT_QRV_SENSOR_DIR"));
 }
 
-TEST_F(Tavikctl, NoAgentEndsWith3) {
-    const ZTSRun lRun = run({"--timeout", "0.05", "get"});
+TEST_F(Tavikctl, WhereNobodyHoldsThePidFileItAnswersAtOnceAndSaysWhatToDo) {
+    const std::vector<std::string> lCommands[] = {{"start"}, {"get"}, {"targets", gcTarget}, {"shutdown"}};
+    for (const std::vector<std::string>& lrCommand : lCommands) {
+        std::vector<std::string> lArguments = lrCommand;
+        lArguments.insert(lArguments.end(), {"--timeout", "3600"});
+        const ZTSRun lRun = run(lArguments);  // waiting out the time limit would fail the test
+        EXPECT_EQ(lRun.mStatus, 3);
+        EXPECT_EQ(lRun.mOutput, "");
+        expectOneLine(lRun.mErrors);
+        EXPECT_THAT(lRun.mErrors, AllOf(HasSubstr("no agent in " + dir()), HasSubstr(dir() + "/qrv-tvk.pid"),
+                                        HasSubstr("qrv-tvk"), HasSubstr("--wait")));
+    }
+}
+
+TEST_F(Tavikctl, ToldToWaitItWaitsForAnAgentUntilTheTimeLimit) {
+    const ZTSRun lRun = run({"--timeout", "0.05", "get", "--wait"});
     EXPECT_EQ(lRun.mStatus, 3);
     EXPECT_EQ(lRun.mOutput, "");
     expectOneLine(lRun.mErrors);
     EXPECT_THAT(lRun.mErrors, AllOf(HasSubstr("no agent in " + dir()), HasSubstr("0.05 s")));
+
+    ZTCChildProcess lWaiting(setup({"get", "--wait"}));
+    waitUntil([&] { return exists(dir() + "/qrv-sn.lock") || !lWaiting.hasEnded(); }, "the tool to run");
+    const ZTCFakeAgent lAgent(dir(), {ZTCFakeAgent::answering(makeFullSampleResponse())});
+    EXPECT_EQ(lWaiting.waitForExit(), 0) << lWaiting.standardError();
+    EXPECT_THAT(lWaiting.standardOutput(), HasSubstr("20 records"));
 }
 
 TEST_F(Tavikctl, NoAnswerInTimeEndsWith3) {
@@ -183,7 +141,7 @@ TEST_F(Tavikctl, GetPrintsJsonForPrograms) {
     const ZTCFakeAgent lAgent(dir(), {ZTCFakeAgent::answering(makeFullSampleResponse())});
     const ZTSRun lRun = run({"get", "--json"});
     EXPECT_EQ(lRun.mStatus, 0) << lRun.mErrors;
-    const nlohmann::json lDocument = sParse(lRun.mOutput);
+    const nlohmann::json lDocument = parseJson(lRun.mOutput);
     EXPECT_EQ(lDocument["command"], "get");
     EXPECT_EQ(lDocument["outcome"], "scope-data");
     EXPECT_EQ(lDocument["totals"]["records"], 20);
@@ -198,7 +156,7 @@ TEST_F(Tavikctl, GetPrintsWhatStandsInFrontOfAProblem) {
     const ZTSRun lRun = run({"get", "--json"});
     EXPECT_EQ(lRun.mStatus, 3);
     expectOneLine(lRun.mErrors);
-    const nlohmann::json lDocument = sParse(lRun.mOutput);
+    const nlohmann::json lDocument = parseJson(lRun.mOutput);
     EXPECT_EQ(lDocument["totals"]["records"], 19);
     EXPECT_THAT(lDocument["problem"].get<std::string>(), HasSubstr("offset"));
 }
@@ -220,6 +178,25 @@ TEST_F(Tavikctl, GetSavesTheBytesAndDecodeReadsThem) {
     const ZTSRun lDecoded = run({"decode", lRaw});
     EXPECT_EQ(lDecoded.mStatus, 0) << lDecoded.mErrors;
     EXPECT_EQ(lDecoded.mOutput, lRun.mOutput);
+}
+
+TEST_F(Tavikctl, RecordsThatCannotBePrintedAreSavedAllTheSame) {
+    const ZTCFakeAgent lAgent(dir(), {ZTCFakeAgent::answering(makeFullSampleResponse())});
+    const std::string lRaw = mOther.path("answer.bin");
+    EXPECT_EQ(runShell("\"$0\" get --raw " + lRaw + " >/dev/full").mStatus, 4);
+    const ZTCBytes lBytes = makeFullSampleResponse();
+    EXPECT_EQ(readFile(lRaw), std::string(lBytes.begin(), lBytes.end()));
+}
+
+TEST_F(Tavikctl, MessagesNeverGoIntoAFileThatWasOpenedInPlaceOfAClosedStream) {
+    const ZTCBytes lBytes = makeSampleResponse(2, {makeSampleList("k", {})});  // one list is missing: worth a message
+    const ZTCFakeAgent lAgent(dir(), {ZTCFakeAgent::answering(lBytes)});
+    const std::string lRaw = mOther.path("answer.bin");
+    for (const char* lpClosed : {"<&-", "2>&-", "<&- 2>&-"}) {
+        SCOPED_TRACE(lpClosed);
+        EXPECT_EQ(runShell("\"$0\" get --raw " + lRaw + " " + lpClosed).mStatus, 0);
+        EXPECT_EQ(readFile(lRaw), std::string(lBytes.begin(), lBytes.end()));
+    }
 }
 
 TEST_F(Tavikctl, GetAsksNothingWhereTheRawFileCannotBeOpened) {
@@ -251,15 +228,15 @@ TEST_F(Tavikctl, AClosedStandardOutputIsNoticedBeforeAnythingIsAsked) {
 }
 
 TEST_F(Tavikctl, TargetsComeFromArgumentsFilesAndStandardInput) {
-    const ZTCFakeAgent lAgent(dir(), {ZTCFakeAgent::answering(scSuccess)});
+    const ZTCFakeAgent lAgent(dir(), {ZTCFakeAgent::answering(gcSuccess)});
     writeFile(mOther.path("ports"),
               "# two\n1000000000000001 2000000000000001 1\n1000000000000002,2000000000000002,2\n");
     const std::string lHex =
         "03 00000003 50060160bba01234 500601603ba01234 00010203"
         "1000000000000001 2000000000000001 00000001 1000000000000002 2000000000000002 00000002";
-    EXPECT_EQ(run({"targets", scTarget, mOther.path("ports")}).mStatus, 0);
+    EXPECT_EQ(run({"targets", gcTarget, mOther.path("ports")}).mStatus, 0);
     EXPECT_EQ(hexOf(lAgent.getRequests().back()), hexOf(bytesOf(lHex)));
-    EXPECT_EQ(runShell("\"$0\" targets " + std::string(scTarget) + " - <" + mOther.path("ports")).mStatus, 0);
+    EXPECT_EQ(runShell("\"$0\" targets " + std::string(gcTarget) + " - <" + mOther.path("ports")).mStatus, 0);
     EXPECT_EQ(lAgent.getRequests().size(), 2U);
     EXPECT_EQ(hexOf(lAgent.getRequests().back()), hexOf(bytesOf(lHex)));
 }
@@ -267,7 +244,7 @@ TEST_F(Tavikctl, TargetsComeFromArgumentsFilesAndStandardInput) {
 TEST_F(Tavikctl, ALateAnswersRecordsAreNotLost) {
     const ZTCFakeAgent lAgent(dir(), {[](ZTCFakeAgent& arAgent, const ZTCWireBytes&) {
                                   arAgent.sendFrame(makeFullSampleResponse());
-                                  arAgent.sendFrame(scSuccess);
+                                  arAgent.sendFrame(gcSuccess);
                               }});
     const ZTSRun lTable = run({"stop"});
     EXPECT_EQ(lTable.mStatus, 0);
@@ -275,83 +252,22 @@ TEST_F(Tavikctl, ALateAnswersRecordsAreNotLost) {
     EXPECT_THAT(lTable.mErrors, HasSubstr("late answer"));
     const ZTSRun lJson = run({"stop", "--json"});
     EXPECT_EQ(lJson.mStatus, 0);
-    EXPECT_EQ(sParse(lJson.mOutput)["lateAnswers"][0]["totals"]["records"], 20);
+    EXPECT_EQ(parseJson(lJson.mOutput)["lateAnswers"][0]["totals"]["records"], 20);
 }
 
 TEST_F(Tavikctl, StatusTellsWhetherAnAgentRunsAndAnswers) {
     const ZTSRun lNone = run({"status", "--json"});
     EXPECT_EQ(lNone.mStatus, 3);
-    EXPECT_EQ(sParse(lNone.mOutput)["agent"]["state"], "none");
+    EXPECT_EQ(parseJson(lNone.mOutput)["agent"]["state"], "none");
 
-    const ZTCFakeAgent lAgent(dir(), {ZTCFakeAgent::answering(scSuccess)});
-    writeFile(dir() + "/qrv-tvk.pid", std::to_string(getpid()) + "\n");
-    const ZTCFileDescriptor lPidFile = ZTCFileDescriptor::open((dir() + "/qrv-tvk.pid").c_str(), O_RDWR);
-    ASSERT_EQ(flock(lPidFile.get(), LOCK_EX | LOCK_NB), 0);
+    const ZTCFakeAgent lAgent(dir(), {ZTCFakeAgent::answering(gcSuccess)});
     const ZTSRun lRunning = run({"status", "--json"});
     EXPECT_EQ(lRunning.mStatus, 0) << lRunning.mErrors;
-    const nlohmann::json lDocument = sParse(lRunning.mOutput);
+    const nlohmann::json lDocument = parseJson(lRunning.mOutput);
     EXPECT_EQ(lDocument["agent"]["state"], "running");
     EXPECT_EQ(lDocument["agent"]["pid"], getpid());
     EXPECT_EQ(lDocument["agent"]["answers"], true);
     EXPECT_THAT(run({"status"}).mOutput, HasSubstr("running, process " + std::to_string(getpid())));
-}
-
-TEST_F(Tavikctl, WatchPlaysTheSensorUntilItsLastRetrieval) {
-    std::atomic<bool> lHadPidFile{true};
-    const ZTCFakeAgent lAgent(dir(), {[&](ZTCFakeAgent& arAgent, const ZTCWireBytes& acrRequest) {
-                                  lHadPidFile = lHadPidFile && exists(dir() + "/qrv-sn.pid");
-                                  arAgent.sendFrame(acrRequest[0] == 1 ? makeFullSampleResponse() : scSuccess);
-                              }});
-    const ZTSRun lRun = run({"watch", "--interval", "0.05", "--count", "3", "--targets", scTarget, "--json"});
-    EXPECT_EQ(lRun.mStatus, 0) << lRun.mErrors;
-    EXPECT_TRUE(lHadPidFile);
-    EXPECT_FALSE(exists(dir() + "/qrv-sn.pid"));
-    std::vector<int> lCodes;
-    for (const ZTCWireBytes& lrRequest : lAgent.getRequests()) {
-        lCodes.push_back(lrRequest[0]);
-    }
-    EXPECT_EQ(lCodes, (std::vector<int>{3, 0, 1, 1, 1}));
-    std::istringstream lLines(lRun.mOutput);
-    std::string lLine;
-    int lCount = 0;
-    while (std::getline(lLines, lLine)) {
-        const nlohmann::json lDocument = sParse(lLine);
-        EXPECT_EQ(lDocument["retrieval"], ++lCount);
-        EXPECT_EQ(lDocument["totals"]["records"], 20);
-    }
-    EXPECT_EQ(lCount, 3);
-}
-
-TEST_F(Tavikctl, WatchGoesOnThroughAMissingAgentAndStartsItsSuccessor) {
-    ZTCChildProcess lWatch(setup({"watch", "--interval", "0.05", "--timeout", "0.2"}));
-    waitUntil([&] { return lWatch.standardError().find("no agent") != std::string::npos; }, "the message");
-    EXPECT_EQ(readFile(dir() + "/qrv-sn.pid"), std::to_string(lWatch.getPid()) + "\n");
-    const auto lServe = [](ZTCFakeAgent& arAgent, const ZTCWireBytes& acrRequest) {
-        arAgent.sendFrame(acrRequest[0] == 1 ? makeSampleResponse(0, {}) : scSuccess);
-    };
-    for (const char* lpPid : {"1001\n", "1002\n"}) {
-        writeFile(dir() + "/qrv-tvk.pid", lpPid);
-        const ZTCFakeAgent lAgent(dir(), {lServe});
-        waitUntil([&] { return lAgent.getRequests().size() >= 2; }, "a retrieval");
-        EXPECT_EQ(lAgent.getRequests()[0], encodeStartScope(900));
-        EXPECT_EQ(lAgent.getRequests()[1], encodeGetScopeData());
-    }
-    lWatch.sendSignal(SIGTERM);
-    EXPECT_EQ(lWatch.waitForExit(), 0) << lWatch.standardError();
-    EXPECT_FALSE(exists(dir() + "/qrv-sn.pid"));
-    EXPECT_THAT(lWatch.standardOutput(), HasSubstr("-- retrieval 2\n"));
-}
-
-TEST_F(Tavikctl, ASecondWatchIsRefused) {
-    ZTCChildProcess lWatch(setup({"watch"}));
-    waitUntil([&] { return readFile(dir() + "/qrv-sn.pid") == std::to_string(lWatch.getPid()) + "\n"; },
-              "the pid file");
-    const ZTSRun lSecond = run({"watch"});
-    EXPECT_EQ(lSecond.mStatus, 2);
-    expectOneLine(lSecond.mErrors);
-    EXPECT_THAT(lSecond.mErrors, HasSubstr(std::to_string(lWatch.getPid())));
-    lWatch.sendSignal(SIGINT);
-    EXPECT_EQ(lWatch.waitForExit(), 0);
 }
 
 TEST_F(Tavikctl, HelpAndVersionGoToStandardOutput) {

@@ -15,7 +15,7 @@ start_agent() {
   : >$gRecords
   (cd /tmp/agent && exec "$@" qrv-tvk -D false -l $gLog) >/tmp/agent.out 2>&1 &
   gAgent=$!
-  tavikctl targets "$(colons $gTargetNode),$(colons $gTargetName),0x000002" \
+  tavikctl --wait targets "$(colons $gTargetNode),$(colons $gTargetName),0x000002" \
     "$(colons $gInitiatorNode),$(colons $gInitiatorName),0x000001" >/dev/null && tavikctl start >/dev/null
 }
 

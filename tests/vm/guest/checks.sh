@@ -281,7 +281,7 @@ check_two() { # two agents of one machine see the same and leave each other alon
   (
     export ZT_QRV_SENSOR_DIR=/tmp/second
     qrv-tvk -D false -l /tmp/second/agent.log &
-    tavikctl start
+    tavikctl --wait start
     past_end 0
     wait_until 10 grep -q 'Processing CHECKCOND' /tmp/second/agent.log
     tavikctl shutdown
