@@ -40,10 +40,49 @@ need_packages() {
   apt-get install -q -y --no-install-recommends "${lMissing[@]}"
 }
 
+# show_progress: passes a build's output on. Of ninja's status lines, "[DONE/ALL] ...", it shows on a terminal the last one
+# and elsewhere one every five seconds; everything else, warnings and errors above all, it shows as it comes.
+show_progress() {
+  local lLine lStep lNext=0 lClear=
+  [ -t 1 ] && lClear=$'\r\033[K'
+  while IFS= read -r lLine; do
+    case $lLine in
+      '['[0-9]*/[0-9]*'] '*)
+        lStep=${lLine%%]*}
+        if [ -n "$lClear" ]; then
+          printf '%s   step %s' "$lClear" "${lStep#[}"
+        elif [ $SECONDS -ge $lNext ]; then
+          printf '   step %s\n' "${lStep#[}"
+          lNext=$((SECONDS + 5))
+        fi
+        ;;
+      'ninja: no work to do.' | 'ninja: Entering directory '*) ;;
+      *) printf '%s%s\n' "$lClear" "$lLine" ;;
+    esac
+  done
+  printf '%s' "$lClear"
+}
+
+# build_directory DIRECTORY [TARGET...]: builds what is out of date there, says beforehand how much that is, and shows
+# progress.
+build_directory() {
+  local lDirectory=$1 lSteps lMinutes
+  shift
+  lSteps=$(ninja -C "$lDirectory" -n "$@" 2>/dev/null | grep -c '^\[' || true)
+  # Measured: a step takes about a second of one processor.
+  lMinutes=$(((lSteps / $(nproc) + 59) / 60))
+  case $lSteps in
+    0) echo "   nothing to build" ;;
+    [1-9] | [1-4][0-9]) echo "   $lSteps steps, less than a minute" ;;
+    *) echo "   $lSteps steps, about $lMinutes min" ;;
+  esac
+  ninja -C "$lDirectory" "$@" | show_progress
+}
+
 # configure_and_build PRESET [CMAKE-OPTION...]: into build/PRESET.
 configure_and_build() {
   local lPreset=$1
   shift
-  cmake --preset "$lPreset" "$@"
-  cmake --build --preset "$lPreset" -- --quiet
+  cmake --preset "$lPreset" "$@" >/dev/null
+  build_directory "build/$lPreset"
 }
