@@ -8,6 +8,7 @@ cd "$gRoot"
 # What each step builds with, as Debian's package names.
 gCompilerPackages=(g++ gcc cmake ninja-build)
 gClientPackages=(libcli11-dev nlohmann-json3-dev)
+gSensorPackages=(libsqlite3-dev libtomlplusplus-dev)
 gTestPackages=(libgtest-dev libgmock-dev)
 gBenchPackages=(libbenchmark-dev prometheus-cpp-dev libspdlog-dev python3)
 gClangPackages=(clang libclang-rt-14-dev llvm)
