@@ -240,7 +240,31 @@ typedef void (*KPM_TemperatureCallback)(unsigned board, unsigned first, unsigned
 #define KPM_STATUS_SUCCESS 0u
 #define KPM_STATUS_INFO_5 5u    /* accepted; the library's own remark */
 #define KPM_STATUS_NO_SOURCE 6u /* accepted and never delivered: this library has no source for that kind here */
-#define KPM_STATUS_INFO_7 7u    /* accepted; the library's own remark */
+#define KPM_STATUS_NO_RIGHTS 7u /* accepted; this host does not grant what its source needs (rights, a name space) */
+
+/* ---- Reports ---- */
+
+/* The states of a kind on a board, as a library reports them. */
+#define KPM_STATE_WORKING 1u   /* events of this kind are delivered */
+#define KPM_STATE_NO_SOURCE 2u /* this library has no source for the kind on this board */
+#define KPM_STATE_NO_RIGHTS 3u /* this host does not grant what the source needs; it may come later */
+#define KPM_STATE_FAILED 4u    /* the source is broken */
+
+/*
+ * Reports the state of a kind on a board: on every change, and once before the registration of a kind whose
+ * registration answers with a handle alone. `category` and `subcategory` are the pair that the kind is delivered as
+ * (RSCN 1 and 0x20, link 8 and 0x02, temperature 8 and 0x04). `reason` says why in a few words that people read, such
+ * as "needs CAP_NET_ADMIN"; null or empty where there is nothing to say. Longer than 111 bytes it is cut.
+ */
+typedef void (*KPM_StateFunction)(void* context, uint32_t board, uint32_t category, uint32_t subcategory,
+                                  uint32_t state, const char* reason);
+
+/*
+ * Reports how much the library has lost so far, under a name that people read, such as "trace events": the running
+ * total since Init, on every change but at most some times a second. A total that is smaller than the last one is
+ * ignored. At most 32 names; a name longer than 55 bytes is cut.
+ */
+typedef void (*KPM_LossFunction)(void* context, const char* name, uint64_t total);
 
 /* ---- The table of functions ---- */
 
@@ -251,6 +275,9 @@ typedef void (*KPM_TemperatureCallback)(unsigned board, unsigned first, unsigned
 
 /* The size of the structure up to and including SetLog. */
 #define KPM_FUNCTION_LIST_SIZE_LOG 88u
+
+/* The size of the structure up to and including SetReport. */
+#define KPM_FUNCTION_LIST_SIZE_REPORT 96u
 
 /* Levels of a line for the agent's log. The agent counts a level that it does not know as a warning. */
 #define KPM_LOG_ERROR 1u
@@ -317,6 +344,12 @@ typedef struct KPM_FunctionList {
     /* Hands the library the agent's log. Called once, after KPM_GetFunctionList and before Init. `log` may be called
        until the library is unloaded. */
     void (*SetLog)(KPM_LogFunction log);
+
+    /* Hands the library the agent's functions for reports, and the context that each of their calls gets. Called once,
+       after SetLog and before Init. Both may be called from any thread, also from inside the library's entries and with
+       its locks held, until the library is unloaded. They copy the texts, never wait for long, never throw and never
+       call back into the library. */
+    void (*SetReport)(void* context, KPM_StateFunction state, KPM_LossFunction loss);
 } KPM_FunctionList;
 
 /*

@@ -65,7 +65,7 @@ const ZTSBoardRegistration* sFindBoardRegistration(unsigned char aSubcategory) {
 
 bool sIsAccepted(unsigned int aStatus) {
     return aStatus == KPM_STATUS_SUCCESS || aStatus == KPM_STATUS_INFO_5 || aStatus == KPM_STATUS_NO_SOURCE ||
-           aStatus == KPM_STATUS_INFO_7;
+           aStatus == KPM_STATUS_NO_RIGHTS;
 }
 
 }  // namespace

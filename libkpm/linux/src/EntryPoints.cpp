@@ -93,6 +93,7 @@ const KPM_FunctionList* getLinuxFunctionList() {
                                              ZTCLinuxEntries::unregisterForPort,
                                              ZTCLinuxEntries::registerForBoard,
                                              ZTCLinuxEntries::unregisterForBoard,
-                                             sSetLog};
+                                             sSetLog,
+                                             nullptr};
     return &scList;
 }

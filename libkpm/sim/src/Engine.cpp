@@ -16,7 +16,7 @@ static bool sIsSameName(const HBA_wwn& acrOne, const HBA_wwn& acrOther) {
 
 static bool sIsAccepted(std::uint32_t aStatus) {
     return aStatus == KPM_STATUS_SUCCESS || aStatus == KPM_STATUS_INFO_5 || aStatus == KPM_STATUS_NO_SOURCE ||
-           aStatus == KPM_STATUS_INFO_7;
+           aStatus == KPM_STATUS_NO_RIGHTS;
 }
 
 /// Memory that lives for one callback: what a callback is given stands at the end of its block, at an odd address

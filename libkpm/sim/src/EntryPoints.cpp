@@ -140,6 +140,7 @@ const KPM_FunctionList* getSimFunctionList() {
                                              ZTCSimEntries::unregisterForPort,
                                              ZTCSimEntries::registerForBoard,
                                              ZTCSimEntries::unregisterForBoard,
+                                             nullptr,
                                              nullptr};
     return &scList;
 }

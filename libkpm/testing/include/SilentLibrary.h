@@ -33,7 +33,8 @@ constexpr KPM_FunctionList makeSilentLibrary(std::uint32_t (*apGetNumberOfAdapte
             .ZtapiUnregEvent = [](std::uint32_t, HBA_wwn, std::uint32_t) -> std::uint32_t { return 0; },
             .KpmRegEvent = apKpmRegEvent,
             .KpmUnregEvent = [](std::uint32_t, std::uint32_t) -> std::uint32_t { return 0; },
-            .SetLog = nullptr};
+            .SetLog = nullptr,
+            .SetReport = nullptr};
 }
 
 #endif

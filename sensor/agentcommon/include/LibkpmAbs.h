@@ -2,6 +2,8 @@
 #ifndef SENSOR_AGENTCOMMON_LIBKPMABS_H
 #define SENSOR_AGENTCOMMON_LIBKPMABS_H
 
+#include <cstdint>
+
 #include "common/include/Exception.h"
 #include "common/include/Pointer.h"
 #include "libkpm/include/libkpm.h"
@@ -15,6 +17,20 @@ ZT_EXCEPTION(ZTCLibkpmFailedEx, ZTCOpsException, "Libkpm operation failed", ZT_S
 inline constexpr const char* gcLibkpmPathVariable = "ZT_LIBKPM_PATH";
 inline constexpr const char* gcDefaultLibkpm = "libkpm.so.1";
 
+/// Takes the reports of the adapters' library. Called on any thread, also from inside of an operation of ZTCLibkpmAbs;
+/// it does not call back into the library and lets nothing out. The texts are never null and live for the call alone.
+class ZTCLibkpmReports {
+public:
+    virtual ~ZTCLibkpmReports() = default;
+
+    /// The state of a kind, named by the pair it is delivered as, is one of KPM_STATE_...; an unknown one is possible.
+    virtual void reportState(std::uint32_t aBoardId, std::uint32_t aCategory, std::uint32_t aSubcategory,
+                             std::uint32_t aState, const char* apReason) noexcept = 0;
+
+    /// The running total of a named loss.
+    virtual void reportLoss(const char* apName, std::uint64_t aTotal) noexcept = 0;
+};
+
 /// Used by one thread at a time: the main thread until the threads start, then the command thread. Every operation but
 /// LIBKPM_LoadLibrary and LIBKPM_FreeLibrary throws ZTCInvalidEx while no library is loaded. The destructor unloads
 /// nothing: at process exit the library's threads may still be running.
@@ -26,8 +42,9 @@ public:
     ZTCLibkpmAbs& operator=(const ZTCLibkpmAbs&) = delete;
 
     /// Throws ZTCNotFoundEx, after logging the reason, where the library is missing, disabled, without its function, of
-    /// another version, or with an incomplete table of functions. A library that takes a log function is given one.
-    void LIBKPM_LoadLibrary();
+    /// another version, or with an incomplete table of functions. A library that takes a log function is given one; so
+    /// is, with apReports, one that takes functions for reports. apReports must outlive the library, its threads too.
+    void LIBKPM_LoadLibrary(ZTCLibkpmReports* apReports = nullptr);
 
     /// Unloads the library, which must have been closed.
     void LIBKPM_FreeLibrary();

@@ -61,6 +61,17 @@ void sWriteLibraryLine(std::uint32_t aLevel, const char* apText) {
     }
 }
 
+/// The library's way to the receiver of its reports, which is their context.
+void sReportState(void* apContext, std::uint32_t aBoard, std::uint32_t aCategory, std::uint32_t aSubcategory,
+                  std::uint32_t aState, const char* apReason) {
+    static_cast<ZTCLibkpmReports*>(apContext)->reportState(aBoard, aCategory, aSubcategory, aState,
+                                                           apReason != nullptr ? apReason : "");
+}
+
+void sReportLoss(void* apContext, const char* apName, std::uint64_t aTotal) {
+    static_cast<ZTCLibkpmReports*>(apContext)->reportLoss(apName != nullptr ? apName : "", aTotal);
+}
+
 HBA_wwn sMakeHbaWwn(const ZTCPointer<ZTCWorldWideName>& acrName) {
     HBA_wwn lName;
     std::memcpy(lName.wwn, acrName->getBytes(), sizeof lName.wwn);
@@ -69,7 +80,7 @@ HBA_wwn sMakeHbaWwn(const ZTCPointer<ZTCWorldWideName>& acrName) {
 
 }  // namespace
 
-void ZTCLibkpmAbs::LIBKPM_LoadLibrary() {
+void ZTCLibkpmAbs::LIBKPM_LoadLibrary(ZTCLibkpmReports* apReports) {
     const char* lpPath = ClibGetenv(gcLibkpmPathVariable, nullptr);
     if (lpPath == nullptr) {
         lpPath = gcDefaultLibkpm;
@@ -105,6 +116,10 @@ void ZTCLibkpmAbs::LIBKPM_LoadLibrary() {
     }
     if (lpFunctions->size >= KPM_FUNCTION_LIST_SIZE_LOG && lpFunctions->SetLog != nullptr) {
         lpFunctions->SetLog(&sWriteLibraryLine);
+    }
+    if (apReports != nullptr && lpFunctions->size >= KPM_FUNCTION_LIST_SIZE_REPORT &&
+        lpFunctions->SetReport != nullptr) {
+        lpFunctions->SetReport(apReports, &sReportState, &sReportLoss);
     }
     mpHandle = lpHandle;
     mpFunctions = lpFunctions;

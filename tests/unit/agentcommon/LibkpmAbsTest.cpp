@@ -12,6 +12,20 @@
 
 namespace {
 
+class ZTCReportsDouble : public ZTCLibkpmReports {
+public:
+    void reportState(std::uint32_t aBoardId, std::uint32_t aCategory, std::uint32_t aSubcategory, std::uint32_t aState,
+                     const char* apReason) noexcept override {
+        mCalls.push_back("state " + std::to_string(aBoardId) + " " + std::to_string(aCategory) + "/" +
+                         std::to_string(aSubcategory) + " " + std::to_string(aState) + " " + apReason);
+    }
+    void reportLoss(const char* apName, std::uint64_t aTotal) noexcept override {
+        mCalls.push_back(std::string("loss ") + apName + " " + std::to_string(aTotal));
+    }
+
+    std::vector<std::string> mCalls;
+};
+
 class LibkpmAbs : public testing::Test {
 protected:
     LibkpmAbs() : mLog(mDirectory.path("log")), mDouble(2) {}
@@ -33,6 +47,7 @@ protected:
     ZTCTestLog mLog;
     ZTCAdaptersLibraryDouble mDouble;
     ZTCLibkpmAbs mLibkpm;
+    ZTCReportsDouble mReports;
 };
 
 ZTCPointer<ZTCWorldWideName> sMakeName(const ZTSWwn& acrName) {
@@ -149,6 +164,44 @@ TEST_F(LibkpmAbs, ARefusedLibraryIsGivenNoLog) {
     mDouble.mShape = [](KPM_FunctionList& arList) { arList.Close = nullptr; };
     EXPECT_THROW(mLibkpm.LIBKPM_LoadLibrary(), ZTCNotFoundEx);
     EXPECT_TRUE(mDouble.callsOf("SetLog").empty());
+}
+
+TEST_F(LibkpmAbs, ALibraryThatTakesReportsIsGivenTheirFunctionsAfterTheLogAndBeforeInit) {
+    mDouble.mTakesLog = true;
+    mDouble.mTakesReport = true;
+    mLibkpm.LIBKPM_LoadLibrary(&mReports);
+    mLibkpm.LIBKPM_Init();
+    EXPECT_EQ((std::vector<std::string>{"KPM_GetFunctionList 1", "SetLog", "SetReport", "Init"}), mDouble.calls());
+    mLibkpm.LIBKPM_FreeLibrary();
+}
+
+TEST_F(LibkpmAbs, ALibraryIsGivenNoFunctionsForReportsWhereItHasNoEntryForThemOrNobodyTakesThem) {
+    mDouble.mTakesLog = true;
+    mLibkpm.LIBKPM_LoadLibrary(&mReports);
+    mLibkpm.LIBKPM_FreeLibrary();
+    mDouble.mTakesReport = true;
+    mLibkpm.LIBKPM_LoadLibrary();
+    mLibkpm.LIBKPM_FreeLibrary();
+    for (const std::uint32_t lSize : {80u, 88u, 95u}) {
+        mDouble.mShape = [lSize](KPM_FunctionList& arList) { arList.size = lSize; };
+        mLibkpm.LIBKPM_LoadLibrary(&mReports);
+        mLibkpm.LIBKPM_FreeLibrary();
+    }
+    EXPECT_TRUE(mDouble.callsOf("SetReport").empty());
+}
+
+TEST_F(LibkpmAbs, TheLibrarysReportsReachTheirReceiver) {
+    mDouble.mTakesReport = true;
+    mLibkpm.LIBKPM_LoadLibrary(&mReports);
+    ASSERT_NE(nullptr, mDouble.mpReportState);
+    mDouble.mpReportState(mDouble.mpReportContext, 3, 1, 0x20, KPM_STATE_NO_RIGHTS, "needs a right");
+    mDouble.mpReportState(mDouble.mpReportContext, 3, 1, 0x20, KPM_STATE_WORKING, nullptr);
+    mDouble.mpReportLoss(mDouble.mpReportContext, "messages", 0x100000000);
+    mDouble.mpReportLoss(mDouble.mpReportContext, nullptr, 1);
+    EXPECT_EQ((std::vector<std::string>{"state 3 1/32 3 needs a right", "state 3 1/32 1 ", "loss messages 4294967296",
+                                        "loss  1"}),
+              mReports.mCalls);
+    mLibkpm.LIBKPM_FreeLibrary();
 }
 
 TEST_F(LibkpmAbs, TheLibrarysLinesStandInTheLogAtTheirLevels) {

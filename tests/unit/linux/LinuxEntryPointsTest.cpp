@@ -33,7 +33,7 @@ protected:
 
 TEST_F(LinuxEntryPoints, TheTableIsWhole) {
     EXPECT_EQ(mrList.version, 1u);
-    EXPECT_EQ(mrList.size, KPM_FUNCTION_LIST_SIZE_LOG);
+    EXPECT_EQ(mrList.size, KPM_FUNCTION_LIST_SIZE_REPORT);
     EXPECT_NE(mrList.KpmUnregEvent, nullptr);
     EXPECT_NE(mrList.SetLog, nullptr);
 }

@@ -262,7 +262,7 @@ TEST_F(EventRegistration, ABoardKindWithoutAHandleEndsTheStartThereWithErrorZero
         mLibrary.forgetCalls();
         mLibrary.mRegisterHandles = {{sKey(1, lcrKind), 0}};
         // An earlier kind's status is not taken for that of a board registration.
-        mLibrary.mRegisterStatuses[{1, 8, 0x01}] = KPM_STATUS_INFO_7;
+        mLibrary.mRegisterStatuses[{1, 8, 0x01}] = KPM_STATUS_NO_RIGHTS;
         const ZTSBoardKind& lcrBoardKind = sBoardKind(lcrKind.mRegisteredSubcategory);
         const bool lIsWarning = lcrBoardKind.mType == FC_REG_TEMPERATURE_EVENT;
         EXPECT_EQ(lIsWarning ? gcSuccessHex : gcNotAllowedHex, startHex());

@@ -77,6 +77,9 @@ std::uint32_t ZTCAdaptersLibraryDouble::getFunctionList(std::uint32_t aVersion, 
     if (!mTakesLog) {
         mList.SetLog = nullptr;
     }
+    if (!mTakesReport) {
+        mList.SetReport = nullptr;
+    }
     if (mShape) {
         mShape(mList);
     }
@@ -133,7 +136,7 @@ std::uint32_t ZTCAdaptersLibraryDouble::ztapiRegEvent(std::uint32_t aBoard, HBA_
         mBeforeRegistered(lKey);
     }
     const std::uint32_t lStatus = sFind(mRegisterStatuses, lKey, KPM_STATUS_SUCCESS);
-    if (lStatus == KPM_STATUS_SUCCESS || (lStatus >= KPM_STATUS_INFO_5 && lStatus <= KPM_STATUS_INFO_7)) {
+    if (lStatus == KPM_STATUS_SUCCESS || (lStatus >= KPM_STATUS_INFO_5 && lStatus <= KPM_STATUS_NO_RIGHTS)) {
         *apHandle = makeHandle(lKey);
     }
     return lStatus;
@@ -166,6 +169,13 @@ std::uint32_t ZTCAdaptersLibraryDouble::kpmUnregEvent(std::uint32_t aBoard, std:
 void ZTCAdaptersLibraryDouble::setLog(KPM_LogFunction apLog) {
     mCalls.emplace_back("SetLog");
     mpLog = apLog;
+}
+
+void ZTCAdaptersLibraryDouble::setReport(void* apContext, KPM_StateFunction apState, KPM_LossFunction apLoss) {
+    mCalls.emplace_back("SetReport");
+    mpReportContext = apContext;
+    mpReportState = apState;
+    mpReportLoss = apLoss;
 }
 
 std::uint32_t ZTCAdaptersLibraryDouble::makeHandle(const ZTCRegistrationKey& acrKey) {

@@ -43,6 +43,7 @@ public:
     std::uint32_t mFunctionListStatus = 0;
     bool mGivesTable = true;                        ///< false: the status is given, but no table
     bool mTakesLog = false;                         ///< whether the table has the entry for the log
+    bool mTakesReport = false;                      ///< whether the table has the entry for the reports
     std::function<void(KPM_FunctionList&)> mShape;  ///< changes the table before it is given
     std::uint32_t mInitStatus = 0;
     std::uint32_t mNumberOfAdapters;
@@ -67,6 +68,9 @@ public:
     std::map<ZTCRegistrationKey, void*> mContexts;
     std::map<ZTCRegistrationKey, std::uint32_t> mHandles;
     KPM_LogFunction mpLog = nullptr;
+    void* mpReportContext = nullptr;
+    KPM_StateFunction mpReportState = nullptr;
+    KPM_LossFunction mpReportLoss = nullptr;
 
 private:
     std::uint32_t getFunctionList(std::uint32_t aVersion, const KPM_FunctionList& acrList,
@@ -84,6 +88,7 @@ private:
                               KPM_EventCallback apCallback) override;
     std::uint32_t kpmUnregEvent(std::uint32_t aBoard, std::uint32_t aHandle) override;
     void setLog(KPM_LogFunction apLog) override;
+    void setReport(void* apContext, KPM_StateFunction apState, KPM_LossFunction apLoss) override;
 
     std::uint32_t makeHandle(const ZTCRegistrationKey& acrKey);
 

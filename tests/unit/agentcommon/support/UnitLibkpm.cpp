@@ -36,6 +36,10 @@ void sSetLog(KPM_LogFunction apLog) {
     spBehaviour->setLog(apLog);
 }
 
+void sSetReport(void* apContext, KPM_StateFunction apState, KPM_LossFunction apLoss) {
+    spBehaviour->setReport(apContext, apState, apLoss);
+}
+
 const KPM_FunctionList scList = {KPM_INTERFACE_VERSION,
                                  sizeof(KPM_FunctionList),
                                  sInit,
@@ -47,7 +51,8 @@ const KPM_FunctionList scList = {KPM_INTERFACE_VERSION,
                                  sZtapiUnregEvent,
                                  sKpmRegEvent,
                                  sKpmUnregEvent,
-                                 sSetLog};
+                                 sSetLog,
+                                 sSetReport};
 
 }  // namespace
 

@@ -26,6 +26,7 @@ public:
                                       std::uint32_t aSize, KPM_EventCallback apCallback) = 0;
     virtual std::uint32_t kpmUnregEvent(std::uint32_t aBoard, std::uint32_t aHandle) = 0;
     virtual void setLog(KPM_LogFunction apLog) = 0;
+    virtual void setReport(void* apContext, KPM_StateFunction apState, KPM_LossFunction apLoss) = 0;
 
 protected:
     ~ZTCUnitLibkpmBehaviour() = default;
