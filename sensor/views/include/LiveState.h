@@ -1,0 +1,175 @@
+/// What a running sensor says of itself, as the collector sends it and `tavik` reads it.
+///
+/// The collector answers `{"request":"status"}` on the control socket with one line: the JSON object below. Every
+/// member may be missing or null: it is then not known, which is not the same as zero or empty. A member of a wrong
+/// type counts as not known and is named in `mProblems`. Members that this page does not name are passed over. Times
+/// are texts as of RFC 3339 with an offset and up to six digits of a fraction. WWNs are texts with colons.
+///
+///     {"schema": "tavik.live/1", "storeId": "5f…", "now": "2026-11-21T10:04:12.000000+01:00",
+///      "keeper": {"pid": 811, "state": "running", "since": "…", "nextStart": null},
+///      "agent": {"running": true, "pid": 813, "generation": "…", "since": "…", "restarts": 0, "endReason": null,
+///                "problem": null, "adapters": 2, "adaptersAtStart": 2,
+///                "heldBytes": 0, "heldRecords": 0, "limitBytes": 262144},
+///      "collector": {"pid": 812, "since": "…", "lastAsked": "…", "lastRetrieval": "…", "lastEvent": "…",
+///                    "lastEventKind": "rscn", "disk": "ok", "diskProblem": null, "waitingFrames": 0,
+///                    "waitingBytes": 0},
+///      "adapters": [{"wwpn": "10:…:01", "wwnn": "20:…:01", "host": "host7", "portState": "Online", "speed": "16
+///      Gbit"}], "kinds": [{"initiator": {"wwpn": "10:…:01", "wwnn": "20:…:01", "host": "host7"},
+///                 "kinds": {"rscn": "listening", "link": "no_rights"}, "words": {"link": "needs CAP_NET_ADMIN"}}],
+///      "ledger": [{"initiator": {…}, "kind": "rscn", "received": 9, "refused": {"total-limit": 0}, "consolidated": 9,
+///                  "handedOver": 9, "held": 0, "dropped": 0}],
+///      "losses": {"since": "…", "refused": {"total-limit": 0}, "dropped": 0, "library": [{"name": "…", "count": 0}]},
+///      "paths": "96 LUNs, 8 paths each, all running",
+///      "troubles": [{"id": "path-lost", "title": "PATH LOST", "subject": "array7 ctrl-B  50:…:34  from host8",
+///                    "status": ["…"], "action": ["…"], "see": "tavik explain 118"}]}
+///
+/// - `keeper.state`: `starting`, `running`, `waiting-for-adapters`, `waiting-for-library`, `waiting-to-restart` or
+///   `stopping`. `since`: when that state began. `nextStart`: when the agent is started next, where that is known.
+/// - `agent` is the running agent, or the last one. `endReason` is why the last one ended, in the words of the status
+///   page: `shut-down`, `signal`, `no-library`, `no-adapters`, `no-event-support`, `sensor-gone`, `other`; null while
+///   one runs. `problem` is one line for people on why it is down. `restarts`: starts since the keeper's own start,
+///   less the first.
+/// - `collector.disk`: `ok`, `full` or `read-only`; anything but `ok` means that it does not ask. `diskProblem` is one
+///   line that names the folder and the reason. `waitingFrames` and `waitingBytes` are in the spool, not yet in the
+///   history.
+/// - `kinds`: an entry an adapter. `words` are the adapters' library's own, for kinds it has said something of.
+/// - `ledger`: the totals of all agents that the database has seen, the running one's up to now. Where it is missing
+/// the
+///   reader takes the rows that the history holds.
+/// - `losses`: what was refused or dropped in the last 24 hours, as far back as `since` where the collector knows less.
+/// - `paths` and `troubles` come with the sensor's topology: null until then. An empty `troubles` means that the SAN
+/// was
+///   judged and has none.
+///
+/// `{"request":"mark","name":"before update"}` is answered by `{"mark":"before update","time":"…"}` once it is stored.
+/// A request that cannot be served is answered by `{"error":"…"}`, one line for people.
+#ifndef SENSOR_VIEWS_INCLUDE_LIVESTATE_H
+#define SENSOR_VIEWS_INCLUDE_LIVESTATE_H
+
+#include <cstdint>
+#include <map>
+#include <nlohmann/json_fwd.hpp>
+#include <optional>
+#include <string>
+#include <vector>
+
+#include "sensor/store/include/Episode.h"
+#include "sensor/store/include/HistoryTime.h"
+
+enum ZTEKeeperState : std::uint8_t {
+    ZTKP_Starting,
+    ZTKP_Running,
+    ZTKP_WaitingForAdapters,
+    ZTKP_WaitingForLibrary,
+    ZTKP_WaitingToRestart,
+    ZTKP_Stopping,
+    ZTKP_Count
+};
+
+/// The text in JSON: "starting", "running", and so on.
+const char* getKeeperStateName(ZTEKeeperState aState);
+
+enum ZTEDiskState : std::uint8_t { ZTDK_Ok, ZTDK_Full, ZTDK_ReadOnly, ZTDK_Count };
+
+/// The text in JSON: "ok", "full" or "read-only".
+const char* getDiskStateName(ZTEDiskState aState);
+
+struct ZTSLiveKeeper {
+    std::optional<std::uint64_t> mPid;
+    std::optional<ZTEKeeperState> mState;
+    std::optional<ZTCHistoryTime> mSince;
+    std::optional<ZTCHistoryTime> mNextStart;
+};
+
+struct ZTSLiveAgent {
+    std::optional<bool> mIsRunning;
+    std::optional<std::uint64_t> mPid;
+    std::string mGeneration;
+    std::optional<ZTCHistoryTime> mSince;
+    std::optional<std::uint64_t> mRestarts;
+    std::string mEndReason;
+    std::string mProblem;
+    std::optional<std::uint64_t> mAdapters;
+    std::optional<std::uint64_t> mAdaptersAtStart;
+    std::optional<std::uint64_t> mHeldBytes;
+    std::optional<std::uint64_t> mHeldRecords;
+    std::optional<std::uint64_t> mLimitBytes;
+};
+
+struct ZTSLiveCollector {
+    std::optional<std::uint64_t> mPid;
+    std::optional<ZTCHistoryTime> mSince;
+    std::optional<ZTCHistoryTime> mLastAsked;
+    std::optional<ZTCHistoryTime> mLastRetrieval;
+    std::optional<ZTCHistoryTime> mLastEvent;
+    std::string mLastEventKind;
+    std::optional<ZTEDiskState> mDisk;
+    std::string mDiskProblem;
+    std::optional<std::uint64_t> mWaitingFrames;
+    std::optional<std::uint64_t> mWaitingBytes;
+};
+
+struct ZTSLiveAdapter {
+    ZTSInitiator mInitiator;
+    std::string mPortState;  ///< "Online"; empty: not known
+    std::string mSpeed;
+};
+
+struct ZTSLiveKinds {
+    ZTSInitiator mInitiator;
+    std::map<std::string, std::string> mStates;  ///< kind's name to the name of its state
+    std::map<std::string, std::string> mWords;   ///< kind's name to the library's words
+};
+
+struct ZTSLiveLedgerRow {
+    ZTSInitiator mInitiator;
+    std::string mKind;
+    std::optional<std::uint64_t> mReceived;
+    std::map<std::string, std::uint64_t> mRefused;  ///< by reason
+    std::optional<std::uint64_t> mConsolidated;
+    std::optional<std::uint64_t> mHandedOver;
+    std::optional<std::uint64_t> mHeld;
+    std::optional<std::uint64_t> mDropped;
+};
+
+struct ZTSLibraryLoss {
+    std::string mName;
+    std::uint64_t mCount = 0;
+};
+
+struct ZTSLiveLosses {
+    std::optional<ZTCHistoryTime> mSince;
+    std::map<std::string, std::uint64_t> mRefused;  ///< by reason
+    std::optional<std::uint64_t> mDropped;
+    std::vector<ZTSLibraryLoss> mLibrary;
+};
+
+/// A trouble with what to say of it. The lines are for people.
+struct ZTSTroubleText {
+    std::string mId;       ///< stable, for programs: "path-lost"
+    std::string mTitle;    ///< "PATH LOST"; empty for a trouble of Tavik itself
+    std::string mSubject;  ///< behind the title
+    std::vector<std::string> mStatus;
+    std::vector<std::string> mAction;
+    std::string mSee;
+};
+
+struct ZTSLiveState {
+    std::string mStoreId;
+    std::optional<ZTCHistoryTime> mNow;
+    ZTSLiveKeeper mKeeper;
+    ZTSLiveAgent mAgent;
+    ZTSLiveCollector mCollector;
+    std::optional<std::vector<ZTSLiveAdapter>> mAdapters;
+    std::optional<std::vector<ZTSLiveKinds>> mKinds;
+    std::optional<std::vector<ZTSLiveLedgerRow>> mLedger;
+    std::optional<ZTSLiveLosses> mLosses;
+    std::string mPaths;
+    std::optional<std::vector<ZTSTroubleText>> mTroubles;
+    std::vector<std::string> mProblems;  ///< members that could not be read, one line each
+};
+
+/// Never throws for what the document holds.
+ZTSLiveState readLiveState(const nlohmann::json& acrDocument);
+
+#endif
