@@ -1,0 +1,49 @@
+/// Filters as people and programs write them: texts of the command line, or parameters of a request.
+#ifndef SENSOR_VIEWS_INCLUDE_FILTERTEXT_H
+#define SENSOR_VIEWS_INCLUDE_FILTERTEXT_H
+
+#include <optional>
+#include <stdexcept>
+#include <string>
+#include <vector>
+
+#include "sensor/store/include/History.h"
+#include "sensor/views/include/NameBook.h"
+
+/// A text that cannot be a filter: wrong use. One line that names the option, the value and what is wanted.
+class ZTCBadFilterEx : public std::runtime_error {
+public:
+    using std::runtime_error::runtime_error;
+};
+
+struct ZTSFilterTexts {
+    std::string mSince;  ///< empty: not given
+    std::string mUntil;
+    std::vector<std::string> mKinds;
+    std::vector<std::string> mPorts;
+    std::vector<std::string> mInitiators;
+    std::vector<std::string> mLuns;
+    std::string mLimit;
+    bool mIsOpenOnly = false;
+};
+
+/// The point in time that a text stands for: a time, a duration back from now ("90s", "10m", "24h", "30d"), or the name
+/// of a mark. @param acrOption  named in the error. Throws ZTCBadFilterEx.
+ZTCHistoryTime readPoint(const std::string& acrText, const std::string& acrOption, const std::vector<ZTSMark>& acrMarks,
+                         ZTCHistoryTime aNow);
+
+/// Whether a text is read as a time or a duration, so that no mark can have it as its name.
+bool isTimeOrDuration(const std::string& acrText);
+
+/// Checks the kinds, LUNs and the limit, which need no history: wrong use is reported also where there is none.
+/// Throws ZTCBadFilterEx.
+void checkFilter(const ZTSFilterTexts& acrTexts);
+
+/// @param aDefaultLimit  where none is given; 0: all. Throws ZTCBadFilterEx.
+ZTSHistoryFilter readFilter(const ZTSFilterTexts& acrTexts, const ZTCNameBook& acrNames,
+                            const std::vector<ZTSMark>& acrMarks, ZTCHistoryTime aNow, std::uint64_t aDefaultLimit);
+
+/// "plogi, prlo, ...": for messages.
+std::string listKinds();
+
+#endif

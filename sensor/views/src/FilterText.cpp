@@ -1,0 +1,141 @@
+#include "sensor/views/include/FilterText.h"
+
+#include <algorithm>
+#include <charconv>
+
+#include "sensor/agentcommon/include/ScopeEventKinds.h"
+#include "sensor/views/include/TextTable.h"
+#include "sensor/views/include/TimeText.h"
+
+[[noreturn]] static void sFail(const std::string& acrOption, const std::string& acrText, const std::string& acrWanted) {
+    throw ZTCBadFilterEx(acrOption + " \"" + escapeControls(acrText) + "\" is not " + acrWanted);
+}
+
+static std::optional<std::uint64_t> sParseNumber(const std::string& acrText, std::uint64_t aMost) {
+    std::uint64_t lNumber = 0;
+    const char* const lpEnd = acrText.data() + acrText.size();
+    const auto [lpStop, lError] = std::from_chars(acrText.data(), lpEnd, lNumber);
+    return lError == std::errc() && lpStop == lpEnd && lNumber <= aMost ? std::optional(lNumber) : std::nullopt;
+}
+
+/// "90s", "10m", "24h", "30d", or a number of seconds.
+static std::optional<std::chrono::microseconds> sParseSpan(const std::string& acrText) {
+    static constexpr std::uint64_t scMost = 100ULL * 365 * 86400;
+    static constexpr std::string_view scUnits = "smhd";
+    static constexpr std::array<std::uint64_t, 4> scSeconds{1, 60, 3600, 86400};
+    const std::size_t lUnit = acrText.empty() ? std::string_view::npos : scUnits.find(acrText.back());
+    const bool lHasUnit = lUnit != std::string_view::npos;
+    const auto lNumber = sParseNumber(lHasUnit ? acrText.substr(0, acrText.size() - 1) : acrText, scMost);
+    if (!lNumber || *lNumber > scMost / (lHasUnit ? scSeconds.at(lUnit) : 1)) {
+        return std::nullopt;
+    }
+    return std::chrono::seconds(*lNumber * (lHasUnit ? scSeconds.at(lUnit) : 1));
+}
+
+bool isTimeOrDuration(const std::string& acrText) {
+    return sParseSpan(acrText) || parseLocalTime(acrText, getHistoryTime());
+}
+
+ZTCHistoryTime readPoint(const std::string& acrText, const std::string& acrOption, const std::vector<ZTSMark>& acrMarks,
+                         ZTCHistoryTime aNow) {
+    if (const auto lSpan = sParseSpan(acrText)) {
+        return aNow - *lSpan;
+    }
+    if (const auto lTime = parseLocalTime(acrText, aNow)) {
+        return *lTime;
+    }
+    const auto lMark = std::find_if(acrMarks.begin(), acrMarks.end(),
+                                    [&acrText](const ZTSMark& acrMark) { return acrMark.mName == acrText; });
+    if (lMark == acrMarks.end()) {
+        sFail(acrOption, acrText,
+              "a time (\"2026-11-21 10:04\", \"10:04\"), a duration back from now (\"90s\", \"10m\", \"24h\", \"30d\") "
+              "or "
+              "the name of a mark");
+    }
+    return lMark->mTime;
+}
+
+std::string listKinds() {
+    std::string lText;
+    for (const ZTSScopeEventKind& lrKind : gcScopeEventKinds) {
+        lText += (lText.empty() ? "" : ", ") + std::string(lrKind.mpName);
+    }
+    return lText;
+}
+
+static constexpr std::uint64_t scMostLimit = 1'000'000'000'000;
+
+static std::uint64_t sReadLimit(const std::string& acrText) {
+    const auto lLimit = sParseNumber(acrText, scMostLimit);
+    if (!lLimit) {
+        sFail("--limit", acrText, "a number from 0 (all) to 1000000000000");
+    }
+    return *lLimit;
+}
+
+static void sReadLun(const std::string& acrText, ZTSHistoryFilter& arFilter) {
+    if (acrText == "all") {
+        arFilter.mIsAllLuns = true;
+        return;
+    }
+    const auto lLun = sParseNumber(acrText, 0xFFFFFFFEU);
+    if (!lLun) {
+        sFail("--lun", acrText, "a number or \"all\"");
+    }
+    arFilter.mLuns.push_back(static_cast<std::uint32_t>(*lLun));
+}
+
+static ZTCKindKey sReadKind(const std::string& acrText) {
+    const auto lKind = findKind(acrText);
+    if (!lKind) {
+        sFail("--kind", acrText, "one of " + listKinds());
+    }
+    return *lKind;
+}
+
+void checkFilter(const ZTSFilterTexts& acrTexts) {
+    ZTSHistoryFilter lFilter;
+    for (const std::string& lrKind : acrTexts.mKinds) {
+        sReadKind(lrKind);
+    }
+    for (const std::string& lrLun : acrTexts.mLuns) {
+        sReadLun(lrLun, lFilter);
+    }
+    if (!acrTexts.mLimit.empty()) {
+        sReadLimit(acrTexts.mLimit);
+    }
+}
+
+ZTSHistoryFilter readFilter(const ZTSFilterTexts& acrTexts, const ZTCNameBook& acrNames,
+                            const std::vector<ZTSMark>& acrMarks, ZTCHistoryTime aNow, std::uint64_t aDefaultLimit) {
+    ZTSHistoryFilter lFilter;
+    if (!acrTexts.mSince.empty()) {
+        lFilter.mSince = readPoint(acrTexts.mSince, "--since", acrMarks, aNow);
+    }
+    if (!acrTexts.mUntil.empty()) {
+        lFilter.mUntil = readPoint(acrTexts.mUntil, "--until", acrMarks, aNow);
+    }
+    for (const std::string& lrKind : acrTexts.mKinds) {
+        lFilter.mKinds.push_back(sReadKind(lrKind));
+    }
+    for (const std::string& lrPort : acrTexts.mPorts) {
+        const std::vector<ZTSFcName> lWwpns = acrNames.findRemotePorts(lrPort);
+        if (lWwpns.empty()) {
+            sFail("--port", lrPort, "a WWPN, nor a name of a remote port (see tavik ports)");
+        }
+        lFilter.mPorts.insert(lFilter.mPorts.end(), lWwpns.begin(), lWwpns.end());
+    }
+    for (const std::string& lrInitiator : acrTexts.mInitiators) {
+        const std::vector<ZTSFcName> lWwpns = acrNames.findInitiators(lrInitiator);
+        if (lWwpns.empty()) {
+            sFail("--initiator", lrInitiator, "a WWPN, nor a name or hostN of an adapter port (see tavik status)");
+        }
+        lFilter.mInitiators.insert(lFilter.mInitiators.end(), lWwpns.begin(), lWwpns.end());
+    }
+    for (const std::string& lrLun : acrTexts.mLuns) {
+        sReadLun(lrLun, lFilter);
+    }
+    lFilter.mIsOpenOnly = acrTexts.mIsOpenOnly;
+    lFilter.mLimit = acrTexts.mLimit.empty() ? aDefaultLimit : sReadLimit(acrTexts.mLimit);
+    return lFilter;
+}

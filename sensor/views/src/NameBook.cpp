@@ -1,0 +1,91 @@
+#include "sensor/views/include/NameBook.h"
+
+#include <algorithm>
+
+#include "sensor/client/include/ClientErrors.h"
+
+std::optional<ZTSFcName> parseWwn(std::string_view aText) {
+    try {
+        return ZTSFcName::fromText(aText);
+    } catch (const ZTCBadInputEx&) {
+        return std::nullopt;
+    }
+}
+
+std::string abbreviateWwn(const ZTSFcName& acrWwn) {
+    const std::string lText = acrWwn.toText();
+    return lText.substr(0, 2) + ":..:" + lText.substr(lText.size() - 2);
+}
+
+std::string ZTCNameBook::findName(const std::optional<ZTSFcName>& acrWwpn,
+                                  const std::optional<ZTSFcName>& acrWwnn) const {
+    for (const std::optional<ZTSFcName>& lrWwn : {acrWwpn, acrWwnn}) {
+        const auto lFound = lrWwn ? mNames.find(lrWwn->mBytes) : mNames.end();
+        if (lFound != mNames.end()) {
+            return lFound->second;
+        }
+    }
+    return {};
+}
+
+std::string ZTCNameBook::describe(const ZTSRemotePort& acrPort) const {
+    const std::string lName = findName(acrPort.mWwpn, acrPort.mWwnn);
+    return lName.empty() ? acrPort.mWwpn.toText() : lName;
+}
+
+std::string ZTCNameBook::describe(const ZTSInitiator& acrInitiator) const {
+    const std::string lName = findName(acrInitiator.mWwpn, acrInitiator.mWwnn);
+    return !lName.empty()                ? lName
+           : !acrInitiator.mHost.empty() ? acrInitiator.mHost
+           : acrInitiator.mWwpn          ? acrInitiator.mWwpn->toText()
+                                         : "unknown adapter";
+}
+
+std::vector<ZTSFcName> ZTCNameBook::findNamed(std::string_view aText) const {
+    std::vector<ZTSFcName> lWwns;
+    for (const auto& [lWwn, lName] : mNames) {
+        if (lName == aText) {
+            lWwns.push_back(ZTSFcName{lWwn});
+        }
+    }
+    return lWwns;
+}
+
+static void sAddOnce(std::vector<ZTSFcName>& arWwns, const ZTSFcName& acrWwn) {
+    if (std::find(arWwns.begin(), arWwns.end(), acrWwn) == arWwns.end()) {
+        arWwns.push_back(acrWwn);
+    }
+}
+
+static bool sContains(const std::vector<ZTSFcName>& acrWwns, const std::optional<ZTSFcName>& acrWwn) {
+    return acrWwn && std::find(acrWwns.begin(), acrWwns.end(), *acrWwn) != acrWwns.end();
+}
+
+std::vector<ZTSFcName> ZTCNameBook::findRemotePorts(std::string_view aText) const {
+    if (const auto lWwn = parseWwn(aText)) {
+        return {*lWwn};
+    }
+    // A name may be a port's own, or that of a node with any number of ports.
+    const std::vector<ZTSFcName> lNamed = findNamed(aText);
+    std::vector<ZTSFcName> lWwpns = lNamed;
+    for (const ZTSRemotePort& lrPort : mRemotePorts) {
+        if (sContains(lNamed, lrPort.mWwnn)) {
+            sAddOnce(lWwpns, lrPort.mWwpn);
+        }
+    }
+    return lWwpns;
+}
+
+std::vector<ZTSFcName> ZTCNameBook::findInitiators(std::string_view aText) const {
+    if (const auto lWwn = parseWwn(aText)) {
+        return {*lWwn};
+    }
+    const std::vector<ZTSFcName> lNamed = findNamed(aText);
+    std::vector<ZTSFcName> lWwpns = lNamed;
+    for (const ZTSInitiator& lrInitiator : mInitiators) {
+        if (lrInitiator.mWwpn && (lrInitiator.mHost == aText || sContains(lNamed, lrInitiator.mWwnn))) {
+            sAddOnce(lWwpns, *lrInitiator.mWwpn);
+        }
+    }
+    return lWwpns;
+}

@@ -1,0 +1,253 @@
+#include <algorithm>
+#include <array>
+
+#include "sensor/views/include/StatusView.h"
+#include "sensor/views/include/TextTable.h"
+#include "sensor/views/include/TimeText.h"
+
+/// Labels stand at the right edge of a column of this width, followed by ": ".
+static constexpr std::size_t scLabelWidth = 6;
+static constexpr std::size_t scTextColumn = scLabelWidth + 2;
+/// Left free at the right edge, so that a quoted or indented copy still fits.
+static constexpr std::size_t scRightMargin = 3;
+/// Adapters that get a line each; of more only the number is shown.
+static constexpr std::size_t scMostLinks = 4;
+/// Without an event for this long it counts as quiet.
+static constexpr std::chrono::minutes scQuietSpan{1};
+
+static constexpr const char* scBold = "1";
+static constexpr const char* scGreen = "1;32";
+static constexpr const char* scYellow = "1;33";
+static constexpr const char* scRed = "1;31";
+
+/// Builds the face line by line.
+class ZTCStatusText {
+public:
+    ZTCStatusText(const ZTSStatusFacts& acrFacts, const ZTSTextStyle& acrStyle)
+        : mrFacts(acrFacts),
+          mrStyle(acrStyle),
+          mLineWidth(std::max(acrStyle.mWidth, scTextColumn + scRightMargin + 20) - scRightMargin),
+          mJudgement(judge(acrFacts)) {}
+
+    std::string build() {
+        const std::vector<ZTSTroubleText> lTroubles = describeTroubles(mrFacts, mJudgement);
+        const bool lHasSanTroubles = mrFacts.mLive && mrFacts.mLive->mTroubles && !mrFacts.mLive->mTroubles->empty();
+        addHead();
+        addState(!lHasSanTroubles);
+        for (const ZTSTroubleText& lrTrouble : lTroubles) {
+            addTrouble(lrTrouble);
+        }
+        if (mJudgement.isCollecting() && lTroubles.empty() && !lHasSanTroubles) {
+            addLinks();
+            addPaths();
+            addQuiet();
+        }
+        if (mJudgement.isCollecting() && (lTroubles.empty() || lHasSanTroubles)) {
+            addSan();
+        }
+        if (!mJudgement.isCollecting()) {
+            addData();
+        }
+        for (const std::string& lrText : listUnknown(mrFacts)) {
+            add("note", lrText);
+        }
+        return std::move(mText);
+    }
+
+private:
+    std::string paint(const std::string& acrText, const char* apColor) const {
+        return mrStyle.mHasColor ? "\x1b[" + std::string(apColor) + "m" + acrText + "\x1b[0m" : acrText;
+    }
+
+    /// A line whose parts are as wide as they look; nothing is wrapped.
+    void addRaw(const std::string& acrLabel, const std::string& acrText) {
+        const std::string lPadding(scLabelWidth - std::min(scLabelWidth, acrLabel.size()), ' ');
+        mText += (acrLabel.empty() ? std::string(scTextColumn, ' ') : lPadding + acrLabel + ": ") + acrText + "\n";
+    }
+
+    /// A paragraph, wrapped; a line that has columns and fits stays as it is.
+    void add(const std::string& acrLabel, const std::string& acrText) {
+        const std::string lText = escapeControls(acrText);
+        const std::size_t lRoom = mLineWidth - scTextColumn;
+        const bool lFits = countCharacters(lText) <= lRoom;
+        bool lIsFirst = true;
+        for (const std::string& lrLine : lFits ? std::vector<std::string>{lText} : wrapText(lText, lRoom)) {
+            addRaw(lIsFirst ? acrLabel : "", lrLine);
+            lIsFirst = false;
+        }
+    }
+
+    void addParagraphs(const std::string& acrLabel, const std::vector<std::string>& acrTexts) {
+        for (std::size_t i = 0; i < acrTexts.size(); ++i) {
+            add(i == 0 ? acrLabel : "", acrTexts[i]);
+        }
+    }
+
+    void addHead() {
+        const std::string lTime = formatDateTime(mrFacts.mNow);
+        const std::string lHost = cutText(escapeControls(mrFacts.mHost), mLineWidth - scTextColumn - lTime.size() - 1);
+        const std::size_t lUsed = scTextColumn + countCharacters(lHost) + lTime.size();
+        addRaw("host", lHost + std::string(mLineWidth - std::min(mLineWidth - 1, lUsed), ' ') + lTime);
+    }
+
+    void addState(bool aHasSince) {
+        const ZTEVerdict lVerdict = mJudgement.getWorst().mVerdict;
+        const char* const lpColor = lVerdict == ZTVD_Collecting ? scGreen
+                                    : lVerdict <= ZTVD_NotKnown ? scRed
+                                                                : scYellow;
+        const std::string lWord = getVerdictWord(lVerdict);
+        const std::string lRest = formatHeadline(mrFacts, mJudgement, aHasSince).substr(lWord.size());
+        addRaw("state", paint(lWord, lpColor) + cutText(lRest, mLineWidth - scTextColumn - lWord.size()));
+    }
+
+    void addTrouble(const ZTSTroubleText& acrTrouble) {
+        addParagraphs("status", acrTrouble.mStatus);
+        addParagraphs("action", acrTrouble.mAction);
+        add("see", acrTrouble.mSee);
+    }
+
+    /// The adapters with their kinds counted by state.
+    void addLinks() {
+        if (!mrFacts.mLive || !mrFacts.mLive->mKinds) {
+            return;
+        }
+        const std::vector<ZTSLiveKinds>& lrKinds = *mrFacts.mLive->mKinds;
+        const std::size_t lShown = lrKinds.size() <= scMostLinks ? lrKinds.size() : scMostLinks - 1;
+        std::vector<std::array<std::string, 4>> lRows;
+        for (std::size_t i = 0; i < lShown; ++i) {
+            const ZTSInitiator& lrInitiator = lrKinds[i].mInitiator;
+            lRows.push_back({lrInitiator.mHost.empty() ? "-" : lrInitiator.mHost,
+                             lrInitiator.mWwpn ? abbreviateWwn(*lrInitiator.mWwpn) : "-", findPortState(lrInitiator),
+                             countKinds(lrKinds[i])});
+        }
+        std::array<std::size_t, 3> lWidths{};
+        for (const auto& lrRow : lRows) {
+            for (std::size_t i = 0; i < lWidths.size(); ++i) {
+                lWidths[i] = std::max(lWidths[i], countCharacters(lrRow[i]));
+            }
+        }
+        for (std::size_t i = 0; i < lRows.size(); ++i) {
+            std::string lLine;
+            for (std::size_t j = 0; j < lWidths.size(); ++j) {
+                lLine += lRows[i][j] + std::string(lWidths[j] - countCharacters(lRows[i][j]) + 2, ' ');
+            }
+            add(i == 0 ? "links" : "", lLine + lRows[i][3]);
+        }
+        if (lShown < lrKinds.size()) {
+            add("", "and " + std::to_string(lrKinds.size() - lShown) + " more: tavik --json status");
+        }
+    }
+
+    std::string findPortState(const ZTSInitiator& acrInitiator) const {
+        if (mrFacts.mLive->mAdapters) {
+            for (const ZTSLiveAdapter& lrAdapter : *mrFacts.mLive->mAdapters) {
+                if (lrAdapter.mInitiator.mWwpn == acrInitiator.mWwpn && !lrAdapter.mPortState.empty()) {
+                    return lrAdapter.mPortState;
+                }
+            }
+        }
+        return "-";
+    }
+
+    static std::string countKinds(const ZTSLiveKinds& acrKinds) {
+        const auto lCount = [&acrKinds](ZTEKindState aState) {
+            return std::count_if(acrKinds.mStates.begin(), acrKinds.mStates.end(),
+                                 [aState](const auto& acrPair) { return acrPair.second == getKindStateName(aState); });
+        };
+        const auto lListening = lCount(ZTKST_Listening);
+        const auto lNoSource = lCount(ZTKST_NoSource);
+        const auto lOff = lCount(ZTKST_Off);
+        std::string lText = "listening to " + std::to_string(lListening) + " kind" + (lListening == 1 ? "" : "s");
+        lText +=
+            lNoSource == 0 ? "" : ", " + std::to_string(lNoSource) + (lNoSource == 1 ? " has" : " have") + " no source";
+        lText += lOff == 0 ? "" : ", " + std::to_string(lOff) + (lOff == 1 ? " is" : " are") + " off";
+        return lText;
+    }
+
+    void addPaths() {
+        if (mrFacts.mLive && !mrFacts.mLive->mPaths.empty()) {
+            add("paths", mrFacts.mLive->mPaths);
+        }
+    }
+
+    void addQuiet() {
+        const ZTSLastEvent lLast = findLastEvent(mrFacts);
+        std::vector<std::string> lParts;
+        const auto lAge = [this](ZTCHistoryTime aTime) { return formatSpan(mrFacts.mNow - aTime) + " ago"; };
+        lParts.push_back(lLast.mTime ? "last event " + lAge(*lLast.mTime) +
+                                           (lLast.mKind.empty() ? "" : " (" + lLast.mKind + ")")
+                                     : "no event yet");
+        if (mrFacts.mLive) {
+            const ZTSLiveState& lrLive = *mrFacts.mLive;
+            if (lrLive.mCollector.mLastAsked) {
+                lParts.push_back("asked " + lAge(*lrLive.mCollector.mLastAsked));
+            }
+            if (lrLive.mAgent.mHeldBytes && lrLive.mAgent.mLimitBytes) {
+                lParts.push_back(formatHeld(*lrLive.mAgent.mHeldBytes, *lrLive.mAgent.mLimitBytes) + " held");
+            }
+        }
+        std::string lText;
+        for (const std::string& lrPart : lParts) {
+            lText += (lText.empty() ? "" : "; ") + lrPart;
+        }
+        const bool lIsQuiet = !lLast.mTime || mrFacts.mNow - *lLast.mTime >= scQuietSpan;
+        add(lIsQuiet ? "quiet" : "events", lText);
+    }
+
+    /// "0 of 256 KiB": the first without a unit where it is nothing.
+    static std::string formatHeld(std::uint64_t aHeld, std::uint64_t aLimit) {
+        return (aHeld == 0 ? "0" : formatBytes(aHeld)) + " of " + formatBytes(aLimit);
+    }
+
+    void addSan() {
+        if (mrFacts.mLive && mrFacts.mLive->mTroubles) {
+            const std::vector<ZTSTroubleText>& lrTroubles = *mrFacts.mLive->mTroubles;
+            add("SAN", lrTroubles.empty() ? "no trouble" : formatCount(lrTroubles.size(), "trouble"));
+            addSanTroubles(lrTroubles);
+        } else if (mrFacts.mHistory) {
+            const ZTSHistoryFacts& lrHistory = *mrFacts.mHistory;
+            const bool lIsMore = lrHistory.mOpenEpisodes == gcMostOpenEpisodes;
+            add("SAN", lrHistory.mOpenEpisodes == 0
+                           ? "no open episode: tavik events shows what was"
+                           : (lIsMore ? "at least " : "") + formatCount(lrHistory.mOpenEpisodes, "open episode") +
+                                 ", " + formatCount(lrHistory.mOpenPorts, "remote port") + ": tavik events --open");
+        }
+    }
+
+    void addSanTroubles(const std::vector<ZTSTroubleText>& acrTroubles) {
+        for (std::size_t i = 0; i < acrTroubles.size(); ++i) {
+            const std::string lNumber = "[" + std::to_string(i + 1) + "] ";
+            const std::string lTitle = cutText(escapeControls(acrTroubles[i].mTitle), mLineWidth - lNumber.size());
+            const std::string lSubject = "   " + escapeControls(acrTroubles[i].mSubject);
+            mText += lNumber + paint(lTitle, scBold);
+            mText += cutText(lSubject, mLineWidth - std::min(mLineWidth, lNumber.size() + countCharacters(lTitle)));
+            mText += "\n";
+            addTrouble(acrTroubles[i]);
+        }
+    }
+
+    /// Up to when the history is complete.
+    void addData() {
+        if (!mrFacts.mHistory) {
+            return;
+        }
+        const ZTSHistoryFacts& lrHistory = *mrFacts.mHistory;
+        std::optional<ZTCHistoryTime> lComplete = lrHistory.mRetrievals.mLast;
+        const bool lMayLack = mrFacts.mAnswer == ZTAN_NoSensor && mrFacts.mLeftPage && mrFacts.mLeftPage->mHeld != 0;
+        if (lrHistory.mLastRun && (!lMayLack || !lComplete)) {
+            lComplete = std::max(lComplete.value_or(lrHistory.mLastRun->mTo), lrHistory.mLastRun->mTo);
+        }
+        add("data", (lComplete ? "complete to " + formatShortTime(*lComplete, mrFacts.mNow) + "; " : "") +
+                        "tavik events still works");
+    }
+
+    const ZTSStatusFacts& mrFacts;
+    const ZTSTextStyle& mrStyle;
+    const std::size_t mLineWidth;
+    const ZTSJudgement mJudgement;
+    std::string mText;
+};
+
+std::string formatStatus(const ZTSStatusFacts& acrFacts, const ZTSTextStyle& acrStyle) {
+    return ZTCStatusText(acrFacts, acrStyle).build();
+}
