@@ -1,0 +1,156 @@
+#include "sensor/settings/src/SettingsTable.h"
+
+#include <algorithm>
+#include <array>
+#include <limits>
+
+static constexpr double scMostOf32Bits = std::numeric_limits<std::uint32_t>::max();
+
+static constexpr ZTSRange sCount(double aLeast, double aMost) {
+    return {ZTQ_Count, aLeast, aMost, nullptr};
+}
+
+static constexpr ZTSRange sSeconds(double aLeast, double aMost) {
+    return {ZTQ_Seconds, aLeast, aMost, nullptr};
+}
+
+static constexpr ZTSRange sBytes(double aLeast, double aMost) {
+    return {ZTQ_Bytes, aLeast, aMost, nullptr};
+}
+
+static constexpr ZTSRange sText(const ZTSTextRule& acrRule) {
+    return {ZTQ_Count, 0, 0, &acrRule};
+}
+
+static constexpr double scMebibyte = 1024.0 * 1024;
+static constexpr double scTebibyte = scMebibyte * scMebibyte;
+
+std::span<const ZTSKey> settingsTable() {
+    using S = ZTSSettings;
+    static constexpr auto scKeys = std::to_array<ZTSKey>({
+        {"agent", "program", &S::mAgentProgram, sText(gcProgramRule), true, R"("qrv-tvk")",
+         "The agent: beside tavik-sensor, else in the sbin folder of its installation, else in PATH."},
+        {"agent", "library", &S::mAgentLibrary, sText(gcAnyRule), true, R"("")",
+         "The adapters' library (ZT_LIBKPM_PATH of the agent). Empty: the agent's own default."},
+        {"agent", "log", &S::mAgentLog, sText(gcPathRule), true, R"("/var/log/tavik/qrv-tvk.log")",
+         "The agent's log, its level (the sum of: 1 halt, 2 alert, 4 critical, 8 error, 16 warning,\n"
+         "32 notice, 64 info, 128 trace) and its heartbeat in whole seconds."},
+        {"agent", "log_level", &S::mAgentLogLevel, sCount(0, 255), true, "31", ""},
+        {"agent", "heartbeat", &S::mAgentHeartbeat, {ZTQ_WholeSeconds, 1, scMostOf32Bits, nullptr}, true, "60", ""},
+
+        {"sensor", "directory", &S::mSensorDirectory, sText(gcSocketDirectoryRule), true, R"("/run/tavik")",
+         "Holds agent/ (FIFOs, pid files, status pages) and the socket control. Gone after a restart of\n"
+         "the host."},
+        {"sensor", "state", &S::mSensorState, sText(gcDirectoryRule), true, R"("/var/lib/tavik")",
+         "Holds the history (history.db) and the spool. Keep it."},
+
+        {"collect", "period", &S::mCollectPeriod, sSeconds(0.1, 3600), true, "5.0",
+         "Time between two looks at the agent when little comes. When much comes, the agent rings."},
+        {"collect", "record_limit", &S::mCollectRecordLimit, sCount(0, scMostOf32Bits), true, "900",
+         "Largest number of bytes of event data in one record, as the start command sets it."},
+
+        {"targets",
+         "sysfs",
+         &S::mTargetsSysfs,
+         {},
+         true,
+         "true",
+         "Remote ports are known from /sys/class/fc_remote_ports, and from a file as of\n"
+         "\"tavikctl targets\". An empty path: no file."},
+        {"targets", "file", &S::mTargetsFile, sText(gcOptionalPathRule), true, R"("")", ""},
+
+        {"history", "days", &S::mHistoryDays, sCount(1, 36500), true, "90",
+         "What is older than these days, or beyond this size, is retired: counted in totals, then deleted."},
+        {"history", "size", &S::mHistorySize, sBytes(16 * scMebibyte, 1024 * scTebibyte), true, R"("2GiB")", ""},
+        {"history", "records", &S::mHistoryRecords, sCount(0, 1000000), true, "100",
+         "Raw records kept at each end of an episode."},
+
+        {"episode", "gap", &S::mEpisodeGap, sSeconds(1, 86400), true, "60",
+         "Time without an event that ends an episode."},
+
+        {"http", "listen", &S::mHttpListen, sText(gcListenRule), false, R"("127.0.0.1:9632")",
+         "\"ADDRESS:PORT\", \"unix:PATH\", or \"\" for off. A loopback port can be read by every local user; a\n"
+         "socket by its mode. Any other address needs public = true."},
+        {"http", "public", &S::mHttpPublic, {}, false, "false", ""},
+        {"http", "hosts", &S::mHttpHosts, sText(gcHostRule), false, "[]",
+         "Names in the Host header that are accepted beside localhost, 127.0.0.1 and [::1]."},
+
+        {"metrics", "textfile", &S::mMetricsTextfile, sText(gcOptionalPathRule), false, R"("")",
+         "A file for node_exporter's textfile collector. Empty: none."},
+        {"metrics", "remote_ports", &S::mMetricsRemotePorts, sCount(0, 100000), false, "500",
+         "Most remote ports that get a label of their own."},
+
+        {"ndjson", "path", &S::mNdjsonPath, sText(gcStreamRule), false, R"("")",
+         "One line of JSON an episode. \"-\" is standard output, empty is none. The file is renamed at this\n"
+         "size, and so many renamed ones are kept."},
+        {"ndjson", "size", &S::mNdjsonSize, sBytes(scMebibyte / 16, scTebibyte), false, R"("64MiB")", ""},
+        {"ndjson", "keep", &S::mNdjsonKeep, sCount(0, 1000), false, "5", ""},
+
+        {"journal", "enabled", &S::mJournalEnabled, {}, false, "false", "Episodes in the system's journal."},
+    });
+    return scKeys;
+}
+
+std::vector<std::string> changedKeys(const ZTSSettings& acrOne, const ZTSSettings& acrOther) {
+    std::vector<std::string> lChanged;
+    for (const ZTSKey& lcrKey : settingsTable()) {
+        if (std::visit([&](auto apMember) { return acrOne.*apMember != acrOther.*apMember; }, lcrKey.mMember)) {
+            lChanged.push_back(lcrKey.toText());
+        }
+    }
+    if (acrOne.mNames != acrOther.mNames) {
+        lChanged.emplace_back("names");
+    }
+    if (acrOne.mWarnings != acrOther.mWarnings) {
+        lChanged.emplace_back("warn");
+    }
+    return lChanged;
+}
+
+static void sAppendComment(std::string& arText, const std::string& acrComment) {
+    std::size_t lStart = 0;
+    while (lStart < acrComment.size()) {
+        const std::size_t lEnd = std::min(acrComment.find('\n', lStart), acrComment.size());
+        arText += "# " + acrComment.substr(lStart, lEnd - lStart) + "\n";
+        lStart = lEnd + 1;
+    }
+}
+
+std::string defaultSettingsFile() {
+    std::string lText =
+        "# Settings of Tavik. Every default stands here as a comment: take the # away to change one.\n"
+        "# \"tavik-sensor --check\" reports what is wrong with this file and starts nothing.\n"
+        "# Durations are numbers of seconds or texts such as \"90s\", \"10m\", \"24h\", \"30d\"; sizes are texts such\n"
+        "# as \"64MiB\".\n";
+    std::string lSection;
+    for (const ZTSKey& lcrKey : settingsTable()) {
+        if (lSection != lcrKey.mpSection) {
+            lSection = lcrKey.mpSection;
+            lText += "\n[" + lSection + "]\n";
+        }
+        sAppendComment(lText, lcrKey.mpMeaning);
+        if (!lcrKey.mHasOutput && *lcrKey.mpMeaning != '\0') {
+            sAppendComment(lText, "Checked, but without effect: this version does not have that output yet.");
+        }
+        lText += std::string("#") + lcrKey.mpName + " = " + lcrKey.mpDefault + "\n";
+    }
+    lText +=
+        "\n# Your names for ports and nodes, by world wide name. None by default.\n"
+        "[names]\n"
+        "# \"50:06:01:60:3b:a0:12:34\" = \"array7 ctrl-A\"\n"
+        "\n# Programs to run on trouble; as many [[warn]] tables as wanted. None by default.\n"
+        "# kind: an event kind (kpm-sim kinds), or deaf, gap, refused, agent-down, disk-full, path-lost\n"
+        "# count, within: so many events within this time (1, 60); per: \"port\", \"initiator\" or \"host\" "
+        "(\"port\")\n"
+        "# run: program and arguments, no shell; timeout: its process group is ended after this time (30)\n";
+    if (!gcHasWarnOutput) {
+        sAppendComment(lText, "Checked, but without effect: this version does not have that output yet.");
+    }
+    lText +=
+        "# [[warn]]\n"
+        "# kind = \"queue-full\"\n"
+        "# count = 100\n"
+        "# within = \"5m\"\n"
+        "# run = [\"/usr/local/bin/tell-someone\", \"--urgent\"]\n";
+    return lText;
+}
