@@ -10,8 +10,8 @@
 
 #include "fuzz/support/FuzzAgent.h"
 #include "fuzz/support/FuzzInput.h"
+#include "libkpm/include/ScopeEventKinds.h"
 #include "libkpm/include/libkpm.h"
-#include "sensor/agentcommon/include/ScopeEventKinds.h"
 #include "sensor/client/include/CommandEncoder.h"
 #include "sensor/client/include/RecordFields.h"
 #include "sensor/client/include/RecordJson.h"

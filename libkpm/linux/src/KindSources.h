@@ -8,7 +8,7 @@
 #include <optional>
 #include <string_view>
 
-#include "sensor/agentcommon/include/ScopeEventKinds.h"
+#include "libkpm/include/ScopeEventKinds.h"
 
 enum ZTELinuxSource : std::uint8_t {
     ZTLSO_None,      ///< the kernel has no generic source

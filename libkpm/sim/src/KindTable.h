@@ -10,7 +10,7 @@
 #include <span>
 #include <string_view>
 
-#include "sensor/agentcommon/include/ScopeEventKinds.h"
+#include "libkpm/include/ScopeEventKinds.h"
 
 /// The callback that a kind is delivered through.
 enum ZTESimDelivery : std::uint8_t { ZTSD_Scope, ZTSD_Link, ZTSD_Rscn, ZTSD_Temperature };

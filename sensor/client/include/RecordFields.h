@@ -9,7 +9,7 @@
 #include <variant>
 #include <vector>
 
-#include "sensor/agentcommon/include/ScopeEventKinds.h"
+#include "libkpm/include/ScopeEventKinds.h"
 #include "sensor/client/include/FcName.h"
 
 /// How a field's bytes are read, and how people see it.

@@ -10,7 +10,7 @@
 #include <cstring>
 #include <thread>
 
-#include "sensor/agentcommon/include/ScopeEventKinds.h"
+#include "libkpm/include/ScopeEventKinds.h"
 
 static_assert(gcScopeEventKinds.size() == gcStatusKinds);
 

@@ -8,7 +8,7 @@
 #include <charconv>
 #include <climits>
 
-#include "sensor/agentcommon/include/ScopeEventKinds.h"
+#include "libkpm/include/ScopeEventKinds.h"
 
 static constexpr std::size_t scMaxName = 128;
 static constexpr std::size_t scMaxQuoted = 60;

@@ -1,6 +1,6 @@
 #include "sensor/store/include/Episode.h"
 
-#include "sensor/agentcommon/include/ScopeEventKinds.h"
+#include "libkpm/include/ScopeEventKinds.h"
 
 std::string getKindName(ZTCKindKey aKind) {
     const auto lCategory = static_cast<std::uint8_t>(aKind >> 8);

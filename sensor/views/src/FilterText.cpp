@@ -3,7 +3,7 @@
 #include <algorithm>
 #include <charconv>
 
-#include "sensor/agentcommon/include/ScopeEventKinds.h"
+#include "libkpm/include/ScopeEventKinds.h"
 #include "sensor/views/include/TextTable.h"
 #include "sensor/views/include/TimeText.h"
 

@@ -10,7 +10,7 @@
 #include <random>
 #include <thread>
 
-#include "sensor/agentcommon/include/ScopeEventKinds.h"
+#include "libkpm/include/ScopeEventKinds.h"
 #include "tests/support/StatusPageFile.h"
 #include "tests/support/TemporaryDirectory.h"
 

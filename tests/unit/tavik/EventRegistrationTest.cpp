@@ -8,7 +8,7 @@
 
 #include "common/include/Exception.h"
 #include "common/include/Log.h"
-#include "sensor/agentcommon/include/ScopeEventKinds.h"
+#include "libkpm/include/ScopeEventKinds.h"
 #include "system/include/SystemGlobals.h"
 #include "tavik/include/TavikCore.h"
 #include "tests/unit/agentcommon/support/BufferBytes.h"

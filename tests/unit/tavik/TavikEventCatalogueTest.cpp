@@ -6,7 +6,7 @@
 
 #include "common/include/Exception.h"
 #include "common/include/Log.h"
-#include "sensor/agentcommon/include/ScopeEventKinds.h"
+#include "libkpm/include/ScopeEventKinds.h"
 #include "tavik/include/ScopeEventSubType.h"
 #include "tests/support/TemporaryDirectory.h"
 #include "tests/unit/agentcommon/support/TestLog.h"

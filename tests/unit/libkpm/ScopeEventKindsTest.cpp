@@ -1,4 +1,4 @@
-#include "sensor/agentcommon/include/ScopeEventKinds.h"
+#include "libkpm/include/ScopeEventKinds.h"
 
 #include <gtest/gtest.h>
 
