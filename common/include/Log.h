@@ -104,8 +104,17 @@ void printLogMessageFromText(unsigned aLevel, const char* apMark, unsigned aLine
 #define ZT_LOG_INFO(...) ZT_LOG(ZTLL_Info, "-I-", __VA_ARGS__)
 #define ZT_LOG_NAP(...) ZT_LOG_NOPREFIX(ZTLL_Nap, "-PROT-", __VA_ARGS__)
 
-#define ZT_ENTRY() ZT_LOG(ZTLL_Debug, "-T-", "%s", "Entered")
-#define ZT_EXIT() ZT_LOG(ZTLL_Debug, "-T-", "%s", "Left")
+// Every function of the agent has these two, the path of an event included: where tracing is off, which is nearly
+// always, they cost one load and one branch that is not taken.
+#define ZT_TRACE_LINE(aText)                                                                                   \
+    do {                                                                                                       \
+        if (isLogLevelEnabled(ZTLL_Debug)) [[unlikely]] {                                                      \
+            PrintLogMessageWithTimeStamp(ZTLL_Debug, "-T-", __LINE__, __func__, ZT_FILE_LABEL, "%s", (aText)); \
+        }                                                                                                      \
+    } while (false)
+
+#define ZT_ENTRY() ZT_TRACE_LINE("Entered")
+#define ZT_EXIT() ZT_TRACE_LINE("Left")
 #define ZT_TRACE() ZT_LOG(ZTLL_Debug, "-T-", "%s", "At")
 #define ZT_TRACE_MSG(...) ZT_LOG(ZTLL_Debug, "-T-", __VA_ARGS__)
 

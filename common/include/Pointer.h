@@ -34,14 +34,21 @@ enum ZTEPointerAllocType : unsigned char {
     ZTPAT_Max = 3
 };
 
+/// Whether objects of the class are made together with their count, in one allocation, by ZTCPointer<T>::make and in no
+/// other way. A class says so by declaring `using ZTMadeWithItsCount = void;`. Those are the objects of a scope record:
+/// each costs one allocation instead of two on the path of an event.
+template <typename T>
+concept ZTCIsMadeWithItsCount = requires {
+    typename T::ZTMadeWithItsCount;
+};
+
 /// An object with its count, for an owner that holds it as a member and shares it through pointers, all of which go
-/// before the owner does.
+/// before the owner does. The owner has a share of its own, so that the pointers never release the object.
 template <typename T>
 class ZTCCounted {
 public:
     template <typename... Arguments>
-    explicit ZTCCounted(Arguments&&... arArguments)
-        : mCount(0, ZTOS_Foreign), mObject(std::forward<Arguments>(arArguments)...) {}
+    explicit ZTCCounted(Arguments&&... arArguments) : mCount(1), mObject(std::forward<Arguments>(arArguments)...) {}
     ZTCCounted(const ZTCCounted&) = delete;
     ZTCCounted& operator=(const ZTCCounted&) = delete;
 
@@ -58,10 +65,11 @@ private:
 template <typename T>
 class ZTCPointer {
 public:
-    /// Makes an object and the pointer to it with one allocation for the object and its count. Throws what the object's
-    /// constructor does, and ZTCNoMemoryEx("Out of Memory", 2).
+    /// Makes an object with its count, and the pointer to it. Throws what the object's constructor does, and
+    /// ZTCNoMemoryEx("Out of Memory", 2).
     template <typename... Arguments>
     static ZTCPointer make(Arguments&&... arArguments) {
+        static_assert(ZTCIsMadeWithItsCount<T>, "the class does not say that it is made so");
         static_assert(alignof(ZTSJoined) <= __STDCPP_DEFAULT_NEW_ALIGNMENT__);
         void* const lpBlock = ::operator new(sizeof(ZTSJoined), std::nothrow);
         if (nullptr == lpBlock) {
@@ -75,7 +83,7 @@ public:
             ::operator delete(lpBlock);
             throw;
         }
-        lPointer.mReferenceCount = new (lpBlock) ZTCReferenceCount(1, ZTOS_Joined);
+        lPointer.mReferenceCount = new (lpBlock) ZTCReferenceCount(1);
         lPointer.mSizeType = ZTPST_Individual;
         lPointer.mAllocType = ZTPAT_New;
         return lPointer;
@@ -97,6 +105,7 @@ public:
     /// ZTCNoMemoryEx("Out of Memory", 2).
     ZTCPointer(T* apObject, ZTEPointerSizeType aSizeType = ZTPST_Individual, ZTEPointerAllocType aAllocType = ZTPAT_New)
         : mPointer(apObject), mSizeType(aSizeType), mAllocType(aAllocType) {
+        static_assert(!ZTCIsMadeWithItsCount<T>, "such an object comes from make");
         if (nullptr == mPointer) {
             throw ZTCNoMemoryEx("Out of Memory", gcErrNoMemory);
         }
@@ -122,6 +131,8 @@ public:
         static_assert(
             std::is_same_v<std::remove_cv_t<Derived>, std::remove_cv_t<T>> || std::has_virtual_destructor_v<T>,
             "an object is released through a base class only by a virtual destructor");
+        static_assert(ZTCIsMadeWithItsCount<Derived> == ZTCIsMadeWithItsCount<T>,
+                      "both classes have to know how the object was made");
         ZT_ASSERT(0 != acrCopy.mPointer);
         ZT_ASSERT(0 != acrCopy.mReferenceCount);
         ZT_ASSERT(ZTPST_Individual == acrCopy.mSizeType);
@@ -220,35 +231,33 @@ private:
             requires { sizeof(T); }, "an object is released only where its type is complete");
         ZTCReferenceCount* const lpCount = mReferenceCount;
         mReferenceCount = nullptr;
-        if (nullptr != lpCount && ZTOS_Apart != lpCount->getStorage()) {
-            if (ZTOS_Joined == lpCount->getStorage()) {
-                mPointer->~T();
-                ::operator delete(lpCount);
+        if constexpr (ZTCIsMadeWithItsCount<T>) {
+            mPointer->~T();
+            ::operator delete(lpCount);
+        } else {
+            delete lpCount;
+            if (nullptr == mPointer) {
+                return;
             }
-            return;
-        }
-        delete lpCount;
-        if (nullptr == mPointer) {
-            return;
-        }
-        switch (mAllocType) {
-            case ZTPAT_New:
-                switch (mSizeType) {
-                    case ZTPST_Individual:
-                        delete mPointer;
-                        break;
-                    case ZTPST_Array:
-                        delete[] mPointer;
-                        break;
-                    default:
-                        ZT_NEVER_GET_HERE();
-                }
-                break;
-            case ZTPAT_Malloc:
-                std::free(const_cast<std::remove_cv_t<T>*>(mPointer));
-                break;
-            default:
-                ZT_NEVER_GET_HERE();
+            switch (mAllocType) {
+                case ZTPAT_New:
+                    switch (mSizeType) {
+                        case ZTPST_Individual:
+                            delete mPointer;
+                            break;
+                        case ZTPST_Array:
+                            delete[] mPointer;
+                            break;
+                        default:
+                            ZT_NEVER_GET_HERE();
+                    }
+                    break;
+                case ZTPAT_Malloc:
+                    std::free(const_cast<std::remove_cv_t<T>*>(mPointer));
+                    break;
+                default:
+                    ZT_NEVER_GET_HERE();
+            }
         }
     }
 

@@ -3,6 +3,7 @@
 #include <gmock/gmock.h>
 #include <gtest/gtest.h>
 
+#include <algorithm>
 #include <set>
 #include <string>
 #include <type_traits>
@@ -53,22 +54,46 @@ TEST(Exception, DefaultsAreThoseOfTheClass) {
     EXPECT_EQ(19u, ZTCExitConditionEx().getError());
 }
 
-TEST(Exception, TheFamilyHasItsBases) {
-    EXPECT_TRUE((std::is_base_of_v<ZTCHaltEx, ZTCExitConditionEx>));
-    EXPECT_TRUE((std::is_base_of_v<ZTCGenericException, ZTCExitConditionEx>));
-    EXPECT_TRUE((std::is_base_of_v<ZTCHaltEx, ZTCQuitThreadEx>));
-    EXPECT_TRUE((std::is_base_of_v<ZTCGenericException, ZTCQuitThreadEx>));
-    EXPECT_TRUE((std::is_base_of_v<ZTCOsException, ZTCTimeOutEx>));
-    EXPECT_TRUE((std::is_base_of_v<ZTCOpsException, ZTCHeartbeatFailedEx>));
-    EXPECT_TRUE((std::is_base_of_v<ZTCClibEx, ZTCClibStatFailedEx>));
-    EXPECT_TRUE((std::is_base_of_v<ZTCClibEx, ZTCClibUtimeFailedEx>));
-    EXPECT_TRUE((std::is_base_of_v<ZTCClibEx, ZTCClibGetProcStatusFailedEx>));
-    EXPECT_FALSE((std::is_base_of_v<ZTCHaltEx, ZTCInvalidEx>));
-    EXPECT_FALSE((std::is_base_of_v<ZTCHaltEx, ZTCNotFoundEx>));
-    EXPECT_FALSE((std::is_base_of_v<ZTCHaltEx, ZTCExistsEx>));
-    EXPECT_FALSE((std::is_base_of_v<ZTCHaltEx, ZTCNotImplementedEx>));
-    EXPECT_FALSE((std::is_base_of_v<ZTCHaltEx, ZTCTimeOutEx>));
-    EXPECT_FALSE((std::is_base_of_v<ZTCGenericException, ZTCClibEx>));
+/// Whether Base is a virtual base: only from such a one no static_cast leads back.
+template <typename Base, typename Derived>
+concept ZTCIsVirtualBase = std::is_base_of_v<Base, Derived> && !requires(Base * apBase) {
+    static_cast<Derived*>(apBase);
+};
+
+/// The bases of a class, each as "v" for a virtual one, "d" for a direct one, "-" for none: root, generic, halt,
+/// operating system, operation, C library.
+template <typename Class>
+std::string sBasesOf() {
+    const auto lSort = [](bool aIsBase, bool aIsVirtual) { return aIsVirtual ? 'v' : aIsBase ? 'd' : '-'; };
+    return {lSort(std::is_base_of_v<ZTCException, Class>, ZTCIsVirtualBase<ZTCException, Class>),
+            lSort(std::is_base_of_v<ZTCGenericException, Class>, ZTCIsVirtualBase<ZTCGenericException, Class>),
+            lSort(std::is_base_of_v<ZTCHaltEx, Class>, ZTCIsVirtualBase<ZTCHaltEx, Class>),
+            lSort(std::is_base_of_v<ZTCOsException, Class>, ZTCIsVirtualBase<ZTCOsException, Class>),
+            lSort(std::is_base_of_v<ZTCOpsException, Class>, ZTCIsVirtualBase<ZTCOpsException, Class>),
+            lSort(std::is_base_of_v<ZTCClibEx, Class>, ZTCIsVirtualBase<ZTCClibEx, Class>)};
+}
+
+TEST(Exception, EachClassHasItsBasesAndAllOfThemAreVirtual) {
+    for (const std::string& lcrOfFirstRow :
+         {sBasesOf<ZTCGenericException>(), sBasesOf<ZTCHaltEx>(), sBasesOf<ZTCOsException>(),
+          sBasesOf<ZTCOpsException>(), sBasesOf<ZTCClibEx>()}) {
+        EXPECT_EQ('v', lcrOfFirstRow.front());
+        EXPECT_EQ(4, std::count(lcrOfFirstRow.begin(), lcrOfFirstRow.end(), '-')) << "no other base of the row";
+    }
+    // Root, generic, halt, operating system, operation, C library.
+    EXPECT_EQ("vvv---", sBasesOf<ZTCNoMemoryEx>());
+    EXPECT_EQ("vv----", sBasesOf<ZTCInvalidEx>());
+    EXPECT_EQ("vv----", sBasesOf<ZTCNotFoundEx>());
+    EXPECT_EQ("vv----", sBasesOf<ZTCExistsEx>());
+    EXPECT_EQ("vv----", sBasesOf<ZTCNotImplementedEx>());
+    EXPECT_EQ("vvv---", sBasesOf<ZTCExitConditionEx>());
+    EXPECT_EQ("vvv---", sBasesOf<ZTCShutDownEx>());
+    EXPECT_EQ("vvv---", sBasesOf<ZTCQuitThreadEx>());
+    EXPECT_EQ("v--v--", sBasesOf<ZTCTimeOutEx>());
+    EXPECT_EQ("v---v-", sBasesOf<ZTCHeartbeatFailedEx>());
+    EXPECT_EQ("v----v", sBasesOf<ZTCClibStatFailedEx>());
+    EXPECT_EQ("v----v", sBasesOf<ZTCClibUtimeFailedEx>());
+    EXPECT_EQ("v----v", sBasesOf<ZTCClibGetProcStatusFailedEx>());
 }
 
 TEST(Exception, FrameworkClassesCarryTheirSegment) {

@@ -230,6 +230,8 @@ TEST_F(Pointer, CopiesMayComeAndGoOnManyThreads) {
 TEST_F(Pointer, HasTheLayoutAndTheOneByteTypesThatItPromises) {
     EXPECT_EQ(1u, sizeof(ZTEPointerSizeType));
     EXPECT_EQ(1u, sizeof(ZTEPointerAllocType));
+    EXPECT_EQ((std::vector<int>{0, 1, 2, 3}), (std::vector<int>{ZTPST_None, ZTPST_Individual, ZTPST_Array, ZTPST_Max}));
+    EXPECT_EQ((std::vector<int>{0, 1, 2, 3}), (std::vector<int>{ZTPAT_None, ZTPAT_New, ZTPAT_Malloc, ZTPAT_Max}));
     EXPECT_EQ(3 * sizeof(void*), sizeof(ZTCPointer<int>));
 
     // The fields in order: object, count, size type, allocation type, filler.
@@ -309,60 +311,4 @@ TEST_F(PointerDeathTest, TheAssertionNamesFunctionAndFile) {
     const ZTCPointer<std::string> lEmpty;
     EXPECT_EXIT(static_cast<void>(lEmpty->size()), testing::ExitedWithCode(1),
                 "-H- common/include/Pointer:[0-9]+ operator->: Assertion");
-}
-
-TEST_F(Pointer, MakeTakesOneAllocationAndReleasesLikeAnyOther) {
-    {
-        ZTCPointer<ZTSObserved> lMade = ZTCPointer<ZTSObserved>::make(7);
-        const ZTCPointer<ZTSObserved> lCopy(lMade);
-        EXPECT_EQ(7, lCopy->mValue);
-        lMade = ZTCPointer<ZTSObserved>(NEW ZTSObserved(8));
-        EXPECT_EQ(2, ZTSObserved::sAlive);
-    }
-    EXPECT_EQ(0, ZTSObserved::sAlive);
-    EXPECT_EQ((std::vector<int>{7, 8}), ZTSObserved::sDestroyed);
-    const unsigned lFailures = failEachAllocation(
-        [] {
-            try {
-                ZTCPointer<int>::make(1);
-            } catch (const ZTCNoMemoryEx& lrException) {
-                EXPECT_STREQ("Out of Memory", lrException.what());
-                EXPECT_EQ(2u, lrException.getError());
-            }
-        },
-        [] {});
-    EXPECT_EQ(1u, lFailures);
-}
-
-TEST_F(Pointer, WhatIsMadeIsReleasedThroughABaseToo) {
-    {
-        const ZTCPointer<ZTSBase> lBase(ZTCPointer<ZTSDerived>::make());
-        EXPECT_EQ(1, lBase->kind());
-        EXPECT_EQ(1, ZTSDerived::sAlive);
-    }
-    EXPECT_EQ(0, ZTSDerived::sAlive);
-}
-
-TEST_F(Pointer, AConstructorThatThrowsInMakeLeavesNothingBehind) {
-    struct ZTSThrowing {
-        ZTSThrowing() { throw ZTCInvalidEx(); }
-    };
-    EXPECT_THROW(ZTCPointer<ZTSThrowing>::make(), ZTCInvalidEx);
-}
-
-TEST_F(Pointer, ACountedPartOfAnOwnerGoesWithTheOwnerAlone) {
-    {
-        ZTCCounted<ZTSObserved> lOwned(5);
-        {
-            const ZTCPointer<ZTSObserved> lFirst(lOwned);
-            const ZTCPointer<ZTSObserved> lSecond(lFirst);
-            EXPECT_EQ(lFirst.get(), lSecond.get());
-            EXPECT_EQ(5, lSecond->mValue);
-        }
-        EXPECT_EQ(1, ZTSObserved::sAlive);
-        const ZTCPointer<ZTSObserved> lAgain(lOwned);
-        EXPECT_EQ(5, lAgain->mValue);
-    }
-    EXPECT_EQ(0, ZTSObserved::sAlive);
-    EXPECT_EQ((std::vector<int>{5}), ZTSObserved::sDestroyed);
 }

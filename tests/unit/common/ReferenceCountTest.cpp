@@ -43,14 +43,3 @@ TEST(ReferenceCount, ExactlyOneThreadGetsToZero) {
     }
     EXPECT_EQ(1u, lZeros.load());
 }
-
-TEST(ReferenceCount, KnowsTheStorageOfItsObjectWhateverItCounts) {
-    for (const ZTEObjectStorage lStorage : {ZTOS_Apart, ZTOS_Joined, ZTOS_Foreign}) {
-        ZTCReferenceCount lCount(1, lStorage);
-        EXPECT_EQ(lStorage, lCount.getStorage());
-        lCount.increment();
-        EXPECT_EQ(1u, lCount.decrement());
-        EXPECT_EQ(0u, lCount.decrement());
-        EXPECT_EQ(lStorage, lCount.getStorage());
-    }
-}
