@@ -45,8 +45,8 @@ public:
     /// asked.
     void killRunningInstance();
 
-    /// Removes the file, if it still is the one that this process locked, and drops the lock. Does nothing a second
-    /// time.
+    /// Removes the file, if it still is the one that this process locked, and drops the lock. From here on this process
+    /// does not rotate the log. Does nothing a second time.
     void exitInstanceManagement();
 
     /// Returns if the pid file holds the id, above 0 and in decimal, of a process that exists and is no zombie; throws

@@ -3,6 +3,8 @@
 #ifndef SYSTEM_INCLUDE_SIGNALWAITER_H
 #define SYSTEM_INCLUDE_SIGNALWAITER_H
 
+#include <sys/types.h>
+
 #include "os/common/include/Os.h"
 #include "os/common/include/ProcessEvents.h"
 
@@ -21,6 +23,10 @@ public:
     /// Blocks the three signals on the calling thread and on those that it starts, and ignores SIGPIPE and SIGXFSZ.
     /// Comes before everything that could make a thread.
     static void blockSignals();
+
+    /// Sends on to the process what blockSignals() has kept back from this one so far: a process that was forked
+    /// inherits the mask but not the signals that wait.
+    static void handOnSignals(::pid_t aProcess) noexcept;
 
     /// Starts the thread. Throws ZTCClibEx or ZTCOsException; nothing runs then.
     void start();

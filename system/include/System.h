@@ -133,7 +133,7 @@ public:
     /// Does nothing here.
     virtual void preInit();
 
-    /// Makes the protocol helper and the buffer manager.
+    /// Makes the protocol helper, the buffer manager and the lock of the numbers.
     virtual void init();
 
     /// Does nothing here.
@@ -255,8 +255,8 @@ public:
     }
 
     /// Applies what processCommandLine() has read. -h and -v end the process, -c hands the file to processConfigFile(),
-    /// -s stops the running instance and ends the process, in this order and before everything else; then -l, -d, -b,
-    /// -S and -D.
+    /// -s stops the running instance and ends the process, in this order; -l and -d are applied before -c, so that the
+    /// lines about the refused file can be seen, and -b, -S and -D at the end.
     virtual void processCommandLineArguments();
 
     virtual void createStartUpEvent() {}
@@ -275,8 +275,10 @@ public:
     void startSignalWaiter();
     void stopSignalWaiter();
 
-    /// Whether the command line asks for a daemon.
-    bool isToRunAsDaemon() const { return mRunAsDaemon; }
+    /// Whether to run as a daemon: yes, unless the command line that was read says no.
+    bool isToRunAsDaemon() const {
+        return !(mCommandLineParser != nullptr) || mCommandLineParser->getOptions().mRunAsDaemon;
+    }
 
     const ZTCString& getName() const { return mName; }
 
@@ -312,14 +314,12 @@ protected:
     ZTCVector<ZTCPointer<ZTCWriter>> mWriters;
 
     // Locks, and what they guard.
+    ZTCPointer<ZTCMutex> mNumericIdsLock;  ///< empty before init()
     ZTCPointer<ZTCMutex> mExitLock;
-    mutable ZTCMutex mNumericIdsLock;
-    ZTCList<unsigned int> mNumericIds ZT_GUARDED_BY(mNumericIdsLock);
+    ZTCList<unsigned int> mNumericIds ZT_GUARDED_BY(*mNumericIdsLock);
 
 private:
     static void* runThread(void* apArguments);
-
-    bool mRunAsDaemon = true;
 };
 
 #endif

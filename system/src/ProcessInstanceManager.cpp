@@ -240,6 +240,8 @@ void ZTCProcessInstanceManager::exitInstanceManagement() {
     if (!mIsLocked) {
         return;
     }
+    // The next agent may run from here on: what comes to be logged belongs at the end of its file.
+    allowLogRotation(false);
     // The lock goes last: whoever gets it then finds that the file is not at its path any more.
     const ZTCDescriptor lFile(mDescriptor);
     mDescriptor = -1;

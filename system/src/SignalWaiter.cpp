@@ -5,6 +5,7 @@
 #include <unistd.h>
 
 #include <cerrno>
+#include <ctime>
 
 #include "common/include/Exception.h"
 #include "common/include/Log.h"
@@ -46,6 +47,14 @@ void ZTCSignalWaiter::blockSignals() {
         if (::sigaction(lSignal, &lIgnore, nullptr) != 0) {
             sThrowSignalFailed("sigaction", errno);
         }
+    }
+}
+
+void ZTCSignalWaiter::handOnSignals(::pid_t aProcess) noexcept {
+    const sigset_t lSignals = sSignals();
+    const std::timespec lAtOnce{};
+    for (int lSignal; (lSignal = ::sigtimedwait(&lSignals, nullptr, &lAtOnce)) > 0;) {
+        ::kill(aProcess, lSignal);
     }
 }
 

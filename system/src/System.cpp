@@ -53,7 +53,7 @@ ZTCSystem::~ZTCSystem() = default;
 // ---- Numbers, waking and identity ----
 
 void ZTCSystem::generateNumericId(unsigned& arId) {
-    ZTCMutexLock lLock(mNumericIdsLock);
+    ZTCMutexLock lLock(*mNumericIdsLock);
     unsigned lId = 1;
     while (sIsGivenOut(mNumericIds, lId)) {
         ++lId;
@@ -63,7 +63,7 @@ void ZTCSystem::generateNumericId(unsigned& arId) {
 }
 
 void ZTCSystem::returnNumericId(const unsigned& acrId) {
-    ZTCMutexLock lLock(mNumericIdsLock);
+    ZTCMutexLock lLock(*mNumericIdsLock);
     if (!sIsGivenOut(mNumericIds, acrId)) {
         throw ZTCNotFoundEx("The number is not given out");
     }
@@ -95,6 +95,7 @@ void ZTCSystem::preInit() {}
 void ZTCSystem::init() {
     mProtocolHelper = ZTCPointer<ZTCProtocolHelper>(NEW ZTCProtocolHelper());
     mBufferManager = ZTCPointer<ZTCBufferManager>(NEW ZTCBufferManager());
+    mNumericIdsLock = ZTCPointer<ZTCMutex>(NEW ZTCMutex());
 }
 
 void ZTCSystem::postDestroy() {}
@@ -128,6 +129,13 @@ void ZTCSystem::processCommandLineArguments() {
     if (lcrOptions.mShowVersion) {
         displayVersionAndExit();
     }
+    if (lcrOptions.mHasLogFile) {
+        mLogFilePath = lcrOptions.mLogFile;
+        setLogFilePath(mLogFilePath.get());
+    }
+    if (lcrOptions.mHasLogCode) {
+        setLogCode(lcrOptions.mLogCode);
+    }
     if (lcrOptions.mHasConfigFile) {
         processConfigFile(lcrOptions.mConfigFile);
     }
@@ -140,25 +148,18 @@ void ZTCSystem::processCommandLineArguments() {
         }
         std::exit(0);
     }
-
-    if (lcrOptions.mHasLogFile) {
-        mLogFilePath = lcrOptions.mLogFile;
-        setLogFilePath(mLogFilePath.get());
-    }
-    if (lcrOptions.mHasLogCode) {
-        setLogCode(lcrOptions.mLogCode);
-    }
     if (lcrOptions.mHasHbTimeout) {
         setHbTimeout(lcrOptions.mHbTimeout);
     }
     ZTCProtocolHelper::setSnifferMode(lcrOptions.mSniffer);
-    mRunAsDaemon = lcrOptions.mRunAsDaemon;
 }
 
 void ZTCSystem::systemDaemonize(ZTCString aDirectory, ZTCString aInput, ZTCString aOutput, ZTCString aError) {
     std::cout.flush();
     std::cerr.flush();
-    if (ClibFork() != 0) {
+    const ::pid_t lDaemon = ClibFork();
+    if (lDaemon != 0) {
+        ZTCSignalWaiter::handOnSignals(lDaemon);
         ::_exit(0);
     }
     ClibSetsid();

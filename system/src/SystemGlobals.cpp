@@ -67,35 +67,46 @@ private:
     bool mIsArmed = true;
 };
 
-/// The life of the process from its options on.
-void sRun(ZTCSystem& lrSystem) {
-    lrSystem.processCommandLineArguments();
-
-    if (lrSystem.isAnInstanceRunning()) {
-        sRefuseToRunTwice(lrSystem);
-    }
-    ZTCRunGuard lGuard(lrSystem);
-    if (lrSystem.isToRunAsDaemon()) {
+/// The life of the process from the instance check on.
+void sRunAlone(ZTCSystem& arSystem) {
+    ZTCRunGuard lGuard(arSystem);
+    if (arSystem.isToRunAsDaemon()) {
         const ZTCString lNull("/dev/null");
-        lrSystem.systemDaemonize(ZTCString(""), lNull, lNull, lNull);
+        arSystem.systemDaemonize(ZTCString(""), lNull, lNull, lNull);
     }
-    lrSystem.markAsRunning();
+    arSystem.markAsRunning();
     // Made here: whoever needs them to end the process must not be the first to ask for them.
     getStopEvent();
     getExitEvent();
-    lrSystem.startSignalWaiter();
+    arSystem.startSignalWaiter();
 
-    lrSystem.init();
-    lrSystem.createThreads();
-    lrSystem.startThreads();
-    lrSystem.postThreadsInit();
-    lrSystem.waitForThreads();
+    arSystem.init();
+    arSystem.createThreads();
+    arSystem.startThreads();
+    arSystem.postThreadsInit();
+    arSystem.waitForThreads();
 
-    lrSystem.destroy();
-    lrSystem.stopSignalWaiter();
-    lrSystem.exitInstanceManagement();
-    lrSystem.postDestroy();
+    arSystem.destroy();
+    arSystem.stopSignalWaiter();
+    arSystem.exitInstanceManagement();
+    arSystem.postDestroy();
     lGuard.disarm();
+}
+
+/// Takes the steps. Says why where they end the process: its caller does so at info level, which is off by default.
+template <typename Steps>
+void sTakeSaidSteps(ZTCSystem& arSystem, Steps aSteps) {
+    try {
+        aSteps();
+    } catch (const ZTCExitConditionEx& acrException) {
+        // The log has a notice of its own. A daemon's standard error leads nowhere, so this is for a start by hand.
+        std::cerr << arSystem.getName().get() << " ends: " << acrException.what() << std::endl;
+        throw;
+    } catch (const ZTCException& acrException) {
+        std::cerr << arSystem.getName().get() << " ends: " << acrException.what() << std::endl;
+        ZT_LOG_ERR("%s ends: %s", arSystem.getName().get(), acrException.what());
+        throw;
+    }
 }
 
 }  // namespace
@@ -123,17 +134,18 @@ void SystemMain(int aArgc, char** apArgv) {
     }
     ZTCSystem& lrSystem = *spSystem;
 
-    lrSystem.preInit();
-    lrSystem.setCmdLineArgDescs();
+    sTakeSaidSteps(lrSystem, [&] {
+        lrSystem.preInit();
+        lrSystem.setCmdLineArgDescs();
+    });
     lrSystem.processCommandLine(aArgc, apArgv);
-    try {
-        sRun(lrSystem);
-    } catch (const ZTCExitConditionEx&) {
-        throw;
-    } catch (const ZTCException& acrException) {
-        // Who catches it says so at info level, which is off by default.
-        std::cerr << lrSystem.getName().get() << " ends: " << acrException.what() << std::endl;
-        ZT_LOG_ERR("%s ends: %s", lrSystem.getName().get(), acrException.what());
-        throw;
+    bool lIsAnother = false;
+    sTakeSaidSteps(lrSystem, [&] {
+        lrSystem.processCommandLineArguments();
+        lIsAnother = lrSystem.isAnInstanceRunning();
+    });
+    if (lIsAnother) {
+        sRefuseToRunTwice(lrSystem);
     }
+    sTakeSaidSteps(lrSystem, [&] { sRunAlone(lrSystem); });
 }

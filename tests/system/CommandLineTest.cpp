@@ -57,6 +57,11 @@ TEST(CommandLine, AConfigurationFileIsNotImplemented) {
     writeFile(lAgent.workingDirectory() + "/tavik.conf", "");
     const ZTSRunResult lResult = lAgent.run(lAgent.defaultArguments({"-c", lAgent.workingDirectory() + "/tavik.conf"}));
     EXPECT_EQ(lResult.mStatus, 0);
+    EXPECT_EQ(lResult.mError, "qrv-tvk ends: Not Implemented\n");
+    EXPECT_TRUE(lAgent.log().has("Failed with error - Not Implemented, exiting abruptly", "-I-"))
+        << "-l and -d are applied before -c";
+    EXPECT_EQ(lAgent.log().lines().back().mFunction, "main");
+    EXPECT_EQ(lAgent.log().lines().back().mText, "Left");
     EXPECT_FALSE(lAgent.defaultLog().has("Tavik System exiting"));
     EXPECT_TRUE(lAgent.library().calls().empty());
     sExpectNothingMade(lAgent);

@@ -233,12 +233,24 @@ TEST(Lifecycle, ARefusedStartSaysWhyInTheLogAndOnStandardErrorWhateverTheLogCode
     lStart(lLibraryAgent, "3");
 }
 
-TEST(Lifecycle, AnOrdinaryEndSaysNothingOnStandardError) {
+TEST(Lifecycle, AStartByHandOnAHostWithoutAdaptersSaysOnStandardErrorWhyItEnded) {
     ZTCAgentProcess lAgent(0);
     const ZTSRunResult lResult = lAgent.run({"-D", "false"});
     EXPECT_EQ(lResult.mStatus, 0);
-    EXPECT_EQ(lResult.mError, "");
+    EXPECT_EQ(lResult.mError, "qrv-tvk ends: No QRV Adapters found.. Tavik would exit\n");
     EXPECT_TRUE(lAgent.defaultLog().has("No QRV Adapters found.. Tavik would exit", "-N-"));
+
+    ZTCAgentProcess lWithoutLibrary;
+    lWithoutLibrary.setEnvironment("ZT_LIBKPM_PATH", "");
+    EXPECT_EQ(lWithoutLibrary.run({"-D", "false"}).mError, "qrv-tvk ends: No Libkpm found\n");
+}
+
+TEST(Lifecycle, AnOrdinaryEndSaysNothingOnStandardError) {
+    ZTCAgentProcess lAgent;
+    lAgent.startAndConnectQuietly();
+    EXPECT_EQ(lAgent.request("04"), gcSuccessHex);
+    EXPECT_EQ(lAgent.waitForExit(), 0);
+    EXPECT_EQ(lAgent.process().standardError(), "");
 }
 
 TEST(Lifecycle, ADirectoryInAFifosPlaceIsRefused) {

@@ -13,57 +13,16 @@
 #include <string>
 
 #include "common/include/Exception.h"
+#include "common/include/Log.h"
 #include "tests/unit/os/LogCapture.h"
 #include "tests/unit/system/ForkedProcess.h"
+#include "tests/unit/system/InstanceTesting.h"
 
-class ProcessInstanceManager : public testing::Test {
-protected:
-    ProcessInstanceManager() : mPath(mDirectory.path("a.pid")) {}
+namespace {
 
-    ZTCProcessInstanceManager* newManager(std::chrono::milliseconds aKillTimeout = std::chrono::milliseconds(20000)) {
-        return new ZTCProcessInstanceManager(ZTCString(mPath.c_str()), aKillTimeout);
-    }
+using ProcessInstanceManager = ZTCInstanceFixture;
 
-    /// A process that is marked as running and ends, giving up its record, when it is told to.
-    ZTCForkedProcess::Function runningInstance() {
-        return [this](ZTCForkedProcess& arSelf) {
-            const ZTCPointer<ZTCProcessInstanceManager> lManager(newManager());
-            if (lManager->isAnInstanceRunning()) {
-                return 1;
-            }
-            lManager->markAsRunning();
-            arSelf.tellParent();
-            arSelf.waitForParent();
-            lManager->exitInstanceManagement();
-            return 0;
-        };
-    }
-
-    std::string killAndCapture(ZTCProcessInstanceManager& arManager) {
-        testing::internal::CaptureStdout();
-        try {
-            arManager.killRunningInstance();
-        } catch (const ZTCException& acrException) {
-            ADD_FAILURE() << acrException.what();
-        }
-        return testing::internal::GetCapturedStdout();
-    }
-
-    ZTCTemporaryDirectory mDirectory;
-    const std::string mPath;
-};
-
-static std::string sStatusError(const std::string& acrPath) {
-    const ZTCProcessInstanceManager lManager(ZTCString("unused"));
-    try {
-        lManager.getProcStatus(ZTCString(acrPath.c_str()));
-    } catch (const ZTCClibGetProcStatusFailedEx& acrException) {
-        return acrException.what();
-    }
-    return "";
-}
-
-// ---- The lock and the file ----
+}  // namespace
 
 TEST_F(ProcessInstanceManager, APidFileThatTakesNoByteIsAnErrorThatNamesIt) {
     ZTCForkedProcess lChild([this](ZTCForkedProcess&) {
@@ -114,6 +73,32 @@ TEST_F(ProcessInstanceManager, MarkingTakesTheLockWhereItWasNotTaken) {
     EXPECT_EQ(readFile(mPath), std::to_string(getpid()) + "\n");
     lSecond->exitInstanceManagement();
     EXPECT_TRUE(exists(mPath));
+}
+
+TEST_F(ProcessInstanceManager, TheLogIsRotatedWhileTheRecordIsHeldAndNoLonger) {
+    const std::string lLog = mDirectory.path("a.log");
+    ZTCForkedProcess lChild([&](ZTCForkedProcess&) {
+        setLogFilePath(lLog.c_str());
+        setLogFileBound(150);
+        const auto lFill = [] {
+            for (int i = 0; i < 4; ++i) {
+                ZT_LOG_NOTICE("%s", "a line of the log");
+            }
+        };
+        const ZTCPointer<ZTCProcessInstanceManager> lManager(newManager());
+        lManager->isAnInstanceRunning();
+        lFill();
+        const bool lBefore = exists(lLog + ".1");
+        lManager->markAsRunning();
+        lFill();
+        const bool lMeanwhile = exists(lLog + ".1");
+        lManager->exitInstanceManagement();
+        unlink((lLog + ".1").c_str());
+        lFill();
+        const bool lAfter = exists(lLog + ".1");
+        return (lBefore ? 1 : 0) + (lMeanwhile ? 2 : 0) + (lAfter ? 4 : 0);
+    });
+    EXPECT_EQ(lChild.waitForExit(), 2);
 }
 
 TEST_F(ProcessInstanceManager, AStalePidFileIsEmptiedAndTakenOver) {
@@ -245,187 +230,4 @@ TEST_F(ProcessInstanceManager, SomethingElseAtThePathIsRefusedUntouched) {
     ASSERT_EQ(symlink(lTarget.c_str(), mPath.c_str()), 0);
     EXPECT_THROW(lManager->isAnInstanceRunning(), ZTCClibOpenFailedEx);
     EXPECT_EQ(readFile(lTarget), "precious");
-}
-
-// ---- Stopping the running instance ----
-
-TEST_F(ProcessInstanceManager, StoppingWhereNoneRunsSaysSo) {
-    const ZTCPointer<ZTCProcessInstanceManager> lManager(newManager());
-    EXPECT_NE(killAndCapture(*lManager).find("No running instance"), std::string::npos);
-    EXPECT_FALSE(exists(mPath));
-
-    // The process that a stale file names is left alone.
-    ZTCForkedProcess lBystander([](ZTCForkedProcess& arSelf) {
-        arSelf.waitForParent();
-        return 0;
-    });
-    writeFile(mPath, std::to_string(lBystander.getPid()) + "\n");
-    EXPECT_NE(killAndCapture(*lManager).find("No running instance"), std::string::npos);
-    lBystander.tellChild();
-    EXPECT_EQ(lBystander.waitForExit(), 0);
-}
-
-TEST_F(ProcessInstanceManager, StoppingWaitsUntilTheProcessIsGone) {
-    ZTCForkedProcess lChild(runningInstance());
-    lChild.waitForChild();
-    const ZTCPointer<ZTCProcessInstanceManager> lManager(newManager());
-    const std::string lSaid = killAndCapture(*lManager);
-    EXPECT_NE(lSaid.find("Stopped"), std::string::npos) << lSaid;
-    EXPECT_NE(lSaid.find(std::to_string(lChild.getPid())), std::string::npos) << lSaid;
-    siginfo_t lInfo{};
-    EXPECT_EQ(waitid(P_PID, static_cast<id_t>(lChild.getPid()), &lInfo, WEXITED | WNOHANG | WNOWAIT), 0);
-    EXPECT_EQ(lInfo.si_pid, lChild.getPid()) << "it still runs";
-    EXPECT_EQ(lChild.waitForExit(), 1000 + SIGTERM);
-}
-
-TEST_F(ProcessInstanceManager, StoppingWaitsForAProcessThatIsStarting) {
-    ZTCForkedProcess lChild([this](ZTCForkedProcess& arSelf) {
-        const ZTCPointer<ZTCProcessInstanceManager> lManager(newManager());
-        if (lManager->isAnInstanceRunning()) {
-            return 1;
-        }
-        arSelf.tellParent();
-        arSelf.waitForParent();
-        lManager->markAsRunning();
-        arSelf.waitForParent();
-        return 0;
-    });
-    lChild.waitForChild();
-    ZTCForkedProcess lStopper(
-        [this](ZTCForkedProcess& arSelf) {
-            const ZTCPointer<ZTCProcessInstanceManager> lManager(newManager());
-            arSelf.tellParent();
-            lManager->killRunningInstance();
-            return 0;
-        },
-        mDirectory.path("stopper"));
-    lStopper.waitForChild();
-    lChild.tellChild();
-    EXPECT_EQ(lChild.waitForExit(), 1000 + SIGTERM);
-    EXPECT_EQ(lStopper.waitForExit(), 0);
-    EXPECT_NE(readFile(mDirectory.path("stopper.out")).find("Stopped"), std::string::npos);
-}
-
-TEST_F(ProcessInstanceManager, StoppingGivesUpAfterItsTime) {
-    ZTCForkedProcess lChild([this](ZTCForkedProcess& arSelf) {
-        signal(SIGTERM, SIG_IGN);
-        return runningInstance()(arSelf);
-    });
-    lChild.waitForChild();
-    const ZTCPointer<ZTCProcessInstanceManager> lManager(newManager(std::chrono::milliseconds(50)));
-    const std::string lSaid = killAndCapture(*lManager);
-    EXPECT_NE(lSaid.find("has not ended"), std::string::npos) << lSaid;
-    lChild.tellChild();
-    EXPECT_EQ(lChild.waitForExit(), 0);
-}
-
-TEST_F(ProcessInstanceManager, StoppingGivesUpOnALockWithoutAProcess) {
-    const ZTCPointer<ZTCProcessInstanceManager> lHolder(newManager());
-    EXPECT_FALSE(lHolder->isAnInstanceRunning());
-    for (const char* lpContent : {"", "no pid", "0\n", "-1\n", "99999999999\n"}) {
-        writeFile(mPath, lpContent);
-        const ZTCPointer<ZTCProcessInstanceManager> lManager(newManager(std::chrono::milliseconds(30)));
-        const std::string lSaid = killAndCapture(*lManager);
-        EXPECT_NE(lSaid.find("named no process"), std::string::npos) << lSaid;
-    }
-}
-
-TEST_F(ProcessInstanceManager, StoppingLeavesAProcessAloneThatIsNotTheFileOwners) {
-    // Another user's file that names a process of this one; without root's rights this user's that names process 1.
-    ZTCForkedProcess lBystander([](ZTCForkedProcess& arSelf) {
-        arSelf.tellParent();
-        arSelf.waitForParent();
-        return 0;
-    });
-    lBystander.waitForChild();
-    const ZTCPointer<ZTCProcessInstanceManager> lHolder(newManager());
-    EXPECT_FALSE(lHolder->isAnInstanceRunning());
-    const bool lIsRoot = geteuid() == 0;
-    const std::string lPid = std::to_string(lIsRoot ? lBystander.getPid() : 1);
-    writeFile(mPath, lPid + "\n");
-    EXPECT_EQ(lIsRoot ? chown(mPath.c_str(), 65534, 65534) : 0, 0);
-    const ZTCPointer<ZTCProcessInstanceManager> lManager(newManager());
-    EXPECT_EQ(killAndCapture(*lManager), "The pid file '" + mPath + "' names process " + lPid +
-                                             ", which is not its owner's; nothing is stopped\n");
-    lBystander.tellChild();
-    EXPECT_EQ(lBystander.waitForExit(), 0);
-}
-
-TEST_F(ProcessInstanceManager, APidFileThatIsTakenOverBelongsToTheProcess) {
-    writeFile(mPath, "");
-    if (geteuid() == 0) {
-        ASSERT_EQ(chown(mPath.c_str(), 65534, 65534), 0);
-    }
-    const ZTCPointer<ZTCProcessInstanceManager> lManager(newManager());
-    EXPECT_FALSE(lManager->isAnInstanceRunning());
-    struct stat lStatus {};
-    ASSERT_EQ(lstat(mPath.c_str(), &lStatus), 0);
-    EXPECT_EQ(lStatus.st_uid, geteuid());
-    lManager->exitInstanceManagement();
-}
-
-// ---- The status of a process ----
-
-TEST_F(ProcessInstanceManager, TheStatusOfARunningProcessIsNoError) {
-    for (const std::string& lcrText :
-         {std::to_string(getpid()), std::to_string(getpid()) + "\n", " " + std::to_string(getpid()) + "\r\n"}) {
-        writeFile(mPath, lcrText);
-        EXPECT_EQ(sStatusError(mPath), "") << lcrText;
-    }
-}
-
-TEST_F(ProcessInstanceManager, TheStatusThroughAPidFileThatNamesNoProcessIsAnErrorWithFileAndReason) {
-    const std::string lMissing = sStatusError(mPath);
-    EXPECT_NE(lMissing.find(mPath), std::string::npos) << lMissing;
-    EXPECT_NE(lMissing.find("No such file"), std::string::npos) << lMissing;
-    for (const char* lpContent :
-         {"", "\n", "0", "-1", "+1", "0x1", "1 1", "1x", "x1", "2147483648", "18446744073709551617"}) {
-        writeFile(mPath, lpContent);
-        EXPECT_NE(sStatusError(mPath).find(mPath), std::string::npos) << lpContent;
-    }
-    writeFile(mPath, std::to_string(getpid()) + std::string(100, ' '));
-    EXPECT_NE(sStatusError(mPath), "");
-    EXPECT_NE(sStatusError(mDirectory.path()), "") << "a directory";
-    ASSERT_EQ(mkfifo(mDirectory.path("fifo").c_str(), 0600), 0);
-    EXPECT_NE(sStatusError(mDirectory.path("fifo")), "");
-}
-
-TEST_F(ProcessInstanceManager, TheStatusOfAZombieIsAnError) {
-    const pid_t lChild = fork();
-    if (lChild == 0) {
-        _exit(0);
-    }
-    ASSERT_GT(lChild, 0);
-    siginfo_t lInfo;
-    ASSERT_EQ(waitid(P_PID, static_cast<id_t>(lChild), &lInfo, WEXITED | WNOWAIT), 0);
-    writeFile(mPath, std::to_string(lChild) + "\n");
-    const std::string lError = sStatusError(mPath);
-    EXPECT_NE(lError.find(std::to_string(lChild)), std::string::npos) << lError;
-    ASSERT_EQ(waitpid(lChild, nullptr, 0), lChild);
-    EXPECT_NE(sStatusError(mPath), "");
-}
-
-TEST_F(ProcessInstanceManager, TheStatusOfAProcessThatMayNotBeSignalledIsNoError) {
-    writeFile(mPath, "1\n");
-    ASSERT_EQ(chmod(mDirectory.path().c_str(), 0755), 0);
-    ZTCForkedProcess lChild([this](ZTCForkedProcess&) {
-        if (geteuid() == 0 && (setgid(65534) != 0 || setuid(65534) != 0)) {
-            return 2;
-        }
-        return sStatusError(mPath).empty() ? 0 : 1;
-    });
-    EXPECT_EQ(lChild.waitForExit(), 0);
-}
-
-TEST_F(ProcessInstanceManager, APidFileThatCannotBeOpenedIsAnErrorThatNamesItAndNothingIsStopped) {
-    // Links are not followed.
-    ASSERT_EQ(symlink(mDirectory.path("elsewhere").c_str(), mPath.c_str()), 0);
-    const ZTCPointer<ZTCProcessInstanceManager> lManager(newManager());
-    try {
-        lManager->killRunningInstance();
-        FAIL() << "a link was followed";
-    } catch (const ZTCClibOpenFailedEx& acrException) {
-        EXPECT_EQ(std::string(acrException.what()),
-                  "Opening the pid file '" + mPath + "' failed: " + std::strerror(ELOOP));
-    }
 }

@@ -221,6 +221,39 @@ TEST_F(SystemMainTest, AnExceptionOutOfAnyOperationGivesUpTheRecordAndTheThreads
     }
 }
 
+TEST_F(SystemMainTest, AnExceptionOutOfPreInitIsSaidLikeThatOfEveryOtherStep) {
+    for (const char* lpFailing : {"preInit", "init"}) {
+        SCOPED_TRACE(lpFailing);
+        unlink(mLogFile.c_str());
+        runInChild([&](ZTCForkedProcess&) {
+            ZTCRecordingSystem lSystem(mPidFile, lpFailing);
+            EXPECT_THROW(sRunSystemMain(&lSystem, {}), ZTCOpsException);
+            return testing::Test::HasFailure() ? 1 : 0;
+        });
+        EXPECT_EQ(readFile(mDirectory.path("child.err")), "test-system ends: told to fail\n");
+        const auto lLines = ZTCAgentLog(mLogFile).containing("test-system ends: told to fail");
+        ASSERT_EQ(lLines.size(), 1u);
+        EXPECT_EQ(lLines[0].mMark, "-E-");
+    }
+}
+
+/// A system whose start is refused.
+class ZTCRefusedSystem : public ZTCTestSystem {
+public:
+    using ZTCTestSystem::ZTCTestSystem;
+    void init() override { throw ZTCExitConditionEx("no use to go on", gcErrStop); }
+};
+
+TEST_F(SystemMainTest, AnExitConditionIsSaidOnStandardErrorAlone) {
+    runInChild([&](ZTCForkedProcess&) {
+        ZTCRefusedSystem lSystem(mPidFile);
+        EXPECT_THROW(sRunSystemMain(&lSystem, {"-D", "false"}), ZTCExitConditionEx);
+        return testing::Test::HasFailure() ? 1 : 0;
+    });
+    EXPECT_EQ(readFile(mDirectory.path("child.err")), "test-system ends: no use to go on\n");
+    EXPECT_TRUE(ZTCAgentLog(mLogFile).containing("no use to go on").empty()) << "who refuses has said it there";
+}
+
 TEST_F(SystemMainTest, AnErrorOfTheCommandLineCreatesNothing) {
     runInChild([this](ZTCForkedProcess&) {
         ZTCRecordingSystem lSystem(mPidFile);
@@ -325,4 +358,46 @@ TEST_F(SystemMainTest, ADaemonKeepsItsDirectoryAndLeavesItsStartersStreamsAlone)
     waitUntil([&] { return waitpid(lDaemon, &lStatus, WNOHANG) == lDaemon; }, "the daemon's end");
     EXPECT_EQ(lStatus, 0);
     EXPECT_FALSE(exists(mPidFile));
+}
+
+/// A system that gets a stop signal at the last moment before it daemonises.
+class ZTCSystemStoppedEarly : public ZTCTestSystem {
+public:
+    ZTCSystemStoppedEarly(const std::string& acrPidFilePath, int aSignal)
+        : ZTCTestSystem(acrPidFilePath), mSignal(aSignal) {}
+    void systemDaemonize(ZTCString aDirectory, ZTCString aInput, ZTCString aOutput, ZTCString aError) override {
+        kill(getpid(), mSignal);
+        ZTCTestSystem::systemDaemonize(aDirectory, aInput, aOutput, aError);
+    }
+
+private:
+    const int mSignal;
+};
+
+TEST_F(SystemMainTest, AStopSignalFromBeforeTheForkStopsTheDaemon) {
+    ASSERT_EQ(prctl(PR_SET_CHILD_SUBREAPER, 1), 0);
+    for (const int lSignal : {SIGTERM, SIGINT}) {
+        ZTCForkedProcess lChild(
+            [&](ZTCForkedProcess& arSelf) {
+                setLogFilePath(mLogFile.c_str());
+                ZTCSystemStoppedEarly lSystem(mPidFile, lSignal);
+                lSystem.addConditional();
+                lSystem.addComponent(
+                    NEW ZTCFunctionComponent(lSystem, "a thread", [&](ZTCFunctionComponent&, ZTCSystem& arSystem) {
+                        // A daemon that was not told goes on until the test ends.
+                        arSystem.wait(0);
+                        arSelf.tellParent();
+                    }));
+                alarm(static_cast<unsigned>(gcTestPatience.count()));
+                sRunSystemMain(&lSystem, {});
+                return 0;
+            },
+            mDirectory.path("child"));
+        EXPECT_EQ(lChild.waitForExit(), 0) << "the process that was started";
+        lChild.waitForChild();
+        int lStatus = -1;
+        waitUntil([&] { return waitpid(-1, &lStatus, WNOHANG) > 0; }, "the daemon's end");
+        EXPECT_EQ(lStatus, 0);
+        EXPECT_FALSE(exists(mPidFile));
+    }
 }
