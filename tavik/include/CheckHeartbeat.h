@@ -4,6 +4,7 @@
 
 #include <cstdint>
 
+#include "common/include/Log.h"
 #include "common/include/Pointer.h"
 #include "common/include/String.h"
 #include "os/common/include/SystemInterface.h"
@@ -16,7 +17,10 @@ class ZTCCheckHeartbeat {
 public:
     /// aFileName is the other's heartbeat file and also its pid file. The system is not owned.
     ZTCCheckHeartbeat(ZTCPointer<ZTCString> aFileName, ZTCSystemInterface* apSystem)
-        : mFileName(aFileName), mpSystemInterface(apSystem), mPrevTime(0), mRetriesDone(0) {}
+        : mFileName(aFileName), mpSystemInterface(apSystem), mPrevTime(0), mRetriesDone(0) {
+        ZT_ENTRY();
+        ZT_EXIT();
+    }
     virtual ~ZTCCheckHeartbeat() = default;
 
     /// One look at the file. The first one never fails; the second look in a row without progress (the file cannot be

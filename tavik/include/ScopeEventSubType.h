@@ -5,14 +5,18 @@
 #ifndef TAVIK_SCOPEEVENTSUBTYPE_H
 #define TAVIK_SCOPEEVENTSUBTYPE_H
 
+#include "common/include/Log.h"
 #include "libkpm/include/libkpm.h"
 #include "sensor/agentcommon/include/ScopeEvent.h"
 
 /// Declares the class ZTC<Subtype>ScopeEvent of the kind (Category, Subcategory).
-#define ZT_SCOPE_EVENT_SUBTYPE(Subtype, Category, Subcategory)                   \
-    class ZTC##Subtype##ScopeEvent : public ZTCScopeEvent {                      \
-    public:                                                                      \
-        ZTC##Subtype##ScopeEvent() : ZTCScopeEvent((Category), (Subcategory)) {} \
+#define ZT_SCOPE_EVENT_SUBTYPE(Subtype, Category, Subcategory)                  \
+    class ZTC##Subtype##ScopeEvent : public ZTCScopeEvent {                     \
+    public:                                                                     \
+        ZTC##Subtype##ScopeEvent() : ZTCScopeEvent((Category), (Subcategory)) { \
+            ZT_ENTRY();                                                         \
+            ZT_EXIT();                                                          \
+        }                                                                       \
     }
 
 /// Category of the kinds that are registered per board with an event type of their own.

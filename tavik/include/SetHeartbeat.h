@@ -2,13 +2,17 @@
 #ifndef TAVIK_SETHEARTBEAT_H
 #define TAVIK_SETHEARTBEAT_H
 
+#include "common/include/Log.h"
 #include "common/include/Pointer.h"
 #include "common/include/String.h"
 
 /// Used by one thread.
 class ZTCSetHeartbeat {
 public:
-    explicit ZTCSetHeartbeat(ZTCPointer<ZTCString> aFileName) : mFileName(aFileName) {}
+    explicit ZTCSetHeartbeat(ZTCPointer<ZTCString> aFileName) : mFileName(aFileName) {
+        ZT_ENTRY();
+        ZT_EXIT();
+    }
     virtual ~ZTCSetHeartbeat() = default;
 
     /// Sets the file's access and modification time to now. Throws ZTCClibUtimeFailedEx.

@@ -19,7 +19,10 @@ public:
     /// Shares the two names.
     ZTCTavikInitiator(unsigned int aBoardId, const ZTCPointer<ZTCWorldWideName>& acrWwnn,
                       const ZTCPointer<ZTCWorldWideName>& acrWwpn)
-        : mBoardId(aBoardId), mWwnn(acrWwnn), mWwpn(acrWwpn) {}
+        : mBoardId(aBoardId), mWwnn(acrWwnn), mWwpn(acrWwpn) {
+        ZT_ENTRY();
+        ZT_EXIT();
+    }
     virtual ~ZTCTavikInitiator() = default;
 
     /// The adapter's index as the library reports it.
@@ -29,10 +32,12 @@ public:
 
     /// The node name, a dot and the port name: by this the sensor tells the boards' record lists apart.
     ZTCString getKey() const {
+        ZT_ENTRY();
         char lKey[ZTCWorldWideName::gcStringLength + 1 + ZTCWorldWideName::gcStringLength];
         char* lpEnd = mWwnn->storeString(lKey);
         *lpEnd++ = '.';
         lpEnd = mWwpn->storeString(lpEnd);
+        ZT_EXIT();
         return ZTCString(lKey, static_cast<std::size_t>(lpEnd - lKey));
     }
 
@@ -40,7 +45,11 @@ public:
     auto r_begin() const { return mRegMap.begin(); }
     auto r_end() const { return mRegMap.end(); }
 
-    void cleanRegs() { mRegMap.clear(); }
+    void cleanRegs() {
+        ZT_ENTRY();
+        mRegMap.clear();
+        ZT_EXIT();
+    }
 
     /// Notes a registration. A kind that is registered already gets the new handle; the old one is not unregistered.
     void addRegEvent(const ZTCPointer<ZTCScopeEvent>& acrEvent, unsigned int aHandle) {

@@ -12,6 +12,8 @@
 /// No lock of its own: guarded by the system's previous-data lock until a retrieval has taken it out of the maps.
 class ZTCTavikRecord {
 public:
+    using ZTMadeWithItsCount = void;
+
     /// Encoded bytes of the occurrences and the times.
     static constexpr Size gcFixedSize = sizeof(std::uint32_t) + ZTCDateTime::gcEncodedSize + ZTCDateTime::gcEncodedSize;
 

@@ -4,6 +4,7 @@
 
 #include "common/include/EncodableStream.h"
 #include "common/include/List.h"
+#include "common/include/Log.h"
 #include "common/include/Pointer.h"
 #include "tavik/include/TavikRecord.h"
 
@@ -13,13 +14,24 @@ class ZTCTavikSystem;
 class ZTCTavikRecordList {
 public:
     /// apSystem is not owned and outlives the list.
-    ZTCTavikRecordList(unsigned int aBoardId, ZTCTavikSystem* apSystem) : mpSystem(apSystem), mBoardId(aBoardId) {}
+    ZTCTavikRecordList(unsigned int aBoardId, ZTCTavikSystem* apSystem) : mpSystem(apSystem), mBoardId(aBoardId) {
+        ZT_ENTRY();
+        ZT_EXIT();
+    }
     virtual ~ZTCTavikRecordList() = default;
 
     /// Appends at the end. Throws ZTCNoMemoryEx and changes nothing then.
-    void addRecord(ZTCPointer<ZTCTavikRecord>& arRecord) { mRecordList.push_back(arRecord); }
+    void addRecord(ZTCPointer<ZTCTavikRecord>& arRecord) {
+        ZT_ENTRY();
+        mRecordList.push_back(arRecord);
+        ZT_EXIT();
+    }
 
-    void clear() { mRecordList.clear(); }
+    void clear() {
+        ZT_ENTRY();
+        mRecordList.clear();
+        ZT_EXIT();
+    }
 
     unsigned int size() const { return mRecordList.size(); }
     unsigned int getBoardId() const { return mBoardId; }

@@ -89,18 +89,15 @@ public:
     void addWwpnTarget(const ZTCPointer<ZTCTavikTarget>& acrTarget) ZT_EXCLUDES(mPrevDataLock);
 
     /// Throw ZTCNotFoundEx where there is no such target. The key of a port name is ZTCWorldWideName::getKey.
-    const ZTCPointer<ZTCTavikTarget>& getFcTarget(unsigned int aFcId) ZT_REQUIRES(mPrevDataLock) {
+    const ZTCPointer<ZTCTavikTarget>& getFcTarget(unsigned int aFcId) const ZT_REQUIRES(mPrevDataLock) {
         return mTargetsMap.get(aFcId);
     }
-    const ZTCPointer<ZTCTavikTarget>& getWwpnTarget(const unsigned long& acrKey) ZT_REQUIRES(mPrevDataLock) {
+    const ZTCPointer<ZTCTavikTarget>& getWwpnTarget(const unsigned long& acrKey) const ZT_REQUIRES(mPrevDataLock) {
         return mTargetsWwpnMap.get(acrKey);
     }
 
     /// For the path of events, where an unknown port is an everyday thing: null where there is no such target.
-    const ZTCTavikTarget* findFcTarget(unsigned int aFcId) ZT_REQUIRES(mPrevDataLock) {
-        const ZTCPointer<ZTCTavikTarget>* lpTarget = mTargetsMap.get(aFcId, std::nothrow);
-        return lpTarget == nullptr ? nullptr : lpTarget->get();
-    }
+    const ZTCTavikTarget* findFcTarget(unsigned int aFcId) const ZT_REQUIRES(mPrevDataLock);
     const ZTSRemotePortNames* findWwpnNames(unsigned long aKey) noexcept ZT_REQUIRES(mPrevDataLock);
 
     // ---- Record lists: filled by callbacks, exchanged by the command thread.
@@ -140,8 +137,16 @@ public:
 
     /// Names the lock for the thread-safety analysis.
     const ZTCMutex& getPrevDataLock() const ZT_RETURN_CAPABILITY(mPrevDataLock) { return *mPrevDataLock; }
-    void acquirePrevDataLock() ZT_ACQUIRE(mPrevDataLock) { mPrevDataLock->lock(); }
-    void releasePrevDataLock() ZT_RELEASE(mPrevDataLock) { mPrevDataLock->unlock(); }
+    void acquirePrevDataLock() ZT_ACQUIRE(mPrevDataLock) {
+        ZT_ENTRY();
+        mPrevDataLock->lock();
+        ZT_EXIT();
+    }
+    void releasePrevDataLock() ZT_RELEASE(mPrevDataLock) {
+        ZT_ENTRY();
+        mPrevDataLock->unlock();
+        ZT_EXIT();
+    }
 
     bool isPrevScopeDataSet() const ZT_REQUIRES(mPrevDataLock) { return mPrevScopeDataSet; }
     ZTCPointer<ZTCScopeData>& getPrevScopeData() ZT_REQUIRES(mPrevDataLock) { return mPrevScopeData; }
@@ -190,7 +195,6 @@ private:
     bool mPrevScopeDataSet ZT_GUARDED_BY(mPrevDataLock);
     ZTCPointer<ZTCScopeData> mPrevScopeData ZT_GUARDED_BY(mPrevDataLock);
     ZTCTavikTargetWwpnMap mTargetsWwpnMap ZT_GUARDED_BY(mPrevDataLock);
-    ZTCTavikTargetIndex mTargetIndex ZT_GUARDED_BY(mPrevDataLock);  ///< the names in mTargetsWwpnMap
     ZTCPointer<ZTCWorldWideName> mPrevPortName ZT_GUARDED_BY(mPrevDataLock);
     std::atomic<std::uint32_t> mTotalEventDataSize;  ///< written under mPrevDataLock
     unsigned int mPrevBoardId ZT_GUARDED_BY(mPrevDataLock);
@@ -202,6 +206,8 @@ private:
     ZTCString mTvkCmdIpcPath;
     ZTCString mTvkOutIpcPath;
 
+    ZTCTavikTargetIndex mTargetIndex ZT_GUARDED_BY(mPrevDataLock);  ///< the names in mTargetsWwpnMap
+
     friend class ZTCPrevDataHold;
 };
 
@@ -209,9 +215,15 @@ private:
 class ZT_SCOPED_CAPABILITY ZTCPrevDataHold {
 public:
     explicit ZTCPrevDataHold(ZTCTavikSystem& arSystem) ZT_ACQUIRE(arSystem.mPrevDataLock) : mrSystem(arSystem) {
-        mrSystem.acquirePrevDataLock();
+        ZT_ENTRY();
+        mrSystem.mPrevDataLock->lock();
+        ZT_EXIT();
     }
-    ~ZTCPrevDataHold() ZT_RELEASE() { mrSystem.releasePrevDataLock(); }
+    ~ZTCPrevDataHold() ZT_RELEASE() {
+        ZT_ENTRY();
+        mrSystem.mPrevDataLock->unlock();
+        ZT_EXIT();
+    }
     ZTCPrevDataHold(const ZTCPrevDataHold&) = delete;
     ZTCPrevDataHold& operator=(const ZTCPrevDataHold&) = delete;
 

@@ -2,6 +2,7 @@
 #ifndef TAVIK_TAVIKTARGET_H
 #define TAVIK_TAVIKTARGET_H
 
+#include "common/include/Log.h"
 #include "common/include/Pointer.h"
 #include "sensor/agentcommon/include/WorldWideName.h"
 
@@ -11,7 +12,10 @@ public:
     /// Shares the two names.
     ZTCTavikTarget(const ZTCPointer<ZTCWorldWideName>& acrWwnn, const ZTCPointer<ZTCWorldWideName>& acrWwpn,
                    unsigned int aFcId)
-        : mWwnn(acrWwnn), mWwpn(acrWwpn), mFcId(aFcId) {}
+        : mWwnn(acrWwnn), mWwpn(acrWwpn), mFcId(aFcId) {
+        ZT_ENTRY();
+        ZT_EXIT();
+    }
     virtual ~ZTCTavikTarget() = default;
 
     const ZTCPointer<ZTCWorldWideName>& getWwnn() const { return mWwnn; }

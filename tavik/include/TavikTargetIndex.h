@@ -28,9 +28,7 @@ public:
 
 private:
     /// Where the search for a key begins.
-    std::size_t getFirstSlot(unsigned long aKey) const noexcept {
-        return static_cast<std::size_t>(aKey * 0x9e3779b97f4a7c15 >> mShift);
-    }
+    std::size_t getFirstSlot(unsigned long aKey) const noexcept;
 
     /// A slot whose port name is that of no port is free, so that a port of that name stands by itself. The number of
     /// slots is a power of 2, and at most two thirds of them are taken.

@@ -53,5 +53,8 @@ void ZTCCheckHeartbeat::getProcStatus() {
 }
 
 bool ZTCCheckHeartbeat::isOutOfRetries() {
-    return ++mRetriesDone >= MAX_HEARTBEAT_RETRIES;
+    ZT_ENTRY();
+    const bool lIsOut = ++mRetriesDone >= MAX_HEARTBEAT_RETRIES;
+    ZT_EXIT();
+    return lIsOut;
 }

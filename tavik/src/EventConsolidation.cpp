@@ -4,6 +4,7 @@
 
 #include "common/include/Log.h"
 #include "common/include/Memory.h"
+#include "common/include/Unaligned.h"
 #include "sensor/agentcommon/include/EventDataRecords.h"
 #include "tavik/include/EventDataBytes.h"
 
@@ -12,89 +13,94 @@ namespace {
 constexpr unsigned int gcAllLuns = 0xFFFFFFFF;
 constexpr unsigned int gcBitsPerField = gcBitFieldSize * 8;
 
-unsigned int sReadNumber(const unsigned char* apPayload, unsigned int aOffset) {
-    unsigned int lNumber;
-    std::memcpy(&lNumber, apPayload + aOffset, sizeof lNumber);
-    return lNumber;
-}
-
 bool sIsSameIdentity(const ZTSConsolidationKind& acrKind, const ZTSPrevIdentity& acrPrev,
                      const unsigned char* apPayload) {
-    for (unsigned lIndex = 0; acrKind.mIdentityNames[lIndex] != 0; ++lIndex) {
-        if (!(*acrPrev.mpNames[lIndex] == ZTCWorldWideName(apPayload + acrKind.mIdentityNames[lIndex]))) {
-            return false;
-        }
+    ZT_ENTRY();
+    bool lIsSame = true;
+    for (unsigned lIndex = 0; lIsSame && acrKind.mIdentityNames[lIndex] != 0; ++lIndex) {
+        lIsSame = *acrPrev.mpNames[lIndex] == ZTCWorldWideName(apPayload + acrKind.mIdentityNames[lIndex]);
     }
-    for (unsigned lIndex = 0; acrKind.mIdentityNumbers[lIndex] != 0; ++lIndex) {
-        if (*acrPrev.mpNumbers[lIndex] != sReadNumber(apPayload, acrKind.mIdentityNumbers[lIndex])) {
-            return false;
-        }
+    for (unsigned lIndex = 0; lIsSame && acrKind.mIdentityNumbers[lIndex] != 0; ++lIndex) {
+        lIsSame =
+            *acrPrev.mpNumbers[lIndex] == loadUnaligned<unsigned int>(apPayload + acrKind.mIdentityNumbers[lIndex]);
     }
-    return true;
+    ZT_EXIT();
+    return lIsSame;
 }
 
 void sNoteIdentity(const ZTSConsolidationKind& acrKind, const ZTSPrevIdentity& acrPrev,
                    const unsigned char* apPayload) noexcept {
+    ZT_ENTRY();
     for (unsigned lIndex = 0; acrKind.mIdentityNames[lIndex] != 0; ++lIndex) {
         *acrPrev.mpNames[lIndex] = ZTCWorldWideName(apPayload + acrKind.mIdentityNames[lIndex]);
     }
     for (unsigned lIndex = 0; acrKind.mIdentityNumbers[lIndex] != 0; ++lIndex) {
-        *acrPrev.mpNumbers[lIndex] = sReadNumber(apPayload, acrKind.mIdentityNumbers[lIndex]);
+        *acrPrev.mpNumbers[lIndex] = loadUnaligned<unsigned int>(apPayload + acrKind.mIdentityNumbers[lIndex]);
     }
+    ZT_EXIT();
 }
 
 void sCopyFields(const ZTSFieldCopy* apFields, const unsigned char* apPayload, unsigned char* apRecord) {
+    ZT_ENTRY();
     for (; apFields->mSize != 0; ++apFields) {
         unsigned char* lpTo = apRecord + apFields->mRecordOffset;
         if (apFields->mSize == ZTCWorldWideName::gcLength) {
             std::memcpy(lpTo, apPayload + apFields->mPayloadOffset, ZTCWorldWideName::gcLength);
         } else {
-            TavikStore32(lpTo, sReadNumber(apPayload, apFields->mPayloadOffset));
+            TavikStore32(lpTo, loadUnaligned<unsigned int>(apPayload + apFields->mPayloadOffset));
         }
     }
+    ZT_EXIT();
 }
 
 void sSetBits(const ZTSConsolidationKind& acrKind, const unsigned char* apPayload, unsigned char* apRecord) {
+    ZT_ENTRY();
     for (const ZTSBitFieldCopy* lpField = acrKind.mBitFields; lpField->mFieldOffset != 0; ++lpField) {
-        const unsigned int lNumber = sReadNumber(apPayload, lpField->mPayloadOffset);
+        const unsigned int lNumber = loadUnaligned<unsigned int>(apPayload + lpField->mPayloadOffset);
         if (lpField->mHasAll && lNumber == gcAllLuns) {
             TavikSet_AllBitField(apRecord + lpField->mFieldOffset, gcBitFieldSize);
         } else if (lNumber < gcBitsPerField) {
             TavikSet_BitField(apRecord + lpField->mFieldOffset, lNumber);
         }
     }
+    ZT_EXIT();
 }
 
 void sFillRecord(const ZTSConsolidationKind& acrKind, const unsigned char* apPayload, unsigned char* apRecord) {
+    ZT_ENTRY();
     TavikStore32(apRecord, EVENTDATA_VERSION);
     sCopyFields(acrKind.mRecordFields, apPayload, apRecord);
     for (const ZTSBitFieldCopy* lpField = acrKind.mBitFields; lpField->mFieldOffset != 0; ++lpField) {
         TavikStore32(apRecord + lpField->mLengthOffset, gcBitsPerField);
     }
     sSetBits(acrKind, apPayload, apRecord);
+    ZT_EXIT();
 }
 
 /// True where the event went into the pending record, whose identity it has.
 bool sContinue(ZTCTavikSystem& arSystem, const ZTSConsolidationKind& acrKind, const unsigned char* apPayload)
     ZT_REQUIRES(arSystem.getPrevDataLock()) {
+    ZT_ENTRY();
+    bool lIsContinued = true;
     switch (acrKind.mContinuation) {
         case ZTCN_Count:
             arSystem.incrementOccurences();
-            return true;
+            break;
         case ZTCN_SetBits:
             sSetBits(acrKind, apPayload, arSystem.getPrevScopeData()->getEventData());
             arSystem.incrementOccurences();
-            return true;
+            break;
         case ZTCN_Append:
-            if (arSystem.canAddEventDataPerRecord(acrKind.mAppendedSize)) {
+            lIsContinued = arSystem.canAddEventDataPerRecord(acrKind.mAppendedSize);
+            if (lIsContinued) {
                 unsigned char lAppended[gcMaxAppendedSize] = {};
                 sCopyFields(acrKind.mAppendedFields, apPayload, lAppended);
                 arSystem.appendEventData(lAppended, acrKind.mAppendedSize);
-                return true;
             }
             break;
     }
-    return false;
+    ZT_EXIT();
+    return lIsContinued;
 }
 
 }  // namespace

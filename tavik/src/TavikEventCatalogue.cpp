@@ -8,7 +8,10 @@ namespace {
 
 template <typename TKind>
 ZTCScopeEvent* sMake() {
-    return NEW TKind();
+    ZT_ENTRY();
+    ZTCScopeEvent* const lpKind = NEW TKind();
+    ZT_EXIT();
+    return lpKind;
 }
 
 struct ZTSCatalogueEntry {

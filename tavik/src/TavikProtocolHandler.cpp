@@ -1,6 +1,8 @@
 #include "tavik/include/TavikProtocolHandler.h"
 
+#include <algorithm>
 #include <cstdint>
+#include <iterator>
 
 #include "common/include/Assert.h"
 #include "common/include/EncodableStream.h"
@@ -54,18 +56,63 @@ const ZTSBoardRegistration gcBoardRegistrations[] = {
 /// The library hands the context of a board registration back unread.
 void* const gcpBoardContext = reinterpret_cast<void*>(std::uintptr_t{0xFFFF});
 
+enum ZTERegistrationOutcome : unsigned char {
+    ZTRG_Registered,
+    ZTRG_Ignored,  ///< a kind that nothing registers
+    ZTRG_Missing,  ///< the library refused a kind that the agent can do without
+    ZTRG_Refused   ///< the library refused a kind that the agent needs
+};
+
+/// What came of registering one kind for one initiator.
+struct ZTSRegistration {
+    ZTERegistrationOutcome mOutcome;
+    unsigned int mStatus;                 ///< a board registration yields none: 0
+    unsigned int mHandle;                 ///< where it is registered
+    const ZTSBoardRegistration* mpBoard;  ///< null for a kind that the library reports per port
+};
+
 const ZTSBoardRegistration* sFindBoardRegistration(unsigned char aSubcategory) {
-    for (const ZTSBoardRegistration& lrRegistration : gcBoardRegistrations) {
-        if (lrRegistration.mSubcategory == aSubcategory) {
-            return &lrRegistration;
-        }
-    }
-    return nullptr;
+    ZT_ENTRY();
+    const auto* lpFound = std::find_if(std::begin(gcBoardRegistrations), std::end(gcBoardRegistrations),
+                                       [&](const auto& acrRow) { return acrRow.mSubcategory == aSubcategory; });
+    ZT_EXIT();
+    return lpFound == std::end(gcBoardRegistrations) ? nullptr : lpFound;
 }
 
 bool sIsAccepted(unsigned int aStatus) {
-    return aStatus == KPM_STATUS_SUCCESS || aStatus == KPM_STATUS_INFO_5 || aStatus == KPM_STATUS_NO_SOURCE ||
-           aStatus == KPM_STATUS_NO_RIGHTS;
+    ZT_ENTRY();
+    const bool lIsAccepted = aStatus == KPM_STATUS_SUCCESS || aStatus == KPM_STATUS_INFO_5 ||
+                             aStatus == KPM_STATUS_NO_SOURCE || aStatus == KPM_STATUS_NO_RIGHTS;
+    ZT_EXIT();
+    return lIsAccepted;
+}
+
+/// Registers a kind that the library reports per port.
+ZTSRegistration sRegisterForPort(ZTCTavikSystem* apSystem, const ZTCTavikInitiator& acrInitiator,
+                                 const ZTCPointer<ZTCScopeEvent>& acrEvent) {
+    ZT_ENTRY();
+    unsigned int lHandle = 0;
+    const unsigned int lStatus = apSystem->getLibkpmAbs()->LIBKPM_ZtapiRegEvent(
+        acrInitiator.getBoardId(), acrInitiator.getWwpn(), acrEvent, apSystem, &lHandle, &ScopeCb_Generic);
+    const ZTERegistrationOutcome lOutcome = sIsAccepted(lStatus) ? ZTRG_Registered : ZTRG_Refused;
+    ZT_EXIT();
+    return {lOutcome, lStatus, lHandle, nullptr};
+}
+
+/// Registers a kind that the library reports per board.
+ZTSRegistration sRegisterForBoard(ZTCTavikSystem* apSystem, const ZTCTavikInitiator& acrInitiator,
+                                  const ZTCPointer<ZTCScopeEvent>& acrEvent) {
+    ZT_ENTRY();
+    ZTSRegistration lResult{ZTRG_Ignored, 0, 0, sFindBoardRegistration(acrEvent->getSubcategory())};
+    if (lResult.mpBoard != nullptr) {
+        const ZTSBoardRegistration& lcrRow = *lResult.mpBoard;
+        lResult.mHandle = apSystem->getLibkpmAbs()->LIBKPM_KpmRegEvent(
+            acrInitiator.getBoardId(), lcrRow.mEventType, gcpBoardContext, lcrRow.mSize, lcrRow.mpCallback);
+        const ZTERegistrationOutcome lOutcomeOfFailure = lcrRow.mIsRequired ? ZTRG_Refused : ZTRG_Missing;
+        lResult.mOutcome = lResult.mHandle != 0 ? ZTRG_Registered : lOutcomeOfFailure;
+    }
+    ZT_EXIT();
+    return lResult;
 }
 
 }  // namespace
@@ -110,56 +157,47 @@ void ZTCTavikProtocolHandler::handleStartScopeCommand(const ZTCPointer<ZTCBuffer
         return;
     }
 
+    bool lIsRefused = false;
     for (const auto& lrEntry : mpTavikSystem->getInitiators()) {
-        ZTCLibkpmAbs& lrLibkpm = *mpTavikSystem->getLibkpmAbs();
-        const ZTCPointer<ZTCTavikInitiator>& lrInitiator = lrEntry.second;
-        const unsigned int lBoardId = lrInitiator->getBoardId();
-        const ZTCString lWwnn = lrInitiator->getWwnn()->getString();
-        const ZTCString lWwpn = lrInitiator->getWwpn()->getString();
+        ZTCTavikInitiator& lrInitiator = *lrEntry.second;
+        const ZTCString lWwnn = lrInitiator.getWwnn()->getString();
+        const ZTCString lWwpn = lrInitiator.getWwpn()->getString();
         for (const ZTCPointer<ZTCScopeEvent>& lrEvent : mpTavikSystem->getEventCatalogue()->getAll()) {
-            unsigned int lStatus = 0;
-            unsigned int lHandle = 0;
+            if (lIsRefused) {
+                break;
+            }
             const unsigned int lCategory = lrEvent->getCategory();
             const unsigned int lSubcategory = lrEvent->getSubcategory();
-            if (lCategory != gcBoardEventCategory) {
-                lStatus = lrLibkpm.LIBKPM_ZtapiRegEvent(lBoardId, lrInitiator->getWwpn(), lrEvent, mpTavikSystem,
-                                                        &lHandle, &ScopeCb_Generic);
-                if (!sIsAccepted(lStatus)) {
-                    ZT_LOG_ERR("Failed to register event (%u, %u) for Initiator <%s, %s> - Error %u", lCategory,
-                               lSubcategory, lWwnn.get(), lWwpn.get(), lStatus);
-                    createFailedResponse(ZTSAPS_NotAllowed, arResponse);
-                    ZT_EXIT();
-                    return;
-                }
-                ZT_LOG_NOTICE("Registered event (%u, %u) for Initiator <%s, %s>", lCategory, lSubcategory, lWwnn.get(),
-                              lWwpn.get());
-                lrInitiator->addRegEvent(lrEvent, lHandle);
-                continue;
-            }
-
-            const ZTSBoardRegistration* lpRegistration = sFindBoardRegistration(lrEvent->getSubcategory());
-            if (lpRegistration == nullptr) {
+            const bool lIsOfBoard = lCategory == gcBoardEventCategory;
+            const ZTSRegistration lResult = lIsOfBoard ? sRegisterForBoard(mpTavikSystem, lrInitiator, lrEvent)
+                                                       : sRegisterForPort(mpTavikSystem, lrInitiator, lrEvent);
+            lIsRefused = lResult.mOutcome == ZTRG_Refused;
+            if (lResult.mOutcome == ZTRG_Ignored) {
                 ZT_TRACE_MSG("Ignore other events for now");
-                continue;
-            }
-            lHandle = lrLibkpm.LIBKPM_KpmRegEvent(lBoardId, lpRegistration->mEventType, gcpBoardContext,
-                                                  lpRegistration->mSize, lpRegistration->mpCallback);
-            // A board registration yields no status, so that a failure shows the one it started with.
-            if (lHandle != 0) {
-                ZT_LOG_NOTICE(lpRegistration->mpRegisteredText, lWwnn.get(), lWwpn.get());
-                lrInitiator->addRegEvent(lrEvent, lHandle);
-            } else if (lpRegistration->mIsRequired) {
-                ZT_LOG_ERR(lpRegistration->mpFailedText, lWwnn.get(), lWwpn.get(), lStatus);
-                createFailedResponse(ZTSAPS_NotAllowed, arResponse);
-                ZT_EXIT();
-                return;
+            } else if (lResult.mOutcome == ZTRG_Missing) {
+                ZT_LOG_WARN(lResult.mpBoard->mpFailedText, lWwnn.get(), lWwpn.get(), lResult.mStatus);
+            } else if (lIsRefused && lIsOfBoard) {
+                ZT_LOG_ERR(lResult.mpBoard->mpFailedText, lWwnn.get(), lWwpn.get(), lResult.mStatus);
+            } else if (lIsRefused) {
+                ZT_LOG_ERR("Failed to register event (%u, %u) for Initiator <%s, %s> - Error %u", lCategory,
+                           lSubcategory, lWwnn.get(), lWwpn.get(), lResult.mStatus);
             } else {
-                ZT_LOG_WARN(lpRegistration->mpFailedText, lWwnn.get(), lWwpn.get(), lStatus);
+                if (lIsOfBoard) {
+                    ZT_LOG_NOTICE(lResult.mpBoard->mpRegisteredText, lWwnn.get(), lWwpn.get());
+                } else {
+                    ZT_LOG_NOTICE("Registered event (%u, %u) for Initiator <%s, %s>", lCategory, lSubcategory,
+                                  lWwnn.get(), lWwpn.get());
+                }
+                lrInitiator.addRegEvent(lrEvent, lResult.mHandle);
             }
         }
     }
-    mEventsRegistered = true;
-    createSuccessResponse(arResponse);
+    mEventsRegistered = !lIsRefused;
+    if (lIsRefused) {
+        createFailedResponse(ZTSAPS_NotAllowed, arResponse);
+    } else {
+        createSuccessResponse(arResponse);
+    }
     ZT_EXIT();
 }
 
@@ -280,13 +318,13 @@ void ZTCTavikProtocolHandler::handleRegisterTargetsCommand(const ZTCPointer<ZTCB
         return;
     }
     for (unsigned int lIndex = 0; lIndex < lTargetCount; ++lIndex) {
-        auto lWwnn = ZTCPointer<ZTCWorldWideName>::make();
-        auto lWwpn = ZTCPointer<ZTCWorldWideName>::make();
+        const ZTCPointer<ZTCWorldWideName> lWwnn(NEW ZTCWorldWideName());
+        const ZTCPointer<ZTCWorldWideName> lWwpn(NEW ZTCWorldWideName());
         unsigned int lFcId = 0;
         lWwnn->decode(lStream);
         lWwpn->decode(lStream);
         lStream >> lFcId;
-        const auto lTarget = ZTCPointer<ZTCTavikTarget>::make(lWwnn, lWwpn, lFcId);
+        const ZTCPointer<ZTCTavikTarget> lTarget(NEW ZTCTavikTarget(lWwnn, lWwpn, lFcId));
         mpTavikSystem->addFcTarget(lTarget);
         mpTavikSystem->addWwpnTarget(lTarget);
     }

@@ -31,12 +31,14 @@ constexpr char gcRuntimeDir[] = "/tmp";
 constexpr unsigned gcDefaultLogCode = 63;
 constexpr unsigned gcDefaultHbTimeout = 240;
 
-// Hexadecimal: 03567, the sticky bit and no read for the owner's group. The umask applies.
+// Hexadecimal 0x777 is octal 3567: set-group-id and sticky; owner r-x, group rw-, others rwx. The umask applies.
 constexpr int gcRuntimeDirMode = 0x777;
 
 /// Who changes the total holds the lock, so that nobody comes in between; its readers without the lock need no order.
 void sAddToTotal(std::atomic<std::uint32_t>& arTotal, unsigned int aBytes) noexcept {
+    ZT_ENTRY();
     arTotal.store(arTotal.load(std::memory_order_relaxed) + aBytes, std::memory_order_relaxed);
+    ZT_EXIT();
 }
 
 void sCreateRtdir() {
@@ -266,6 +268,7 @@ void ZTCTavikSystem::postDestroy() {
 // ---- Command line ----
 
 void ZTCTavikSystem::setCmdLineArgDescs() {
+    ZT_ENTRY();
     static constexpr struct {
         ZTECommandLineArgumentType mType;
         const char* mpIdentifier;
@@ -274,7 +277,6 @@ void ZTCTavikSystem::setCmdLineArgDescs() {
         {ZTCLAT_OptionValue, "-D"}, {ZTCLAT_OptionValue, "-l"}, {ZTCLAT_OptionValue, "-d"},
         {ZTCLAT_OptionValue, "-c"}, {ZTCLAT_OptionOnly, "-S"},  {ZTCLAT_OptionValue, "-b"},
     };
-    ZT_ENTRY();
     ZT_LOG_INFO("Setting Command line argument descs");
     for (const auto& lrOption : lcOptions) {
         ZTSCommandLineArgumentDesc lDesc{};
@@ -389,12 +391,21 @@ void ZTCTavikSystem::addWwpnTarget(const ZTCPointer<ZTCTavikTarget>& acrTarget) 
     ZT_EXIT();
 }
 
+const ZTCTavikTarget* ZTCTavikSystem::findFcTarget(unsigned int aFcId) const {
+    ZT_ENTRY();
+    const ZTCPointer<ZTCTavikTarget>* const lpTarget = mTargetsMap.get(aFcId, std::nothrow);
+    ZT_EXIT();
+    return lpTarget == nullptr ? nullptr : lpTarget->get();
+}
+
 const ZTSRemotePortNames* ZTCTavikSystem::findWwpnNames(unsigned long aKey) noexcept {
+    ZT_ENTRY();
     const ZTSRemotePortNames* lpNames = mTargetIndex.find(aKey);
     if (lpNames == nullptr && isLogLevelEnabled(ZTLL_Info)) {
         // The map does not have it either, and says so.
         static_cast<void>(mTargetsWwpnMap.get(aKey, std::nothrow));
     }
+    ZT_EXIT();
     return lpNames;
 }
 

@@ -4,23 +4,27 @@
 #include <new>
 
 #include "common/include/Exception.h"
+#include "common/include/Log.h"
 
 namespace {
 
 constexpr std::size_t gcLeastSlots = 16;
 constexpr unsigned gcHashBits = 64;
+constexpr unsigned long gcHashFactor = 0x9e3779b97f4a7c15;
 
 }  // namespace
 
 void ZTCTavikTargetIndex::reserveOne() {
+    ZT_ENTRY();
     if (3 * (mTaken + 1) <= 2 * mSlots.size()) {
+        ZT_EXIT();
         return;
     }
     ZTCTavikTargetIndex lGrown;
     try {
         lGrown.mSlots.resize(mSlots.empty() ? gcLeastSlots : 2 * mSlots.size());
     } catch (const std::bad_alloc&) {
-        throw ZTCNoMemoryEx("Out of Memory", gcErrNoMemory);
+        ZT_THROW(ZTCNoMemoryEx, "Out of Memory", gcErrNoMemory);
     }
     lGrown.mShift = gcHashBits - static_cast<unsigned>(std::countr_zero(lGrown.mSlots.size()));
     for (const ZTSRemotePortNames& lrNames : mSlots) {
@@ -30,12 +34,15 @@ void ZTCTavikTargetIndex::reserveOne() {
     }
     mSlots.swap(lGrown.mSlots);
     mShift = lGrown.mShift;
+    ZT_EXIT();
 }
 
 void ZTCTavikTargetIndex::insert(const ZTSRemotePortNames& acrNames) noexcept {
+    ZT_ENTRY();
     if (acrNames.mWwpn.getKey() == 0) {
         mNoPort = acrNames;
         mHasNoPort = true;
+        ZT_EXIT();
         return;
     }
     std::size_t lSlot = getFirstSlot(acrNames.mWwpn.getKey());
@@ -44,23 +51,29 @@ void ZTCTavikTargetIndex::insert(const ZTSRemotePortNames& acrNames) noexcept {
     }
     mSlots[lSlot] = acrNames;
     ++mTaken;
+    ZT_EXIT();
 }
 
 const ZTSRemotePortNames* ZTCTavikTargetIndex::find(unsigned long aKey) const noexcept {
+    ZT_ENTRY();
+    const ZTSRemotePortNames* lpFound = nullptr;
     if (aKey == 0) {
-        return mHasNoPort ? &mNoPort : nullptr;
-    }
-    if (mSlots.empty()) {
-        return nullptr;
-    }
-    const std::size_t lMask = mSlots.size() - 1;
-    for (std::size_t lSlot = getFirstSlot(aKey);; lSlot = (lSlot + 1) & lMask) {
-        const unsigned long lKey = mSlots[lSlot].mWwpn.getKey();
-        if (lKey == aKey) {
-            return &mSlots[lSlot];
+        lpFound = mHasNoPort ? &mNoPort : nullptr;
+    } else if (!mSlots.empty()) {
+        const std::size_t lMask = mSlots.size() - 1;
+        std::size_t lSlot = getFirstSlot(aKey);
+        while (mSlots[lSlot].mWwpn.getKey() != aKey && mSlots[lSlot].mWwpn.getKey() != 0) {
+            lSlot = (lSlot + 1) & lMask;
         }
-        if (lKey == 0) {
-            return nullptr;
-        }
+        lpFound = mSlots[lSlot].mWwpn.getKey() == aKey ? &mSlots[lSlot] : nullptr;
     }
+    ZT_EXIT();
+    return lpFound;
+}
+
+std::size_t ZTCTavikTargetIndex::getFirstSlot(unsigned long aKey) const noexcept {
+    ZT_ENTRY();
+    const auto lSlot = static_cast<std::size_t>(aKey * gcHashFactor >> mShift);
+    ZT_EXIT();
+    return lSlot;
 }

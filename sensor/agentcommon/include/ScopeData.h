@@ -17,6 +17,8 @@ inline constexpr Size MAX_SCOPERECORD_SIZE = 900;
 /// No lock of its own: guarded by the lock of whoever holds it.
 class ZTCScopeData {
 public:
+    using ZTMadeWithItsCount = void;
+
     /// Encoded bytes beside the names and the data: category, subcategory, names (0 or 1), length.
     static constexpr Size gcFixedSize = 7;
 

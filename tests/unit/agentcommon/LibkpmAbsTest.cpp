@@ -80,6 +80,12 @@ TEST_F(LibkpmAbs, AFileThatIsNoLibraryIsRefusedWithTheLoadersReason) {
     expectRefusal("Libkpm '" + lPath + "' cannot be loaded: " + lPath + ": file too short");
 }
 
+TEST_F(LibkpmAbs, ALibraryThatNeedsAFunctionThatIsNowhereIsRefusedWhenItIsLoaded) {
+    const std::string lPath = ZTCAdaptersLibraryDouble::incompleteModulePath();
+    setenv("ZT_LIBKPM_PATH", lPath.c_str(), 1);
+    expectRefusal("Libkpm '" + lPath + "' cannot be loaded: " + lPath + ": undefined symbol: functionThatIsNowhere");
+}
+
 TEST_F(LibkpmAbs, AnEmptyPathDisablesTheLibrary) {
     setenv("ZT_LIBKPM_PATH", "", 1);
     expectRefusal("Libkpm is disabled: ZT_LIBKPM_PATH is set and empty");

@@ -1,7 +1,9 @@
 #include <gtest/gtest.h>
 
 #include "common/include/Exception.h"
+#include "common/include/Log.h"
 #include "os/common/include/ProcessEvents.h"
+#include "system/include/SystemGlobals.h"
 #include "tests/unit/tavik/support/TavikFixture.h"
 
 namespace {
@@ -76,6 +78,27 @@ TEST_F(AdapterDiscovery, AnOldDriverIsAnExitConditionAfterTheLibraryIsClosedAndU
                         "Old incompatible driver found.. Tavik would exit",
                         {"KPM_GetFunctionList 1", "Init", "GetNumberOfAdapters", "IsZtapiSupported", "Close"});
     EXPECT_THROW(mSystem->getLibkpmAbs()->LIBKPM_Close(), ZTCInvalidEx);
+}
+
+TEST_F(AdapterDiscovery, TheLibraryIsClosedAndUnloadedBeforeTheNotice) {
+    for (const bool lHasAdapters : {false, true}) {
+        mLibrary.mNumberOfAdapters = lHasAdapters ? 1 : 0;
+        mLibrary.mIsZtapiSupported = 0;
+        mSystem = std::make_unique<ZTCTestTavikSystem>();
+        setSystemObject(mSystem.get());
+        mSystem->preInit();
+        setLogCode(255);
+        mLog.forget();
+        EXPECT_THROW(mSystem->init(), ZTCExitConditionEx);
+        setLogCode(gcDefaultLogCode);
+        std::vector<std::string> lSeen;
+        for (const ZTSLogLine& lcrLine : mLog.lines()) {
+            if (lcrLine.mMark == "-N-" || (lcrLine.mFunction == "closeLibkpm" && lcrLine.mText == "Left")) {
+                lSeen.push_back(lcrLine.mFunction);
+            }
+        }
+        EXPECT_EQ((std::vector<std::string>{"closeLibkpm", "initLibkpm"}), lSeen);
+    }
 }
 
 TEST_F(AdapterDiscovery, WithoutAdaptersAndWithAnOldDriverTheAdaptersAreReported) {

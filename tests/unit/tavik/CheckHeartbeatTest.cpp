@@ -155,7 +155,7 @@ TEST_F(CheckHeartbeat, TheTraceEndsBeforeTheWarningOfAnUnchangedTime) {
     mLog.forget();
     setLogCode(ZTLL_Debug | ZTLL_Warning);
     EXPECT_TRUE(lookFails());
-    EXPECT_EQ((std::vector<std::string>{"-T- Entered", "-T- Left", unchangedText()}),
+    EXPECT_EQ((std::vector<std::string>{"-T- Entered", "-T- Entered", "-T- Left", "-T- Left", unchangedText()}),
               mLog.texts("", ".//CheckHeartbeat"));
 }
 

@@ -18,6 +18,23 @@ protected:
 
 }  // namespace
 
+TEST_F(PendingRecord, ItsCapacityIsTheLimitOfTheStartCommand) {
+    registerTargets({{makeWwn(1), makeWwn(2), 3}});
+    const ZTCBytes lKnown = ZTCByteWriter().le32(0).wwn(makeWwn(2)).le32(0).bytes();
+    const ZTCBytes lUnknown = ZTCByteWriter().le32(0).wwn(makeWwn(9)).le32(0).bytes();
+    for (const unsigned lLimit : {0u, 77u, 0xFFFFFFFFu}) {
+        startScope(lLimit);
+        deliverScope(0, 4, 1, lKnown);
+        EXPECT_EQ(lLimit, mSystem->pendingCapacity());
+        deliverScope(0, 4, 1, lUnknown);
+        EXPECT_EQ(lLimit, mSystem->pendingCapacity());
+        deliverRscn(0, makeRscn({1}));
+        EXPECT_EQ(lLimit, mSystem->pendingCapacity());
+        deliverTemperature(0);
+        EXPECT_EQ(lLimit, mSystem->pendingCapacity());
+    }
+}
+
 TEST_F(PendingRecord, IsInNoListUntilAnotherOneTakesItsPlace) {
     mSystem->makePendingRecord(1, 8);
     EXPECT_TRUE(mSystem->hasPendingRecord());

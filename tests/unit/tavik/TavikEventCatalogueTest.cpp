@@ -2,6 +2,8 @@
 
 #include <gtest/gtest.h>
 
+#include <map>
+#include <string>
 #include <vector>
 
 #include "common/include/Exception.h"
@@ -75,6 +77,40 @@ TEST_F(TavikEventCatalogue, SaysEachKindAtInfoLevelInOrder) {
     setLogCode(ZTLL_Info);
     const ZTCTavikEventCatalogue lCatalogue;
     EXPECT_EQ(lExpected, mLog.texts());
+}
+
+TEST_F(TavikEventCatalogue, SaysEachKindBeforeItIsInserted) {
+    setLogCode(255);
+    ZTCTavikEventCatalogue();
+    std::vector<std::string> lFirst;
+    std::vector<std::string> lSecond;
+    for (const ZTSLogLine& lcrLine : mLog.lines()) {
+        if (lcrLine.mMark == "-I-") {
+            lFirst.push_back(lcrLine.mText);
+        } else if (lcrLine.mFunction == "insertIntoCatalogue" && lcrLine.mText == "Entered") {
+            lSecond.push_back(lcrLine.mText);
+            EXPECT_EQ(lFirst.size(), lSecond.size());
+        }
+    }
+    EXPECT_EQ(20u, lSecond.size());
+}
+
+TEST_F(TavikEventCatalogue, HasASubcategoryForEveryBitOfTheFiveMasks) {
+    EXPECT_EQ(0x1Fu, ZT_ELS_SUBCATEGORY_VALID_MASK);
+    EXPECT_EQ(0x07u, ZT_FABRIC_SUBCATEGORY_MASK);
+    EXPECT_EQ(0x7Fu, ZT_SCSI_SUBCATEGORY_VALID_MASK);
+    EXPECT_EQ(0x01u, ZT_BOARD_SUBCATEGORY_VALID_MASK);
+    EXPECT_EQ(0x01u, ZT_ADAPTER_SUBCATEGORY_VALID_MASK);
+    std::map<unsigned, unsigned> lSubcategories;
+    const ZTCTavikEventCatalogue lCatalogue;
+    for (const ZTCPointer<ZTCScopeEvent>& lcrKind : lCatalogue.getAll()) {
+        lSubcategories[lcrKind->getCategory()] |= lcrKind->getSubcategory();
+    }
+    EXPECT_EQ(ZT_ELS_SUBCATEGORY_VALID_MASK, lSubcategories[ZT_REG_ELS_EVENT]);
+    EXPECT_EQ(ZT_FABRIC_SUBCATEGORY_MASK, lSubcategories[ZT_REG_FABRIC_EVENT]);
+    EXPECT_EQ(ZT_SCSI_SUBCATEGORY_VALID_MASK, lSubcategories[ZT_REG_SCSI_EVENT]);
+    EXPECT_EQ(ZT_BOARD_SUBCATEGORY_VALID_MASK, lSubcategories[ZT_REG_BOARD_EVENT]);
+    EXPECT_EQ(ZT_ADAPTER_SUBCATEGORY_VALID_MASK, lSubcategories[ZT_REG_ADAPTER_EVENT]);
 }
 
 TEST_F(TavikEventCatalogue, SaysNothingAtTheDefaultLogCode) {

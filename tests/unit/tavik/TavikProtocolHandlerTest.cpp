@@ -4,6 +4,7 @@
 
 #include "common/include/Exception.h"
 #include "common/include/Log.h"
+#include "tests/support/VirtualSlot.h"
 #include "tests/unit/agentcommon/support/BufferBytes.h"
 #include "tests/unit/tavik/support/Deliveries.h"
 #include "tests/unit/tavik/support/TavikFixture.h"
@@ -76,6 +77,30 @@ TEST_F(TavikProtocolHandler, ConstructionNamesTheSystemToTheCallbacksAndSwitches
     const ZTCTavikProtocolHandler lHandler(mSystem.get());
     EXPECT_EQ(mSystem.get(), gpTavikSystem);
     EXPECT_FALSE(mDoScopeCollection);
+}
+
+TEST_F(TavikProtocolHandler, ItsVirtualOperationsStandInTheirOrder) {
+    using Handler = ZTCTavikProtocolHandler;
+    const std::vector<std::size_t> lSlots = {
+        virtualSlotOf(&Handler::process),
+        virtualSlotOf(&Handler::handleStartScopeCommand),
+        virtualSlotOf(&Handler::handleGetScopeDataCommand),
+        virtualSlotOf(&Handler::handleStopCommand),
+        virtualSlotOf(&Handler::handleUnregisterEvents),
+        virtualSlotOf(&Handler::handleRegisterTargetsCommand),
+        virtualSlotOf(&Handler::handleSetCollectionPeriodCommand),
+        virtualSlotOf(&Handler::handleShutDownCommand),
+        virtualSlotOf(&Handler::createSuccessResponse),
+        virtualSlotOf(&Handler::createFailedResponse),
+    };
+    EXPECT_EQ(slotsBehindTheDestructor(lSlots.size()), lSlots);
+}
+
+TEST_F(TavikProtocolHandler, ItsConstantsAreThose) {
+    EXPECT_EQ(60u, ZT_COLLECTION_PERIOD_MIN);
+    EXPECT_EQ(65535u, ZT_COLLECTION_PERIOD_MAX);
+    EXPECT_EQ(3600u, ZT_DEFAULT_COLLECTION_PERIOD);
+    EXPECT_EQ(104857600u, ZT_DEFAULT_RESP_LIST_SIZE);
 }
 
 TEST_F(TavikProtocolHandler, WithoutASystemEndsTheProcess) {

@@ -6,8 +6,7 @@
 
 static ZTCPointer<ZTCTavikRecord> sMakeRecord(unsigned char aMark) {
     const ZTCPointer<ZTCScopeEvent> lEvent(new ZTCScopeEvent(1, 1));
-    return ZTCPointer<ZTCTavikRecord>(
-        new ZTCTavikRecord(ZTCPointer<ZTCScopeData>(new ZTCScopeData(lEvent, &aMark, 1, 0))));
+    return ZTCPointer<ZTCTavikRecord>::make(ZTCPointer<ZTCScopeData>::make(lEvent, &aMark, 1u, 0u));
 }
 
 TEST(TavikRecordList, AnEmptyOneEncodesAsOneZero) {

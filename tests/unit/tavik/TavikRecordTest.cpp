@@ -16,8 +16,8 @@ template struct ZTSCounterAccess<&ZTCTavikRecord::mOccurences>;
 
 static ZTCPointer<ZTCScopeData> sMakeData() {
     const ZTCBytes lBytes = bytesOf("01000000 aabbccdd");
-    return ZTCPointer<ZTCScopeData>(
-        new ZTCScopeData(ZTCPointer<ZTCScopeEvent>(new ZTCScopeEvent(1, 0x20)), lBytes.data(), 8, 900));
+    return ZTCPointer<ZTCScopeData>::make(ZTCPointer<ZTCScopeEvent>(new ZTCScopeEvent(1, 0x20)), lBytes.data(), 8u,
+                                          900u);
 }
 
 /// The record's encoding inside of the smallest response, taken apart.

@@ -5,6 +5,7 @@
 
 #include <cstring>
 #include <iostream>
+#include <regex>
 #include <sstream>
 
 #include "common/include/Exception.h"
@@ -58,6 +59,22 @@ TEST_F(TavikSystem, ConstructionZeroesEverything) {
     EXPECT_FALSE(mSystem->getProtocolHandler() != nullptr);
     EXPECT_FALSE(mDoScopeCollection);
     EXPECT_THROW(mSystem->getFcInitiator(0), ZTCNotFoundEx);
+}
+
+TEST_F(TavikSystem, ItsFieldsAreDeclaredInTheirOrder) {
+    const std::string lHeader = readFile(TAVIK_SOURCE_ROOT "/tavik/include/TavikSystem.h");
+    const std::string lPrivate = lHeader.substr(lHeader.find("void filePrevScopeRecord()"));
+    const std::regex lField(R"(\n    (?:\[\[maybe_unused\]\] )?[\w:<>, ]+ (m[A-Z]\w*)(?: ZT_GUARDED_BY\(\w+\))?;)");
+    std::vector<std::string> lFields;
+    for (std::sregex_iterator lMatch(lPrivate.begin(), lPrivate.end(), lField), lcEnd; lMatch != lcEnd; ++lMatch) {
+        lFields.push_back((*lMatch)[1]);
+    }
+    EXPECT_EQ((std::vector<std::string>{"mMaxScopeEventDataSize", "mMaxTotalEventDataSize", "mLibkpmAbs",
+                                        "mInitiatorsMap", "mTargetsMap", "mRecordsMap", "mProtocolHandler",
+                                        "mEventCatalogue", "mPrevScopeDataSet", "mPrevScopeData", "mTargetsWwpnMap",
+                                        "mPrevPortName", "mTotalEventDataSize", "mPrevBoardId", "mPrevScopeRecord",
+                                        "mPrevDataLock", "mTvkCmdIpcPath", "mTvkOutIpcPath", "mTargetIndex"}),
+              lFields);
 }
 
 TEST_F(TavikSystem, ThePipePathsCanBeSet) {

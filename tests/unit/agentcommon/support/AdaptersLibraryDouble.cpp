@@ -40,6 +40,10 @@ std::string ZTCAdaptersLibraryDouble::modulePath() {
     return TAVIK_UNIT_LIBKPM;
 }
 
+std::string ZTCAdaptersLibraryDouble::incompleteModulePath() {
+    return TAVIK_UNIT_LIBKPM_INCOMPLETE;
+}
+
 std::string ZTCAdaptersLibraryDouble::moduleWithoutEntryPath() {
     return TAVIK_UNIT_LIBKPM_NO_ENTRY;
 }

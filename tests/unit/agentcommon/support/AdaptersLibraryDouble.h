@@ -28,6 +28,7 @@ public:
 
     static std::string modulePath();
     static std::string moduleWithoutEntryPath();
+    static std::string incompleteModulePath();
     static ZTSWwn nodeName(unsigned aBoard) { return makeWwn(0x20000000c9000000 + aBoard); }
     static ZTSWwn portName(unsigned aBoard) { return makeWwn(0x10000000c9000000 + aBoard); }
     /// "NODE, PORT", as log lines name an initiator.

@@ -1,10 +1,10 @@
 #include "tests/unit/logtexts/support/LogCalls.h"
 
-#include <algorithm>
-#include <cctype>
 #include <cstddef>
 #include <map>
 #include <optional>
+
+#include "tests/unit/logtexts/support/SourceText.h"
 
 namespace {
 
@@ -59,56 +59,6 @@ const std::map<std::string, ZTSLogMacro>& sMacros() {
     return srMacros;
 }
 
-bool sIsWordChar(char aChar) {
-    return std::isalnum(static_cast<unsigned char>(aChar)) != 0 || aChar == '_';
-}
-
-/// The end of the text or character in quotes that begins here, one past its closing quote.
-std::size_t sEndOfQuoted(const std::string& acrText, std::size_t aBegin) {
-    std::size_t lEnd = aBegin + 1;
-    while (lEnd < acrText.size() && acrText[lEnd] != acrText[aBegin]) {
-        lEnd += acrText[lEnd] == '\\' ? 2 : 1;
-    }
-    return std::min(lEnd + 1, acrText.size());
-}
-
-bool sIsDigitSeparator(const std::string& acrText, std::size_t aAt) {
-    return acrText[aAt] == '\'' && aAt != 0 && sIsWordChar(acrText[aAt - 1]);
-}
-
-/// The source without comments and preprocessor lines.
-std::string sBare(const std::string& acrSource) {
-    std::string lBare;
-    bool lIsAtLineStart = true;
-    for (std::size_t lAt = 0; lAt < acrSource.size();) {
-        if (acrSource.compare(lAt, 2, "//") == 0) {
-            lAt = std::min(acrSource.find('\n', lAt), acrSource.size());
-        } else if (acrSource.compare(lAt, 2, "/*") == 0) {
-            lAt = std::min(acrSource.find("*/", lAt), acrSource.size() - 2) + 2;
-        } else if (lIsAtLineStart && acrSource[lAt] == '#') {
-            while (lAt < acrSource.size() && acrSource[lAt] != '\n') {
-                lAt += acrSource[lAt] == '\\' ? 2 : 1;
-            }
-        } else if (acrSource[lAt] == '"' || (acrSource[lAt] == '\'' && !sIsDigitSeparator(acrSource, lAt))) {
-            const std::size_t lEnd = sEndOfQuoted(acrSource, lAt);
-            lBare += acrSource.substr(lAt, lEnd - lAt);
-            lAt = lEnd;
-            lIsAtLineStart = false;
-        } else {
-            lIsAtLineStart = acrSource[lAt] == '\n' || (lIsAtLineStart && acrSource[lAt] == ' ');
-            lBare += acrSource[lAt++];
-        }
-    }
-    return lBare;
-}
-
-std::size_t sSkipBlanks(const std::string& acrText, std::size_t aAt) {
-    while (aAt < acrText.size() && std::isspace(static_cast<unsigned char>(acrText[aAt])) != 0) {
-        ++aAt;
-    }
-    return aAt;
-}
-
 std::string sUnescaped(const std::string& acrQuoted) {
     std::string lText;
     for (std::size_t lAt = 1; lAt + 1 < acrQuoted.size(); ++lAt) {
@@ -136,13 +86,13 @@ std::optional<ZTSLiteral> sReadLiteral(const std::string& acrText, std::size_t a
     ZTSLiteral lLiteral{"", aBegin};
     for (std::size_t lAt = aBegin; lAt < acrText.size();) {
         if (acrText[lAt] == '"') {
-            const std::size_t lEnd = sEndOfQuoted(acrText, lAt);
+            const std::size_t lEnd = endOfQuoted(acrText, lAt);
             lLiteral.mText += sUnescaped(acrText.substr(lAt, lEnd - lAt));
             lLiteral.mEnd = lEnd;
-            lAt = sSkipBlanks(acrText, lEnd);
+            lAt = skipBlanks(acrText, lEnd);
         } else if (acrText.compare(lAt, 6, "PRIu64") == 0) {
             lLiteral.mText += "lu";
-            lAt = sSkipBlanks(acrText, lAt + 6);
+            lAt = skipBlanks(acrText, lAt + 6);
         } else {
             break;
         }
@@ -157,7 +107,7 @@ std::vector<std::string> sArguments(const std::string& acrText, std::size_t aOpe
     for (std::size_t lAt = aOpen + 1; lAt < acrText.size();) {
         const char lChar = acrText[lAt];
         if (lChar == '"' || lChar == '\'') {
-            const std::size_t lEnd = sEndOfQuoted(acrText, lAt);
+            const std::size_t lEnd = endOfQuoted(acrText, lAt);
             lArguments.back() += acrText.substr(lAt, lEnd - lAt);
             lAt = lEnd;
             continue;
@@ -175,7 +125,7 @@ std::vector<std::string> sArguments(const std::string& acrText, std::size_t aOpe
         ++lAt;
     }
     for (std::string& lrArgument : lArguments) {
-        lrArgument = lrArgument.substr(sSkipBlanks(lrArgument, 0));
+        lrArgument = lrArgument.substr(skipBlanks(lrArgument, 0));
     }
     return lArguments;
 }
@@ -212,7 +162,7 @@ std::string sTextOfCall(const std::string& acrMacro, ZTEMacroSort aSort, const s
 }  // namespace
 
 ZTSLogSource readLogCalls(const std::string& acrSource) {
-    const std::string lText = sBare(acrSource);
+    const std::string lText = withoutComments(acrSource);
     ZTSLogSource lSource;
     for (std::size_t lAt = 0; lAt < lText.size();) {
         if (const auto lLiteral = sReadLiteral(lText, lAt)) {
@@ -220,17 +170,17 @@ ZTSLogSource readLogCalls(const std::string& acrSource) {
             lAt = lLiteral->mEnd;
             continue;
         }
-        if (!sIsWordChar(lText[lAt])) {
-            lAt = lText[lAt] == '\'' ? sEndOfQuoted(lText, lAt) : lAt + 1;
+        if (!isWordChar(lText[lAt])) {
+            lAt = lText[lAt] == '\'' ? endOfQuoted(lText, lAt) : lAt + 1;
             continue;
         }
         std::size_t lEnd = lAt;
-        while (lEnd < lText.size() && (sIsWordChar(lText[lEnd]) || sIsDigitSeparator(lText, lEnd))) {
+        while (lEnd < lText.size() && (isWordChar(lText[lEnd]) || isDigitSeparator(lText, lEnd))) {
             ++lEnd;
         }
         const std::string lWord = lText.substr(lAt, lEnd - lAt);
         const auto lMacro = sMacros().find(lWord);
-        const std::size_t lOpen = sSkipBlanks(lText, lEnd);
+        const std::size_t lOpen = skipBlanks(lText, lEnd);
         if (lMacro != sMacros().end() && lOpen < lText.size() && lText[lOpen] == '(') {
             const std::vector<std::string> lArguments = sArguments(lText, lOpen);
             const bool lIsDeclaration = lWord == "sFinish" && lArguments[0].find('&') != std::string::npos;

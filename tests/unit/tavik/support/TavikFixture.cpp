@@ -42,6 +42,11 @@ std::string ZTCTestTavikSystem::pendingDataHex() {
     return hexOf(ZTCBytes(lrData.getEventData(), lrData.getEventData() + lrData.getEventDataSize()));
 }
 
+unsigned ZTCTestTavikSystem::pendingCapacity() {
+    const ZTCPrevDataHold lHold(*this);
+    return getPrevScopeData()->getCapacity();
+}
+
 bool ZTCTestTavikSystem::hasRecordList(unsigned aBoard) {
     const ZTCPrevDataHold lHold(*this);
     return isRecordListExist(aBoard);
@@ -83,7 +88,7 @@ std::string ZTCTestTavikSystem::targetByPortName(const ZTSWwn& acrPortName) {
 void ZTCTestTavikSystem::makePendingRecord(unsigned aBoard, unsigned aSize) {
     const ZTCPointer<ZTCScopeEvent> lEvent(new ZTCScopeEvent(0xEE, 0xEE));
     const ZTCBytes lBytes(aSize, 0xEE);
-    ZTCPointer<ZTCScopeData> lData(new ZTCScopeData(lEvent, lBytes.data(), aSize, getMaxEventDataSize()));
+    auto lData = ZTCPointer<ZTCScopeData>::make(lEvent, lBytes.data(), aSize, getMaxEventDataSize());
     const ZTCPrevDataHold lHold(*this);
     setPrevScopeData(aBoard, lData);
 }

@@ -43,6 +43,7 @@ public:
     bool hasPendingRecord();
     unsigned pendingBoard();
     std::string pendingDataHex();
+    unsigned pendingCapacity();
     bool hasRecordList(unsigned aBoard);
     unsigned recordListSize(unsigned aBoard);
     bool canAddToPendingRecord(unsigned aLength);
