@@ -3,6 +3,7 @@
 #include <fcntl.h>
 #include <gtest/gtest.h>
 #include <signal.h>
+#include <sys/prctl.h>
 #include <sys/wait.h>
 #include <unistd.h>
 
@@ -10,6 +11,7 @@
 #include <cstring>
 #include <filesystem>
 #include <functional>
+#include <iterator>
 #include <string>
 
 #include "tests/support/ResourceLimit.h"
@@ -243,41 +245,6 @@ TEST(Clib, ALockIsHeldByOneOpenFileAtATime) {
     ClibClose(lSecond);
 }
 
-TEST(Clib, AZombieIsNotAlive) {
-    const pid_t lChild = fork();
-    if (lChild == 0) {
-        _exit(0);
-    }
-    ASSERT_GT(lChild, 0);
-    siginfo_t lInfo;
-    ASSERT_EQ(waitid(P_PID, static_cast<id_t>(lChild), &lInfo, WEXITED | WNOWAIT), 0);
-    EXPECT_EQ(kill(lChild, 0), 0) << "the zombie is gone before it was looked at";
-    EXPECT_FALSE(ClibIsProcessAlive(lChild));
-    ASSERT_EQ(waitpid(lChild, nullptr, 0), lChild);
-    EXPECT_FALSE(ClibIsProcessAlive(lChild));
-    EXPECT_FALSE(ClibKill(lChild, 0));
-    EXPECT_TRUE(ClibIsProcessAlive(getpid()));
-    EXPECT_FALSE(ClibIsProcessAlive(0));
-    EXPECT_FALSE(ClibIsProcessAlive(-1));
-}
-
-TEST(Clib, AProcessThatMayNotBeSignalledIsAlive) {
-    if (geteuid() != 0) {
-        EXPECT_TRUE(ClibIsProcessAlive(1));
-        return;
-    }
-    const pid_t lChild = fork();
-    if (lChild == 0) {
-        const bool lIsNobody = setgid(65534) == 0 && setuid(65534) == 0;
-        const bool lIsRefused = kill(1, 0) != 0 && errno == EPERM;
-        _exit(lIsNobody && lIsRefused && ClibIsProcessAlive(1) ? 0 : 1);
-    }
-    ASSERT_GT(lChild, 0);
-    int lStatus = -1;
-    ASSERT_EQ(waitpid(lChild, &lStatus, 0), lChild);
-    EXPECT_EQ(lStatus, 0);
-}
-
 TEST(Clib, AFailureNamesItsDescriptorAndTheReason) {
     const std::string lcReason = std::string(" -1 failed: ") + std::strerror(EBADF);
     struct stat lStatus {};
@@ -303,15 +270,6 @@ TEST(Clib, AFailureNamesItsPathAndTheReason) {
               "Changing into the directory" + lcReason);
     EXPECT_EQ(sTextOf<ZTCClibDupFailedEx>([] { ClibRedirect(-1, "/dev/null", O_RDONLY); }),
               std::string("Replacing a standard stream by '/dev/null' failed: ") + std::strerror(EBADF));
-}
-
-TEST(Clib, ChdirChangesTheWorkingDirectoryOfTheProcess) {
-    const ZTCTemporaryDirectory lDirectory;
-    EXPECT_EQ(sStatusOfChild([&] {
-                  ClibChdir(lDirectory.path().c_str());
-                  return std::filesystem::equivalent(std::filesystem::current_path(), lDirectory.path()) ? 0 : 1;
-              }),
-              0);
 }
 
 TEST(Clib, AnEventWhoseCounterIsFullStaysRaised) {
@@ -343,45 +301,6 @@ TEST(Clib, ADescriptorThatCannotBeLiftedIsClosedAndAnError) {
               0);
 }
 
-TEST(Clib, OneWhoLeadsASessionCannotMakeAnotherOne) {
-    EXPECT_EQ(sStatusOfChild([] {
-                  ClibSetsid();
-                  if (getsid(0) != getpid()) {
-                      return 1;
-                  }
-                  return sTextOf<ZTCClibSessionFailedEx>([] { ClibSetsid(); }) ==
-                                 std::string("Making a session failed: ") + std::strerror(EPERM)
-                             ? 0
-                             : 2;
-              }),
-              0);
-}
-
-TEST(Clib, WhoMayNeitherForkNorSignalIsToldSo) {
-    EXPECT_EQ(sStatusOfChild([] {
-                  // Root is not bound by the limit; and nobody else may signal the first process.
-                  const uid_t lFormer = geteuid();
-                  if (lFormer == 0 && setresuid(65534, 65534, 0) != 0) {
-                      return 1;
-                  }
-                  const ZTCResourceLimit lLimit(RLIMIT_NPROC, 0);
-                  const std::string lFork = sTextOf<ZTCClibForkFailedEx>([] {
-                      if (ClibFork() == 0) {
-                          _exit(0);
-                      }
-                  });
-                  const std::string lKill = sTextOf<ZTCClibKillFailedEx>([] { ClibKill(1, 0); });
-                  if (lFormer == 0 && setresuid(0, 0, 0) != 0) {
-                      return 2;
-                  }
-                  return lFork == std::string("Making a process failed: ") + std::strerror(EAGAIN) &&
-                                 lKill == std::string("Signalling process 1 failed: ") + std::strerror(EPERM)
-                             ? 0
-                             : 3;
-              }),
-              0);
-}
-
 #ifndef __SANITIZE_ADDRESS__  // its runtime takes a descriptor to look at memory with
 TEST(Clib, AWaitOnMoreDescriptorsThanAProcessMayHaveIsAnError) {
     const ZTCResourceLimit lLimit(RLIMIT_NOFILE, 0);
@@ -390,9 +309,3 @@ TEST(Clib, AWaitOnMoreDescriptorsThanAProcessMayHaveIsAnError) {
               std::string("Waiting on 1 descriptors failed: ") + std::strerror(EINVAL));
 }
 #endif
-
-TEST(Clib, AProcessWhoseStateCannotBeReadIsTakenForAlive) {
-    const ZTCResourceLimit lLimit(RLIMIT_NOFILE, 0);
-    EXPECT_TRUE(ClibIsProcessAlive(getpid()));
-    EXPECT_FALSE(ClibIsProcessAlive(0x7fffffff));
-}

@@ -1,0 +1,80 @@
+#include <fcntl.h>
+#include <gtest/gtest.h>
+#include <sys/stat.h>
+#include <unistd.h>
+
+#include <chrono>
+#include <cstddef>
+#include <string>
+#include <vector>
+
+#include "common/include/Exception.h"
+#include "os/common/include/Descriptor.h"
+#include "os/common/include/NamedPipe.h"
+#include "tests/unit/interposed/support/Replaced.h"
+#include "tests/unit/os/LogCapture.h"
+
+namespace {
+
+class PipeRace : public testing::Test {
+protected:
+    PipeRace() { mPipe.create(); }
+
+    ZTCTemporaryDirectory mDirectory;
+    const std::string mPath = mDirectory.path("a.fifo");
+    ZTCNamedPipe mPipe{ZTCString(mPath.c_str()), ZTFM_Read, ZTNPS_NonBlock, ZTCM_Server};
+};
+
+}  // namespace
+
+TEST_F(PipeRace, AFifoThatIsReplacedBetweenItsTwoOpensIsRefused) {
+    unsigned lOpens = 0;
+    int lOther = -1;  // somebody who reads the one that took its place
+    const ZTCReplacement lOpen(gReplaced.mBeforeOpen, [&](const char*) {
+        if (++lOpens == 2) {
+            unlink(mPath.c_str());
+            ASSERT_EQ(0, mkfifo(mPath.c_str(), 0600));
+            lOther = open(mPath.c_str(), O_RDONLY | O_NONBLOCK | O_CLOEXEC);
+        }
+    });
+    try {
+        mPipe.open();
+        FAIL() << "the reader would wait on one FIFO and its own writer hold another";
+    } catch (const ZTCClibOpenFailedEx& acrException) {
+        EXPECT_EQ("Opening the FIFO '" + mPath + "' failed: it was replaced meanwhile",
+                  std::string(acrException.what()));
+    }
+    EXPECT_EQ(2u, lOpens);
+    close(lOther);
+}
+
+TEST_F(PipeRace, AMessageOfNoLengthGoesWithAllThatItsWriterHasBehindIt) {
+    ZTCLogCapture lLog(63);
+    mPipe.open();
+    const ZTCDescriptor lWriter(open(mPath.c_str(), O_WRONLY | O_NONBLOCK | O_CLOEXEC));
+    ASSERT_GE(lWriter.get(), 0);
+    // A length of 0, and zeros behind it: more than the pipe holds, written on whenever it is waited for.
+    std::size_t lLeft = 200 * 1024;
+    const auto lWriteOn = [&] {
+        const std::vector<char> lZeros(lLeft, 0);
+        const ssize_t lCount = write(lWriter.get(), lZeros.data(), lZeros.size());
+        lLeft -= lCount > 0 ? static_cast<std::size_t>(lCount) : 0;
+    };
+    lWriteOn();
+    ASSERT_GT(lLeft, 0u);
+    {
+        const ZTCReplacement lPoll(gReplaced.mBeforePoll, [&](const struct pollfd*, unsigned, int) { lWriteOn(); });
+        EXPECT_THROW(mPipe.waitForActivity(std::chrono::milliseconds(1)), ZTCTimeOutEx);
+    }
+    EXPECT_EQ(0u, lLeft);
+    EXPECT_EQ(1u, lLog.countMark("-E-")) << "one message, one line";
+
+    // The next message is served.
+    ASSERT_EQ(5, write(lWriter.get(), "\0\0\0\1x", 5));
+    mPipe.waitForActivity(std::chrono::seconds(20));
+    ZTCPointer<ZTCBuffer> lBuffer;
+    unsigned lCount = 0;
+    mPipe.read(lBuffer, lCount);
+    EXPECT_EQ(1u, lCount);
+    EXPECT_EQ('x', lBuffer->getData()[0]);
+}
