@@ -21,28 +21,10 @@
 
 static constexpr std::uint32_t gcMaxAdapters = 4;
 
-/// Bytes that an event of the kind needs to be consolidated, by catalogue order; RSCN stands apart.
-static constexpr std::size_t gcLeastSizes[] = {sizeof(zt_plogi_rcv_v0),
-                                               sizeof(zt_prlo_rcv_v0),
-                                               sizeof(zt_adisc_rcv_v0),
-                                               sizeof(zt_lsrjt_rcv_v0),
-                                               sizeof(zt_logo_rcv_v0),
-                                               0,
-                                               0,
-                                               sizeof(zt_pbsy_rcv_v0),
-                                               sizeof(zt_fcprdchkerr_v0),
-                                               sizeof(ZT_scsi_generic_v0),
-                                               sizeof(ZT_scsi_generic_v0),
-                                               sizeof(zt_scsi_checkcondition_v0),
-                                               sizeof(ZT_scsi_generic_v0),
-                                               sizeof(ZT_scsi_generic_v0),
-                                               0,
-                                               sizeof(zt_scsi_varquedepth_v0),
-                                               0,
-                                               0,
-                                               0,
-                                               0};
-static_assert(sizeof gcLeastSizes / sizeof gcLeastSizes[0] == gcScopeEventKinds.size());
+/// Bytes that an event of the kind needs to be consolidated. An RSCN is counted by its pages instead.
+static constexpr std::size_t sLeastSize(const ZTSScopeEventKind& acrKind) {
+    return acrKind.isScope() ? acrKind.mDataSize : 0;
+}
 
 static constexpr unsigned gcRscnPair = 1 << 8 | 0x20;
 
@@ -135,11 +117,10 @@ void ZTCConservation::scope(ZTCFuzzInput& arInput, std::uint8_t aShape) {
 
     std::uint64_t lExpected = 0;
     if (isAdmitted(lBoard)) {
-        for (std::size_t lKind = 0; lKind < gcScopeEventKinds.size(); ++lKind) {
-            const ZTSScopeEventKind& lrKind = gcScopeEventKinds[lKind];
+        for (const ZTSScopeEventKind& lrKind : gcScopeEventKinds) {
             const unsigned lKindsPair =
                 static_cast<unsigned>(lrKind.mDeliveredCategory << 8 | lrKind.mDeliveredSubcategory);
-            if (lKindsPair == lPair && lPair != gcRscnPair && lLength >= gcLeastSizes[lKind]) {
+            if (lKindsPair == lPair && lPair != gcRscnPair && lLength >= sLeastSize(lrKind)) {
                 lExpected = 1;
             }
         }

@@ -12,6 +12,7 @@
 #include <array>
 #include <cstddef>
 #include <cstdint>
+#include <optional>
 #include <string_view>
 
 #include "libkpm/include/libkpm.h"
@@ -64,23 +65,25 @@ inline constexpr std::array<ZTSScopeEventKind, 20> gcScopeEventKinds{{
 
 inline constexpr std::size_t gcScopeEventKindCount = gcScopeEventKinds.size();
 
-/// The index of the kind of this name, or gcScopeEventKindCount.
-constexpr std::size_t findKindIndex(std::string_view aName) {
-    std::size_t lKind = 0;
-    while (lKind < gcScopeEventKindCount && gcScopeEventKinds[lKind].mpName != aName) {
-        ++lKind;
+/// The index of the kind of this name.
+constexpr std::optional<std::size_t> findKindIndex(std::string_view aName) {
+    for (std::size_t lKind = 0; lKind < gcScopeEventKindCount; ++lKind) {
+        if (gcScopeEventKinds[lKind].mpName == aName) {
+            return lKind;
+        }
     }
-    return lKind;
+    return std::nullopt;
 }
 
-/// The index of the kind that is registered under this pair, or gcScopeEventKindCount.
-constexpr std::size_t findRegisteredKindIndex(std::uint32_t aCategory, std::uint32_t aSubcategory) {
-    std::size_t lKind = 0;
-    while (lKind < gcScopeEventKindCount && (gcScopeEventKinds[lKind].mRegisteredCategory != aCategory ||
-                                             gcScopeEventKinds[lKind].mRegisteredSubcategory != aSubcategory)) {
-        ++lKind;
+/// The index of the kind that is registered under this pair.
+constexpr std::optional<std::size_t> findRegisteredKindIndex(std::uint32_t aCategory, std::uint32_t aSubcategory) {
+    for (std::size_t lKind = 0; lKind < gcScopeEventKindCount; ++lKind) {
+        if (gcScopeEventKinds[lKind].mRegisteredCategory == aCategory &&
+            gcScopeEventKinds[lKind].mRegisteredSubcategory == aSubcategory) {
+            return lKind;
+        }
     }
-    return lKind;
+    return std::nullopt;
 }
 
 /// The kind that is delivered as this pair, or null.

@@ -13,7 +13,9 @@
 #define ZT_SCOPE_EVENT_SUBTYPE(Subtype, Category, Subcategory)                  \
     class ZTC##Subtype##ScopeEvent : public ZTCScopeEvent {                     \
     public:                                                                     \
-        ZTC##Subtype##ScopeEvent() : ZTCScopeEvent((Category), (Subcategory)) { \
+        static constexpr unsigned char gcCategory = (Category);                 \
+        static constexpr unsigned char gcSubcategory = (Subcategory);           \
+        ZTC##Subtype##ScopeEvent() : ZTCScopeEvent(gcCategory, gcSubcategory) { \
             ZT_ENTRY();                                                         \
             ZT_EXIT();                                                          \
         }                                                                       \

@@ -1,7 +1,9 @@
 #include "tavik/include/ConsolidationKinds.h"
 
 #include <cstddef>
+#include <string_view>
 
+#include "libkpm/include/ScopeEventKinds.h"
 #include "libkpm/include/libkpm.h"
 #include "sensor/agentcommon/include/EventDataRecords.h"
 
@@ -26,11 +28,6 @@ static_assert(offsetof(ZT_scsi_generic_v0, zt_scsi_generic_rport) == gcRemotePor
 static_assert(offsetof(zt_scsi_checkcondition_v0, zt_checkcondition_rport) == gcRemotePortOffset);
 static_assert(offsetof(zt_scsi_varquedepth_v0, zt_varquedepth_rport) == gcRemotePortOffset);
 
-static_assert(sizeof(zt_plogi_rcv_v0) == 20 && sizeof(zt_prlo_rcv_v0) == 12 && sizeof(zt_adisc_rcv_v0) == 20);
-static_assert(sizeof(zt_lsrjt_rcv_v0) == 24 && sizeof(zt_logo_rcv_v0) == 20 && sizeof(zt_pbsy_rcv_v0) == 12);
-static_assert(sizeof(zt_fcprdchkerr_v0) == 24 && sizeof(ZT_scsi_generic_v0) == 16);
-static_assert(sizeof(zt_scsi_checkcondition_v0) == 32 && sizeof(zt_scsi_varquedepth_v0) == 24);
-
 static_assert(SIZE_QFULL_OSLUN_BITFIELD == gcBitFieldSize && SIZE_DEVBSY_OSLUN_BITFIELD == gcBitFieldSize &&
               SIZE_CHECKCOND_OSLUN_BITFIELD == gcBitFieldSize && SIZE_CHECKCOND_CMDCODE_BITFIELD == gcBitFieldSize &&
               SIZE_CHECKCOND_ASCQ_BITFIELD == gcBitFieldSize);
@@ -38,7 +35,7 @@ static_assert(sizeof(TavikCheckCond) <= gcMaxRecordDataSize);
 
 }  // namespace
 
-const ZTSConsolidationKind gcPlogiKind = {
+constexpr ZTSConsolidationKind gcPlogiKind = {
     .mMinimumLength = sizeof(zt_plogi_rcv_v0),
     .mContinuation = ZTCN_Count,
     .mIdentityNames = {gcRemotePortOffset, offsetof(zt_plogi_rcv_v0, zt_plogir_nodename)},
@@ -50,7 +47,7 @@ const ZTSConsolidationKind gcPlogiKind = {
     .mAppendedFields = {},
     .mBitFields = {}};
 
-const ZTSConsolidationKind gcPrloKind = {
+constexpr ZTSConsolidationKind gcPrloKind = {
     .mMinimumLength = sizeof(zt_prlo_rcv_v0),
     .mContinuation = ZTCN_Count,
     .mIdentityNames = {gcRemotePortOffset},
@@ -61,7 +58,7 @@ const ZTSConsolidationKind gcPrloKind = {
     .mAppendedFields = {},
     .mBitFields = {}};
 
-const ZTSConsolidationKind gcAdiscKind = {
+constexpr ZTSConsolidationKind gcAdiscKind = {
     .mMinimumLength = sizeof(zt_adisc_rcv_v0),
     .mContinuation = ZTCN_Count,
     .mIdentityNames = {gcRemotePortOffset, offsetof(zt_adisc_rcv_v0, zt_adiscr_nodename)},
@@ -73,7 +70,7 @@ const ZTSConsolidationKind gcAdiscKind = {
     .mAppendedFields = {},
     .mBitFields = {}};
 
-const ZTSConsolidationKind gcLsRjtKind = {
+constexpr ZTSConsolidationKind gcLsRjtKind = {
     .mMinimumLength = sizeof(zt_lsrjt_rcv_v0),
     .mContinuation = ZTCN_Append,
     .mIdentityNames = {gcRemotePortOffset},
@@ -88,7 +85,7 @@ const ZTSConsolidationKind gcLsRjtKind = {
                         ZT_COPY(zt_lsrjt_rcv_v0, zt_lsrjtr_reasoncodeexpl, TavikConsLsRjt, ReasonCodeExpl)},
     .mBitFields = {}};
 
-const ZTSConsolidationKind gcLogoKind = {
+constexpr ZTSConsolidationKind gcLogoKind = {
     .mMinimumLength = sizeof(zt_logo_rcv_v0),
     .mContinuation = ZTCN_Count,
     .mIdentityNames = {gcRemotePortOffset, offsetof(zt_logo_rcv_v0, zt_logo_payloadwwpn)},
@@ -100,7 +97,7 @@ const ZTSConsolidationKind gcLogoKind = {
     .mAppendedFields = {},
     .mBitFields = {}};
 
-const ZTSConsolidationKind gcPortBusyKind = {
+constexpr ZTSConsolidationKind gcPortBusyKind = {
     .mMinimumLength = sizeof(zt_pbsy_rcv_v0),
     .mContinuation = ZTCN_Count,
     .mIdentityNames = {gcRemotePortOffset},
@@ -111,7 +108,7 @@ const ZTSConsolidationKind gcPortBusyKind = {
     .mAppendedFields = {},
     .mBitFields = {}};
 
-const ZTSConsolidationKind gcFcprdChkErrKind = {
+constexpr ZTSConsolidationKind gcFcprdChkErrKind = {
     .mMinimumLength = sizeof(zt_fcprdchkerr_v0),
     .mContinuation = ZTCN_Append,
     .mIdentityNames = {gcRemotePortOffset},
@@ -126,7 +123,7 @@ const ZTSConsolidationKind gcFcprdChkErrKind = {
     .mAppendedFields = {ZT_COPY(zt_fcprdchkerr_v0, zt_fcprdchkerr_fcpiparam, TavikConsFcprdChkErr, FcpiParam)},
     .mBitFields = {}};
 
-const ZTSConsolidationKind gcQFullKind = {
+constexpr ZTSConsolidationKind gcQFullKind = {
     .mMinimumLength = sizeof(ZT_scsi_generic_v0),
     .mContinuation = ZTCN_SetBits,
     .mIdentityNames = {gcRemotePortOffset},
@@ -137,7 +134,7 @@ const ZTSConsolidationKind gcQFullKind = {
     .mAppendedFields = {},
     .mBitFields = {ZT_SET_BIT(ZT_scsi_generic_v0, zt_scsi_generic_lun, TavikQFull, LenOsLun, OsLun, true)}};
 
-const ZTSConsolidationKind gcDevBsyKind = {
+constexpr ZTSConsolidationKind gcDevBsyKind = {
     .mMinimumLength = sizeof(ZT_scsi_generic_v0),
     .mContinuation = ZTCN_SetBits,
     .mIdentityNames = {gcRemotePortOffset},
@@ -148,7 +145,7 @@ const ZTSConsolidationKind gcDevBsyKind = {
     .mAppendedFields = {},
     .mBitFields = {ZT_SET_BIT(ZT_scsi_generic_v0, zt_scsi_generic_lun, TavikDevBsy, LenOsLun, OsLun, true)}};
 
-const ZTSConsolidationKind gcCheckCondKind = {
+constexpr ZTSConsolidationKind gcCheckCondKind = {
     .mMinimumLength = sizeof(zt_scsi_checkcondition_v0),
     .mContinuation = ZTCN_SetBits,
     .mIdentityNames = {gcRemotePortOffset},
@@ -165,7 +162,7 @@ const ZTSConsolidationKind gcCheckCondKind = {
         ZT_SET_BIT(zt_scsi_checkcondition_v0, zt_checkcondition_cmdcode, TavikCheckCond, CmdCodeLen, CmdCode, false),
         ZT_SET_BIT(zt_scsi_checkcondition_v0, zt_checkcondition_ascq, TavikCheckCond, AscqLen, Ascq, false)}};
 
-const ZTSConsolidationKind gcLunResetKind = {
+constexpr ZTSConsolidationKind gcLunResetKind = {
     .mMinimumLength = sizeof(ZT_scsi_generic_v0),
     .mContinuation = ZTCN_Append,
     .mIdentityNames = {gcRemotePortOffset},
@@ -177,7 +174,7 @@ const ZTSConsolidationKind gcLunResetKind = {
     .mAppendedFields = {ZT_COPY(ZT_scsi_generic_v0, zt_scsi_generic_lun, TavikConsLunReset, OsLun)},
     .mBitFields = {}};
 
-const ZTSConsolidationKind gcTargetResetKind = {
+constexpr ZTSConsolidationKind gcTargetResetKind = {
     .mMinimumLength = sizeof(ZT_scsi_generic_v0),
     .mContinuation = ZTCN_Append,
     .mIdentityNames = {gcRemotePortOffset},
@@ -189,7 +186,7 @@ const ZTSConsolidationKind gcTargetResetKind = {
     .mAppendedFields = {ZT_COPY(ZT_scsi_generic_v0, zt_scsi_generic_lun, TavikConsTargetReset, OsLun)},
     .mBitFields = {}};
 
-const ZTSConsolidationKind gcVarQDepthKind = {
+constexpr ZTSConsolidationKind gcVarQDepthKind = {
     .mMinimumLength = sizeof(zt_scsi_varquedepth_v0),
     .mContinuation = ZTCN_Append,
     .mIdentityNames = {gcRemotePortOffset},
@@ -202,3 +199,21 @@ const ZTSConsolidationKind gcVarQDepthKind = {
     .mAppendedFields = {ZT_COPY(zt_scsi_varquedepth_v0, zt_varquedepth_lun, TavikConsQChange, OsLun),
                         ZT_COPY(zt_scsi_varquedepth_v0, zt_varquedepth_newval, TavikConsQChange, NewVal)},
     .mBitFields = {}};
+
+namespace {
+
+constexpr bool sHasSizesOf(const ZTSConsolidationKind& acrKind, std::string_view aName) {
+    const ZTSScopeEventKind& lrKind = gcScopeEventKinds[findKindIndex(aName).value()];
+    return acrKind.mMinimumLength == lrKind.mDataSize && acrKind.mRecordSize == lrKind.mRecordSize &&
+           acrKind.mAppendedSize == lrKind.mEntrySize;
+}
+
+static_assert(sHasSizesOf(gcPlogiKind, "plogi") && sHasSizesOf(gcPrloKind, "prlo") &&
+              sHasSizesOf(gcAdiscKind, "adisc") && sHasSizesOf(gcLsRjtKind, "lsrjt") &&
+              sHasSizesOf(gcLogoKind, "logo"));
+static_assert(sHasSizesOf(gcPortBusyKind, "port-busy") && sHasSizesOf(gcFcprdChkErrKind, "fcp-read-check"));
+static_assert(sHasSizesOf(gcQFullKind, "queue-full") && sHasSizesOf(gcDevBsyKind, "device-busy") &&
+              sHasSizesOf(gcCheckCondKind, "check-condition") && sHasSizesOf(gcLunResetKind, "lun-reset") &&
+              sHasSizesOf(gcTargetResetKind, "target-reset") && sHasSizesOf(gcVarQDepthKind, "queue-depth"));
+
+}  // namespace

@@ -6,10 +6,12 @@
 #include <cstdint>
 #include <cstring>
 #include <exception>
+#include <iterator>
 
 #include "common/include/Exception.h"
 #include "common/include/Log.h"
 #include "common/include/Memory.h"
+#include "libkpm/include/ScopeEventKinds.h"
 #include "os/common/include/Clib.h"
 #include "sensor/agentcommon/include/EventDataRecords.h"
 #include "tavik/include/EventConsolidation.h"
@@ -208,6 +210,26 @@ constexpr ZTSDispatch gcDispatch[] = {
     {8, 0x04, nullptr, nullptr, "Processing TEMP event Cat=%u SubCat=%u"},
     {16, 0x01, nullptr, nullptr, "Processing ADAPTER ARRIVAL Event Cat=%u SubCat=%u"},
 };
+
+/// Every kind has its row, in the order of the table of kinds: under the pair it is delivered as, and with a member of
+/// its own where its events carry data that a record keeps. RSCNs do not come here.
+constexpr bool sHasEveryKindButRscn() {
+    const ZTSDispatch* lpDispatch = std::begin(gcDispatch);
+    for (const ZTSScopeEventKind& lrKind : gcScopeEventKinds) {
+        if (lrKind.mDeliveredCategory == gcRscnCategory && lrKind.mDeliveredSubcategory == gcRscnSubcategory) {
+            continue;
+        }
+        const bool lHasMember = lrKind.isScope() && lrKind.mDataSize != 0;
+        if (lpDispatch == std::end(gcDispatch) || lpDispatch->mCategory != lrKind.mDeliveredCategory ||
+            lpDispatch->mSubcategory != lrKind.mDeliveredSubcategory || (lpDispatch->mpKind != nullptr) != lHasMember ||
+            (lpDispatch->mpMember != nullptr) != lHasMember) {
+            return false;
+        }
+        ++lpDispatch;
+    }
+    return lpDispatch == std::end(gcDispatch);
+}
+static_assert(sHasEveryKindButRscn());
 
 constexpr unsigned int gcCategoryBits = 5;
 constexpr unsigned int gcSubcategoryBits = 8;

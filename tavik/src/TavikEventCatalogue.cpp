@@ -1,7 +1,11 @@
 #include "tavik/include/TavikEventCatalogue.h"
 
+#include <array>
+#include <cstddef>
+
 #include "common/include/Log.h"
 #include "common/include/Memory.h"
+#include "libkpm/include/ScopeEventKinds.h"
 #include "tavik/include/ScopeEventSubType.h"
 
 namespace {
@@ -17,30 +21,48 @@ ZTCScopeEvent* sMake() {
 struct ZTSCatalogueEntry {
     const char* mpMessage;
     ZTCScopeEvent* (*mpMake)();
+    unsigned char mCategory;
+    unsigned char mSubcategory;
 };
 
-constexpr ZTSCatalogueEntry gcEntries[] = {
-    {"Inserting ElsPlogi ScopeEvent into Events Catalogue", sMake<ZTCElsPlogiScopeEvent>},
-    {"Inserting ElsPrlo ScopeEvent into Events Catalogue", sMake<ZTCElsPrloScopeEvent>},
-    {"Inserting ElsAdisc ScopeEvent into Events Catalogue", sMake<ZTCElsAdiscScopeEvent>},
-    {"Inserting ElsLsrjt ScopeEvent into Events Catalogue", sMake<ZTCElsLsrjtScopeEvent>},
-    {"Inserting ElsLogo ScopeEvent into Events Catalogue", sMake<ZTCElsLogoScopeEvent>},
-    {"Inserting ElsRscn ScopeEvent into Events Catalogue", sMake<ZTCElsRscnScopeEvent>},
-    {"Inserting FabricFbsy ScopeEvent into Events Catalogue", sMake<ZTCFabricFbsyScopeEvent>},
-    {"Inserting FabricPbsy ScopeEvent into Events Catalogue", sMake<ZTCFabricPbsyScopeEvent>},
-    {"Inserting FabricFcprdchkerr ScopeEvent into Events Catalogue", sMake<ZTCFabricFcprdchkerrScopeEvent>},
-    {"Inserting ScsiQfull ScopeEvent into Events Catalogue", sMake<ZTCScsiQfullScopeEvent>},
-    {"Inserting ScsiDevbsy ScopeEvent into Events Catalogue", sMake<ZTCScsiDevbsyScopeEvent>},
-    {"Inserting ScsiCheckcondition ScopeEvent into Events Catalogue", sMake<ZTCScsiCheckconditionScopeEvent>},
-    {"Inserting ScsiLunreset ScopeEvent into Events Catalogue", sMake<ZTCScsiLunresetScopeEvent>},
-    {"Inserting ScsiTgtreset ScopeEvent into Events Catalogue", sMake<ZTCScsiTgtresetScopeEvent>},
-    {"Inserting ScsiBusreset ScopeEvent into Events Catalogue", sMake<ZTCScsiBusresetScopeEvent>},
-    {"Inserting ScsiVarquedepth ScopeEvent into Events Catalogue", sMake<ZTCScsiVarquedepthScopeEvent>},
-    {"Inserting BoardPortinterr ScopeEvent into Events Catalogue", sMake<ZTCBoardPortinterrScopeEvent>},
-    {"Inserting BoardLinkatte ScopeEvent into Events Catalogue", sMake<ZTCBoardLinkatteScopeEvent>},
-    {"Inserting BoardTemperature ScopeEvent into Events Catalogue", sMake<ZTCBoardTemperatureScopeEvent>},
-    {"Inserting AdapterArrival ScopeEvent into Events Catalogue", sMake<ZTCAdapterArrivalScopeEvent>},
-};
+template <typename TKind>
+constexpr ZTSCatalogueEntry sEntry(const char* apMessage) {
+    return {apMessage, sMake<TKind>, TKind::gcCategory, TKind::gcSubcategory};
+}
+
+constexpr std::array<ZTSCatalogueEntry, gcScopeEventKindCount> gcEntries{{
+    sEntry<ZTCElsPlogiScopeEvent>("Inserting ElsPlogi ScopeEvent into Events Catalogue"),
+    sEntry<ZTCElsPrloScopeEvent>("Inserting ElsPrlo ScopeEvent into Events Catalogue"),
+    sEntry<ZTCElsAdiscScopeEvent>("Inserting ElsAdisc ScopeEvent into Events Catalogue"),
+    sEntry<ZTCElsLsrjtScopeEvent>("Inserting ElsLsrjt ScopeEvent into Events Catalogue"),
+    sEntry<ZTCElsLogoScopeEvent>("Inserting ElsLogo ScopeEvent into Events Catalogue"),
+    sEntry<ZTCElsRscnScopeEvent>("Inserting ElsRscn ScopeEvent into Events Catalogue"),
+    sEntry<ZTCFabricFbsyScopeEvent>("Inserting FabricFbsy ScopeEvent into Events Catalogue"),
+    sEntry<ZTCFabricPbsyScopeEvent>("Inserting FabricPbsy ScopeEvent into Events Catalogue"),
+    sEntry<ZTCFabricFcprdchkerrScopeEvent>("Inserting FabricFcprdchkerr ScopeEvent into Events Catalogue"),
+    sEntry<ZTCScsiQfullScopeEvent>("Inserting ScsiQfull ScopeEvent into Events Catalogue"),
+    sEntry<ZTCScsiDevbsyScopeEvent>("Inserting ScsiDevbsy ScopeEvent into Events Catalogue"),
+    sEntry<ZTCScsiCheckconditionScopeEvent>("Inserting ScsiCheckcondition ScopeEvent into Events Catalogue"),
+    sEntry<ZTCScsiLunresetScopeEvent>("Inserting ScsiLunreset ScopeEvent into Events Catalogue"),
+    sEntry<ZTCScsiTgtresetScopeEvent>("Inserting ScsiTgtreset ScopeEvent into Events Catalogue"),
+    sEntry<ZTCScsiBusresetScopeEvent>("Inserting ScsiBusreset ScopeEvent into Events Catalogue"),
+    sEntry<ZTCScsiVarquedepthScopeEvent>("Inserting ScsiVarquedepth ScopeEvent into Events Catalogue"),
+    sEntry<ZTCBoardPortinterrScopeEvent>("Inserting BoardPortinterr ScopeEvent into Events Catalogue"),
+    sEntry<ZTCBoardLinkatteScopeEvent>("Inserting BoardLinkatte ScopeEvent into Events Catalogue"),
+    sEntry<ZTCBoardTemperatureScopeEvent>("Inserting BoardTemperature ScopeEvent into Events Catalogue"),
+    sEntry<ZTCAdapterArrivalScopeEvent>("Inserting AdapterArrival ScopeEvent into Events Catalogue"),
+}};
+
+constexpr bool sIsInOrderOfKinds() {
+    for (std::size_t lKind = 0; lKind < gcScopeEventKindCount; ++lKind) {
+        if (gcEntries[lKind].mCategory != gcScopeEventKinds[lKind].mRegisteredCategory ||
+            gcEntries[lKind].mSubcategory != gcScopeEventKinds[lKind].mRegisteredSubcategory) {
+            return false;
+        }
+    }
+    return true;
+}
+static_assert(sIsInOrderOfKinds());
 
 }  // namespace
 

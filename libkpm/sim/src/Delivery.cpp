@@ -60,7 +60,7 @@ static std::vector<std::uint8_t> sFieldData(const ZTSSimEvent& acrEvent, const Z
     if (lrKind.mDelivery == ZTSD_Rscn) {
         lPages = acrEvent.mPages.value_or(std::vector<std::uint32_t>{lrRemote.mFcId});
     }
-    std::vector<std::uint8_t> lData(lrKind.mDataSize);
+    std::vector<std::uint8_t> lData(gcScopeEventKinds[acrEvent.mKind].mDataSize);
     const ZTSSimSurroundings lSurroundings{&acrLocal, &lrRemote, aLinkTag, lPages.size()};
     for (const ZTSSimField& lrField : lrKind.mFields) {
         const auto lSetting =
@@ -95,6 +95,7 @@ ZTSSimDelivery makeSimDelivery(const ZTSSimScenario& acrScenario, const ZTSSimEv
                                std::uint64_t aOccurrence, std::uint32_t aLinkTag) {
     const ZTSSimKind& lrKind = getSimKind(acrEvent.mKind);
     const ZTSScopeEventKind& lrPair = gcScopeEventKinds[acrEvent.mKind];
+    const std::size_t lDataSize = lrPair.mDataSize;
     const ZTSSimPort& lrLocal = acrScenario.mAdapters.at(aBoard);
     ZTSSimDelivery lDelivery;
     lDelivery.mKind = acrEvent.mKind;
@@ -108,7 +109,7 @@ ZTSSimDelivery makeSimDelivery(const ZTSSimScenario& acrScenario, const ZTSSimEv
     switch (lrKind.mDelivery) {
         case ZTSD_Link:
         case ZTSD_Temperature:
-            sGrow(lrData, lrKind.mDataSize);
+            sGrow(lrData, lDataSize);
             break;
         case ZTSD_Rscn:
             if (acrEvent.mLength) {
@@ -121,7 +122,7 @@ ZTSSimDelivery makeSimDelivery(const ZTSSimScenario& acrScenario, const ZTSSimEv
             if (acrEvent.mLength) {
                 lrData.resize(*acrEvent.mLength);
             }
-            const bool lHasNoData = lrKind.mDataSize == 0 && !acrEvent.mData && !acrEvent.mLength && !acrEvent.mSize;
+            const bool lHasNoData = lDataSize == 0 && !acrEvent.mData && !acrEvent.mLength && !acrEvent.mSize;
             lDelivery.mIsPayloadNull = acrEvent.mPayloadNull || (lHasNoData && !acrEvent.mDataNull);
             lDelivery.mIsDataNull = acrEvent.mDataNull;
             lDelivery.mEventSize = acrEvent.mSize.value_or(ZT_EVENT_HEADER_SIZE + lrData.size());

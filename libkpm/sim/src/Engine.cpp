@@ -367,7 +367,7 @@ std::uint32_t ZTCSimEngine::registerForPort(std::uint32_t aBoard, const HBA_wwn&
     if (!sIsSameName(acrPort, mScenario.mAdapters[aBoard].mWwpn)) {
         return ZTLST_NotItsPort;
     }
-    const std::optional<std::size_t> lKind = findSimKindByRegistration(aCategory, aSubcategory);
+    const std::optional<std::size_t> lKind = findRegisteredKindIndex(aCategory, aSubcategory);
     if (!lKind || getSimKind(*lKind).mDelivery != ZTSD_Scope) {
         return ZTLST_NoSuchKind;
     }
@@ -386,7 +386,7 @@ std::uint32_t ZTCSimEngine::registerForPort(std::uint32_t aBoard, const HBA_wwn&
 
 std::uint32_t ZTCSimEngine::registerForBoard(std::uint32_t aBoard, std::uint32_t aEventType, void* apContext,
                                              KPM_EventCallback apCallback) {
-    const std::optional<std::size_t> lKind = findSimKindByRegistration(0, aEventType);
+    const std::optional<std::size_t> lKind = findRegisteredKindIndex(0, aEventType);
     if (apCallback == nullptr || aBoard >= getNumberOfAdapters() || !lKind) {
         return 0;
     }

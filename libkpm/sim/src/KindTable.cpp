@@ -136,26 +136,26 @@ static constexpr ZTSSimField gcTemperature[] = {
 };
 
 static constexpr std::array<ZTSSimKind, gcSimKindCount> gcSimKinds{{
-    {"plogi", ZTSD_Scope, sizeof(zt_plogi_rcv_v0), gcPlogi},
-    {"prlo", ZTSD_Scope, sizeof(zt_prlo_rcv_v0), gcPrlo},
-    {"adisc", ZTSD_Scope, sizeof(zt_adisc_rcv_v0), gcAdisc},
-    {"lsrjt", ZTSD_Scope, sizeof(zt_lsrjt_rcv_v0), gcLsrjt},
-    {"logo", ZTSD_Scope, sizeof(zt_logo_rcv_v0), gcLogo},
-    {"rscn", ZTSD_Rscn, 4, gcRscn},
-    {"fabric-busy", ZTSD_Scope, 0, {}},
-    {"port-busy", ZTSD_Scope, sizeof(zt_pbsy_rcv_v0), gcPortBusy},
-    {"fcp-read-check", ZTSD_Scope, sizeof(zt_fcprdchkerr_v0), gcFcpReadCheck},
-    {"queue-full", ZTSD_Scope, sizeof(ZT_scsi_generic_v0), gcScsiGeneric},
-    {"device-busy", ZTSD_Scope, sizeof(ZT_scsi_generic_v0), gcScsiGeneric},
-    {"check-condition", ZTSD_Scope, sizeof(zt_scsi_checkcondition_v0), gcCheckCondition},
-    {"lun-reset", ZTSD_Scope, sizeof(ZT_scsi_generic_v0), gcScsiGeneric},
-    {"target-reset", ZTSD_Scope, sizeof(ZT_scsi_generic_v0), gcScsiGeneric},
-    {"bus-reset", ZTSD_Scope, 0, {}},
-    {"queue-depth", ZTSD_Scope, sizeof(zt_scsi_varquedepth_v0), gcQueueDepth},
-    {"port-interrupt", ZTSD_Scope, 0, {}},
-    {"link", ZTSD_Link, sizeof(LINKINFO), gcLink},
-    {"temperature", ZTSD_Temperature, 8, gcTemperature},
-    {"adapter-arrival", ZTSD_Scope, 0, {}},
+    {"plogi", ZTSD_Scope, gcPlogi},
+    {"prlo", ZTSD_Scope, gcPrlo},
+    {"adisc", ZTSD_Scope, gcAdisc},
+    {"lsrjt", ZTSD_Scope, gcLsrjt},
+    {"logo", ZTSD_Scope, gcLogo},
+    {"rscn", ZTSD_Rscn, gcRscn},
+    {"fabric-busy", ZTSD_Scope, {}},
+    {"port-busy", ZTSD_Scope, gcPortBusy},
+    {"fcp-read-check", ZTSD_Scope, gcFcpReadCheck},
+    {"queue-full", ZTSD_Scope, gcScsiGeneric},
+    {"device-busy", ZTSD_Scope, gcScsiGeneric},
+    {"check-condition", ZTSD_Scope, gcCheckCondition},
+    {"lun-reset", ZTSD_Scope, gcScsiGeneric},
+    {"target-reset", ZTSD_Scope, gcScsiGeneric},
+    {"bus-reset", ZTSD_Scope, {}},
+    {"queue-depth", ZTSD_Scope, gcQueueDepth},
+    {"port-interrupt", ZTSD_Scope, {}},
+    {"link", ZTSD_Link, gcLink},
+    {"temperature", ZTSD_Temperature, gcTemperature},
+    {"adapter-arrival", ZTSD_Scope, {}},
 }};
 
 static constexpr bool sIsInCatalogueOrder() {
@@ -179,9 +179,9 @@ static constexpr bool sHasOnlyNumbersOfAtMostFourBytes() {
 }
 
 static constexpr bool sHasEveryFieldInsideItsData() {
-    for (const ZTSSimKind& lrKind : gcSimKinds) {
-        for (const ZTSSimField& lrField : lrKind.mFields) {
-            if (lrField.mOffset + lrField.mWidth > lrKind.mDataSize) {
+    for (std::size_t lKind = 0; lKind < gcSimKindCount; ++lKind) {
+        for (const ZTSSimField& lrField : gcSimKinds[lKind].mFields) {
+            if (lrField.mOffset + lrField.mWidth > gcScopeEventKinds[lKind].mDataSize) {
                 return false;
             }
         }
@@ -204,23 +204,4 @@ void storeSimNumber(const ZTSSimField& acrField, std::uint32_t aNumber, std::uin
         const std::size_t lFromRight = lIsBigEndian ? acrField.mWidth - 1u - lByte : lByte;
         apPlace[lByte] = static_cast<std::uint8_t>(aNumber >> (8 * lFromRight));
     }
-}
-
-std::optional<std::size_t> findSimKind(std::string_view aName) {
-    for (std::size_t lKind = 0; lKind < gcSimKindCount; ++lKind) {
-        if (aName == gcSimKinds[lKind].mpName) {
-            return lKind;
-        }
-    }
-    return std::nullopt;
-}
-
-std::optional<std::size_t> findSimKindByRegistration(std::uint32_t aCategory, std::uint32_t aSubcategory) {
-    for (std::size_t lKind = 0; lKind < gcSimKindCount; ++lKind) {
-        if (aCategory == gcScopeEventKinds[lKind].mRegisteredCategory &&
-            aSubcategory == gcScopeEventKinds[lKind].mRegisteredSubcategory) {
-            return lKind;
-        }
-    }
-    return std::nullopt;
 }

@@ -1,14 +1,12 @@
-/// What the simulated library knows of each of the twenty event kinds: how it is delivered, how long its data are, and
-/// the name, place and default of each field. One row a kind; reading scenarios, building events, storms and the tool's
-/// listing all walk this table.
+/// What the simulated library knows of each of the twenty event kinds: how it is delivered, and the name, place and
+/// default of each field. One row a kind, in the order of gcScopeEventKinds, which holds everything else. Reading
+/// scenarios, building events, storms and the tool's listing all walk this table.
 #ifndef LIBKPM_SIM_SRC_KINDTABLE_H
 #define LIBKPM_SIM_SRC_KINDTABLE_H
 
 #include <cstddef>
 #include <cstdint>
-#include <optional>
 #include <span>
-#include <string_view>
 
 #include "libkpm/include/ScopeEventKinds.h"
 
@@ -52,23 +50,16 @@ struct ZTSSimField {
 struct ZTSSimKind {
     const char* mpName;
     ZTESimDelivery mDelivery;
-    std::uint16_t mDataSize;  ///< bytes of the kind's data (RSCN: without pages), 0 for none
     std::span<const ZTSSimField> mFields;
 };
 
-inline constexpr std::size_t gcSimKindCount = gcScopeEventKinds.size();
+inline constexpr std::size_t gcSimKindCount = gcScopeEventKindCount;
 
 /// The table's rows, in the order of gcScopeEventKinds. `aKind` is an index below gcSimKindCount.
 const ZTSSimKind& getSimKind(std::size_t aKind);
 
 /// Stores a number as a field of mWidth bytes, at most 4, at `apPlace`, in the byte order of the field's form.
 void storeSimNumber(const ZTSSimField& acrField, std::uint32_t aNumber, std::uint8_t* apPlace);
-
-/// The kind of this name.
-std::optional<std::size_t> findSimKind(std::string_view aName);
-
-/// The kind that is registered under this pair.
-std::optional<std::size_t> findSimKindByRegistration(std::uint32_t aCategory, std::uint32_t aSubcategory);
 
 /// The last kind in catalogue order: with its registration on the last board everything is registered.
 inline constexpr std::size_t gcSimLastKind = gcSimKindCount - 1;

@@ -560,7 +560,7 @@ static ZTSSimStorm sParseStorm(ZTCSimLine& arLine, const ZTSSimScenario& acrScen
         }
     } else {
         sForEachPart("kind", lKinds, [&](std::string_view aPart) {
-            const std::optional<std::size_t> lKind = findSimKind(aPart);
+            const std::optional<std::size_t> lKind = findKindIndex(aPart);
             if (!lKind) {
                 sRefuse("kind= names " + sQuoted(aPart) + ", which is no event kind");
             }
@@ -625,7 +625,7 @@ static ZTSSimAnswer sParseAnswer(ZTCSimLine& arLine, ZTESimOperation aOperation,
     if (aOperation != ZTSO_GetAdapterInfo) {
         const std::string_view lName = arLine.takeWord("an event kind, or all");
         if (lName != "all") {
-            lAnswer.mKind = findSimKind(lName);
+            lAnswer.mKind = findKindIndex(lName);
             if (!lAnswer.mKind) {
                 sRefuse(sQuoted(lName) + " is no event kind");
             }
@@ -748,7 +748,7 @@ static std::optional<ZTSSimEventLine> sParseEventLine(ZTCSimLine& arLine, const 
     if (arLine.getDirective() == "storm") {
         return sParseStorm(arLine, acrScenario);
     }
-    if (const std::optional<std::size_t> lKind = findSimKind(arLine.getDirective())) {
+    if (const std::optional<std::size_t> lKind = findKindIndex(arLine.getDirective())) {
         return sParseEvent(arLine, *lKind, acrScenario);
     }
     return std::nullopt;

@@ -45,13 +45,10 @@ struct ZTSFieldRule {
 };
 
 struct ZTSKindRule {
-    std::uint8_t mCategory;  ///< as delivered
-    std::uint8_t mSubcategory;
-    std::uint32_t mRecordSize;  ///< bytes of the structure that a record starts with
+    const ZTSScopeEventKind* mpKind;
     std::span<const ZTSFieldRule> mFields;
     const char* mpEntriesName = nullptr;  ///< of an appending kind
     std::uint32_t mEntriesOffset = 0;     ///< where the first entry stands; the appended ones follow it without a gap
-    std::uint32_t mEntrySize = 0;
     std::span<const ZTSFieldRule> mEntryFields{};
 };
 

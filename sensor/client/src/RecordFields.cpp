@@ -4,6 +4,7 @@
 #include <array>
 #include <cstddef>
 #include <cstring>
+#include <string_view>
 
 #include "sensor/agentcommon/include/EventDataRecords.h"
 
@@ -136,38 +137,62 @@ static_assert(sizeof(TavikDevBsy) == sizeof(TavikQFull) &&
               offsetof(TavikDevBsy, LenOsLun) == offsetof(TavikQFull, LenOsLun));
 static_assert(sizeof(TavikConsTargetReset) == sizeof(TavikConsLunReset));
 
-static constexpr std::array<ZTSKindRule, gcScopeEventKinds.size()> scKindRules{{
-    {1, 0x01, sizeof(TavikPlogi), scPlogiFields},
-    {1, 0x02, sizeof(TavikPrlo), scPortFields},
-    {1, 0x04, sizeof(TavikAdisc), scAdiscFields},
-    {1, 0x08, sizeof(TavikLsRjt), scLsRjtFields, "rejections", offsetof(TavikLsRjt, ReasonCode), sizeof(TavikConsLsRjt),
-     scLsRjtEntry},
-    {1, 0x10, sizeof(TavikLogo), scLogoFields},
-    {1, 0x20, sizeof(TavikRscn), scRscnFields},
-    {2, 0x01, sizeof(TavikGeneric), scVersionFields},
-    {2, 0x02, sizeof(TavikPortBusy), scPortFields},
-    {2, 0x04, sizeof(TavikFcprdChkErr), scFcprdChkErrFields, "parameters", offsetof(TavikFcprdChkErr, FcpiParam),
-     sizeof(TavikConsFcprdChkErr), scFcprdChkErrEntry},
-    {4, 0x01, sizeof(TavikQFull), scBusyFields},
-    {4, 0x02, sizeof(TavikDevBsy), scBusyFields},
-    {4, 0x04, sizeof(TavikCheckCond), scCheckCondFields},
-    {4, 0x08, sizeof(TavikLunReset), scPortFields, "resets", offsetof(TavikLunReset, OsLun), sizeof(TavikConsLunReset),
-     scResetEntry},
-    {4, 0x10, sizeof(TavikTargetReset), scPortFields, "resets", offsetof(TavikTargetReset, OsLun),
-     sizeof(TavikConsTargetReset), scResetEntry},
-    {4, 0x20, sizeof(TavikGeneric), scVersionFields},
-    {4, 0x40, sizeof(TavikQChange), scPortFields, "changes", offsetof(TavikQChange, OsLun), sizeof(TavikConsQChange),
-     scQChangeEntry},
-    {8, 0x01, sizeof(TavikGeneric), scVersionFields},
-    {8, 0x02, sizeof(TavikGeneric), scVersionFields},
-    {8, 0x04, sizeof(TavikGeneric), scVersionFields},
-    {16, 0x01, sizeof(TavikGeneric), scVersionFields},
+/// The rule of the kind of this name, whose records begin with a `Record`.
+template <class Record>
+static consteval ZTSKindRule sRule(std::string_view aName, std::span<const ZTSFieldRule> aFields) {
+    const ZTSScopeEventKind& lrKind = gcScopeEventKinds[findKindIndex(aName).value()];
+    if (lrKind.mRecordSize != sizeof(Record)) {
+        throw "the record is not as long as the table of kinds says";
+    }
+    return {&lrKind, aFields};
+}
+
+/// The rule of a kind whose further events append an `Entry` each.
+template <class Record, class Entry>
+static consteval ZTSKindRule sAppendingRule(std::string_view aName, std::span<const ZTSFieldRule> aFields,
+                                            const char* apEntriesName, std::size_t aEntriesOffset,
+                                            std::span<const ZTSFieldRule> aEntryFields) {
+    ZTSKindRule lRule = sRule<Record>(aName, aFields);
+    if (lRule.mpKind->mEntrySize != sizeof(Entry)) {
+        throw "an entry is not as long as the table of kinds says";
+    }
+    lRule.mpEntriesName = apEntriesName;
+    lRule.mEntriesOffset = static_cast<std::uint32_t>(aEntriesOffset);
+    lRule.mEntryFields = aEntryFields;
+    return lRule;
+}
+
+static constexpr std::array<ZTSKindRule, gcScopeEventKindCount> scKindRules{{
+    sRule<TavikPlogi>("plogi", scPlogiFields),
+    sRule<TavikPrlo>("prlo", scPortFields),
+    sRule<TavikAdisc>("adisc", scAdiscFields),
+    sAppendingRule<TavikLsRjt, TavikConsLsRjt>("lsrjt", scLsRjtFields, "rejections", offsetof(TavikLsRjt, ReasonCode),
+                                               scLsRjtEntry),
+    sRule<TavikLogo>("logo", scLogoFields),
+    sRule<TavikRscn>("rscn", scRscnFields),
+    sRule<TavikGeneric>("fabric-busy", scVersionFields),
+    sRule<TavikPortBusy>("port-busy", scPortFields),
+    sAppendingRule<TavikFcprdChkErr, TavikConsFcprdChkErr>("fcp-read-check", scFcprdChkErrFields, "parameters",
+                                                           offsetof(TavikFcprdChkErr, FcpiParam), scFcprdChkErrEntry),
+    sRule<TavikQFull>("queue-full", scBusyFields),
+    sRule<TavikDevBsy>("device-busy", scBusyFields),
+    sRule<TavikCheckCond>("check-condition", scCheckCondFields),
+    sAppendingRule<TavikLunReset, TavikConsLunReset>("lun-reset", scPortFields, "resets",
+                                                     offsetof(TavikLunReset, OsLun), scResetEntry),
+    sAppendingRule<TavikTargetReset, TavikConsTargetReset>("target-reset", scPortFields, "resets",
+                                                           offsetof(TavikTargetReset, OsLun), scResetEntry),
+    sRule<TavikGeneric>("bus-reset", scVersionFields),
+    sAppendingRule<TavikQChange, TavikConsQChange>("queue-depth", scPortFields, "changes",
+                                                   offsetof(TavikQChange, OsLun), scQChangeEntry),
+    sRule<TavikGeneric>("port-interrupt", scVersionFields),
+    sRule<TavikGeneric>("link", scVersionFields),
+    sRule<TavikGeneric>("temperature", scVersionFields),
+    sRule<TavikGeneric>("adapter-arrival", scVersionFields),
 }};
 
 static constexpr bool sIsInCatalogueOrder() {
     for (std::size_t i = 0; i < scKindRules.size(); ++i) {
-        if (scKindRules[i].mCategory != gcScopeEventKinds[i].mDeliveredCategory ||
-            scKindRules[i].mSubcategory != gcScopeEventKinds[i].mDeliveredSubcategory) {
+        if (scKindRules[i].mpKind != &gcScopeEventKinds[i]) {
             return false;
         }
     }
@@ -180,12 +205,8 @@ std::span<const ZTSKindRule> getKindRules() {
 }
 
 const ZTSKindRule* findKindRule(std::uint8_t aCategory, std::uint8_t aSubcategory) {
-    for (const ZTSKindRule& lrRule : scKindRules) {
-        if (lrRule.mCategory == aCategory && lrRule.mSubcategory == aSubcategory) {
-            return &lrRule;
-        }
-    }
-    return nullptr;
+    const ZTSScopeEventKind* lpKind = findDeliveredKind(aCategory, aSubcategory);
+    return lpKind != nullptr ? &scKindRules[static_cast<std::size_t>(lpKind - gcScopeEventKinds.data())] : nullptr;
 }
 
 const char* ZTSFieldValue::findValueName() const {
@@ -260,18 +281,19 @@ static std::vector<ZTSFieldValue> sReadFields(std::span<const ZTSFieldRule> aRul
 
 ZTSDecodedData decodeEventData(std::uint8_t aCategory, std::uint8_t aSubcategory, std::span<const std::uint8_t> aData) {
     ZTSDecodedData lDecoded;
-    lDecoded.mpKind = findDeliveredKind(aCategory, aSubcategory);
     lDecoded.mpRule = findKindRule(aCategory, aSubcategory);
     if (lDecoded.mpRule == nullptr) {
         return lDecoded;
     }
     const ZTSKindRule& lrRule = *lDecoded.mpRule;
+    lDecoded.mpKind = lrRule.mpKind;
+    const std::size_t lEntrySize = lrRule.mpKind->mEntrySize;
+    const std::size_t lRecordSize = lrRule.mpKind->mRecordSize;
     lDecoded.mFields = sReadFields(lrRule.mFields, aData, lDecoded.mProblem);
-    if (lrRule.mEntrySize != 0) {
-        for (std::size_t lOffset = lrRule.mEntriesOffset; lOffset + lrRule.mEntrySize <= aData.size();
-             lOffset += lrRule.mEntrySize) {
+    if (lEntrySize != 0) {
+        for (std::size_t lOffset = lrRule.mEntriesOffset; lOffset + lEntrySize <= aData.size(); lOffset += lEntrySize) {
             lDecoded.mEntries.push_back(
-                sReadFields(lrRule.mEntryFields, aData.subspan(lOffset, lrRule.mEntrySize), lDecoded.mProblem));
+                sReadFields(lrRule.mEntryFields, aData.subspan(lOffset, lEntrySize), lDecoded.mProblem));
         }
     }
 
@@ -282,13 +304,13 @@ ZTSDecodedData decodeEventData(std::uint8_t aCategory, std::uint8_t aSubcategory
                         "version " + std::to_string(lVersion) + ", known is " + std::to_string(EVENTDATA_VERSION));
         }
     }
-    const std::size_t lExtra = aData.size() - std::min<std::size_t>(aData.size(), lrRule.mRecordSize);
-    if (aData.size() < lrRule.mRecordSize) {
+    const std::size_t lExtra = aData.size() - std::min(aData.size(), lRecordSize);
+    if (aData.size() < lRecordSize) {
         sAddProblem(lDecoded.mProblem, std::to_string(aData.size()) + " bytes of event data, wanted at least " +
-                                           std::to_string(lrRule.mRecordSize));
-    } else if (lrRule.mEntrySize == 0 ? lExtra != 0 : lExtra % lrRule.mEntrySize != 0) {
-        sAddProblem(lDecoded.mProblem, std::to_string(lrRule.mEntrySize == 0 ? lExtra : lExtra % lrRule.mEntrySize) +
-                                           " bytes behind the last field");
+                                           std::to_string(lRecordSize));
+    } else if (lEntrySize == 0 ? lExtra != 0 : lExtra % lEntrySize != 0) {
+        sAddProblem(lDecoded.mProblem,
+                    std::to_string(lEntrySize == 0 ? lExtra : lExtra % lEntrySize) + " bytes behind the last field");
     }
     return lDecoded;
 }

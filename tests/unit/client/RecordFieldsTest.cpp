@@ -34,10 +34,10 @@ TEST(RecordFields, TheTableHoldsTheTwentyKindsInCatalogueOrder) {
     const std::vector<ZTSSampleKind> lKinds = makeSampleKinds();
     ASSERT_EQ(getKindRules().size(), lKinds.size());
     for (std::size_t i = 0; i < lKinds.size(); ++i) {
-        EXPECT_EQ(getKindRules()[i].mCategory, lKinds[i].mCategory);
-        EXPECT_EQ(getKindRules()[i].mSubcategory, lKinds[i].mSubcategory);
+        EXPECT_EQ(getKindRules()[i].mpKind->mDeliveredCategory, lKinds[i].mCategory);
+        EXPECT_EQ(getKindRules()[i].mpKind->mDeliveredSubcategory, lKinds[i].mSubcategory);
         EXPECT_EQ(findKindRule(lKinds[i].mCategory, lKinds[i].mSubcategory), &getKindRules()[i]);
-        EXPECT_EQ(getKindRules()[i].mRecordSize, lKinds[i].mData.size() - lKinds[i].mTail) << lKinds[i].mName;
+        EXPECT_EQ(getKindRules()[i].mpKind->mRecordSize, lKinds[i].mData.size() - lKinds[i].mTail) << lKinds[i].mName;
     }
     EXPECT_EQ(findKindRule(0, 2), nullptr);
 }
@@ -64,7 +64,7 @@ TEST(RecordFields, DataCutAnywhereKeepsItsWholeFieldsAndSaysSo) {
             SCOPED_TRACE(lrKind.mName + " " + std::to_string(lSize));
             const ZTSDecodedData lCut =
                 decodeEventData(lrKind.mCategory, lrKind.mSubcategory, {lrKind.mData.data(), lSize});
-            const std::size_t lEntry = lCut.mpRule->mEntrySize;
+            const std::size_t lEntry = lCut.mpKind->mEntrySize;
             const bool lIsWhole = lSize >= lRecordSize && (lSize - lRecordSize) % lEntry == 0;
             EXPECT_EQ(lCut.mProblem.empty(), lIsWhole) << lCut.mProblem;
             ASSERT_LE(lCut.mFields.size(), lWhole.mFields.size());
@@ -144,8 +144,8 @@ TEST(RecordFields, RandomDataOfAnyKindNeverCrashesIt) {
         }
         ZTSReceivedRecord lRecord;
         const ZTSKindRule& lrRule = getKindRules()[lRandom() % getKindRules().size()];
-        lRecord.mCategory = lrRule.mCategory;
-        lRecord.mSubcategory = lrRule.mSubcategory;
+        lRecord.mCategory = lrRule.mpKind->mDeliveredCategory;
+        lRecord.mSubcategory = lrRule.mpKind->mDeliveredSubcategory;
         lRecord.mEventData = lData;
         ASSERT_FALSE(formatDetails(lRecord).empty());
         ASSERT_FALSE(toJson(lRecord)["data"].is_null());

@@ -46,3 +46,18 @@ TEST(ScopeEventKinds, FindsNothingUnderThePairsOfRegistrationAlone) {
     EXPECT_EQ(nullptr, findDeliveredKind(0, 0x20));
     EXPECT_EQ(nullptr, findDeliveredKind(255, 255));
 }
+
+TEST(ScopeEventKinds, EveryKindIsFoundByItsNameAndByItsRegistration) {
+    for (std::size_t lKind = 0; lKind < gcScopeEventKindCount; ++lKind) {
+        const ZTSScopeEventKind& lcrKind = gcScopeEventKinds[lKind];
+        EXPECT_EQ(lKind, findKindIndex(lcrKind.mpName));
+        EXPECT_EQ(lKind, findRegisteredKindIndex(lcrKind.mRegisteredCategory, lcrKind.mRegisteredSubcategory));
+    }
+}
+
+TEST(ScopeEventKinds, WhatIsNoKindIsNotFound) {
+    EXPECT_EQ(std::nullopt, findKindIndex("plog"));
+    EXPECT_EQ(std::nullopt, findKindIndex(""));
+    EXPECT_EQ(std::nullopt, findRegisteredKindIndex(1, 0x20));
+    EXPECT_EQ(std::nullopt, findRegisteredKindIndex(0x0101, 0x01));
+}

@@ -105,7 +105,7 @@ TEST(Delivery, EveryScopeKindHasTheSizeOfItsStructure) {
     for (std::size_t lKind = 0; lKind < gcSimKindCount; ++lKind) {
         if (getSimKind(lKind).mDelivery == ZTSD_Scope) {
             const ZTSSimDelivery lDelivery = sMake(getSimKind(lKind).mpName);
-            EXPECT_EQ(lDelivery.mData.size(), getSimKind(lKind).mDataSize);
+            EXPECT_EQ(lDelivery.mData.size(), gcScopeEventKinds[lKind].mDataSize);
             EXPECT_EQ(lDelivery.mCategory, gcScopeEventKinds[lKind].mDeliveredCategory);
             EXPECT_EQ(lDelivery.mSubcategory, gcScopeEventKinds[lKind].mDeliveredSubcategory);
         }
@@ -286,6 +286,6 @@ TEST(Delivery, AStormMixesAllKindsBoardsPortsAndLuns) {
 TEST(Delivery, AStormKeepsToItsKinds) {
     const ZTSSimStorm lStorm = sStorm("kind=prlo");
     for (std::uint64_t lNumber = 0; lNumber < 100; ++lNumber) {
-        EXPECT_EQ(drawSimEvent(lStorm, lNumber).mKind, findSimKind("prlo"));
+        EXPECT_EQ(drawSimEvent(lStorm, lNumber).mKind, findKindIndex("prlo"));
     }
 }

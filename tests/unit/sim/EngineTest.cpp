@@ -160,7 +160,7 @@ TEST(Engine, PlaysInformationalStatuses) {
         sScenario("register plogi status=5\nregister prlo status=6\nregister adisc status=7 handle=4711\n"
                   "register logo status=0 handle=0\n"));
     const auto lRegister = [&](const char* apKind, std::uint32_t& arHandle) {
-        const ZTSScopeEventKind& lrKind = gcScopeEventKinds.at(findSimKind(apKind).value());
+        const ZTSScopeEventKind& lrKind = gcScopeEventKinds.at(findKindIndex(apKind).value());
         return lEngine.registerForPort(0, lEngine.getScenario().mAdapters[0].mWwpn, lrKind.mRegisteredCategory,
                                        lrKind.mRegisteredSubcategory, nullptr, &arHandle, ZTCRecorder::onScope);
     };

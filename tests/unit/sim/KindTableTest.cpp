@@ -7,20 +7,6 @@
 #include <string>
 #include <vector>
 
-TEST(KindTable, EveryKindIsFoundByItsNameAndByItsRegistration) {
-    for (std::size_t lKind = 0; lKind < gcSimKindCount; ++lKind) {
-        const ZTSScopeEventKind& lrPair = gcScopeEventKinds[lKind];
-        EXPECT_EQ(findSimKind(lrPair.mpName), lKind);
-        EXPECT_EQ(findSimKindByRegistration(lrPair.mRegisteredCategory, lrPair.mRegisteredSubcategory), lKind);
-    }
-}
-
-TEST(KindTable, WhatIsNoKindIsNotFound) {
-    EXPECT_EQ(findSimKind("plog"), std::nullopt);
-    EXPECT_EQ(findSimKindByRegistration(1, 0x20), std::nullopt);
-    EXPECT_EQ(findSimKindByRegistration(0x0101, 0x01), std::nullopt);
-}
-
 TEST(KindTable, NoFieldNameOfAKindStandsTwice) {
     for (std::size_t lKind = 0; lKind < gcSimKindCount; ++lKind) {
         std::set<std::string> lNames;

@@ -126,7 +126,7 @@ KPM_EventCallback ZTCRecorder::getEventCallback(std::uint32_t aEventType) {
 }
 
 std::uint32_t ZTCRecorder::registerKind(ZTCSimEngine& arEngine, std::uint32_t aBoard, const char* apKind) {
-    const ZTSScopeEventKind& lrKind = gcScopeEventKinds.at(findSimKind(apKind).value());
+    const ZTSScopeEventKind& lrKind = gcScopeEventKinds.at(findKindIndex(apKind).value());
     if (lrKind.mRegisteredCategory == 0) {
         return arEngine.registerForBoard(aBoard, lrKind.mRegisteredSubcategory, this,
                                          getEventCallback(lrKind.mRegisteredSubcategory));

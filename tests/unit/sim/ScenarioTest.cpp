@@ -143,7 +143,7 @@ TEST(Scenario, AnswersNameOperationKindAndBoard) {
     ASSERT_EQ(lScenario.mAnswers.size(), 4u);
     EXPECT_EQ(lScenario.mAnswers[0].mOperation, ZTSO_GetAdapterInfo);
     EXPECT_EQ(lScenario.mAnswers[0].mBoard, 1u);
-    EXPECT_EQ(lScenario.mAnswers[1].mKind, findSimKind("rscn"));
+    EXPECT_EQ(lScenario.mAnswers[1].mKind, findKindIndex("rscn"));
     EXPECT_EQ(lScenario.mAnswers[1].mTimes, 2u);
     EXPECT_EQ(lScenario.mAnswers[2].mOperation, ZTSO_Unregister);
     EXPECT_EQ(lScenario.mAnswers[2].mKind, std::nullopt);

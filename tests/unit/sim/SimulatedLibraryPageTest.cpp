@@ -76,7 +76,7 @@ TEST(SimulatedLibraryPage, HasARowForEveryKindWithItsPairCallbackSizeAndFields) 
             lFields += (lFields.empty() ? "`" : ", `") + std::string(lrField.mpName) + "=`";
         }
         const std::string lRow = "| `" + std::string(lrKind.mpName) + "` | " + lPair + " | " +
-                                 scCallbacks[lrKind.mDelivery] + " | " + std::to_string(lrKind.mDataSize) + " | " +
+                                 scCallbacks[lrKind.mDelivery] + " | " + std::to_string(lrPair.mDataSize) + " | " +
                                  (lFields.empty() ? "none" : lFields) + " |";
         EXPECT_TRUE(sHasRow(lRow)) << lRow;
     }
