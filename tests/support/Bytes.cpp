@@ -114,6 +114,14 @@ ZTCByteWriter& ZTCByteWriter::fill(std::size_t aCount, unsigned char aByte) {
     return *this;
 }
 
+ZTCByteWriter& ZTCByteWriter::bitField(const std::vector<unsigned>& acrBits) {
+    ZTCBytes lField(32, 0);
+    for (const unsigned lBit : acrBits) {
+        lField.at(lBit / 8) = static_cast<unsigned char>(lField.at(lBit / 8) | 1u << lBit % 8);
+    }
+    return raw(lField);
+}
+
 std::uint64_t ZTCByteReader::number(std::size_t aCount) {
     std::uint64_t lValue = 0;
     for (unsigned char lByte : raw(aCount)) {

@@ -39,6 +39,8 @@ public:
     ZTCByteWriter& wwn(const ZTSWwn& acrName);
     ZTCByteWriter& raw(const ZTCBytes& acrBytes);
     ZTCByteWriter& fill(std::size_t aCount, unsigned char aByte);
+    /// A bit field of a record: 32 bytes with these bits set.
+    ZTCByteWriter& bitField(const std::vector<unsigned>& acrBits);
 
     const ZTCBytes& bytes() const { return mBytes; }
     std::string hex() const { return hexOf(mBytes); }

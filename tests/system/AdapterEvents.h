@@ -8,6 +8,7 @@
 #include <vector>
 
 #include "tests/support/Bytes.h"
+#include "tests/support/EventKinds.h"
 #include "tests/support/LibraryEvent.h"
 
 /// Two remote ports, each with a node.
@@ -36,21 +37,12 @@ std::string allLunsRecord(std::uint64_t aPort);
 std::string checkConditionRecord(std::uint64_t aPort, std::uint32_t aSenseKey, std::uint32_t aAsc,
                                  const std::vector<unsigned>& acrLunBits, const std::vector<unsigned>& acrCommandBits,
                                  const std::vector<unsigned>& acrAscqBits);
-/// 32 bytes with these bits set.
-ZTCBytes bitField(const std::vector<unsigned>& acrBits);
 std::string rscnRecord(std::uint32_t aPage);
 
 /// What becomes of a second event of the same identity.
 enum class ZTEContinuation { Counts, Appends };
 
-/// One row per kind that is delivered with data.
-struct ZTSDataKind {
-    const char* mpName;
-    unsigned mCategory;
-    unsigned mSubcategory;
-    unsigned mMinimum;       ///< least length of its data
-    const char* mpTooShort;  ///< message, up to the two numbers
-    const char* mpNotice;    ///< processing notice, up to its category
+struct ZTSEventData {
     ZTCBytes mData;          ///< an event's data
     std::string mRecordHex;  ///< the record that it makes
     ZTCBytes mSameIdentity;  ///< data that continue that record
@@ -59,19 +51,16 @@ struct ZTSDataKind {
     std::vector<ZTCBytes> mOthers;  ///< data that start a record of their own: one changed part of the identity each
 };
 
+/// One row per kind that is delivered with data, but for RSCN.
+struct ZTSDataKind : ZTSTestKind, ZTSEventData {};
+
 std::vector<ZTSDataKind> dataKinds();
 
-/// One row per kind without data: how it is delivered, and its notice up to its category.
-struct ZTSBareKind {
+/// One row per kind without data: how it is delivered.
+struct ZTSBareKind : ZTSTestKind {
     ZTSLibraryEvent mEvent;
-    unsigned mCategory;
-    unsigned mSubcategory;
-    const char* mpNotice;
 };
 
 std::vector<ZTSBareKind> bareKinds(unsigned aBoard = 0);
-
-/// " Cat=C SubCat=S" and the like: the text of a processing notice.
-std::string noticeText(const char* apNotice, unsigned aCategory, unsigned aSubcategory);
 
 #endif

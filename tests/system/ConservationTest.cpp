@@ -27,10 +27,7 @@ static std::vector<ZTSDrawnKind> sKinds() {
     for (const ZTSDataKind& lcrKind : dataKinds()) {
         std::vector<ZTCBytes> lData{lcrKind.mData, lcrKind.mSameIdentity};
         lData.insert(lData.end(), lcrKind.mOthers.begin(), lcrKind.mOthers.end());
-        ZTSDrawnKind lKind{lcrKind.mCategory,
-                           lcrKind.mSubcategory,
-                           noticeText(lcrKind.mpNotice, lcrKind.mCategory, lcrKind.mSubcategory),
-                           {}};
+        ZTSDrawnKind lKind{lcrKind.mCategory, lcrKind.mSubcategory, lcrKind.notice(), {}};
         for (const ZTCBytes& lcrBytes : lData) {
             lKind.mEvents.push_back(ZTSLibraryEvent::scope(0, lcrKind.mCategory, lcrKind.mSubcategory, lcrBytes));
         }
@@ -39,14 +36,11 @@ static std::vector<ZTSDrawnKind> sKinds() {
         lKinds.push_back(lKind);
     }
     for (const ZTSBareKind& lcrKind : bareKinds()) {
-        lKinds.push_back({lcrKind.mCategory,
-                          lcrKind.mSubcategory,
-                          noticeText(lcrKind.mpNotice, lcrKind.mCategory, lcrKind.mSubcategory),
-                          {lcrKind.mEvent}});
+        lKinds.push_back({lcrKind.mCategory, lcrKind.mSubcategory, lcrKind.notice(), {lcrKind.mEvent}});
     }
     lKinds.push_back({1,
                       0x20,
-                      noticeText("Processing Rscn Event Cat=", 1, 0x20),
+                      testKind("rscn").notice(),
                       {ZTSLibraryEvent::rscn(0, rscnPayload({0x00010203})),
                        ZTSLibraryEvent::rscn(0, rscnPayload({0x00010203, 0x00010203, 0x01020000})),
                        ZTSLibraryEvent::rscn(0, rscnPayload({0x03000000, 0x00040506}))}});

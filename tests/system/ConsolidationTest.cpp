@@ -34,7 +34,7 @@ TEST(Consolidation, EveryKindWithDataIsRecordedByteForByte) {
         SCOPED_TRACE(lcrKind.mpName);
         lAgent.library().deliver(sEvent(lcrKind, lcrKind.mData));
         EXPECT_EQ(lAgent.retrieve().texts(), ZTCTexts{sRecord(lcrKind, 1, lcrKind.mRecordHex)});
-        EXPECT_EQ(lAgent.log().count(noticeText(lcrKind.mpNotice, lcrKind.mCategory, lcrKind.mSubcategory), "-N-"), 1u);
+        EXPECT_EQ(lAgent.log().count(lcrKind.notice(), "-N-"), 1u);
     }
 }
 
@@ -43,10 +43,10 @@ TEST(Consolidation, EveryKindWithoutDataIsRecordedAsItsVersionAlone) {
     lAgent.startAndConnect();
     lAgent.startScope();
     for (const ZTSBareKind& lcrKind : bareKinds()) {
-        SCOPED_TRACE(lcrKind.mpNotice);
+        SCOPED_TRACE(lcrKind.mpName);
         lAgent.library().deliver(lcrKind.mEvent);
         EXPECT_EQ(lAgent.retrieve().texts(), ZTCTexts{sRecord(lcrKind.mCategory, lcrKind.mSubcategory, 1, "01000000")});
-        EXPECT_EQ(lAgent.log().count(noticeText(lcrKind.mpNotice, lcrKind.mCategory, lcrKind.mSubcategory), "-N-"), 1u);
+        EXPECT_EQ(lAgent.log().count(lcrKind.notice(), "-N-"), 1u);
     }
 }
 
@@ -55,7 +55,7 @@ TEST(Consolidation, EventsWithoutDataOfOneKindAndBoardAreCounted) {
     lAgent.startAndConnect();
     lAgent.startScope();
     for (const ZTSBareKind& lcrKind : bareKinds()) {
-        SCOPED_TRACE(lcrKind.mpNotice);
+        SCOPED_TRACE(lcrKind.mpName);
         ZTSLibraryEvent lElsewhere = lcrKind.mEvent;
         lElsewhere.mBoard = 1;
         lAgent.library().deliverAll({lcrKind.mEvent, lcrKind.mEvent, lcrKind.mEvent, lElsewhere, lcrKind.mEvent});
@@ -72,10 +72,9 @@ TEST(Consolidation, DataOneByteTooShortIsReportedWithBothLengthsAndDropped) {
     lAgent.startScope();
     for (const ZTSDataKind& lcrKind : dataKinds()) {
         SCOPED_TRACE(lcrKind.mpName);
-        const std::string lMessage =
-            lcrKind.mpTooShort + std::to_string(lcrKind.mMinimum) + " " + std::to_string(lcrKind.mMinimum - 1);
+        const std::string lMessage = lcrKind.tooShort(lcrKind.mMinimumLength - 1);
         const std::size_t lBefore = lAgent.log().count(lMessage, "-W-");
-        ASSERT_EQ(lcrKind.mData.size(), lcrKind.mMinimum);
+        ASSERT_EQ(lcrKind.mData.size(), lcrKind.mMinimumLength);
         lAgent.library().deliver(sEvent(lcrKind, ZTCBytes(lcrKind.mData.begin(), lcrKind.mData.end() - 1)));
         EXPECT_EQ(lAgent.log().count(lMessage, "-W-"), lBefore + 1);
         EXPECT_EQ(lAgent.retrieve().texts(), ZTCTexts{});
@@ -97,7 +96,7 @@ TEST(Consolidation, AnEventWithoutPayloadObjectHasLengthZeroWhateverItsSize) {
     lAgent.startScope();
     for (const ZTSDataKind& lcrKind : dataKinds()) {
         SCOPED_TRACE(lcrKind.mpName);
-        const std::string lMessage = lcrKind.mpTooShort + std::to_string(lcrKind.mMinimum) + " 0";
+        const std::string lMessage = lcrKind.tooShort(0);
         const std::size_t lBefore = lAgent.log().count(lMessage, "-W-");
         ZTSLibraryEvent lEvent = sEvent(lcrKind, lcrKind.mData);
         lEvent.mPayload = ZTELibraryEventPayload::NullPayload;
@@ -258,7 +257,7 @@ TEST(Consolidation, ARegisteredTargetGivesItsNamesToEveryKind) {
         EXPECT_EQ(lAgent.retrieve().texts(), ZTCTexts{sRecord(lcrKind, 2, lcrKind.mContinuedHex, lNames)});
     }
     for (const ZTSBareKind& lcrKind : bareKinds()) {
-        SCOPED_TRACE(lcrKind.mpNotice);
+        SCOPED_TRACE(lcrKind.mpName);
         lAgent.library().deliver(lcrKind.mEvent);
         EXPECT_EQ(lAgent.retrieve().texts(), ZTCTexts{sRecord(lcrKind.mCategory, lcrKind.mSubcategory, 1, "01000000")});
     }

@@ -52,7 +52,7 @@ void sDriveRegistration(ZTCAgentProcess& arAgent) {
 void sDriveEvents(ZTCAgentProcess& arAgent) {
     std::vector<ZTSLibraryEvent> lEvents;
     for (const ZTSDataKind& lcrKind : dataKinds()) {
-        const ZTCBytes lShort(lcrKind.mMinimum - 1, 0);
+        const ZTCBytes lShort(lcrKind.mMinimumLength - 1, 0);
         lEvents.push_back(ZTSLibraryEvent::scope(0, lcrKind.mCategory, lcrKind.mSubcategory, lcrKind.mData));
         lEvents.push_back(ZTSLibraryEvent::scope(0, lcrKind.mCategory, lcrKind.mSubcategory, lShort));
     }

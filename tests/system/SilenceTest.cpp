@@ -63,7 +63,7 @@ TEST(Silence, EventsOfEverySortAreHandledWithoutAWord) {
     lAgent.startScope();
     unsigned lRecords = 0;
     for (const ZTSDataKind& lcrKind : dataKinds()) {
-        const ZTCBytes lShort(lcrKind.mMinimum - 1, 0);
+        const ZTCBytes lShort(lcrKind.mMinimumLength - 1, 0);
         lAgent.library().deliverAll(
             {ZTSLibraryEvent::scope(0, lcrKind.mCategory, lcrKind.mSubcategory, lcrKind.mData),
              ZTSLibraryEvent::scope(0, lcrKind.mCategory, lcrKind.mSubcategory, lShort),

@@ -23,7 +23,7 @@ static ZTSReceivedRecord sRecord(const ZTSSampleKind& acrKind) {
 
 static const ZTSSampleKind& sKind(const std::vector<ZTSSampleKind>& acrKinds, const std::string& acrName) {
     for (const ZTSSampleKind& lrKind : acrKinds) {
-        if (lrKind.mName == acrName) {
+        if (lrKind.mpName == acrName) {
             return lrKind;
         }
     }
@@ -37,31 +37,31 @@ TEST(RecordFields, TheTableHoldsTheTwentyKindsInCatalogueOrder) {
         EXPECT_EQ(getKindRules()[i].mpKind->mDeliveredCategory, lKinds[i].mCategory);
         EXPECT_EQ(getKindRules()[i].mpKind->mDeliveredSubcategory, lKinds[i].mSubcategory);
         EXPECT_EQ(findKindRule(lKinds[i].mCategory, lKinds[i].mSubcategory), &getKindRules()[i]);
-        EXPECT_EQ(getKindRules()[i].mpKind->mRecordSize, lKinds[i].mData.size() - lKinds[i].mTail) << lKinds[i].mName;
+        EXPECT_EQ(getKindRules()[i].mpKind->mRecordSize, lKinds[i].mRecordSize) << lKinds[i].mpName;
     }
     EXPECT_EQ(findKindRule(0, 2), nullptr);
 }
 
 TEST(RecordFields, EveryKindsDataIsDecodedToNamedFields) {
     for (const ZTSSampleKind& lrKind : makeSampleKinds()) {
-        SCOPED_TRACE(lrKind.mName);
+        SCOPED_TRACE(lrKind.mpName);
         const ZTSReceivedRecord lRecord = sRecord(lrKind);
         const nlohmann::ordered_json lJson = toJson(lRecord);
-        EXPECT_EQ(lJson["kind"], lrKind.mName);
+        EXPECT_EQ(lJson["kind"], lrKind.mpName);
         EXPECT_EQ(lJson["data"].dump(), lrKind.mJson);
         EXPECT_TRUE(lJson["dataProblem"].is_null()) << lJson["dataProblem"];
         EXPECT_EQ(lJson["dataHex"], hexOf(lrKind.mData));
         EXPECT_EQ(formatDetails(lRecord), lrKind.mDetails);
-        EXPECT_EQ(formatKind(lRecord), lrKind.mName);
+        EXPECT_EQ(formatKind(lRecord), lrKind.mpName);
     }
 }
 
 TEST(RecordFields, DataCutAnywhereKeepsItsWholeFieldsAndSaysSo) {
     for (const ZTSSampleKind& lrKind : makeSampleKinds()) {
         const ZTSDecodedData lWhole = decodeEventData(lrKind.mCategory, lrKind.mSubcategory, lrKind.mData);
-        const std::size_t lRecordSize = lrKind.mData.size() - lrKind.mTail;
+        const std::size_t lRecordSize = lrKind.mRecordSize;
         for (std::size_t lSize = 0; lSize < lrKind.mData.size(); ++lSize) {
-            SCOPED_TRACE(lrKind.mName + " " + std::to_string(lSize));
+            SCOPED_TRACE(std::string(lrKind.mpName) + " " + std::to_string(lSize));
             const ZTSDecodedData lCut =
                 decodeEventData(lrKind.mCategory, lrKind.mSubcategory, {lrKind.mData.data(), lSize});
             const std::size_t lEntry = lCut.mpKind->mEntrySize;

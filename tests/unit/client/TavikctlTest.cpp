@@ -132,7 +132,7 @@ TEST_F(Tavikctl, GetPrintsATableForPeople) {
     EXPECT_EQ(lRun.mStatus, 0) << lRun.mErrors;
     EXPECT_THAT(lRun.mOutput, StartsWith("INITIATOR "));
     for (const ZTSSampleKind& lrKind : makeSampleKinds()) {
-        EXPECT_THAT(lRun.mOutput, HasSubstr("  " + lrKind.mName + "  "));
+        EXPECT_THAT(lRun.mOutput, HasSubstr(std::string("  ") + lrKind.mpName + "  "));
     }
     EXPECT_THAT(lRun.mOutput, HasSubstr("20 records, 20 occurrences from 2 initiators\n"));
 }

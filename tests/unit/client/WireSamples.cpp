@@ -14,12 +14,7 @@ static ZTCByteWriter sStartWithPort() {
 
 /// A bit field of 256 bits with its length in front.
 static ZTCBytes sBits(const std::vector<unsigned>& acrBits) {
-    ZTCBytes lField(32, 0);
-    for (const unsigned lBit : acrBits) {
-        lField[lBit / 8] = static_cast<unsigned char>(lField[lBit / 8] | 1U << (lBit % 8));
-    }
-    ZTCByteWriter lWriter;
-    return lWriter.le32(256).raw(lField).bytes();
+    return ZTCByteWriter().le32(256).bitField(acrBits).bytes();
 }
 
 std::vector<ZTSSampleKind> makeSampleKinds() {
@@ -30,49 +25,69 @@ std::vector<ZTSSampleKind> makeSampleKinds() {
     const ZTCBytes lPortAndNode = sStartWithPort().wwn(makeWwn(gcSampleNode)).bytes();
     const std::string lVersionJson = R"({"version":1})";
     return {
-        {1, 0x01, "plogi", lPortAndNode, "{" + lPort + ",\"nodeName\":" + lNode + "}",
-         std::string("nodeName=") + gcSampleNodeText, 0},
-        {1, 0x02, "prlo", lPortOnly, "{" + lPort + "}", "-", 0},
-        {1, 0x04, "adisc", lPortAndNode, "{" + lPort + ",\"nodeName\":" + lNode + "}",
-         std::string("nodeName=") + gcSampleNodeText, 0},
-        {1, 0x08, "lsrjt",
-         sStartWithPort().le32(0x03).le32(0x09).le32(0x2A).le32(0x09).le32(0x2A).le32(0x55).le32(0x00).bytes(),
-         "{" + lPort +
-             R"(,"originalCommand":3,"originalCommandName":"PLOGI","rejections":[)"
-             R"({"reasonCode":9,"reasonCodeName":"unable to perform","explanation":42},)"
-             R"({"reasonCode":9,"reasonCodeName":"unable to perform","explanation":42},)"
-             R"({"reasonCode":85,"reasonCodeName":null,"explanation":0}]})",
-         "originalCommand=0x03(PLOGI) rejections=[0x09(unable to perform)/0x2a*2 0x55/0x00]", 16},
-        {1, 0x10, "logo", lPortAndNode, "{" + lPort + ",\"payloadPortName\":" + lNode + "}",
-         std::string("payloadPortName=") + gcSampleNodeText, 0},
-        {1, 0x20, "rscn", sStart().le32(0x01010200).bytes(),
-         R"({"version":1,"page":16843264,"addressFormat":1,"addressFormatName":"area","fcAddress":66048})",
-         "addressFormat=1(area) fcAddress=0x010200", 0},
-        {2, 0x01, "fabric-busy", lVersion, lVersionJson, "-", 0},
-        {2, 0x02, "port-busy", lPortOnly, "{" + lPort + "}", "-", 0},
-        {2, 0x04, "fcp-read-check", sStartWithPort().le32(0x28).le32(7).le32(512).le32(1024).bytes(),
-         "{" + lPort + R"(,"opCode":40,"lun":7,"parameters":[{"fcpiParameter":512},{"fcpiParameter":1024}]})",
-         "opCode=0x28 lun=7 parameters=[0x200 0x400]", 4},
-        {4, 0x01, "queue-full", sStartWithPort().raw(sBits({3, 9})).bytes(), "{" + lPort + R"(,"luns":[3,9]})",
-         "luns=3,9", 0},
-        {4, 0x02, "device-busy", sStartWithPort().raw(sBits({0, 1, 2, 255})).bytes(),
-         "{" + lPort + R"(,"luns":[0,1,2,255]})", "luns=0-2,255", 0},
-        {4, 0x04, "check-condition",
-         sStartWithPort().le32(5).le32(0x24).raw(sBits({4})).raw(sBits({0x28, 0x2A})).raw(sBits({})).bytes(),
-         "{" + lPort +
-             R"(,"senseKey":5,"senseKeyName":"illegal request","asc":36,"luns":[4],"commandCodes":[40,42],"ascqs":[]})",
-         "senseKey=0x05(illegal request) asc=0x24 luns=4 commandCodes=0x28,0x2a ascqs=none", 0},
-        {4, 0x08, "lun-reset", sStartWithPort().le32(6).le32(0xFFFFFFFF).bytes(),
-         "{" + lPort + R"(,"resets":[{"lun":6},{"lun":4294967295}]})", "resets=[6 all]", 4},
-        {4, 0x10, "target-reset", sStartWithPort().le32(0).le32(1).le32(1).bytes(),
-         "{" + lPort + R"(,"resets":[{"lun":0},{"lun":1},{"lun":1}]})", "resets=[0 1*2]", 8},
-        {4, 0x20, "bus-reset", lVersion, lVersionJson, "-", 0},
-        {4, 0x40, "queue-depth", sStartWithPort().le32(2).le32(32).le32(3).le32(16).bytes(),
-         "{" + lPort + R"(,"changes":[{"lun":2,"newDepth":32},{"lun":3,"newDepth":16}]})", "changes=[2/32 3/16]", 8},
-        {8, 0x01, "port-interrupt", lVersion, lVersionJson, "-", 0},
-        {8, 0x02, "link", lVersion, lVersionJson, "-", 0},
-        {8, 0x04, "temperature", lVersion, lVersionJson, "-", 0},
-        {16, 0x01, "adapter-arrival", lVersion, lVersionJson, "-", 0},
+        {testKind("plogi"),
+         {.mData = lPortAndNode,
+          .mJson = "{" + lPort + ",\"nodeName\":" + lNode + "}",
+          .mDetails = std::string("nodeName=") + gcSampleNodeText}},
+        {testKind("prlo"), {.mData = lPortOnly, .mJson = "{" + lPort + "}", .mDetails = "-"}},
+        {testKind("adisc"),
+         {.mData = lPortAndNode,
+          .mJson = "{" + lPort + ",\"nodeName\":" + lNode + "}",
+          .mDetails = std::string("nodeName=") + gcSampleNodeText}},
+        {testKind("lsrjt"),
+         {.mData =
+              sStartWithPort().le32(0x03).le32(0x09).le32(0x2A).le32(0x09).le32(0x2A).le32(0x55).le32(0x00).bytes(),
+          .mJson = "{" + lPort +
+                   R"(,"originalCommand":3,"originalCommandName":"PLOGI","rejections":[)"
+                   R"({"reasonCode":9,"reasonCodeName":"unable to perform","explanation":42},)"
+                   R"({"reasonCode":9,"reasonCodeName":"unable to perform","explanation":42},)"
+                   R"({"reasonCode":85,"reasonCodeName":null,"explanation":0}]})",
+          .mDetails = "originalCommand=0x03(PLOGI) rejections=[0x09(unable to perform)/0x2a*2 0x55/0x00]"}},
+        {testKind("logo"),
+         {.mData = lPortAndNode,
+          .mJson = "{" + lPort + ",\"payloadPortName\":" + lNode + "}",
+          .mDetails = std::string("payloadPortName=") + gcSampleNodeText}},
+        {testKind("rscn"),
+         {.mData = sStart().le32(0x01010200).bytes(),
+          .mJson = R"({"version":1,"page":16843264,"addressFormat":1,"addressFormatName":"area","fcAddress":66048})",
+          .mDetails = "addressFormat=1(area) fcAddress=0x010200"}},
+        {testKind("fabric-busy"), {.mData = lVersion, .mJson = lVersionJson, .mDetails = "-"}},
+        {testKind("port-busy"), {.mData = lPortOnly, .mJson = "{" + lPort + "}", .mDetails = "-"}},
+        {testKind("fcp-read-check"),
+         {.mData = sStartWithPort().le32(0x28).le32(7).le32(512).le32(1024).bytes(),
+          .mJson = "{" + lPort + R"(,"opCode":40,"lun":7,"parameters":[{"fcpiParameter":512},{"fcpiParameter":1024}]})",
+          .mDetails = "opCode=0x28 lun=7 parameters=[0x200 0x400]"}},
+        {testKind("queue-full"),
+         {.mData = sStartWithPort().raw(sBits({3, 9})).bytes(),
+          .mJson = "{" + lPort + R"(,"luns":[3,9]})",
+          .mDetails = "luns=3,9"}},
+        {testKind("device-busy"),
+         {.mData = sStartWithPort().raw(sBits({0, 1, 2, 255})).bytes(),
+          .mJson = "{" + lPort + R"(,"luns":[0,1,2,255]})",
+          .mDetails = "luns=0-2,255"}},
+        {testKind("check-condition"),
+         {.mData = sStartWithPort().le32(5).le32(0x24).raw(sBits({4})).raw(sBits({0x28, 0x2A})).raw(sBits({})).bytes(),
+          .mJson =
+              "{" + lPort +
+              R"(,"senseKey":5,"senseKeyName":"illegal request","asc":36,"luns":[4],"commandCodes":[40,42],"ascqs":[]})",
+          .mDetails = "senseKey=0x05(illegal request) asc=0x24 luns=4 commandCodes=0x28,0x2a ascqs=none"}},
+        {testKind("lun-reset"),
+         {.mData = sStartWithPort().le32(6).le32(0xFFFFFFFF).bytes(),
+          .mJson = "{" + lPort + R"(,"resets":[{"lun":6},{"lun":4294967295}]})",
+          .mDetails = "resets=[6 all]"}},
+        {testKind("target-reset"),
+         {.mData = sStartWithPort().le32(0).le32(1).le32(1).bytes(),
+          .mJson = "{" + lPort + R"(,"resets":[{"lun":0},{"lun":1},{"lun":1}]})",
+          .mDetails = "resets=[0 1*2]"}},
+        {testKind("bus-reset"), {.mData = lVersion, .mJson = lVersionJson, .mDetails = "-"}},
+        {testKind("queue-depth"),
+         {.mData = sStartWithPort().le32(2).le32(32).le32(3).le32(16).bytes(),
+          .mJson = "{" + lPort + R"(,"changes":[{"lun":2,"newDepth":32},{"lun":3,"newDepth":16}]})",
+          .mDetails = "changes=[2/32 3/16]"}},
+        {testKind("port-interrupt"), {.mData = lVersion, .mJson = lVersionJson, .mDetails = "-"}},
+        {testKind("link"), {.mData = lVersion, .mJson = lVersionJson, .mDetails = "-"}},
+        {testKind("temperature"), {.mData = lVersion, .mJson = lVersionJson, .mDetails = "-"}},
+        {testKind("adapter-arrival"), {.mData = lVersion, .mJson = lVersionJson, .mDetails = "-"}},
     };
 }
 

@@ -7,6 +7,7 @@
 #include <vector>
 
 #include "tests/support/Bytes.h"
+#include "tests/support/EventKinds.h"
 
 /// Names that the samples use.
 inline constexpr std::uint64_t gcSamplePort = 0x500601603BA01234;
@@ -16,15 +17,14 @@ inline constexpr const char* gcSampleNodeText = "50:06:01:60:bb:a0:12:34";
 inline constexpr const char* gcSampleKey = "20:00:00:00:c9:00:00:01.10:00:00:00:c9:00:00:01";
 
 /// Event data of one kind, and what tools make of it.
-struct ZTSSampleKind {
-    std::uint8_t mCategory;
-    std::uint8_t mSubcategory;
-    std::string mName;
+struct ZTSSampleData {
     ZTCBytes mData;
     std::string mJson;     ///< the "data" object
     std::string mDetails;  ///< the table's last column
-    std::size_t mTail;     ///< bytes at the end that are appended entries
 };
+
+/// What of the data goes beyond the kind's record size are appended entries.
+struct ZTSSampleKind : ZTSTestKind, ZTSSampleData {};
 
 /// One for each of the twenty kinds, in catalogue order.
 std::vector<ZTSSampleKind> makeSampleKinds();

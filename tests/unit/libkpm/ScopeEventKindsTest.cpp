@@ -6,6 +6,33 @@
 #include <string>
 #include <utility>
 
+#include "tests/support/EventKinds.h"
+
+TEST(ScopeEventKinds, EveryRowIsTheOneThatTheTestsExpect) {
+    ASSERT_EQ(gcTestKinds.size(), gcScopeEventKindCount);
+    for (std::size_t lKind = 0; lKind < gcScopeEventKindCount; ++lKind) {
+        const ZTSScopeEventKind& lcrKind = gcScopeEventKinds[lKind];
+        const ZTSTestKind& lcrExpected = gcTestKinds[lKind];
+        SCOPED_TRACE(lcrExpected.mpName);
+        EXPECT_STREQ(lcrExpected.mpName, lcrKind.mpName);
+        EXPECT_EQ(lcrExpected.mRegisteredCategory, lcrKind.mRegisteredCategory);
+        EXPECT_EQ(lcrExpected.mRegisteredSubcategory, lcrKind.mRegisteredSubcategory);
+        EXPECT_EQ(lcrExpected.mCategory, lcrKind.mDeliveredCategory);
+        EXPECT_EQ(lcrExpected.mSubcategory, lcrKind.mDeliveredSubcategory);
+        EXPECT_EQ(lcrExpected.mRecordSize, lcrKind.mRecordSize);
+        EXPECT_EQ(lcrExpected.mAppendedSize, lcrKind.mEntrySize);
+        if (lcrKind.isScope()) {
+            EXPECT_EQ(lcrExpected.mMinimumLength, lcrKind.mDataSize);
+        }
+    }
+}
+
+TEST(ScopeEventKinds, TheDataOfTheThreeBoardEventsIsAnRscnHeaderALinkInfoAndTwoTemperatures) {
+    EXPECT_EQ(4u, gcScopeEventKinds[findKindIndex("rscn").value()].mDataSize);
+    EXPECT_EQ(168u, gcScopeEventKinds[findKindIndex("link").value()].mDataSize);
+    EXPECT_EQ(8u, gcScopeEventKinds[findKindIndex("temperature").value()].mDataSize);
+}
+
 TEST(ScopeEventKinds, EveryNameAndEveryPairStandsOnce) {
     std::set<std::string> lNames;
     std::set<std::pair<int, int>> lRegistered;

@@ -344,9 +344,9 @@ TEST_F(Conservation, WithStopsThatRaceTheEventsWhatIsNotedAsProcessedIsDelivered
             }
         }
         for (const ZTSDeliveredKind& lcrKind : allKinds()) {
-            EXPECT_EQ(lNotices[lcrKind.mNotice], lDelivered.count(lcrKind.mCategory, lcrKind.mSubcategory))
+            EXPECT_EQ(lNotices[lcrKind.notice()], lDelivered.count(lcrKind.mCategory, lcrKind.mSubcategory))
                 << lcrKind.mpName;
-            lProcessed += lNotices[lcrKind.mNotice];
+            lProcessed += lNotices[lcrKind.notice()];
         }
         EXPECT_EQ(lNotices["Processing Rscn Event Cat=1 SubCat=32"], lDelivered.count(1, 0x20));
         ASSERT_FALSE(HasFailure());

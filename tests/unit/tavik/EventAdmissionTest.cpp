@@ -15,7 +15,7 @@ const char* const gcLimitText = "-N- Ignoring the event as the limit on the tota
 class EventAdmission : public ZTCTavikFixture {
 protected:
     void deliverPlogi(unsigned aBoard, const ZTSDeliveryShape& acrShape = {}) {
-        deliverScope(aBoard, 1, 1, kindNamed("PLOGI").mPayload, acrShape);
+        deliverScope(aBoard, 1, 1, kindNamed("plogi").mPayload, acrShape);
     }
 
     /// One event through each of the four callbacks.
@@ -31,7 +31,7 @@ protected:
                "; cat " + std::to_string(aCategory) + "; subcat " + std::to_string(aSubcategory) + ".  Skip event!";
     }
 
-    const std::string mPlogiText = "1/1 x1 " + kindNamed("PLOGI").mRecordHex;
+    const std::string mPlogiText = "1/1 x1 " + kindNamed("plogi").mRecordHex;
 };
 
 }  // namespace
@@ -53,8 +53,8 @@ TEST_F(EventAdmission, AnEventIsAdmittedOneByteBelowTheTotalLimitAndMayPassIt) {
 }
 
 TEST_F(EventAdmission, AnAppendMayPassTheTotalLimitAndIsTheLastThingAdmitted) {
-    const ZTSDeliveredKind& lcrKind = kindNamed("LS_RJT");
-    const auto lcRecord = static_cast<unsigned>(lcrKind.recordSize());
+    const ZTSDeliveredKind& lcrKind = kindNamed("lsrjt");
+    const auto lcRecord = static_cast<unsigned>(lcrKind.mRecordSize);
     for (const unsigned lTotal : {262143u, 262144u}) {
         SCOPED_TRACE(lTotal);
         mSystem->getProtocolHandler() != nullptr ? startScope() : collect();

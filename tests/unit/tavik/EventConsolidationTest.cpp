@@ -73,9 +73,9 @@ TEST_F(EventConsolidation, EveryKindMakesARecordOfItsBytesAfterItsNotice) {
         SCOPED_TRACE(lcrKind.mpName);
         mLog.forget();
         deliver(lcrKind);
-        EXPECT_EQ(std::vector<std::string>{"-N- " + lcrKind.mNotice}, mLog.texts());
+        EXPECT_EQ(std::vector<std::string>{"-N- " + lcrKind.notice()}, mLog.texts());
         EXPECT_EQ(".//TavikCore", mLog.lines().at(0).mLabel);
-        EXPECT_EQ(lcrKind.recordSize(), mSystem->getTotalEventDataSize());
+        EXPECT_EQ(lcrKind.mRecordSize, mSystem->getTotalEventDataSize());
         EXPECT_EQ(std::vector<std::string>{textOf(lcrKind)}, retrieveTexts());
     }
 }
@@ -87,7 +87,7 @@ TEST_F(EventConsolidation, EveryKindContinuesItsRecordInItsWay) {
         deliver(lcrKind);
         deliver(lcrKind);
         deliver(lcrKind);
-        EXPECT_EQ(lcrKind.recordSize() + 2 * lcrKind.appendedSize(), mSystem->getTotalEventDataSize());
+        EXPECT_EQ(lcrKind.mRecordSize + 2 * lcrKind.mAppendedSize, mSystem->getTotalEventDataSize());
         EXPECT_EQ(std::vector<std::string>{textOf(lcrKind, 3)}, retrieveTexts());
     }
 }
@@ -118,7 +118,7 @@ TEST_F(EventConsolidation, EveryPayloadByteStartsANewRecordExactlyWhereItBelongs
             if (lcrKind.isIdentityByte(lByte)) {
                 ASSERT_EQ(2u, lcrRecords.size());
                 EXPECT_EQ(1u, lcrRecords[1].mOccurrences);
-                EXPECT_EQ(lcrKind.recordSize(), lcrRecords[1].mData.size());
+                EXPECT_EQ(lcrKind.mRecordSize, lcrRecords[1].mData.size());
             } else {
                 ASSERT_EQ(1u, lcrRecords.size());
                 EXPECT_EQ(2u, lcrRecords[0].mOccurrences);
@@ -171,11 +171,11 @@ TEST_F(EventConsolidation, EveryOtherKindInBetweenStartsANewRecord) {
 
 TEST_F(EventConsolidation, AnEventThatIsDroppedDoesNotInterruptARun) {
     collect();
-    const ZTSDeliveredKind& lcrKind = kindNamed("PLOGI");
+    const ZTSDeliveredKind& lcrKind = kindNamed("plogi");
     deliver(lcrKind);
     deliver(lcrKind, ZTCBytes(19, 0));
     deliverScope(0, 1, 0x40, {});
-    deliver(kindNamed("QFULL"), ZTCBytes(15, 0));
+    deliver(kindNamed("queue-full"), ZTCBytes(15, 0));
     deliverRscn(0, makeRscn({1}, 4));
     deliver(lcrKind);
     EXPECT_EQ(std::vector<std::string>{textOf(lcrKind, 2)}, retrieveTexts());
@@ -199,8 +199,8 @@ TEST_F(EventConsolidation, AppendingKindsAppendWhileTheRecordStaysStrictlyBelowT
         if (lcrKind.mOnMatch != ZTEOnMatch::Appends) {
             continue;
         }
-        const auto lRecord = static_cast<unsigned>(lcrKind.recordSize());
-        const auto lAppended = static_cast<unsigned>(lcrKind.appendedSize());
+        const auto lRecord = static_cast<unsigned>(lcrKind.mRecordSize);
+        const auto lAppended = static_cast<unsigned>(lcrKind.mAppendedSize);
         for (const unsigned lLimit :
              {0u, 1u, lRecord, lRecord + lAppended - 1, lRecord + lAppended, lRecord + lAppended + 1,
               lRecord + 2 * lAppended, lRecord + 2 * lAppended + 1, lRecord + 3 * lAppended, 0xFFFFFFFFu}) {
@@ -249,16 +249,16 @@ TEST_F(EventConsolidation, AnAppendedPartHoldsWhatIsNewInItsEvent) {
         deliver(kindNamed(apKind), makePortPayload(gcKindPort, acrNumbers));
     };
     const std::string lHead = hexOf(bytesOf("01000000 500601603ba01234"));
-    lDeliver("LS_RJT", {3, 9, 0x29});
-    lDeliver("LS_RJT", {3, 0xA, 0x2A});
-    lDeliver("FCP read check", {7, 0x28, 1});
-    lDeliver("FCP read check", {7, 0x28, 2});
-    lDeliver("LUN reset", {5});
-    lDeliver("LUN reset", {6});
-    lDeliver("target reset", {7});
-    lDeliver("target reset", {8});
-    lDeliver("queue depth", {5, 32, 16});
-    lDeliver("queue depth", {6, 64, 48});
+    lDeliver("lsrjt", {3, 9, 0x29});
+    lDeliver("lsrjt", {3, 0xA, 0x2A});
+    lDeliver("fcp-read-check", {7, 0x28, 1});
+    lDeliver("fcp-read-check", {7, 0x28, 2});
+    lDeliver("lun-reset", {5});
+    lDeliver("lun-reset", {6});
+    lDeliver("target-reset", {7});
+    lDeliver("target-reset", {8});
+    lDeliver("queue-depth", {5, 32, 16});
+    lDeliver("queue-depth", {6, 64, 48});
     EXPECT_EQ(
         (std::vector<std::string>{"1/8 x2 " + lHead + hexOf(bytesOf("03000000 09000000 29000000 0a000000 2a000000")),
                                   "2/4 x2 " + lHead + hexOf(bytesOf("28000000 07000000 01000000 02000000")),
@@ -289,7 +289,7 @@ TEST_F(EventConsolidation, LunBitsAreSetUpTo255AndAllAtOnceForEveryLun) {
     for (const ZTSLunCase& lcrCase : lCases) {
         SCOPED_TRACE(testing::PrintToString(lcrCase.mLuns));
         const auto lCount = static_cast<unsigned>(lcrCase.mLuns.size());
-        for (const char* lpName : {"QFULL", "DEVBSY"}) {
+        for (const char* lpName : {"queue-full", "device-busy"}) {
             const ZTSDeliveredKind& lcrKind = kindNamed(lpName);
             for (const std::uint32_t lLun : lcrCase.mLuns) {
                 deliver(lcrKind, makePortPayload(gcKindPort, {lLun}));
@@ -299,7 +299,7 @@ TEST_F(EventConsolidation, LunBitsAreSetUpTo255AndAllAtOnceForEveryLun) {
                 std::vector<std::string>{textOf(lcrKind, lCount, sLunRecordHex({}).substr(0, 32) + lcrCase.mFieldHex)},
                 retrieveTexts());
         }
-        const ZTSDeliveredKind& lcrCheck = kindNamed("check condition");
+        const ZTSDeliveredKind& lcrCheck = kindNamed("check-condition");
         for (const std::uint32_t lLun : lcrCase.mLuns) {
             deliver(lcrCheck, makePortPayload(gcKindPort, {lLun, 1, 6, 0x29, 2}));
         }
@@ -312,7 +312,7 @@ TEST_F(EventConsolidation, LunBitsAreSetUpTo255AndAllAtOnceForEveryLun) {
 
 TEST_F(EventConsolidation, CommandCodeAndAscqBitsAreSetBelow256AndNeverAllAtOnce) {
     collect();
-    const ZTSDeliveredKind& lcrKind = kindNamed("check condition");
+    const ZTSDeliveredKind& lcrKind = kindNamed("check-condition");
     for (const std::uint32_t lNumber : {0u, 1u, 7u, 8u, 254u, 255u, 256u, 257u, 300u, 0xFFFFFFFEu, 0xFFFFFFFFu}) {
         SCOPED_TRACE(lNumber);
         const std::vector<unsigned> lBit = lNumber < 256 ? std::vector<unsigned>{lNumber} : std::vector<unsigned>{};
@@ -355,13 +355,13 @@ TEST_F(EventConsolidation, ARecordGetsTheNamesOfTheTargetThatIsItsRemotePort) {
 TEST_F(EventConsolidation, ATargetIsFoundByThePortAndNotByTheNode) {
     collect();
     ASSERT_EQ(gcSuccessHex, registerTargets({{makeWwn(gcKindPort), makeWwn(gcKindNode), 0x010203}}));
-    deliver(kindNamed("PLOGI"));
-    EXPECT_EQ(std::vector<std::string>{textOf(kindNamed("PLOGI"))}, retrieveTexts());
+    deliver(kindNamed("plogi"));
+    EXPECT_EQ(std::vector<std::string>{textOf(kindNamed("plogi"))}, retrieveTexts());
 }
 
 TEST_F(EventConsolidation, ATargetThatIsRegisteredLaterNamesTheNextRecord) {
     collect();
-    const ZTSDeliveredKind& lcrKind = kindNamed("PRLO");
+    const ZTSDeliveredKind& lcrKind = kindNamed("prlo");
     deliver(lcrKind);
     ASSERT_EQ(gcSuccessHex, registerTargets({{makeWwn(7), makeWwn(gcKindPort), 1}}));
     deliver(lcrKind);
@@ -374,9 +374,9 @@ TEST_F(EventConsolidation, ATargetThatIsRegisteredLaterNamesTheNextRecord) {
 
 TEST_F(EventConsolidation, ARecordsTimesSpanItsEvents) {
     collect();
-    deliver(kindNamed("PRLO"));
-    deliver(kindNamed("PRLO"));
-    deliver(kindNamed("PLOGI"));
+    deliver(kindNamed("prlo"));
+    deliver(kindNamed("prlo"));
+    deliver(kindNamed("plogi"));
     const std::vector<ZTSEncodedRecord> lRecords = retrieve().mLists.at(0).mRecords;
     ASSERT_EQ(2u, lRecords.size());
     EXPECT_LE(lRecords[0].mBegin.total(), lRecords[0].mEnd.total());

@@ -63,17 +63,14 @@ protected:
         if (lpKind == nullptr) {
             return {ZTCBytes(40, 0x5A), {lWithout, lWithout, lWithout, lWithout}, {}, ""};
         }
-        const std::string lNotice = "-N- " + lpKind->mNotice;
+        const std::string lNotice = "-N- " + lpKind->notice();
         if (lpKind->mMinimumLength == 0) {
             return {
-                {}, {lNotice, lNotice, lNotice, lNotice}, {lpKind->recordSize(), 0, 0, 0}, "x4 " + lpKind->mRecordHex};
+                {}, {lNotice, lNotice, lNotice, lNotice}, {lpKind->mRecordSize, 0, 0, 0}, "x4 " + lpKind->mRecordHex};
         }
         return {lpKind->mPayload,
-                {lWithout,
-                 "-W- " + lpKind->mTooShortText + std::to_string(lpKind->mMinimumLength) + " " +
-                     std::to_string(lpKind->mMinimumLength - 1),
-                 lNotice, lNotice},
-                {0, 0, lpKind->recordSize(), lpKind->appendedSize()},
+                {lWithout, "-W- " + lpKind->tooShort(lpKind->mMinimumLength - 1), lNotice, lNotice},
+                {0, 0, lpKind->mRecordSize, lpKind->mAppendedSize},
                 "x2 " + lpKind->mRecordHex + lpKind->mAppendedHex};
     }
 
@@ -97,9 +94,7 @@ protected:
         if (lpKind == nullptr) {
             return unknownText(aCategory, aSubcategory);
         }
-        return lpKind->mMinimumLength == 0
-                   ? "-N- " + lpKind->mNotice
-                   : "-W- " + lpKind->mTooShortText + std::to_string(lpKind->mMinimumLength) + " 0";
+        return lpKind->mMinimumLength == 0 ? "-N- " + lpKind->notice() : "-W- " + lpKind->tooShort(0);
     }
 };
 
@@ -157,7 +152,7 @@ TEST_F(EventDispatch, ValuesAbove255RouteByTheirLowEightBits) {
     std::vector<std::string> lExpectedRecords;
     for (const ZTSDeliveredKind& lcrKind : allKinds()) {
         deliverScope(0, 0xABCDE000 + lcrKind.mCategory, 0x00000100 + lcrKind.mSubcategory, lcrKind.mPayload);
-        lExpectedTexts.push_back("-N- " + lcrKind.mNotice);
+        lExpectedTexts.push_back("-N- " + lcrKind.notice());
         lExpectedRecords.push_back(std::to_string(lcrKind.mCategory) + "/" + std::to_string(lcrKind.mSubcategory) +
                                    " x1 " + lcrKind.mRecordHex);
     }
@@ -180,9 +175,7 @@ TEST_F(EventDispatch, AKindOneByteTooShortIsReportedWithBothLengthsAndMakesNothi
             deliverScope(
                 0, lcrKind.mCategory, lcrKind.mSubcategory,
                 ZTCBytes(lcrKind.mPayload.begin(), lcrKind.mPayload.begin() + static_cast<std::ptrdiff_t>(lLength)));
-            ASSERT_EQ(std::vector<std::string>{"-W- " + lcrKind.mTooShortText + std::to_string(lcrKind.mMinimumLength) +
-                                               " " + std::to_string(lLength)},
-                      mLog.texts());
+            ASSERT_EQ(std::vector<std::string>{"-W- " + lcrKind.tooShort(lLength)}, mLog.texts());
         }
     }
     EXPECT_FALSE(mSystem->hasPendingRecord());

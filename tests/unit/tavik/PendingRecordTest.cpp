@@ -115,9 +115,9 @@ TEST_F(PendingRecord, WhoseBoardHasLostItsListIsReportedAndDroppedWhenAnEventTak
     mDoScopeCollection = true;
     mSystem->makePendingRecord(1, 8);
     mSystem->exchangeRecordLists(1);
-    const ZTSDeliveredKind& lcrKind = kindNamed("PLOGI");
+    const ZTSDeliveredKind& lcrKind = kindNamed("plogi");
     deliverScope(0, lcrKind.mCategory, lcrKind.mSubcategory, lcrKind.mPayload);
-    EXPECT_EQ((std::vector<std::string>{"-N- " + lcrKind.mNotice, droppedText(1)}), mLog.texts());
+    EXPECT_EQ((std::vector<std::string>{"-N- " + lcrKind.notice(), droppedText(1)}), mLog.texts());
     EXPECT_EQ(std::vector<std::string>{"1/1 x1 " + lcrKind.mRecordHex}, retrieveTexts());
 }
 

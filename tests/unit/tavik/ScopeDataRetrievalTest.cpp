@@ -72,10 +72,10 @@ TEST_F(ScopeDataRetrieval, EveryByteOfARecordHasItsPlace) {
     collect(1);
     const ZTSWwn lNode = makeWwn(0x2000000000000077);
     registerTargets({{lNode, makeWwn(gcKindPort), 1}});
-    const ZTSDeliveredKind& lcrKind = kindNamed("LS_RJT");
+    const ZTSDeliveredKind& lcrKind = kindNamed("lsrjt");
     deliver(lcrKind);
     deliver(lcrKind);
-    deliver(kindNamed("bus reset"));
+    deliver(kindNamed("bus-reset"));
     const std::string lResponse = requestHex("01");
 
     ZTCByteWriter lHead;
@@ -137,9 +137,9 @@ TEST_F(ScopeDataRetrieval, RecordsOfInterleavedBoardsComeInTheirOwnListsInOrder)
 
 TEST_F(ScopeDataRetrieval, ThePendingRecordIsPartOfItAndNothingIsPendingBehindIt) {
     collect(2);
-    deliver(kindNamed("QFULL"), 1);
+    deliver(kindNamed("queue-full"), 1);
     EXPECT_EQ(0u, mSystem->recordListSize(1));
-    EXPECT_EQ(std::vector<std::string>{textOf(kindNamed("QFULL"))}, retrieve().texts(1));
+    EXPECT_EQ(std::vector<std::string>{textOf(kindNamed("queue-full"))}, retrieve().texts(1));
     EXPECT_FALSE(mSystem->hasPendingRecord());
     EXPECT_EQ(0u, mSystem->recordListSize(1));
     EXPECT_TRUE(retrieve().texts(1).empty()) << "nothing is delivered twice";
@@ -161,9 +161,9 @@ TEST_F(ScopeDataRetrieval, WorksWithCollectionOffAndBeforeTheFirstStart) {
     bringUp();
     EXPECT_EQ(std::vector<std::string>{}, retrieveTexts());
     startScope();
-    deliver(kindNamed("PRLO"));
+    deliver(kindNamed("prlo"));
     requestHex("02");
-    EXPECT_EQ(std::vector<std::string>{textOf(kindNamed("PRLO"))}, retrieveTexts());
+    EXPECT_EQ(std::vector<std::string>{textOf(kindNamed("prlo"))}, retrieveTexts());
     EXPECT_FALSE(mDoScopeCollection);
 }
 
@@ -185,7 +185,7 @@ TEST_F(ScopeDataRetrieval, AListWithoutItsInitiatorIsCountedReportedAndDropped) 
 
 TEST_F(ScopeDataRetrieval, ABoardThatHasLostItsListIsNotDeliveredAndItsPendingRecordIsReported) {
     collect(2);
-    deliver(kindNamed("PLOGI"), 1);
+    deliver(kindNamed("plogi"), 1);
     mSystem->exchangeRecordLists(1);
     mLog.forget();
     const ZTSScopeDataResponse lResponse = retrieve();
@@ -196,8 +196,8 @@ TEST_F(ScopeDataRetrieval, ABoardThatHasLostItsListIsNotDeliveredAndItsPendingRe
                   "-E- Dropping the pending scope record of board 1: the board has no record list any more",
                   listText(0), totalText(0)}),
               mLog.texts());
-    deliver(kindNamed("PLOGI"), 1);
-    EXPECT_EQ(std::vector<std::string>{textOf(kindNamed("PLOGI"))}, retrieve().texts(1));
+    deliver(kindNamed("plogi"), 1);
+    EXPECT_EQ(std::vector<std::string>{textOf(kindNamed("plogi"))}, retrieve().texts(1));
 }
 
 TEST_F(ScopeDataRetrieval, AdaptersAreCountedAnewEachTime) {
@@ -232,20 +232,20 @@ TEST_F(ScopeDataRetrieval, AdaptersAreCountedAnewEachTime) {
 TEST_F(ScopeDataRetrieval, EventsOfABoardThatHasComeBackAreDeliveredAgain) {
     collect(2);
     mLibrary.mNumberOfAdapters = 1;
-    deliver(kindNamed("PRLO"), 1);
-    EXPECT_EQ(std::vector<std::string>{textOf(kindNamed("PRLO"))}, retrieve().texts(1));
-    deliver(kindNamed("PRLO"), 1);  // dropped: no list
+    deliver(kindNamed("prlo"), 1);
+    EXPECT_EQ(std::vector<std::string>{textOf(kindNamed("prlo"))}, retrieve().texts(1));
+    deliver(kindNamed("prlo"), 1);  // dropped: no list
     mLibrary.mNumberOfAdapters = 2;
     EXPECT_EQ(1u, retrieve().mLists.size());
-    deliver(kindNamed("PRLO"), 1);
-    EXPECT_EQ(std::vector<std::string>{textOf(kindNamed("PRLO"))}, retrieve().texts(1));
+    deliver(kindNamed("prlo"), 1);
+    EXPECT_EQ(std::vector<std::string>{textOf(kindNamed("prlo"))}, retrieve().texts(1));
 }
 
 TEST_F(ScopeDataRetrieval, TheLibraryIsAskedWithoutTheRecordLockAndEventsThatComeMeanwhileAreDelivered) {
     collect(2);
     // Whoever holds the lock cannot take it again.
-    mLibrary.mBeforeCounted = [] { deliver(kindNamed("PRLO"), 1); };
-    EXPECT_EQ(std::vector<std::string>{textOf(kindNamed("PRLO"))}, retrieve().texts(1));
+    mLibrary.mBeforeCounted = [] { deliver(kindNamed("prlo"), 1); };
+    EXPECT_EQ(std::vector<std::string>{textOf(kindNamed("prlo"))}, retrieve().texts(1));
 }
 
 TEST_F(ScopeDataRetrieval, AFailedAllocationDeliversNothingTwice) {
@@ -257,9 +257,9 @@ TEST_F(ScopeDataRetrieval, AFailedAllocationDeliversNothingTwice) {
     setLogCode(0);
     for (bool lFailed = true; lFailed;) {
         SCOPED_TRACE(lFailures);
-        deliver(kindNamed("LS_RJT"), 0);
-        deliver(kindNamed("LS_RJT"), 1);
-        deliver(kindNamed("QFULL"), 1);
+        deliver(kindNamed("lsrjt"), 0);
+        deliver(kindNamed("lsrjt"), 1);
+        deliver(kindNamed("queue-full"), 1);
         const unsigned lTotal = mSystem->getTotalEventDataSize();
         ZTCPointer<ZTCBuffer> lResponse;
         bool lHasThrown = false;
@@ -288,7 +288,7 @@ TEST_F(ScopeDataRetrieval, AFailedAllocationDeliversNothingTwice) {
 TEST_F(ScopeDataRetrieval, ALargeResponseGrowsBeyondItsFirstCapacity) {
     collect(1, 0);
     setLogCode(0);
-    const ZTSDeliveredKind& lcrKind = kindNamed("LUN reset");
+    const ZTSDeliveredKind& lcrKind = kindNamed("lun-reset");
     for (unsigned lEvent = 0; lEvent < 5000; ++lEvent) {
         deliver(lcrKind);  // with a limit of 0 every one is a record
     }

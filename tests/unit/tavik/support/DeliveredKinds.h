@@ -1,5 +1,5 @@
-/// The kinds of event as the agent is to treat them, written down a second time, so that the agent's own tables are
-/// held against something: one row a kind, walked by the tests.
+/// The events that the agent consolidates one by one: for each kind a payload, the record it makes, and how a record
+/// goes on. The rows build on the tests' own table of kinds.
 #ifndef TESTS_UNIT_TAVIK_SUPPORT_DELIVEREDKINDS_H
 #define TESTS_UNIT_TAVIK_SUPPORT_DELIVEREDKINDS_H
 
@@ -9,6 +9,7 @@
 #include <vector>
 
 #include "tests/support/Bytes.h"
+#include "tests/support/EventKinds.h"
 
 /// What an event does that matches the pending record.
 enum class ZTEOnMatch { Counts, Appends, SetsBits };
@@ -18,22 +19,16 @@ struct ZTSByteRange {
     std::size_t mEnd;  ///< one past the last
 };
 
-struct ZTSDeliveredKind {
-    const char* mpName;
-    unsigned mCategory;
-    unsigned mSubcategory;
-    std::size_t mMinimumLength;  ///< of the payload; 0: a kind without data
-    std::string mTooShortText;   ///< message up to its two numbers
-    std::string mNotice;
-    ZTCBytes mPayload;                    ///< of exactly the minimum length
-    std::string mRecordHex;               ///< the record that this payload makes
-    std::vector<ZTSByteRange> mIdentity;  ///< payload bytes that tell one record from another
-    ZTEOnMatch mOnMatch;
-    std::string mAppendedHex;  ///< what a second event of this payload appends
+struct ZTSDeliveredData {
+    ZTCBytes mPayload;                      ///< of exactly the kind's minimum length
+    std::string mRecordHex;                 ///< the record that this payload makes
+    std::vector<ZTSByteRange> mIdentity{};  ///< payload bytes that tell one record from another
+    ZTEOnMatch mOnMatch = ZTEOnMatch::Counts;
+    std::string mAppendedHex{};  ///< what a second event of this payload appends
+};
 
+struct ZTSDeliveredKind : ZTSTestKind, ZTSDeliveredData {
     bool isIdentityByte(std::size_t aByte) const;
-    std::size_t recordSize() const { return mRecordHex.size() / 2; }
-    std::size_t appendedSize() const { return mAppendedHex.size() / 2; }
 };
 
 /// The thirteen kinds with data. The payloads name the remote port gcKindPort, their second name is gcKindNode.
