@@ -1,39 +1,44 @@
 #include "fuzz/support/FuzzLibkpm.h"
 
-#include "libkpm/testing/include/SilentLibrary.h"
+#include "libkpm/testing/include/TestLibrary.h"
 
 namespace {
 
 ZTSFuzzLibkpm sAnswers;
 
-std::uint32_t sTakeStatus() {
-    const std::uint32_t lRegistration = sAnswers.mRegistrations++;
-    return sAnswers.mStatusCount == 0 ? 0 : sAnswers.mpStatuses[lRegistration % sAnswers.mStatusCount];
-}
+class ZTCFuzzLibrary : public ZTCTestLibrary {
+public:
+    std::uint32_t getNumberOfAdapters() override { return sAnswers.mAdapters; }
 
-std::uint32_t sGetNumberOfAdapters() {
-    return sAnswers.mAdapters;
-}
+    std::uint32_t ztapiRegEvent(std::uint32_t, HBA_wwn, std::uint32_t, std::uint32_t, void*, std::uint32_t* apHandle,
+                                KPM_ScopeCallback) override {
+        const std::uint32_t lStatus = takeStatus();
+        *apHandle = sAnswers.mRegistrations;
+        return lStatus;
+    }
 
-std::uint32_t sZtapiRegEvent(std::uint32_t, HBA_wwn, std::uint32_t, std::uint32_t, void*, std::uint32_t* apHandle,
-                             KPM_ScopeCallback) {
-    const std::uint32_t lStatus = sTakeStatus();
-    *apHandle = sAnswers.mRegistrations;
-    return lStatus;
-}
+    std::uint32_t kpmRegEvent(std::uint32_t, std::uint32_t, void*, std::uint32_t, KPM_EventCallback) override {
+        return takeStatus() == 0 ? sAnswers.mRegistrations : 0;
+    }
 
-std::uint32_t sKpmRegEvent(std::uint32_t, std::uint32_t, void*, std::uint32_t, KPM_EventCallback) {
-    return sTakeStatus() == 0 ? sAnswers.mRegistrations : 0;
-}
+private:
+    static std::uint32_t takeStatus() {
+        const std::uint32_t lRegistration = sAnswers.mRegistrations++;
+        return sAnswers.mStatusCount == 0 ? 0 : sAnswers.mpStatuses[lRegistration % sAnswers.mStatusCount];
+    }
+};
 
-constexpr KPM_FunctionList gcFunctions = makeSilentLibrary(sGetNumberOfAdapters, sZtapiRegEvent, sKpmRegEvent);
+ZTCFuzzLibrary sLibrary;
+
+ZTCTestLibrary& sGet() {
+    return sLibrary;
+}
 
 }  // namespace
 
-extern "C" __attribute__((visibility("default"))) uint32_t KPM_GetFunctionList(uint32_t,
+extern "C" __attribute__((visibility("default"))) uint32_t KPM_GetFunctionList(uint32_t aVersion,
                                                                                const KPM_FunctionList** appList) {
-    *appList = &gcFunctions;
-    return 0;
+    return sGet().getFunctionList(aVersion, gcTestLibraryList<sGet>, appList);
 }
 
 extern "C" __attribute__((visibility("default"))) ZTSFuzzLibkpm* FuzzLibkpm_get();

@@ -23,10 +23,12 @@
 ///   deliver-in-close N EVENT...          Close delivers these events on N threads, waits for those, and delivers the
 ///                                        first one more on its own thread, before it closes anything
 ///   hold FUNCTION                        the next call of Init, GetNumberOfAdapters, ZtapiRegEvent or Close waits
-///   until
-///                                        letGo(), and is recorded as "FUNCTION held"
+///                                        until letGo(), and is recorded as "FUNCTION held"
 ///   hold-nothing                         takes every such line back
 ///   log L TEXT                           writes a line of level L to the agent's log; only while the library is open
+///   state B C U S REASON                 reports state S of the kind that is delivered as category C, subcategory U on
+///                                        board B; only while the library is open
+///   loss N NAME                          reports that N of these are lost so far; only while the library is open
 #ifndef TESTS_SUPPORT_SCRIPTEDLIBRARY_H
 #define TESTS_SUPPORT_SCRIPTEDLIBRARY_H
 

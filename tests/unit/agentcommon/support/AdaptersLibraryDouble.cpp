@@ -8,7 +8,7 @@
 
 static const char* const scPathVariable = "ZT_LIBKPM_PATH";
 
-static void sSetBehaviour(void* apModule, ZTCUnitLibkpmBehaviour* apBehaviour) {
+static void sSetBehaviour(void* apModule, ZTCTestLibrary* apBehaviour) {
     const auto lpSetBehaviour = reinterpret_cast<ZTPSetBehaviour>(dlsym(apModule, gcSetBehaviourSymbol));
     if (lpSetBehaviour == nullptr) {
         throw std::runtime_error("the module has no function to set its behaviour");

@@ -18,7 +18,7 @@ using ZTCRegistrationKey = std::tuple<unsigned, unsigned, unsigned>;
 
 /// One object at a time, which is the library from its construction on. The agent calls it from one thread at a time,
 /// and so does the test.
-class ZTCAdaptersLibraryDouble : private ZTCUnitLibkpmBehaviour {
+class ZTCAdaptersLibraryDouble : private ZTCTestLibrary {
 public:
     /// A library with so many adapters, and the environment variable set to it.
     explicit ZTCAdaptersLibraryDouble(unsigned aAdapters = 1);
