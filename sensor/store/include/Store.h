@@ -69,8 +69,9 @@ public:
 
 private:
     friend class ZTCStore;
-    explicit ZTCStoreTransaction(ZTCStore& arStore) : mpStore(&arStore) {}
+    ZTCStoreTransaction(ZTCStore& arStore, std::uint64_t aSerial);
     ZTCStore* mpStore;
+    std::uint64_t mSerial;  ///< which of the store's transactions it is
 };
 
 class ZTCStore {
@@ -139,7 +140,8 @@ public:
                   const std::string& acrReason);
     /// Whether endAgent() was called for it. Needs no transaction.
     bool hasEnded(const std::string& acrGeneration) const;
-    /// A gap of another sort. Written once for each pair of reason and generation; returns whether it was.
+    /// A gap of another sort. Where it names a generation, it is written once for each pair of reason and generation.
+    /// Returns whether it was written.
     bool noteGap(const ZTSGap& acrGap);
 
     /// Begins a run of Tavik: now, and what was left open by an earlier run ends where that was last seen.

@@ -1,0 +1,65 @@
+/// Counts per minute, per day and in total, of each initiator, kind and remote port: added up in memory, written at the
+/// end of the transaction.
+#ifndef SENSOR_STORE_SRC_COUNTBOOK_H
+#define SENSOR_STORE_SRC_COUNTBOOK_H
+
+#include <cstdint>
+#include <unordered_map>
+
+#include "sensor/store/include/Episode.h"
+#include "sensor/store/src/Database.h"
+
+inline constexpr std::int64_t gcMinuteMicroseconds = 60'000'000;
+inline constexpr std::int64_t gcDayMicroseconds = 86'400'000'000;
+
+/// The number of the slot that a time is in; times before the epoch round down.
+constexpr std::int64_t getSlot(std::int64_t aTime, std::int64_t aSlotMicroseconds) {
+    const std::int64_t lQuotient = aTime / aSlotMicroseconds;
+    return aTime % aSlotMicroseconds < 0 ? lQuotient - 1 : lQuotient;
+}
+
+/// What a count is of.
+struct ZTSCountKey {
+    std::uint32_t mInitiator = 0;
+    std::uint32_t mPort = 0;
+    ZTCKindKey mKind = 0;
+
+    auto operator<=>(const ZTSCountKey&) const = default;
+};
+
+class ZTCCountBook {
+public:
+    explicit ZTCCountBook(ZTCDatabase& arDatabase);
+
+    void clear();
+    /// A record within one slot counts there; any other in the slot of its last time, marked as spread.
+    void add(const ZTSCountKey& acrKey, std::int64_t aBegin, std::int64_t aEnd, std::uint64_t aOccurrences);
+    void flush();
+
+private:
+    struct SlotKey {
+        std::int64_t mSlot = 0;
+        ZTSCountKey mKey;
+
+        auto operator<=>(const SlotKey&) const = default;
+    };
+    struct Hash {
+        std::size_t operator()(const SlotKey& acrKey) const;
+    };
+    struct Count {
+        std::uint64_t mCount = 0;
+        std::uint64_t mSpread = 0;
+        std::int64_t mLast = 0;
+    };
+    using Slots = std::unordered_map<SlotKey, Count, Hash>;
+
+    static void addTo(Slots& arSlots, std::int64_t aLength, const ZTSCountKey& acrKey, std::int64_t aBegin,
+                      std::int64_t aEnd, std::uint64_t aOccurrences);
+    static void flushSlots(Slots& arSlots, ZTCStatement& arStatement);
+
+    Slots mMinutes;
+    Slots mDays;
+    ZTCStatement mAddMinute, mAddDay, mAddTotal;
+};
+
+#endif
