@@ -3,8 +3,8 @@
 #include <array>
 #include <cstddef>
 
-#include "sensor/agentcommon/include/EventDataRecords.h"
 #include "libkpm/include/ScopeEventKinds.h"
+#include "sensor/agentcommon/include/EventDataRecords.h"
 
 static constexpr ZTSKindShape sGeneric(std::uint8_t aCategory, std::uint8_t aSubcategory) {
     return {.mCategory = aCategory, .mSubcategory = aSubcategory, .mSize = sizeof(TavikGeneric)};

@@ -2,15 +2,19 @@
 
 #include <numeric>
 
+#include "sensor/agentcommon/include/StatusPage.h"
+
+// The numbers are those of the status page, which has the names.
+static_assert(ZTRF_CollectionOff == +ZTSR_CollectionOff && ZTRF_Failed == +ZTSR_Failed &&
+              ZTRF_Count == gcStatusRefusals);
+static_assert(ZTKST_Off == +ZTSS_Off && ZTKST_Failed == +ZTSS_Failed && ZTKST_NoSource == +ZTSS_NoSource);
+
 const char* getRefusalName(ZTERefusal aRefusal) {
-    static constexpr std::array<const char*, ZTRF_Count> scNames = {
-        "collection-off", "total-limit", "unknown-board", "no-list", "too-short", "unknown-kind", "failed"};
-    return aRefusal < ZTRF_Count ? scNames[aRefusal] : "unknown";
+    return aRefusal < ZTRF_Count ? gcStatusRefusalNames[aRefusal] : "unknown";
 }
 
 const char* getKindStateName(ZTEKindState aState) {
-    static constexpr std::array<const char*, 5> scNames = {"off", "listening", "failed", "no_rights", "no_source"};
-    return aState < scNames.size() ? scNames[aState] : "unknown";
+    return aState < gcStatusStateNames.size() ? gcStatusStateNames[aState] : "unknown";
 }
 
 std::uint64_t ZTSLedgerRow::getRefusedTotal() const {
