@@ -77,10 +77,10 @@ ZTCBenchKernel::~ZTCBenchKernel() {
 
 ZTSLinuxOptions ZTCBenchKernel::options() const {
     // No look at sysfs comes between.
-    return {sCapture(mKernel, "sysfs-online"), {mDirectory}, std::chrono::hours(1)};
+    return {sCapture(mKernel, "sysfs-online"), {{mDirectory}, {}}, std::chrono::hours(1)};
 }
 
-std::unique_ptr<ZTCFcEventSource> ZTCBenchKernel::openFcEvents(std::string& /*arProblem*/) {
+std::unique_ptr<ZTCFcEventSource> ZTCBenchKernel::openFcEvents(ZTSFeedProblem& /*arProblem*/) {
     return std::make_unique<ZTCBenchFcSource>(*this);
 }
 

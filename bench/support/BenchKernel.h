@@ -47,7 +47,7 @@ public:
     /// While the thread is held: so many messages of this bytes come, with numbers of their own, once it is released.
     void addMessages(ZTCBenchBytes aMessage, std::size_t aCount);
 
-    std::unique_ptr<ZTCFcEventSource> openFcEvents(std::string& arProblem) override;
+    std::unique_ptr<ZTCFcEventSource> openFcEvents(ZTSFeedProblem& arProblem) override;
     int make(const std::string& acrPath) override;
     int remove(const std::string& acrPath) override;
 

@@ -1,6 +1,6 @@
-/// Which FC host is which board. Boards are given in order of host number to the hosts of one look, and are never given
-/// to another port again: a host that leaves leaves its board empty, and a port that comes back, known by its name,
-/// gets its own. Pure.
+/// Which FC host is which board. The hosts of one look get boards in order of their numbers, and a board is never given
+/// to another port: a host that leaves leaves its board empty, and a port that comes back, known by its name, gets its
+/// own board again. A host without a name is held back until it has one. Pure.
 #ifndef LIBKPM_LINUX_SRC_BOARDS_H
 #define LIBKPM_LINUX_SRC_BOARDS_H
 
@@ -9,9 +9,10 @@
 #include <optional>
 #include <vector>
 
+#include "libkpm/common/include/PortName.h"
 #include "libkpm/include/libkpm.h"
 
-/// A host as it was seen. A name that could not be read is zero.
+/// A host as it was seen. A name that it does not have, or that could not be read, is zero.
 struct ZTSLinuxHost {
     std::uint32_t mNumber = 0;
     HBA_wwn mNodeName{};
@@ -21,16 +22,20 @@ struct ZTSLinuxHost {
 struct ZTSLinuxBoard {
     HBA_wwn mNodeName{};
     HBA_wwn mPortName{};
-    std::optional<std::uint32_t> mHost;  ///< none: its host is gone
+    std::optional<std::uint32_t> mHost;   ///< none: its host is gone
+    std::vector<HBA_wwn> mFormerNames{};  ///< port names that it had before
+
+    /// Whether this is its port name, or was.
+    bool hasName(const HBA_wwn& acrPort) const;
 };
 
 class ZTCLinuxBoards {
 public:
     struct Changes {
-        std::vector<std::uint32_t> mArrived;
-        std::vector<std::uint32_t> mLeft;
-
-        bool isEmpty() const { return mArrived.empty() && mLeft.empty(); }
+        std::vector<std::uint32_t> mArrived;   ///< boards whose host has come
+        std::vector<std::uint32_t> mLeft;      ///< boards whose host is gone
+        std::vector<std::uint32_t> mRenamed;   ///< boards that have another port name now
+        std::vector<std::uint32_t> mHeldBack;  ///< hosts without a name that were not held back before
     };
 
     /// Takes in what one look saw: all hosts there are, each number once, in ascending order.
@@ -40,16 +45,16 @@ public:
     const ZTSLinuxBoard& get(std::uint32_t aBoard) const { return mBoards.at(aBoard); }
     std::uint32_t size() const { return static_cast<std::uint32_t>(mBoards.size()); }
 
-    /// The numbers of the hosts that are there, in ascending order.
+    /// The numbers of the boards' hosts that are there, in ascending order.
     std::vector<std::uint32_t> getHosts() const;
 
 private:
+    bool isAnotherBoards(const HBA_wwn& acrName, std::uint32_t aBoard) const;
+    bool follow(std::uint32_t aBoard, const std::vector<ZTSLinuxHost>& acrHosts, Changes& arChanges);
     std::uint32_t place(const ZTSLinuxHost& acrHost);
 
     std::vector<ZTSLinuxBoard> mBoards;
+    std::vector<std::uint32_t> mHeldBack;  // numbers of hosts, in ascending order
 };
-
-bool isSameName(const HBA_wwn& acrOne, const HBA_wwn& acrOther);
-bool isZeroName(const HBA_wwn& acrName);
 
 #endif

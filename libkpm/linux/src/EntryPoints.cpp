@@ -6,9 +6,9 @@
 #include <string>
 #include <utility>
 
+#include "libkpm/common/include/AgentLink.h"
 #include "libkpm/common/include/OpenLibrary.h"
 #include "libkpm/linux/src/Engine.h"
-#include "libkpm/linux/src/Report.h"
 
 /// What is open between Init and Close.
 struct ZTSLinuxSession {
@@ -22,7 +22,7 @@ using ZTCLinuxLibrary = ZTCOpenLibrary<ZTSLinuxSession>;
 
 static void sReportAs(const char* apPrefix, const char* apWhat) noexcept {
     try {
-        logLinuxLine(KPM_LOG_ERROR, std::string(apPrefix) + apWhat);
+        logLibraryLine(KPM_LOG_ERROR, std::string(apPrefix) + apWhat);
     } catch (const std::exception&) {  // out of memory: the status alone has to tell of it
         return;
     }
@@ -42,7 +42,10 @@ static ZTSLinuxOptions sOptions() {
     }
     const char* lpTracefs = std::getenv("KPM_LINUX_TRACEFS");
     if (lpTracefs != nullptr && *lpTracefs != '\0') {
-        lOptions.mTracefsRoots = {lpTracefs};
+        lOptions.mTracePlace.mRoots = {lpTracefs};
+    }
+    if (const char* lpInstance = std::getenv("KPM_LINUX_INSTANCE"); lpInstance != nullptr) {
+        lOptions.mTracePlace.mPrepared = lpInstance;
     }
     return lOptions;
 }
@@ -78,7 +81,11 @@ static std::uint32_t sIsZtapiSupported() {
 }
 
 static void sSetLog(KPM_LogFunction apLog) {
-    setLinuxLog(apLog);
+    setLibraryLog(apLog);
+}
+
+static void sSetReport(void* apContext, KPM_StateFunction apState, KPM_LossFunction apLoss) {
+    setLibraryReport(apContext, apState, apLoss);
 }
 
 const KPM_FunctionList* getLinuxFunctionList() {
@@ -94,6 +101,6 @@ const KPM_FunctionList* getLinuxFunctionList() {
                                              ZTCLinuxEntries::registerForBoard,
                                              ZTCLinuxEntries::unregisterForBoard,
                                              sSetLog,
-                                             nullptr};
+                                             sSetReport};
     return &scList;
 }

@@ -1,7 +1,9 @@
 /// The library's table of functions, apart from the one symbol that hands it out, so that programs may link it too.
 ///
-/// Init reads where sysfs and tracefs are from KPM_LINUX_SYSFS and KPM_LINUX_TRACEFS (unset or empty: where the
-/// kernel's own are), which are there for tests.
+/// Init reads these variables of the environment; one that is unset or empty changes nothing:
+///   KPM_LINUX_INSTANCE  the directory of a trace instance that was prepared for the agent
+///   KPM_LINUX_SYSFS     in place of /sys, for tests
+///   KPM_LINUX_TRACEFS   in place of where tracefs usually is, for tests
 #ifndef LIBKPM_LINUX_SRC_ENTRYPOINTS_H
 #define LIBKPM_LINUX_SRC_ENTRYPOINTS_H
 

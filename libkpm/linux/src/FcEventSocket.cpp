@@ -6,27 +6,39 @@
 
 #include <cerrno>
 #include <cstring>
+#include <optional>
 #include <utility>
 
-static constexpr int scScsiTransportFamily = 18;  // NETLINK_SCSITRANSPORT
+#include "libkpm/linux/src/NetworkNamespace.h"
+#include "libkpm/linux/src/Sysfs.h"
+
+static constexpr unsigned scScsiTransportFamily = 18;  // NETLINK_SCSITRANSPORT
 // The kernel multicasts to the group of this number; as a bit of the address it is the fourth.
 static constexpr unsigned scFcEventGroup = 4;
 static constexpr int scReceiveBytes = 4 * 1024 * 1024;
 
-static std::string sExplain(const char* apWhat, int aError) {
-    std::string lText = std::string(apWhat) + ": " + std::strerror(aError);
-    if (aError == EPERM || aError == EACCES) {
-        lText += "; run the agent with CAP_NET_ADMIN in the first network namespace";
+static ZTSFeedProblem sProblem(const char* apWhat, int aError) {
+    ZTSFeedProblem lProblem{judgeFeedError(aError), std::string(apWhat) + ": " + std::strerror(aError)};
+    if (lProblem.mHappening == ZTFH_NotGranted) {
+        lProblem.mText += "; run the agent with CAP_NET_ADMIN in the first network namespace";
     } else if (aError == EPROTONOSUPPORT) {
-        lText += "; this kernel has no SCSI transport events (module scsi_transport_fc)";
+        lProblem.mText += "; this kernel has no SCSI transport events (module scsi_transport_fc)";
     }
-    return lText;
+    return lProblem;
 }
 
-std::unique_ptr<ZTCFcEventSource> ZTCFcEventSocket::open(std::string& arProblem) {
-    ZTCLibraryDescriptor lSocket(::socket(AF_NETLINK, SOCK_RAW | SOCK_CLOEXEC | SOCK_NONBLOCK, scScsiTransportFamily));
+/// False where it is known that the kernel sends its events elsewhere.
+static bool sHears() {
+    static constexpr std::size_t scMostTable = std::size_t{4} * 1024 * 1024;
+    const std::optional<std::string> lTable = readSmallFile("/proc/thread-self/net/netlink", scMostTable);
+    return !lTable || hasKernelSocket(*lTable, scScsiTransportFamily).value_or(true);
+}
+
+std::unique_ptr<ZTCFcEventSource> ZTCFcEventSocket::open(ZTSFeedProblem& arProblem) {
+    ZTCLibraryDescriptor lSocket(
+        ::socket(AF_NETLINK, SOCK_RAW | SOCK_CLOEXEC | SOCK_NONBLOCK, static_cast<int>(scScsiTransportFamily)));
     if (!lSocket.isOpen()) {
-        arProblem = sExplain("the socket for FC events cannot be made", errno);
+        arProblem = sProblem("the socket for FC events cannot be made", errno);
         return nullptr;
     }
     // A storm of events must fit until it is read; without the right to force it, as much as the system allows.
@@ -37,10 +49,16 @@ std::unique_ptr<ZTCFcEventSource> ZTCFcEventSocket::open(std::string& arProblem)
     lAddress.nl_family = AF_NETLINK;
     lAddress.nl_groups = 1u << (scFcEventGroup - 1);
     if (::bind(lSocket.get(), reinterpret_cast<const sockaddr*>(&lAddress), sizeof lAddress) != 0) {
-        arProblem = sExplain("FC events cannot be subscribed to", errno);
+        arProblem = sProblem("FC events cannot be subscribed to", errno);
         return nullptr;
     }
-    return std::unique_ptr<ZTCFcEventSource>(new ZTCFcEventSocket(std::move(lSocket)));
+    if (!sHears()) {
+        arProblem = {ZTFH_NotGranted,
+                     "this process is in a network namespace of its own, where the kernel sends no FC events; run the "
+                     "agent in the first one (a container: with the host's network)"};
+        return nullptr;
+    }
+    return std::make_unique<ZTCFcEventSocket>(std::move(lSocket));
 }
 
 ZTSLinuxReceived ZTCFcEventSocket::receive(std::span<std::uint8_t> aBuffer) {

@@ -9,6 +9,7 @@
 #include <string>
 
 #include "libkpm/common/include/Descriptor.h"
+#include "libkpm/linux/src/FeedState.h"
 
 enum ZTELinuxReceived : std::uint8_t {
     ZTLR_Datagram,   ///< mSize bytes, from the kernel
@@ -29,7 +30,7 @@ class ZTCFcEventSource {
 public:
     virtual ~ZTCFcEventSource() = default;
 
-    /// Readable where receive would not say that nothing is there.
+    /// Readable when `receive()` has something to return.
     virtual int getDescriptor() const = 0;
 
     /// Never waits.
@@ -38,15 +39,17 @@ public:
 
 class ZTCFcEventSocket : public ZTCFcEventSource {
 public:
-    /// Subscribes. Null, with the reason and what would help in `arProblem`, where that cannot be done.
-    static std::unique_ptr<ZTCFcEventSource> open(std::string& arProblem);
+    /// Subscribes. Null, with the reason and what would help in `arProblem`, where that cannot be done, or where
+    /// nothing would ever come.
+    static std::unique_ptr<ZTCFcEventSource> open(ZTSFeedProblem& arProblem);
+
+    /// Receives from a netlink socket that is bound.
+    explicit ZTCFcEventSocket(ZTCLibraryDescriptor aSocket) : mSocket(std::move(aSocket)) {}
 
     int getDescriptor() const override { return mSocket.get(); }
     ZTSLinuxReceived receive(std::span<std::uint8_t> aBuffer) override;
 
 private:
-    explicit ZTCFcEventSocket(ZTCLibraryDescriptor aSocket) : mSocket(std::move(aSocket)) {}
-
     ZTCLibraryDescriptor mSocket;
 };
 

@@ -28,12 +28,15 @@ std::vector<ZTSLinuxLinkChange> ZTCLinuxLinkState::noteReading(ZTELinuxLink aSta
     // Between two readings of one state lies an even number of changes, between differing ones an odd number: one
     // change more is a reading ahead of its message, or a message ahead of its reading.
     std::uint32_t lCount = mUntold;
-    if (lIsOther && mUntold % 2 == 0) {
+    const bool lIsAhead = lIsOther && mUntold % 2 == 0;
+    if (lIsAhead) {
         ++lCount;
-        ++mAhead;
     } else if (!lIsOther) {
         lCount -= mUntold % 2;
     }
+    // Where memory is short, nothing has changed yet.
+    lChanges.reserve(lCount);
+    mAhead += lIsAhead ? 1 : 0;
     mUntold -= lCount < mUntold ? lCount : mUntold;
     for (; lCount != 0; --lCount) {
         mState = isUp() ? ZTLK_Down : ZTLK_Up;

@@ -1,6 +1,6 @@
-/// The state of one board's link, and which changes of it are to be told. It follows two witnesses of the same changes:
-/// the state that is read, and messages that the link went up or down. Either may be ahead of the other, a change may
-/// have several messages or none, and one that came and went between two readings has only messages. Pure.
+/// The state of one board's link, and which of its changes are to be reported. Two sources show the same changes: the
+/// state that is read, and messages that the link went up or down. Either may be ahead of the other. A change may have
+/// several messages or none. A change that came and went between two readings has only messages. Pure.
 #ifndef LIBKPM_LINUX_SRC_LINKSTATE_H
 #define LIBKPM_LINUX_SRC_LINKSTATE_H
 
@@ -22,8 +22,8 @@ public:
     /// A message said that the link went up, or down. Followed by a reading.
     void noteMessage(bool aIsUp);
 
-    /// The state was read. The first state that is known is no change; after that, each differing one is, and so are
-    /// those that only messages told of, in pairs, where the state read is again what it was.
+    /// The state was read. The first known state is not reported. Every later difference is. A flap seen only in
+    /// messages is reported as two changes.
     std::vector<ZTSLinuxLinkChange> noteReading(ZTELinuxLink aState);
 
     /// No message that was sent before the last reading is still to come.

@@ -1,15 +1,12 @@
-/// Counts what the library could not see, and says so at most once a second and kind, with the running total.
+/// What this library can lose, by name.
 #ifndef LIBKPM_LINUX_SRC_LOSSES_H
 #define LIBKPM_LINUX_SRC_LOSSES_H
 
 #include <array>
-#include <chrono>
 #include <cstddef>
 #include <cstdint>
-#include <functional>
-#include <optional>
-#include <string>
-#include <utility>
+
+#include "libkpm/common/include/Losses.h"
 
 enum ZTELinuxLoss : std::uint8_t {
     ZTLO_SocketOverrun,     ///< the socket's buffer was full: any number of messages is lost
@@ -22,34 +19,14 @@ enum ZTELinuxLoss : std::uint8_t {
 };
 inline constexpr std::size_t gcLinuxLossCount = ZTLO_Failure + 1;
 
-/// Used by one thread at a time.
-class ZTCLinuxLosses {
-public:
-    using Clock = std::chrono::steady_clock;
-    using Sink = std::function<void(const std::string&)>;
-
-    explicit ZTCLinuxLosses(Sink aSink) : mSink(std::move(aSink)) {}
-
-    void count(ZTELinuxLoss aKind, std::uint64_t aNumber = 1) { mRows[aKind].mTotal += aNumber; }
-    std::uint64_t getTotal(ZTELinuxLoss aKind) const { return mRows[aKind].mTotal; }
-
-    /// Says what is new of each kind that has been silent for a second.
-    void tell(Clock::time_point aNow);
-
-    /// Says what is new of every kind.
-    void tellAll();
-
-private:
-    struct Row {
-        std::uint64_t mTotal = 0;
-        std::uint64_t mTold = 0;
-        std::optional<Clock::time_point> mToldAt;
-    };
-
-    void tellRow(std::size_t aKind);
-
-    Sink mSink;
-    std::array<Row, gcLinuxLossCount> mRows;
-};
+/// One row a kind, in the order of the enumeration.
+inline constexpr std::array<ZTSLossKind, gcLinuxLossCount> gcLinuxLosses{
+    {{"fc-socket-overruns", "times the FC event socket overran: events are lost, and the link states are read again"},
+     {"fc-events-missing", "FC events are lost: their numbers were passed over; the link states are read again"},
+     {"fc-messages-foreign", "FC messages are dropped: the kernel did not send them"},
+     {"fc-messages-malformed", "FC messages are dropped: they do not parse"},
+     {"scsi-outcomes-lost", "SCSI outcomes are lost: a trace buffer overran"},
+     {"trace-records-malformed", "trace records are dropped: they do not parse"},
+     {"other", "events are lost: they could not be read or handled"}}};
 
 #endif

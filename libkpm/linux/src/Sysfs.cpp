@@ -2,6 +2,7 @@
 
 #include <dirent.h>
 #include <fcntl.h>
+#include <sys/stat.h>
 #include <unistd.h>
 
 #include <algorithm>
@@ -87,7 +88,8 @@ std::optional<std::vector<ZTSLinuxHost>> ZTCSysfs::readHosts() const {
         const ZTSLinuxHost lHost{*lNumber, lReadName("node_name"), lReadName("port_name")};
         // A host may vanish while its names are read: then it was not there, rather than there without names.
         const bool lHasName = !isZeroName(lHost.mPortName) || !isZeroName(lHost.mNodeName);
-        if (lHasName || ::access((mRoot + "/class/fc_host/" + lrName).c_str(), F_OK) == 0) {
+        struct stat lStatus {};
+        if (lHasName || ::stat((mRoot + "/class/fc_host/" + lrName).c_str(), &lStatus) == 0) {
             lHosts.push_back(lHost);
         }
     }

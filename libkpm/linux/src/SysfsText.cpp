@@ -34,7 +34,7 @@ static std::optional<std::uint64_t> sHexNumber(std::string_view aText) {
 
 std::optional<HBA_wwn> parseSysfsWwn(std::string_view aText) {
     const std::optional<std::uint64_t> lNumber = sHexNumber(aText);
-    if (!lNumber) {
+    if (!lNumber || *lNumber == std::numeric_limits<std::uint64_t>::max()) {
         return std::nullopt;
     }
     HBA_wwn lName;

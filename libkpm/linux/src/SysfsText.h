@@ -8,7 +8,8 @@
 
 #include "libkpm/include/libkpm.h"
 
-/// "0x1000020000000001" and a line end: a world wide name.
+/// "0x1000020000000001" and a line end: a world wide name. All ones is no name: the transport class shows that until
+/// the driver has set it.
 std::optional<HBA_wwn> parseSysfsWwn(std::string_view aText);
 
 /// "0x000001" and a line end: an FC id, of 24 bits.

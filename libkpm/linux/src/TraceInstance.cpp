@@ -1,157 +1,155 @@
 #include "libkpm/linux/src/TraceInstance.h"
 
 #include <fcntl.h>
+#include <sys/resource.h>
 #include <sys/stat.h>
 #include <unistd.h>
 
 #include <algorithm>
 #include <cerrno>
-#include <charconv>
 #include <cstring>
-#include <optional>
-#include <string_view>
-#include <utility>
+#include <exception>
 #include <variant>
 
+#include "libkpm/common/include/AgentLink.h"
 #include "libkpm/include/libkpm.h"
 #include "libkpm/linux/src/ExitSwitch.h"
-#include "libkpm/linux/src/Report.h"
+#include "libkpm/linux/src/InstanceName.h"
 #include "libkpm/linux/src/ScsiOutcome.h"
 #include "libkpm/linux/src/Sysfs.h"
 
-static const char* const scNamePrefix = "libkpm-linux-";
 static const char* const scDoneEvent = "events/scsi/scsi_dispatch_cmd_done";
 static const char* const scBufferKilobytes = "256";  // for each processor: some thousand records
 static constexpr std::size_t scMostDescription = 65536;
 
-int ZTCTraceDirectories::make(const std::string& acrPath) {
-    return ::mkdir(acrPath.c_str(), 0700) == 0 ? 0 : errno;
+static ZTSFeedProblem sProblem(const std::string& acrWhat, int aError) {
+    ZTSFeedProblem lProblem{judgeFeedError(aError), acrWhat + ": " + std::strerror(aError)};
+    if (lProblem.mHappening == ZTFH_NotGranted && aError != EROFS) {
+        lProblem.mText += "; run the agent as root, or with CAP_DAC_OVERRIDE, or prepare tracefs for its user";
+    }
+    return lProblem;
 }
 
-int ZTCTraceDirectories::remove(const std::string& acrPath) {
-    return ::rmdir(acrPath.c_str()) == 0 ? 0 : errno;
-}
+// ---- Opening ----
 
-/// When a process was started, in the kernel's ticks since boot: field 22 of its stat file.
-static std::optional<std::string> sStartTime(const std::string& acrProcess) {
-    const std::optional<std::string> lText = readSmallFile("/proc/" + acrProcess + "/stat", 4096);
-    if (!lText) {
-        return std::nullopt;
-    }
-    // The second field, the name in brackets, may hold anything.
-    std::size_t lPlace = lText->rfind(')');
-    for (int lField = 2; lField < 22 && lPlace != std::string::npos; ++lField) {
-        lPlace = lText->find(' ', lPlace + 1);
-    }
-    if (lPlace == std::string::npos) {
-        return std::nullopt;
-    }
-    return lText->substr(lPlace + 1, lText->find(' ', lPlace + 1) - lPlace - 1);
-}
-
-std::string makeTraceInstanceName() {
-    return scNamePrefix + std::to_string(::getpid()) + "-" + sStartTime("self").value_or("0");
-}
-
-bool isTraceInstanceLeftOver(const std::string& acrName) {
-    if (!acrName.starts_with(scNamePrefix)) {
-        return false;
-    }
-    const std::string lRest = acrName.substr(std::strlen(scNamePrefix));
-    const std::size_t lDash = lRest.find('-');
-    const auto lIsNumber = [](std::string_view aText) {
-        return !aText.empty() &&
-               std::all_of(aText.begin(), aText.end(), [](char aChar) { return '0' <= aChar && aChar <= '9'; });
-    };
-    if (lDash == std::string::npos || !lIsNumber(lRest.substr(0, lDash)) || !lIsNumber(lRest.substr(lDash + 1))) {
-        return false;
-    }
-    return sStartTime(lRest.substr(0, lDash)) != lRest.substr(lDash + 1);
-}
-
-static std::string sExplain(const std::string& acrWhat, int aError) {
-    std::string lText = acrWhat + ": " + std::strerror(aError);
-    if (aError == EACCES || aError == EPERM) {
-        lText += "; run the agent as root, or with CAP_DAC_OVERRIDE";
-    }
-    return lText;
-}
-
-/// Instances of killed runs; one that is in use after all (a process of another namespace) the kernel keeps.
-static void sRemoveLeftOvers(const std::string& acrInstances, ZTCTraceDirectories& arDirectories) {
+/// Instances of killed runs. The kernel keeps one that is in use after all, by a process of another name space.
+static void sRemoveLeftOvers(const std::string& acrInstances, ZTCTraceFiles& arFiles) {
     const std::vector<std::string> lNames = listDirectory(acrInstances).value_or(std::vector<std::string>());
     for (const std::string& lrName : lNames) {
         if (!isTraceInstanceLeftOver(lrName)) {
             continue;
         }
-        const int lError = arDirectories.remove(std::string(acrInstances).append("/").append(lrName));
+        const std::string lPath = acrInstances + "/" + lrName;
+        arFiles.write(lPath + "/" + scDoneEvent + "/enable", "0");
+        const int lError = arFiles.remove(lPath);
         if (lError == 0) {
-            logLinuxLine(
-                KPM_LOG_NOTICE,
-                std::string("removed the trace instance ").append(lrName).append(", which a killed run has left"));
+            logLibraryLine(KPM_LOG_NOTICE, "removed the trace instance " + lrName + ", which a killed run has left");
         } else if (lError != EBUSY && lError != ENOENT) {
-            logLinuxLine(KPM_LOG_WARNING, "the trace instance " + lrName +
-                                              ", which a killed run has left, stays: " + std::strerror(lError));
+            logLibraryLine(KPM_LOG_WARNING, "the trace instance " + lrName +
+                                                ", which a killed run has left, stays: " + std::strerror(lError));
         }
     }
 }
 
-std::unique_ptr<ZTCTraceInstance> ZTCTraceInstance::open(const std::string& acrRoot, ZTCTraceDirectories& arDirectories,
-                                                         std::string& arProblem) {
-    const std::string lInstances = acrRoot + "/instances";
-    if (::access(lInstances.c_str(), F_OK) != 0) {
-        const bool lIsMissing = errno == ENOENT;
-        arProblem = sExplain("there is no tracefs at " + acrRoot, errno);
-        arProblem += lIsMissing ? "; mount it with: mount -t tracefs nodev /sys/kernel/tracing" : "";
+/// The directory of instances: the first that is there, or cannot be seen for want of rights. By trying, with the
+/// rights that count for opening files; access(2) asks for those of the real user.
+static std::optional<std::string> sFindInstances(const std::vector<std::string>& acrRoots, ZTSFeedProblem& arProblem) {
+    for (const std::string& lrRoot : acrRoots) {
+        struct stat lStatus {};
+        if (::stat((lrRoot + "/instances").c_str(), &lStatus) == 0) {
+            return lrRoot + "/instances";
+        }
+        const int lError = errno;
+        const bool lIsFirst = &lrRoot == &acrRoots.front();
+        if (lIsFirst || lError != ENOENT) {
+            arProblem = sProblem(
+                (lError == ENOENT ? "there is no tracefs at " : "no tracefs can be reached at ") + lrRoot, lError);
+        }
+        if (lError != ENOENT) {
+            return std::nullopt;
+        }
+    }
+    arProblem.mText += "; mount it with: mount -t tracefs nodev /sys/kernel/tracing";
+    return std::nullopt;
+}
+
+ZTCTraceInstance::ZTCTraceInstance(std::string aPath, ZTCTraceFiles& arFiles)
+    : mPath(std::move(aPath)),
+      mFilterPath(mPath + "/" + scDoneEvent + "/filter"),
+      mEnablePath(mPath + "/" + scDoneEvent + "/enable"),
+      mrFiles(arFiles) {}
+
+std::unique_ptr<ZTCTraceInstance> ZTCTraceInstance::open(const ZTSTracePlace& acrPlace, ZTCTraceFiles& arFiles,
+                                                         ZTSFeedProblem& arProblem) {
+    std::string lPath = acrPlace.mPrepared;
+    const bool lIsOwn = lPath.empty();
+    if (lIsOwn) {
+        const std::optional<std::string> lInstances = sFindInstances(acrPlace.mRoots, arProblem);
+        if (!lInstances) {
+            return nullptr;
+        }
+        sRemoveLeftOvers(*lInstances, arFiles);
+        lPath = *lInstances + "/" + makeTraceInstanceName();
+    }
+    // Before the directory is made: from then on, its owner removes it.
+    std::unique_ptr<ZTCTraceInstance> lpInstance(new ZTCTraceInstance(lPath, arFiles));
+    if (lIsOwn) {
+        int lError = arFiles.make(lPath);
+        if (lError == EEXIST) {
+            arFiles.remove(lPath);
+            lError = arFiles.make(lPath);
+        }
+        if (lError != 0) {
+            arProblem = sProblem("the trace instance " + lPath + " cannot be made", lError);
+            return nullptr;
+        }
+        lpInstance->mIsOwn = true;
+    }
+    if (!lpInstance->readLayouts(arProblem)) {
         return nullptr;
     }
-    sRemoveLeftOvers(lInstances, arDirectories);
-    const std::string lPath = lInstances + "/" + makeTraceInstanceName();
-    int lError = arDirectories.make(lPath);
-    if (lError == EEXIST) {
-        arDirectories.remove(lPath);
-        lError = arDirectories.make(lPath);
-    }
-    if (lError != 0) {
-        arProblem = sExplain("the trace instance " + lPath + " cannot be made", lError);
-        return nullptr;
-    }
-    std::unique_ptr<ZTCTraceInstance> lpInstance(new ZTCTraceInstance(lPath, arDirectories));
-    if (!lpInstance->readLayouts(acrRoot, arProblem) || !lpInstance->openBuffers(arProblem)) {
-        return nullptr;
-    }
-    return lpInstance;
+    lpInstance->setBufferSizes();
+    return lpInstance->openBuffers(arProblem) ? std::move(lpInstance) : nullptr;
 }
 
 ZTCTraceInstance::~ZTCTraceInstance() {
-    write(std::string(scDoneEvent) + "/enable", "0");
+    switchOff();
     disarmLinuxExitSwitch();
     // The kernel keeps an instance that has open files.
     mBuffers.clear();
-    if (const int lError = mrDirectories.remove(mPath); lError != 0) {
-        logLinuxLine(KPM_LOG_WARNING, "the trace instance " + mPath + " stays: " + std::strerror(lError));
+    const int lError = mIsOwn ? mrFiles.remove(mPath) : 0;
+    if (lError == 0) {
+        return;
+    }
+    try {
+        logLibraryLine(KPM_LOG_WARNING, "the trace instance " + mPath + " stays: " + std::strerror(lError));
+    } catch (const std::exception&) {
+        return;  // no memory for a line; the next run removes the instance
     }
 }
 
-bool ZTCTraceInstance::readLayouts(const std::string& acrRoot, std::string& arProblem) {
+bool ZTCTraceInstance::readLayouts(ZTSFeedProblem& arProblem) {
     std::optional<std::string> lHeader = readSmallFile(mPath + "/events/header_page", scMostDescription);
     if (!lHeader) {
-        lHeader = readSmallFile(acrRoot + "/events/header_page", scMostDescription);
+        // Older kernels have it at the root alone.
+        lHeader = readSmallFile(mPath + "/../../events/header_page", scMostDescription);
     }
     const std::string lFormatName = std::string(scDoneEvent) + "/format";
     const std::optional<std::string> lFormat = readSmallFile(mPath + "/" + lFormatName, scMostDescription);
     if (!lHeader || !lFormat) {
-        arProblem = std::string(lFormat ? "events/header_page" : lFormatName) + " cannot be read below " + mPath;
+        const int lError = errno;
+        arProblem = {judgeFeedError(lError),
+                     std::string(lFormat ? "events/header_page" : lFormatName) + " cannot be read below " + mPath};
         return false;
     }
     const auto lPageLayout = makeTracePageLayout(parseTraceFormat(*lHeader));
     const auto lRecordLayout = makeScsiDoneLayout(parseTraceFormat(*lFormat));
     if (const auto* lpProblem = std::get_if<ZTSTraceProblem>(&lPageLayout)) {
-        arProblem = "trace pages cannot be read: " + lpProblem->mText;
+        arProblem = {ZTFH_Broken, "trace pages cannot be read: " + lpProblem->mText};
         return false;
     }
     if (const auto* lpProblem = std::get_if<ZTSTraceProblem>(&lRecordLayout)) {
-        arProblem = "the trace event scsi_dispatch_cmd_done cannot be used: " + lpProblem->mText;
+        arProblem = {ZTFH_Broken, "the trace event scsi_dispatch_cmd_done cannot be used: " + lpProblem->mText};
         return false;
     }
     mPageLayout = std::get<ZTSTracePageLayout>(lPageLayout);
@@ -159,18 +157,50 @@ bool ZTCTraceInstance::readLayouts(const std::string& acrRoot, std::string& arPr
     return true;
 }
 
-bool ZTCTraceInstance::openBuffers(std::string& arProblem) {
-    if (const int lError = write("buffer_size_kb", scBufferKilobytes); lError != 0) {
-        logLinuxLine(KPM_LOG_WARNING,
-                     "the size of the trace buffers stays as it is: " + std::string(std::strerror(lError)));
+void ZTCTraceInstance::setBufferSizes() {
+    if (const int lError = mrFiles.write(mPath + "/buffer_size_kb", scBufferKilobytes); lError != 0) {
+        logLibraryLine(KPM_LOG_WARNING,
+                       "the size of the trace buffers stays as it is: " + std::string(std::strerror(lError)));
     }
-    mWakesAtOnce = write("buffer_percent", "0") == 0;
+    // Some kernels store a written 0 as 1, which would leave a single record unread: see what is there.
+    const std::string lPercent = mPath + "/buffer_percent";
+    mWakesAtOnce = mrFiles.write(lPercent, "0") == 0 &&
+                   parseSysfsNumber(readSmallFile(lPercent, scMostDescription).value_or(std::string())) == 0;
+}
+
+/// Whether so many more descriptors leave the rest of the process enough.
+static bool sHasDescriptorsFor(std::size_t aNumber, const std::string& acrPath, ZTSFeedProblem& arProblem) {
+    rlimit lLimit{};
+    const std::optional<std::vector<std::string>> lOpen = listDirectory("/proc/self/fd");
+    if (::getrlimit(RLIMIT_NOFILE, &lLimit) != 0 || lLimit.rlim_cur == RLIM_INFINITY || !lOpen) {
+        return true;
+    }
+    const std::size_t lNeeded = lOpen->size() + aNumber + gcTraceDescriptorReserve;
+    if (lNeeded <= lLimit.rlim_cur) {
+        return true;
+    }
+    arProblem = {ZTFH_Broken, "the trace buffers of " + std::to_string(aNumber) +
+                                  " possible processors need a descriptor each, below " + acrPath + "/per_cpu: of " +
+                                  std::to_string(lLimit.rlim_cur) + " that are allowed, " +
+                                  std::to_string(lOpen->size()) + " are in use and " +
+                                  std::to_string(gcTraceDescriptorReserve) +
+                                  " are kept for the agent; raise the limit (LimitNOFILE= of the service) to " +
+                                  std::to_string(lNeeded) + " or more"};
+    return false;
+}
+
+bool ZTCTraceInstance::openBuffers(ZTSFeedProblem& arProblem) {
+    const std::vector<std::string> lNames = listDirectory(mPath + "/per_cpu").value_or(std::vector<std::string>());
+    if (!sHasDescriptorsFor(lNames.size(), mPath, arProblem)) {
+        return false;
+    }
     int lError = 0;
     std::size_t lMissing = 0;
-    const std::vector<std::string> lNames = listDirectory(mPath + "/per_cpu").value_or(std::vector<std::string>());
+    mBuffers.reserve(lNames.size());
     for (const std::string& lrName : lNames) {
         const std::string lBuffer = mPath + "/per_cpu/" + lrName;
         Buffer lNew;
+        lNew.mStatsPath = lBuffer + "/stats";
         lNew.mPipe = ZTCLibraryDescriptor(
             ::open((lBuffer + "/trace_pipe_raw").c_str(), O_RDONLY | O_NONBLOCK | O_CLOEXEC | O_NOCTTY));
         if (!lNew.mPipe.isOpen()) {
@@ -178,16 +208,15 @@ bool ZTCTraceInstance::openBuffers(std::string& arProblem) {
             ++lMissing;
             continue;
         }
-        lNew.mStatsPath = lBuffer + "/stats";
         mBuffers.push_back(std::move(lNew));
     }
     if (mBuffers.empty()) {
-        arProblem = "no trace buffer below " + mPath + "/per_cpu can be opened" +
-                    (lMissing == 0 ? std::string() : std::string(": ") + std::strerror(lError));
+        const std::string lWhat = "no trace buffer below " + mPath + "/per_cpu can be opened";
+        arProblem = lMissing == 0 ? ZTSFeedProblem{ZTFH_Broken, lWhat} : sProblem(lWhat, lError);
         return false;
     }
     if (lMissing != 0) {
-        logLinuxLine(
+        logLibraryLine(
             KPM_LOG_WARNING,
             "the trace buffers of " + std::to_string(lMissing) + " of " + std::to_string(lMissing + mBuffers.size()) +
                 " processors cannot be opened, so that their SCSI outcomes are lost: " + std::strerror(lError));
@@ -195,45 +224,47 @@ bool ZTCTraceInstance::openBuffers(std::string& arProblem) {
     return true;
 }
 
-/// Writes all of a text at once, as the kernel's control files want it. 0, or the error number.
-int ZTCTraceInstance::write(const std::string& acrName, const std::string& acrText) const {
-    const ZTCLibraryDescriptor lFile(
-        ::open((mPath + "/" + acrName).c_str(), O_WRONLY | O_CLOEXEC | O_NONBLOCK | O_NOCTTY | O_TRUNC));
-    if (!lFile.isOpen()) {
-        return errno;
-    }
-    ssize_t lWritten = -1;
-    do {
-        lWritten = ::write(lFile.get(), acrText.data(), acrText.size());
-    } while (lWritten < 0 && errno == EINTR);
-    if (lWritten < 0) {
-        return errno;
-    }
-    return static_cast<std::size_t>(lWritten) == acrText.size() ? 0 : EIO;
+// ---- On and off ----
+
+void ZTCTraceInstance::switchOff() {
+    mrFiles.write(mEnablePath, "0");
+    mFilter.clear();
 }
 
-bool ZTCTraceInstance::watchHosts(const std::vector<std::uint32_t>& acrHosts, std::string& arProblem) {
-    const std::string lEnable = std::string(scDoneEvent) + "/enable";
+ZTETraceFilter ZTCTraceInstance::watchHosts(const std::vector<std::uint32_t>& acrHosts, ZTSFeedProblem& arProblem) {
     if (acrHosts.empty()) {
-        write(lEnable, "0");
-        return true;
+        switchOff();
+        return ZTTF_Set;
     }
-    int lError = write(std::string(scDoneEvent) + "/filter", makeScsiFilter(acrHosts));
+    std::string lFilter = makeScsiFilter(acrHosts);
+    int lError = mrFiles.write(mFilterPath, lFilter);
+    if (lError != 0 && !mFilter.empty()) {
+        arProblem = sProblem("the filter of the trace event scsi_dispatch_cmd_done cannot be set", lError);
+        // After a refusal some kernels leave the event without any filter.
+        if (mrFiles.write(mFilterPath, mFilter) == 0) {
+            return ZTTF_Kept;
+        }
+        switchOff();
+        return ZTTF_Off;
+    }
     if (lError == 0) {
-        armLinuxExitSwitch(ZTCLibraryDescriptor(
-            ::open((mPath + "/" + lEnable).c_str(), O_WRONLY | O_CLOEXEC | O_NONBLOCK | O_NOCTTY)));
-        lError = write(lEnable, "1");
+        armLinuxExitSwitch(
+            ZTCLibraryDescriptor(::open(mEnablePath.c_str(), O_WRONLY | O_CLOEXEC | O_NONBLOCK | O_NOCTTY)));
+        lError = mrFiles.write(mEnablePath, "1");
         if (isLinuxExitSwitchPulled()) {
-            write(lEnable, "0");
+            mrFiles.write(mEnablePath, "0");
         }
     }
-    if (lError == 0) {
-        return true;
+    if (lError != 0) {
+        switchOff();
+        arProblem = sProblem("the trace event scsi_dispatch_cmd_done cannot be switched on", lError);
+        return ZTTF_Off;
     }
-    write(lEnable, "0");
-    arProblem = sExplain("the trace event scsi_dispatch_cmd_done cannot be switched on", lError);
-    return false;
+    mFilter.swap(lFilter);
+    return ZTTF_Set;
 }
+
+// ---- Reading ----
 
 ZTETraceRead ZTCTraceInstance::read(std::size_t aBuffer, std::span<std::uint8_t> aPage, std::size_t& arSize) {
     ssize_t lRead = -1;

@@ -1,5 +1,5 @@
-/// A trace instance of the library's own: one event, finished SCSI commands, with a filter and small buffers that no
-/// other user of tracing shares.
+/// A trace instance that no other user of tracing shares: one event, finished SCSI commands, with a filter and small
+/// buffers. The library makes it and removes it, or uses one that was prepared for it.
 #ifndef LIBKPM_LINUX_SRC_TRACEINSTANCE_H
 #define LIBKPM_LINUX_SRC_TRACEINSTANCE_H
 
@@ -9,50 +9,62 @@
 #include <optional>
 #include <span>
 #include <string>
+#include <utility>
 #include <vector>
 
 #include "libkpm/common/include/Descriptor.h"
+#include "libkpm/linux/src/FeedState.h"
+#include "libkpm/linux/src/TraceFiles.h"
 #include "libkpm/linux/src/TraceFormat.h"
-
-/// Makes and removes directories of instances; on tracefs that makes and removes the instance with all its files. Tests
-/// have a double that does what the kernel would.
-class ZTCTraceDirectories {
-public:
-    virtual ~ZTCTraceDirectories() = default;
-
-    /// 0, or the error number.
-    virtual int make(const std::string& acrPath);
-    virtual int remove(const std::string& acrPath);
-};
 
 enum ZTETraceRead : std::uint8_t { ZTTR_Page, ZTTR_Empty, ZTTR_Failed };
 
 /// What a read of a buffer that gave nothing means: what it returned, and the error number where that is negative.
 ZTETraceRead judgeEmptyTraceRead(std::int64_t aRead, int aError);
 
+/// Where tracefs is.
+struct ZTSTracePlace {
+    /// The first is used that has instances.
+    std::vector<std::string> mRoots{"/sys/kernel/tracing", "/sys/kernel/debug/tracing"};
+    /// The directory of an instance that was prepared for the library; empty: it makes its own.
+    std::string mPrepared{};
+};
+
+enum ZTETraceFilter : std::uint8_t {
+    ZTTF_Set,   ///< the event is on for these hosts, or off where there are none
+    ZTTF_Kept,  ///< the kernel refused: the filter before is still in use
+    ZTTF_Off    ///< the kernel refused: the event is off
+};
+
+/// Descriptors that the library leaves to the rest of the process.
+inline constexpr std::size_t gcTraceDescriptorReserve = 64;
+
 /// One thread at a time.
 class ZTCTraceInstance {
 public:
-    /// Removes what killed runs have left, makes the instance, and opens its buffers; nothing is recorded yet. Null,
-    /// with the reason and what would help in `arProblem`, where that cannot be done. `arDirectories` outlives the
+    /// Removes what killed runs have left, makes the instance or takes the prepared one, and opens its buffers; nothing
+    /// is recorded yet. Null, with the reason in `arProblem`, where that cannot be done. `arFiles` outlives the
     /// instance.
-    static std::unique_ptr<ZTCTraceInstance> open(const std::string& acrRoot, ZTCTraceDirectories& arDirectories,
-                                                  std::string& arProblem);
+    static std::unique_ptr<ZTCTraceInstance> open(const ZTSTracePlace& acrPlace, ZTCTraceFiles& arFiles,
+                                                  ZTSFeedProblem& arProblem);
 
-    /// Switches the event off and removes the instance.
+    /// Switches the event off, closes the buffers, and removes the instance if the library has made it.
     ~ZTCTraceInstance();
     ZTCTraceInstance(const ZTCTraceInstance&) = delete;
     ZTCTraceInstance& operator=(const ZTCTraceInstance&) = delete;
 
-    /// Records finished commands of these hosts from now on, in ascending order; of none, nothing is recorded. False,
-    /// with the reason, where the kernel refuses; the event is off then.
-    bool watchHosts(const std::vector<std::uint32_t>& acrHosts, std::string& arProblem);
+    /// Records finished commands of these hosts, which are in ascending order. Where that is not Set, `arProblem` has
+    /// the reason.
+    ZTETraceFilter watchHosts(const std::vector<std::uint32_t>& acrHosts, ZTSFeedProblem& arProblem);
+
+    /// Records nothing from now on. What was recorded can still be read. Allocates nothing.
+    void switchOff();
 
     const ZTSScsiDoneLayout& getRecordLayout() const { return mRecordLayout; }
     const ZTSTracePageLayout& getPageLayout() const { return mPageLayout; }
 
-    /// Whether the buffers' descriptors are readable as soon as one record is there, rather than when they are half
-    /// full.
+    /// Whether the buffers' descriptors are readable as soon as one record is there. Otherwise they are readable when
+    /// the buffers are filled to some part.
     bool wakesAtOnce() const { return mWakesAtOnce; }
 
     std::size_t getBufferCount() const { return mBuffers.size(); }
@@ -73,26 +85,22 @@ private:
         std::uint64_t mLosses = 0;
     };
 
-    ZTCTraceInstance(std::string aPath, ZTCTraceDirectories& arDirectories)
-        : mPath(std::move(aPath)), mrDirectories(arDirectories) {}
+    ZTCTraceInstance(std::string aPath, ZTCTraceFiles& arFiles);
 
-    bool readLayouts(const std::string& acrRoot, std::string& arProblem);
-    bool openBuffers(std::string& arProblem);
-    int write(const std::string& acrName, const std::string& acrText) const;
+    bool readLayouts(ZTSFeedProblem& arProblem);
+    bool openBuffers(ZTSFeedProblem& arProblem);
+    void setBufferSizes();
 
     const std::string mPath;
-    ZTCTraceDirectories& mrDirectories;
+    const std::string mFilterPath;
+    const std::string mEnablePath;
+    bool mIsOwn = false;  // made by the library, and removed by it
+    ZTCTraceFiles& mrFiles;
     ZTSScsiDoneLayout mRecordLayout;
     ZTSTracePageLayout mPageLayout;
     bool mWakesAtOnce = false;
+    std::string mFilter;  // in use; empty: the event is off
     std::vector<Buffer> mBuffers;
 };
-
-/// The name of this process's instance: a common begin, the process's number, and when it was started, so that another
-/// of the same number is not taken for it.
-std::string makeTraceInstanceName();
-
-/// Whether an instance of this name is one of the library's, and its process is gone.
-bool isTraceInstanceLeftOver(const std::string& acrName);
 
 #endif

@@ -2,6 +2,9 @@
 
 #include <gtest/gtest.h>
 
+#include <algorithm>
+#include <iterator>
+
 using testing::Test;
 
 static ZTSLinuxHost sHost(std::uint32_t aNumber, std::uint8_t aName) {
@@ -25,7 +28,8 @@ TEST(Boards, HostsGetBoardsInTheOrderOfTheirNumbers) {
 TEST(Boards, WhatStaysIsNoChange) {
     ZTCLinuxBoards lBoards;
     lBoards.update({sHost(2, 12)});
-    EXPECT_TRUE(lBoards.update({sHost(2, 12)}).isEmpty());
+    const auto lChanges = lBoards.update({sHost(2, 12)});
+    EXPECT_TRUE(lChanges.mArrived.empty() && lChanges.mLeft.empty() && lChanges.mRenamed.empty());
 }
 
 TEST(Boards, AHostThatComesLaterGetsTheNextBoardWhateverItsNumber) {
@@ -55,28 +59,62 @@ TEST(Boards, APortThatComesBackUnderAnotherHostNumberGetsItsOwnBoard) {
     EXPECT_EQ(lBoards.size(), 2u);
 }
 
-TEST(Boards, AnotherPortUnderTheSameHostNumberIsAnotherBoard) {
+TEST(Boards, ANameThatChangesKeepsTheBoardAndTheFormerNameIsKnown) {
     ZTCLinuxBoards lBoards;
     lBoards.update({sHost(0, 10)});
     const auto lChanges = lBoards.update({sHost(0, 20)});
-    EXPECT_EQ(lChanges.mLeft, ZTCBoardNumbers{0});
-    EXPECT_EQ(lChanges.mArrived, ZTCBoardNumbers{1});
-    EXPECT_EQ(lBoards.get(0).mPortName.wwn[7], 10);
+    EXPECT_EQ(lChanges.mRenamed, ZTCBoardNumbers{0});
+    EXPECT_TRUE(lChanges.mLeft.empty());
+    EXPECT_TRUE(lChanges.mArrived.empty());
+    EXPECT_EQ(lBoards.get(0).mPortName.wwn[7], 20);
+    EXPECT_TRUE(lBoards.get(0).hasName(sHost(0, 10).mPortName));
+    EXPECT_TRUE(lBoards.get(0).hasName(sHost(0, 20).mPortName));
+    EXPECT_FALSE(lBoards.get(0).hasName(sHost(0, 30).mPortName));
+    // And back again: the list of former names does not grow for ever.
+    for (int lTimes = 0; lTimes < 10; ++lTimes) {
+        lBoards.update({sHost(0, 10)});
+        lBoards.update({sHost(0, 20)});
+    }
+    EXPECT_LE(lBoards.get(0).mFormerNames.size(), 2u);
+}
+
+TEST(Boards, HostsThatHaveChangedTheirNumbersKeepTheirBoards) {
+    ZTCLinuxBoards lBoards;
+    lBoards.update({sHost(0, 10), sHost(1, 11)});
+    const auto lChanges = lBoards.update({sHost(0, 11), sHost(1, 10)});
+    EXPECT_EQ(lChanges.mLeft, (ZTCBoardNumbers{0, 1}));
+    EXPECT_EQ(lChanges.mArrived, (ZTCBoardNumbers{1, 0}));
     EXPECT_EQ(lBoards.findHost(0), 1u);
+    EXPECT_EQ(lBoards.findHost(1), 0u);
+    EXPECT_EQ(lBoards.size(), 2u);
 }
 
-TEST(Boards, ANameThatCouldNotBeReadIsFilledInAndIsNoOtherPort) {
-    ZTCLinuxBoards lBoards;
-    lBoards.update({sHost(0, 0)});
-    EXPECT_TRUE(lBoards.update({sHost(0, 10)}).isEmpty());
-    EXPECT_EQ(lBoards.get(0).mPortName.wwn[7], 10);
-    EXPECT_TRUE(lBoards.update({sHost(0, 0)}).isEmpty()) << "unreadable for a moment";
-    EXPECT_EQ(lBoards.get(0).mPortName.wwn[7], 10);
+TEST(Boards, AHostWithoutANameIsHeldBackOnceUntilItHasOne) {
+    for (const std::uint8_t lNone : {std::uint8_t{0}, std::uint8_t{0xFF}}) {
+        ZTSLinuxHost lUnnamed;
+        std::fill(std::begin(lUnnamed.mPortName.wwn), std::end(lUnnamed.mPortName.wwn), lNone);
+        ZTCLinuxBoards lBoards;
+        EXPECT_EQ(lBoards.update({lUnnamed, sHost(1, 11)}).mHeldBack, ZTCBoardNumbers{0});
+        EXPECT_EQ(lBoards.size(), 1u);
+        EXPECT_FALSE(lBoards.findHost(0).has_value());
+        EXPECT_EQ(lBoards.getHosts(), ZTCBoardNumbers{1});
+        EXPECT_TRUE(lBoards.update({lUnnamed, sHost(1, 11)}).mHeldBack.empty()) << "told once";
+        EXPECT_EQ(lBoards.update({sHost(0, 10), sHost(1, 11)}).mArrived, ZTCBoardNumbers{1});
+        EXPECT_EQ(lBoards.findHost(0), 1u);
+    }
 }
 
-TEST(Boards, HostsWithoutNamesAreNotTakenForEachOther) {
+TEST(Boards, AHostThatWasHeldBackAndLeftIsToldAgainWhenItComesBack) {
     ZTCLinuxBoards lBoards;
-    lBoards.update({sHost(0, 0)});
-    lBoards.update({});
-    EXPECT_EQ(lBoards.update({sHost(3, 0)}).mArrived, ZTCBoardNumbers{1});
+    EXPECT_EQ(lBoards.update({sHost(0, 0)}).mHeldBack, ZTCBoardNumbers{0});
+    EXPECT_TRUE(lBoards.update({}).mLeft.empty());
+    EXPECT_EQ(lBoards.update({sHost(0, 0)}).mHeldBack, ZTCBoardNumbers{0});
+}
+
+TEST(Boards, ANameThatCannotBeReadForAMomentChangesNothing) {
+    ZTCLinuxBoards lBoards;
+    lBoards.update({sHost(0, 10)});
+    const auto lChanges = lBoards.update({sHost(0, 0)});
+    EXPECT_TRUE(lChanges.mLeft.empty() && lChanges.mRenamed.empty() && lChanges.mHeldBack.empty());
+    EXPECT_EQ(lBoards.get(0).mPortName.wwn[7], 10);
 }

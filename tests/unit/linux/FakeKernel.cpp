@@ -12,7 +12,7 @@
 #include <stdexcept>
 #include <utility>
 
-#include "libkpm/linux/src/Report.h"
+#include "libkpm/common/include/AgentLink.h"
 
 std::string portNameText(std::uint32_t aName) {
     char lText[32];
@@ -38,7 +38,7 @@ ZTCFakeKernel::ZTCFakeKernel() : mFcWake(::eventfd(0, EFD_CLOEXEC | EFD_NONBLOCK
 ZTCFakeKernel::~ZTCFakeKernel() = default;
 
 ZTSLinuxOptions ZTCFakeKernel::options() const {
-    return {sysfs(), {tracefs()}, std::chrono::milliseconds(20)};
+    return {sysfs(), {{tracefs()}, {}}, std::chrono::milliseconds(20)};
 }
 
 // ---- sysfs ----
@@ -105,6 +105,7 @@ public:
     int getDescriptor() const override { return mrKernel.mFcWake.get(); }
 
     ZTSLinuxReceived receive(std::span<std::uint8_t> aBuffer) override {
+        const ZTCTestsOwn lOwn;
         const std::lock_guard<std::mutex> lGuard(mrKernel.mLock);
         std::uint64_t lCount = 0;
         if (mrKernel.mOutcomes.empty() || mrKernel.mIsHeld) {
@@ -121,9 +122,10 @@ private:
     ZTCFakeKernel& mrKernel;
 };
 
-std::unique_ptr<ZTCFcEventSource> ZTCFakeKernel::openFcEvents(std::string& arProblem) {
+std::unique_ptr<ZTCFcEventSource> ZTCFakeKernel::openFcEvents(ZTSFeedProblem& arProblem) {
+    const ZTCTestsOwn lOwn;
     if (mRefusesFcEvents) {
-        arProblem = "FC events cannot be subscribed to: Operation not permitted";
+        arProblem = {ZTFH_NotGranted, "FC events cannot be subscribed to: Operation not permitted"};
         return nullptr;
     }
     return std::make_unique<ZTCFakeFcSource>(*this);
@@ -160,12 +162,18 @@ bool ZTCFakeKernel::isFcDrained() const {
 // ---- tracefs ----
 
 int ZTCFakeKernel::make(const std::string& acrPath) {
+    const ZTCTestsOwn lOwn;
     if (mMakeError != 0) {
         return mMakeError;
     }
     if (!std::filesystem::create_directory(acrPath)) {
         return EEXIST;
     }
+    fillInstance(acrPath);
+    return 0;
+}
+
+void ZTCFakeKernel::fillInstance(const std::string& acrPath) {
     mInstance = acrPath;
     const std::string lEvent = acrPath + "/events/scsi/scsi_dispatch_cmd_done";
     std::filesystem::create_directories(lEvent);
@@ -192,17 +200,55 @@ int ZTCFakeKernel::make(const std::string& acrPath) {
         std::filesystem::create_directories(lBuffer);
         writeFile(lBuffer + "/stats", "entries: 0\noverrun: 0\ncommit overrun: 0\ndropped events: 0\n");
         if (::mkfifo((lBuffer + "/trace_pipe_raw").c_str(), 0600) != 0) {
-            return errno;
+            throw std::runtime_error("a FIFO cannot be made");
         }
         // Open for both, so that the reader never sees an end.
         mPipes[lProcessor] = ZTCLibraryDescriptor(::open((lBuffer + "/trace_pipe_raw").c_str(), O_RDWR | O_CLOEXEC));
     }
-    return 0;
 }
 
 int ZTCFakeKernel::remove(const std::string& acrPath) {
+    const ZTCTestsOwn lOwn;
+    if (isOpenElsewhere(acrPath)) {
+        return EBUSY;
+    }
     std::error_code lError;
     return std::filesystem::remove_all(acrPath, lError) == 0 || lError ? ENOENT : 0;
+}
+
+/// Whether a descriptor of this process, other than those of this object, is open below the path.
+bool ZTCFakeKernel::isOpenElsewhere(const std::string& acrPath) const {
+    const std::vector<std::string> lNames = listDirectory("/proc/self/fd").value_or(std::vector<std::string>());
+    return std::any_of(lNames.begin(), lNames.end(), [&](const std::string& acrName) {
+        std::error_code lError;
+        const std::string lTarget = std::filesystem::read_symlink("/proc/self/fd/" + acrName, lError).string();
+        const bool lIsOwn = std::any_of(mPipes.begin(), mPipes.end(), [&](const auto& acrPipe) {
+            return std::to_string(acrPipe.second.get()) == acrName;
+        });
+        return lTarget.starts_with(acrPath + "/") && !lIsOwn;
+    });
+}
+
+void ZTCFakeKernel::refuseWrites(const std::string& acrName, const std::string& acrText, int aError, unsigned aTimes) {
+    const std::lock_guard<std::mutex> lGuard(mLock);
+    mRefusals.push_back({"/" + acrName, acrText, aError, aTimes});
+}
+
+int ZTCFakeKernel::write(const std::string& acrPath, std::string_view aText) {
+    const ZTCTestsOwn lOwn;
+    {
+        const std::lock_guard<std::mutex> lGuard(mLock);
+        for (Refusal& lrRefusal : mRefusals) {
+            const bool lIsMeant =
+                acrPath.ends_with(lrRefusal.mName) && aText.find(lrRefusal.mText) != std::string_view::npos;
+            if (lIsMeant && lrRefusal.mTimes != 0) {
+                --lrRefusal.mTimes;
+                return lrRefusal.mError;
+            }
+        }
+    }
+    const bool lIsPercent = !mStoredPercent.empty() && acrPath.ends_with("/buffer_percent");
+    return ZTCTraceFiles::write(acrPath, lIsPercent ? mStoredPercent : aText);
 }
 
 void ZTCFakeKernel::sendPage(const ZTCBytes& acrPage, unsigned aProcessor) {
@@ -219,29 +265,91 @@ std::vector<std::string> ZTCFakeKernel::instances() const {
     return listDirectory(tracefs() + "/instances").value();
 }
 
-// ---- The log ----
+// ---- The log and the reports ----
+
+struct ZTSToldSource {
+    std::uint32_t mBoard;
+    std::uint32_t mCategory;
+    std::uint32_t mSubcategory;
+    std::string mText;
+};
 
 static std::mutex sLogLock;
 static std::vector<std::string>& sLines() {
     static std::vector<std::string>& srLines = *new std::vector<std::string>;
     return srLines;
 }
+static std::vector<ZTSToldSource>& sSources() {
+    static std::vector<ZTSToldSource>& srSources = *new std::vector<ZTSToldSource>;
+    return srSources;
+}
+static std::map<std::string, std::uint64_t>& sLosses() {
+    static std::map<std::string, std::uint64_t>& srLosses = *new std::map<std::string, std::uint64_t>;
+    return srLosses;
+}
 
 static void sLog(std::uint32_t aLevel, const char* apText) {
+    const ZTCTestsOwn lOwn;
     const std::lock_guard<std::mutex> lGuard(sLogLock);
     sLines().push_back(std::to_string(aLevel) + " " + apText);
+}
+
+static void sState(void*, std::uint32_t aBoard, std::uint32_t aCategory, std::uint32_t aSubcategory,
+                   std::uint32_t aState, const char* apReason) {
+    const ZTCTestsOwn lOwn;
+    static constexpr const char* scStates[] = {"?", "working", "no source", "no rights", "failed"};
+    const std::lock_guard<std::mutex> lGuard(sLogLock);
+    const std::string lReason = *apReason == '\0' ? std::string() : std::string(" (") + apReason + ")";
+    sSources().push_back(
+        {aBoard, aCategory, aSubcategory, scStates[aState <= KPM_STATE_FAILED ? aState : 0] + lReason});
+}
+
+static void sLoss(void*, const char* apName, std::uint64_t aTotal) {
+    const ZTCTestsOwn lOwn;
+    const std::lock_guard<std::mutex> lGuard(sLogLock);
+    sLosses()[apName] = aTotal;
 }
 
 ZTCLinuxLog::ZTCLinuxLog() {
     {
         const std::lock_guard<std::mutex> lGuard(sLogLock);
         sLines().clear();
+        sSources().clear();
+        sLosses().clear();
     }
-    setLinuxLog(&sLog);
+    setLibraryLog(&sLog);
+    setLibraryReport(nullptr, &sState, &sLoss);
 }
 
 ZTCLinuxLog::~ZTCLinuxLog() {
-    setLinuxLog(nullptr);
+    setLibraryLog(nullptr);
+    setLibraryReport(nullptr, nullptr, nullptr);
+}
+
+static std::vector<std::string> sTold(std::uint32_t aBoard, std::uint32_t aCategory, std::uint32_t aSubcategory) {
+    const std::lock_guard<std::mutex> lGuard(sLogLock);
+    std::vector<std::string> lTold;
+    for (const ZTSToldSource& lrSource : sSources()) {
+        if (lrSource.mBoard == aBoard && lrSource.mCategory == aCategory && lrSource.mSubcategory == aSubcategory) {
+            lTold.push_back(lrSource.mText);
+        }
+    }
+    return lTold;
+}
+
+std::string ZTCLinuxLog::source(std::uint32_t aBoard, std::uint32_t aCategory, std::uint32_t aSubcategory) const {
+    const std::vector<std::string> lTold = sTold(aBoard, aCategory, aSubcategory);
+    return lTold.empty() ? std::string() : lTold.back();
+}
+
+std::size_t ZTCLinuxLog::countSource(std::uint32_t aBoard, std::uint32_t aCategory, std::uint32_t aSubcategory) const {
+    return sTold(aBoard, aCategory, aSubcategory).size();
+}
+
+std::optional<std::uint64_t> ZTCLinuxLog::loss(const std::string& acrName) const {
+    const std::lock_guard<std::mutex> lGuard(sLogLock);
+    const auto lFound = sLosses().find(acrName);
+    return lFound == sLosses().end() ? std::nullopt : std::optional(lFound->second);
 }
 
 std::vector<std::string> ZTCLinuxLog::lines() const {

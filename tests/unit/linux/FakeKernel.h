@@ -9,12 +9,28 @@
 #include <deque>
 #include <map>
 #include <mutex>
+#include <optional>
 #include <string>
+#include <string_view>
 #include <vector>
 
 #include "libkpm/linux/src/Engine.h"
 #include "tests/support/TemporaryDirectory.h"
 #include "tests/unit/linux/KernelBytes.h"
+
+/// While one lives, what its thread does is the test's own doing and not the library's: the kernel's, or the agent's.
+class ZTCTestsOwn {
+public:
+    ZTCTestsOwn() { ++sDepth; }
+    ~ZTCTestsOwn() { --sDepth; }
+    ZTCTestsOwn(const ZTCTestsOwn&) = delete;
+    ZTCTestsOwn& operator=(const ZTCTestsOwn&) = delete;
+
+    static bool isHere() { return sDepth != 0; }
+
+private:
+    static inline thread_local unsigned sDepth = 0;
+};
 
 /// The trees below /sys and /sys/kernel/tracing.
 class ZTCFakeKernel : public ZTCLinuxSources {
@@ -42,7 +58,7 @@ public:
     void addRport(std::uint32_t aHost, std::uint32_t aNumber, std::int64_t aTarget, const std::string& acrName);
 
     // ---- FC events ----
-    std::unique_ptr<ZTCFcEventSource> openFcEvents(std::string& arProblem) override;
+    std::unique_ptr<ZTCFcEventSource> openFcEvents(ZTSFeedProblem& arProblem) override;
     /// Says one outcome of receive, with these bytes.
     void sendFc(ZTELinuxReceived aOutcome, const ZTCBytes& acrBytes = {});
     void sendFc(const ZTSFcMessage& acrMessage) { sendFc(ZTLR_Datagram, acrMessage.make()); }
@@ -51,11 +67,16 @@ public:
     void releaseFc();
     bool isFcDrained() const;
 
-    bool mRefusesFcEvents = false;
+    std::atomic<bool> mRefusesFcEvents{false};
 
     // ---- tracefs ----
     int make(const std::string& acrPath) override;
+    /// As the kernel does, keeps an instance that has files open outside of this object.
     int remove(const std::string& acrPath) override;
+    int write(const std::string& acrPath, std::string_view aText) override;
+    /// From now on, writing a text with this in it to a control file of this name fails with the error number, so many
+    /// times.
+    void refuseWrites(const std::string& acrName, const std::string& acrText, int aError, unsigned aTimes = ~0u);
 
     /// Writes a page to a processor's buffer.
     void sendPage(const ZTCBytes& acrPage, unsigned aProcessor = 0);
@@ -66,15 +87,28 @@ public:
     std::string instanceFile(const std::string& acrName) const { return readFile(instance() + "/" + acrName); }
     std::vector<std::string> instances() const;
 
-    int mMakeError = 0;
+    std::atomic<int> mMakeError{0};
     unsigned mProcessors = 2;
     std::string mFormat = doneFormat();
     std::string mHeaderPage = headerPage();
     bool mHasBufferPercent = true;
+    std::string mStoredPercent{};  ///< what the kernel makes of any buffer_percent; empty: it stores what is written
     bool mHasFilter = true;
+
+    /// The files of an instance in a directory that is there.
+    void fillInstance(const std::string& acrPath);
 
 private:
     friend class ZTCFakeFcSource;
+
+    bool isOpenElsewhere(const std::string& acrPath) const;
+
+    struct Refusal {
+        std::string mName;
+        std::string mText;
+        int mError;
+        unsigned mTimes;
+    };
 
     ZTCTemporaryDirectory mDirectory;
     std::map<unsigned, ZTCLibraryDescriptor> mPipes;
@@ -84,6 +118,7 @@ private:
     ZTCLibraryDescriptor mFcWake;
     bool mIsHeld = false;                                         // guarded by mLock
     std::deque<std::pair<ZTELinuxReceived, ZTCBytes>> mOutcomes;  // guarded by mLock
+    std::vector<Refusal> mRefusals;                               // guarded by mLock
 };
 
 /// The name "0x1000...NN".
@@ -91,7 +126,7 @@ std::string portNameText(std::uint32_t aName);
 HBA_wwn portName(std::uint32_t aName);
 HBA_wwn nodeName(std::uint32_t aName);
 
-/// The lines that the library logs while it is there.
+/// The lines that the library logs, and the reports that it makes, while it is there.
 class ZTCLinuxLog {
 public:
     ZTCLinuxLog();
@@ -104,6 +139,14 @@ public:
     /// How many contain this text.
     std::size_t count(const std::string& acrText) const;
     std::string all() const;
+
+    /// The last report of a kind's source on a board: "working", "no source", "no rights" or "failed", and " (REASON)"
+    /// where there is one; empty where there was no report.
+    std::string source(std::uint32_t aBoard, std::uint32_t aCategory, std::uint32_t aSubcategory) const;
+    /// How many reports there were of it.
+    std::size_t countSource(std::uint32_t aBoard, std::uint32_t aCategory, std::uint32_t aSubcategory) const;
+    /// The last total of a loss; nothing where it was not reported.
+    std::optional<std::uint64_t> loss(const std::string& acrName) const;
 };
 
 #endif

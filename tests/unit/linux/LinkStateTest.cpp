@@ -134,3 +134,10 @@ TEST_F(LinkState, AStrayMessageIsForgottenWithTheNextLook) {
     mLink.forgetMessages();
     EXPECT_EQ(told(true, ZTLK_Up), "");
 }
+
+TEST_F(LinkState, AReadingAheadOfAMessageThatNeverComesHidesNoLaterFlap) {
+    EXPECT_EQ(read(ZTLK_Down), "down#1");
+    mLink.forgetMessages();
+    EXPECT_EQ(told(true, ZTLK_Down), "");
+    EXPECT_EQ(told(false, ZTLK_Down), "up#1 down#2");
+}

@@ -36,6 +36,7 @@ TEST_F(LinuxEntryPoints, TheTableIsWhole) {
     EXPECT_EQ(mrList.size, KPM_FUNCTION_LIST_SIZE_REPORT);
     EXPECT_NE(mrList.KpmUnregEvent, nullptr);
     EXPECT_NE(mrList.SetLog, nullptr);
+    EXPECT_NE(mrList.SetReport, nullptr);
 }
 
 TEST_F(LinuxEntryPoints, BeforeInitAndAfterCloseNothingIsThere) {

@@ -7,6 +7,7 @@
 #include <cstring>
 
 #include "tests/support/Waiting.h"
+#include "tests/unit/linux/FakeKernel.h"
 
 static std::atomic<ZTCLinuxRecorder*> gpRecorder{nullptr};
 
@@ -55,6 +56,7 @@ static Data sData(const ZT_event& acrEvent) {
 
 void ZTCLinuxRecorder::onScope(unsigned aBoard, HBA_wwn aPort, unsigned aCategory, unsigned aSubcategory,
                                void* apContext, ZT_event* apEvent) {
+    const ZTCTestsOwn lOwn;
     EXPECT_EQ(apContext, gpRecorder.load());
     EXPECT_NE(aPort.wwn[7], 0) << "the board's own name";
     const std::string lBoard = std::to_string(aBoard);
@@ -80,6 +82,7 @@ void ZTCLinuxRecorder::onScope(unsigned aBoard, HBA_wwn aPort, unsigned aCategor
 }
 
 static void sOnLink(unsigned aBoard, void* apInfo) {
+    const ZTCTestsOwn lOwn;
     LINKINFO lInfo;
     std::memcpy(&lInfo, apInfo, sizeof lInfo);
     gpRecorder.load()->record(std::to_string(aBoard) + " link " + (lInfo.a_linkState == 1 ? "up" : "down") +
@@ -89,6 +92,7 @@ static void sOnLink(unsigned aBoard, void* apInfo) {
 }
 
 static void sOnRscn(unsigned aBoard, void* apPayload, unsigned aLength) {
+    const ZTCTestsOwn lOwn;
     std::string lText = std::to_string(aBoard) + " rscn ";
     for (unsigned lByte = 0; lByte < aLength; ++lByte) {
         char lHex[3];

@@ -3,6 +3,8 @@
 
 #include <gtest/gtest.h>
 
+#include <algorithm>
+
 #include "tests/unit/linux/KernelBytes.h"
 
 static ZTSScsiDoneLayout sLayout(bool aHasSense = true) {
@@ -77,4 +79,37 @@ TEST(ScsiOutcome, AFilterTooLongForTheKernelLeavesTheHostsOut) {
     }
     EXPECT_GT(lHosts.size(), 200u);
     EXPECT_EQ(makeScsiFilter(lHosts), "result & 42");
+}
+
+/// Hosts, none next to another, whose filter has exactly so many bytes.
+static std::vector<std::uint32_t> sHostsFor(std::size_t aSize) {
+    static constexpr std::size_t scAround = 13;  // "result & 42 && (" and ")", without one " || "
+    static constexpr std::size_t scItem = 25;    // " || host_no == 2000000000"
+    std::size_t lLeft = aSize - scAround;
+    std::vector<std::uint32_t> lHosts;
+    // Numbers of fewer digits make up for what is not a whole item.
+    for (std::uint32_t lFirst = 100; lLeft % scItem != 0; lFirst += 2) {
+        const std::size_t lFewer = std::min<std::size_t>(scItem - lLeft % scItem, 7);
+        std::uint32_t lHost = lFirst;
+        for (std::size_t lDigits = 3; lDigits < 10 - lFewer; ++lDigits) {
+            lHost *= 10;
+        }
+        lHosts.push_back(lHost);
+        lLeft -= scItem - lFewer;
+    }
+    for (std::uint32_t lHost = 2000000000; lLeft != 0; lHost += 2) {
+        lHosts.push_back(lHost);
+        lLeft -= scItem;
+    }
+    std::sort(lHosts.begin(), lHosts.end());
+    return lHosts;
+}
+
+TEST(ScsiOutcome, AFilterOfExactlyTheKernelsLimitLeavesTheHostsOutAndOneByteLessNamesThem) {
+    ASSERT_EQ(gcScsiFilterLimit, 4096u);
+    EXPECT_EQ(makeScsiFilter(sHostsFor(4095)).size(), 4095u);
+    EXPECT_EQ(makeScsiFilter(sHostsFor(4096)), "result & 42");
+    EXPECT_EQ(makeScsiFilter(sHostsFor(4097)), "result & 42");
+    // The numbers are counted right: a few bytes less, and the size is as asked for.
+    EXPECT_EQ(makeScsiFilter(sHostsFor(4090)).size(), 4090u);
 }

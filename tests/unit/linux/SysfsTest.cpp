@@ -160,3 +160,9 @@ TEST_F(RemotePorts, ThousandsOfThemAreFound) {
         EXPECT_EQ(find(0, 0, lPort), lPort % 255 + 1);
     }
 }
+
+TEST_F(RemotePorts, ATargetWhoseNameIsAllOnesIsNamedByItsRemotePort) {
+    mKernel.addTarget(0, 0, 4, "0xffffffffffffffff");
+    mKernel.addRport(0, 1, 4, portNameText(0x44));
+    EXPECT_EQ(find(0, 0, 4), 0x44);
+}

@@ -10,7 +10,7 @@ TEST(SysfsText, WorldWideNamesAreReadFromTheirMostSignificantByteOn) {
     EXPECT_EQ(lName->wwn[0], 0x10);
     EXPECT_EQ(lName->wwn[2], 0x02);
     EXPECT_EQ(lName->wwn[7], 0x01);
-    EXPECT_EQ(parseSysfsWwn("0xffffffffffffffff").value().wwn[3], 0xFF);
+    EXPECT_EQ(parseSysfsWwn("0xffffffffffffff00").value().wwn[3], 0xFF);
     EXPECT_EQ(parseSysfsWwn(" 0x1 \n").value().wwn[7], 1);
 }
 
@@ -86,4 +86,9 @@ TEST(SysfsText, TraceLossesThatAreNotToldAreNone) {
     EXPECT_FALSE(parseTraceLosses("overrun: 18446744073709551615\n").has_value());
     EXPECT_FALSE(parseTraceLosses("overrun: 18446744073709551614\ndropped events: 2\n").has_value());
     EXPECT_FALSE(parseTraceLosses("overrun: 99999999999999999999999\n").has_value());
+}
+
+TEST(SysfsText, AllOnesIsNoName) {
+    EXPECT_FALSE(parseSysfsWwn("0xffffffffffffffff\n").has_value());
+    EXPECT_TRUE(parseSysfsWwn("0xfffffffffffffffe\n").has_value());
 }

@@ -3,24 +3,28 @@
 #include <gtest/gtest.h>
 #include <unistd.h>
 
+#include <algorithm>
 #include <cerrno>
 #include <filesystem>
 #include <string>
 
-#include "tests/support/Waiting.h"
+#include "libkpm/linux/src/InstanceName.h"
+#include "libkpm/linux/src/ScsiOutcome.h"
+#include "libkpm/linux/src/Sysfs.h"
+#include "tests/support/ResourceLimit.h"
 #include "tests/unit/linux/FakeKernel.h"
 
 class TraceInstance : public testing::Test {
 protected:
     std::unique_ptr<ZTCTraceInstance> open() {
-        mProblem.clear();
-        return ZTCTraceInstance::open(mKernel.tracefs(), mKernel, mProblem);
+        mProblem = {};
+        return ZTCTraceInstance::open(mPlace, mKernel, mProblem);
     }
 
     /// Expects that it cannot be opened, for this reason, and that nothing is left.
     void expectProblem(const std::string& acrText) {
         EXPECT_EQ(open(), nullptr);
-        EXPECT_NE(mProblem.find(acrText), std::string::npos) << mProblem;
+        EXPECT_NE(mProblem.mText.find(acrText), std::string::npos) << mProblem.mText;
         EXPECT_TRUE(mKernel.instances().empty());
     }
 
@@ -30,13 +34,14 @@ protected:
 
     ZTCLinuxLog mLog;
     ZTCFakeKernel mKernel;
-    std::string mProblem;
+    ZTSTracePlace mPlace{{mKernel.tracefs()}, {}};
+    ZTSFeedProblem mProblem;
 };
 
 TEST_F(TraceInstance, IsMadeUnderANameOfThisProcessAndRemovedWithItsOwner) {
     {
         const auto lpInstance = open();
-        ASSERT_NE(lpInstance, nullptr) << mProblem;
+        ASSERT_NE(lpInstance, nullptr) << mProblem.mText;
         EXPECT_EQ(mKernel.instances(), std::vector<std::string>{makeTraceInstanceName()});
         EXPECT_TRUE(makeTraceInstanceName().starts_with("libkpm-linux-" + std::to_string(::getpid()) + "-"));
         EXPECT_EQ(lpInstance->getBufferCount(), 2u);
@@ -51,26 +56,111 @@ TEST_F(TraceInstance, IsMadeUnderANameOfThisProcessAndRemovedWithItsOwner) {
 
 TEST_F(TraceInstance, RecordsTheHostsItIsToldOfAndNoneWithoutAny) {
     const auto lpInstance = open();
-    ASSERT_NE(lpInstance, nullptr) << mProblem;
-    EXPECT_TRUE(lpInstance->watchHosts({1, 3}, mProblem));
+    ASSERT_NE(lpInstance, nullptr) << mProblem.mText;
+    EXPECT_EQ(lpInstance->watchHosts({1, 3}, mProblem), ZTTF_Set);
     EXPECT_EQ(event("filter"), makeScsiFilter({1, 3}));
     EXPECT_EQ(event("enable"), "1");
-    EXPECT_TRUE(lpInstance->watchHosts({}, mProblem));
+    EXPECT_EQ(lpInstance->watchHosts({}, mProblem), ZTTF_Set);
     EXPECT_EQ(event("enable"), "0");
 }
 
-TEST_F(TraceInstance, AFilterThatTheKernelRefusesLeavesTheEventOff) {
+TEST_F(TraceInstance, AFirstFilterThatTheKernelRefusesLeavesTheEventOff) {
     mKernel.mHasFilter = false;
     const auto lpInstance = open();
-    ASSERT_NE(lpInstance, nullptr) << mProblem;
-    EXPECT_FALSE(lpInstance->watchHosts({1}, mProblem));
-    EXPECT_EQ(mProblem, "the trace event scsi_dispatch_cmd_done cannot be switched on: Is a directory");
+    ASSERT_NE(lpInstance, nullptr) << mProblem.mText;
+    EXPECT_EQ(lpInstance->watchHosts({1}, mProblem), ZTTF_Off);
+    EXPECT_EQ(mProblem.mText, "the trace event scsi_dispatch_cmd_done cannot be switched on: Is a directory");
+    EXPECT_EQ(mProblem.mHappening, ZTFH_Broken);
     EXPECT_EQ(event("enable"), "0");
+}
+
+TEST_F(TraceInstance, AFilterThatFailsLaterKeepsTheOneBefore) {
+    const auto lpInstance = open();
+    ASSERT_EQ(lpInstance->watchHosts({1}, mProblem), ZTTF_Set);
+    mKernel.refuseWrites("filter", "host_no == 9", ENOMEM, 1);
+    EXPECT_EQ(lpInstance->watchHosts({1, 9}, mProblem), ZTTF_Kept);
+    EXPECT_EQ(mProblem.mText,
+              "the filter of the trace event scsi_dispatch_cmd_done cannot be set: Cannot allocate memory");
+    EXPECT_EQ(event("filter"), makeScsiFilter({1}));
+    EXPECT_EQ(event("enable"), "1");
+    EXPECT_EQ(lpInstance->watchHosts({1, 9}, mProblem), ZTTF_Set);
+    EXPECT_EQ(event("filter"), makeScsiFilter({1, 9}));
+}
+
+TEST_F(TraceInstance, WhereTheOldFilterCannotBeSetAgainEitherTheEventIsSwitchedOff) {
+    const auto lpInstance = open();
+    ASSERT_EQ(lpInstance->watchHosts({1}, mProblem), ZTTF_Set);
+    mKernel.refuseWrites("filter", "", EINVAL, 2);
+    EXPECT_EQ(lpInstance->watchHosts({1, 9}, mProblem), ZTTF_Off);
+    EXPECT_EQ(event("enable"), "0");
+}
+
+TEST_F(TraceInstance, ABufferPercentThatTheKernelStoresAsOneDoesNotWakeAtOnce) {
+    mKernel.mStoredPercent = "1\n";
+    EXPECT_FALSE(open()->wakesAtOnce());
+    mKernel.mStoredPercent = "0\n";
+    EXPECT_TRUE(open()->wakesAtOnce());
+    mKernel.mStoredPercent.clear();
+    mKernel.mHasBufferPercent = false;
+    EXPECT_FALSE(open()->wakesAtOnce());
+}
+
+TEST_F(TraceInstance, ItsFilesAreClosedBeforeItIsRemoved) {
+    // The double refuses to remove what is still open, as the kernel does.
+    ASSERT_NE(open(), nullptr);
+    EXPECT_TRUE(mKernel.instances().empty());
+    EXPECT_EQ(mLog.count("stays"), 0u);
+}
+
+TEST_F(TraceInstance, APreparedInstanceIsUsedAndStays) {
+    mPlace.mPrepared = mKernel.tracefs() + "/instances/ours";
+    EXPECT_EQ(open(), nullptr);
+    EXPECT_NE(mProblem.mText.find("cannot be read below " + mPlace.mPrepared), std::string::npos) << mProblem.mText;
+    std::filesystem::create_directory(mPlace.mPrepared);
+    mKernel.fillInstance(mPlace.mPrepared);
+    {
+        const auto lpInstance = open();
+        ASSERT_NE(lpInstance, nullptr) << mProblem.mText;
+        EXPECT_EQ(lpInstance->watchHosts({1}, mProblem), ZTTF_Set);
+        EXPECT_EQ(event("enable"), "1");
+    }
+    EXPECT_EQ(event("enable"), "0");
+    EXPECT_EQ(mKernel.instances(), std::vector<std::string>{"ours"});
+    EXPECT_EQ(mLog.all(), "");
+}
+
+TEST_F(TraceInstance, WithTooFewDescriptorsForAllProcessorsItSaysHowManyItNeeds) {
+    const std::size_t lUsed = listDirectory("/proc/self/fd").value().size() + 2;  // the double opens two of its own
+    {
+        const ZTCResourceLimit lLimit(RLIMIT_NOFILE, lUsed + 2 + gcTraceDescriptorReserve - 1);
+        expectProblem("the trace buffers of 2 possible processors need a descriptor each");
+        expectProblem("raise the limit (LimitNOFILE= of the service) to " +
+                      std::to_string(lUsed + 2 + gcTraceDescriptorReserve) + " or more");
+        EXPECT_EQ(mProblem.mHappening, ZTFH_Broken);
+    }
+    const ZTCResourceLimit lLimit(RLIMIT_NOFILE, lUsed + 2 + gcTraceDescriptorReserve);
+    EXPECT_NE(open(), nullptr) << mProblem.mText;
+}
+
+TEST_F(TraceInstance, TheRightsThatCountAreThoseForOpeningAndNotTheRealUsers) {
+    if (::geteuid() != 0) {
+        GTEST_SKIP() << "needs root, to have another real user";
+    }
+    std::filesystem::permissions(mKernel.tracefs(), std::filesystem::perms::owner_all);
+    ASSERT_EQ(::setresuid(65534, 0, 0), 0);
+    const auto lpInstance = open();
+    ASSERT_EQ(::setresuid(0, 0, 0), 0);
+    EXPECT_NE(lpInstance, nullptr) << mProblem.mText;
+}
+
+TEST_F(TraceInstance, TheFirstRootThatHasInstancesIsUsed) {
+    mPlace.mRoots = {mKernel.tracefs() + "/nowhere", mKernel.tracefs()};
+    EXPECT_NE(open(), nullptr) << mProblem.mText;
 }
 
 TEST_F(TraceInstance, PagesAreReadWithoutWaiting) {
     const auto lpInstance = open();
-    ASSERT_NE(lpInstance, nullptr) << mProblem;
+    ASSERT_NE(lpInstance, nullptr) << mProblem.mText;
     ZTCBytes lPage(4096);
     std::size_t lSize = 0;
     EXPECT_EQ(lpInstance->read(0, lPage, lSize), ZTTR_Empty);
@@ -98,7 +188,7 @@ TEST_F(TraceInstance, ABufferWithNothingInItAndOneOfAProcessorThatIsNotUpAreEmpt
 TEST_F(TraceInstance, LossesAreToldOnceAndACountThatGoesBackBeginsAnew) {
     mKernel.mProcessors = 1;
     const auto lpInstance = open();
-    ASSERT_NE(lpInstance, nullptr) << mProblem;
+    ASSERT_NE(lpInstance, nullptr) << mProblem.mText;
     const std::string lStats = mKernel.instance() + "/per_cpu/cpu0/stats";
     EXPECT_EQ(lpInstance->takeLosses(0), 0u);
     writeFile(lStats, "overrun: 7\ncommit overrun: 1\ndropped events: 2\n");
@@ -119,13 +209,21 @@ TEST_F(TraceInstance, LossesAreToldOnceAndACountThatGoesBackBeginsAnew) {
 TEST_F(TraceInstance, WithoutTracefsTheReasonSaysHowToMountIt) {
     std::filesystem::remove_all(mKernel.tracefs());
     EXPECT_EQ(open(), nullptr);
-    EXPECT_EQ(mProblem, "there is no tracefs at " + mKernel.tracefs() +
-                            ": No such file or directory; mount it with: mount -t tracefs nodev /sys/kernel/tracing");
+    EXPECT_EQ(mProblem.mText,
+              "there is no tracefs at " + mKernel.tracefs() +
+                  ": No such file or directory; mount it with: mount -t tracefs nodev /sys/kernel/tracing");
 }
 
 TEST_F(TraceInstance, WithoutTheRightTheReasonSaysHowToGetIt) {
     mKernel.mMakeError = EACCES;
     expectProblem("cannot be made: Permission denied; run the agent as root, or with CAP_DAC_OVERRIDE");
+    EXPECT_EQ(mProblem.mHappening, ZTFH_NotGranted);
+    mKernel.mMakeError = EROFS;
+    expectProblem("cannot be made: Read-only file system");
+    EXPECT_EQ(mProblem.mHappening, ZTFH_NotGranted);
+    mKernel.mMakeError = ENOMEM;
+    expectProblem("cannot be made: Cannot allocate memory");
+    EXPECT_EQ(mProblem.mHappening, ZTFH_Broken);
 }
 
 TEST_F(TraceInstance, AnUnknownKernelsDescriptionsAreRefusedByName) {
@@ -149,7 +247,7 @@ TEST_F(TraceInstance, TheDescriptionOfPagesMayStandAtTheRoot) {
     mKernel.mHeaderPage = "";
     std::filesystem::create_directories(mKernel.tracefs() + "/events");
     writeFile(mKernel.tracefs() + "/events/header_page", headerPage());
-    EXPECT_NE(open(), nullptr) << mProblem;
+    EXPECT_NE(open(), nullptr) << mProblem.mText;
 }
 
 TEST_F(TraceInstance, WhatKilledRunsHaveLeftIsRemovedAndNothingElse) {
@@ -161,18 +259,10 @@ TEST_F(TraceInstance, WhatKilledRunsHaveLeftIsRemovedAndNothingElse) {
         std::filesystem::create_directories(mKernel.tracefs() + "/instances/" + lrName + "/events");
     }
     const auto lpInstance = open();
-    ASSERT_NE(lpInstance, nullptr) << mProblem;
+    ASSERT_NE(lpInstance, nullptr) << mProblem.mText;
     std::vector<std::string> lLeft = mKernel.instances();
     std::sort(lLeft.begin(), lLeft.end());
     EXPECT_EQ(lLeft,
               (std::vector<std::string>{"libkpm-linux-1", makeTraceInstanceName(), "libkpm-linux-x-1", "someone"}));
     EXPECT_EQ(mLog.count("3 removed the trace instance " + lDead + ", which a killed run has left"), 1u);
-}
-
-TEST_F(TraceInstance, ALivingProcesssInstanceIsNoLeftOver) {
-    EXPECT_FALSE(isTraceInstanceLeftOver(makeTraceInstanceName()));
-    EXPECT_FALSE(isTraceInstanceLeftOver("libkpm-linux-"));
-    EXPECT_FALSE(isTraceInstanceLeftOver("libkpm-linux-1-"));
-    EXPECT_FALSE(isTraceInstanceLeftOver("libkpm-linux--1"));
-    EXPECT_FALSE(isTraceInstanceLeftOver("libkpm-linux-../1-1"));
 }

@@ -1,0 +1,230 @@
+#include "libkpm/linux/src/OutcomeFeed.h"
+
+#include <exception>
+#include <optional>
+#include <utility>
+
+#include "libkpm/common/include/AgentLink.h"
+#include "libkpm/linux/src/KindSources.h"
+#include "libkpm/linux/src/Losses.h"
+#include "libkpm/linux/src/TracePage.h"
+
+// How much of one buffer is read before the other sources, and a stop, have their turn.
+static constexpr unsigned scPagesInARound = 16;
+
+ZTCLinuxOutcomeFeed::ZTCLinuxOutcomeFeed(ZTSTracePlace aPlace, ZTCTraceFiles& arFiles, ZTCLinuxHostWatcher& arWatcher,
+                                         const ZTCLinuxDelivery& acrDelivery, ZTCLosses& arLosses)
+    : mPlace(std::move(aPlace)), mrFiles(arFiles), mrWatcher(arWatcher), mrDelivery(acrDelivery), mrLosses(arLosses) {}
+
+// ---- The state ----
+
+void ZTCLinuxOutcomeFeed::happen(ZTEFeedHappening aHappening, const std::string& acrReason) {
+    const bool lIsFirst = mState.get() == ZTFS_Idle;
+    const ZTSFeedStep lStep = mState.happen(aHappening, acrReason);
+    if (lStep.mAction == ZTFA_Close) {
+        close();
+    }
+    if (lStep.mIsToTell && !(lIsFirst && mState.isOpen())) {
+        tell();
+    }
+    if (lStep.mAction == ZTFA_Open && (aHappening != ZTFH_Look || mPause.isDue())) {
+        open();
+    }
+}
+
+void ZTCLinuxOutcomeFeed::open() {
+    ZTSFeedProblem lProblem;
+    mpTrace = ZTCTraceInstance::open(mPlace, mrFiles, lProblem);
+    if (mpTrace != nullptr && mpTrace->watchHosts(mrWatcher.getHosts(), lProblem) != ZTTF_Set) {
+        mpTrace.reset();
+    }
+    if (mpTrace == nullptr) {
+        happen(lProblem.mHappening, lProblem.mText);
+        return;
+    }
+    mPage.resize(mpTrace->getPageLayout().mPageSize);
+    mBuffers.assign(mpTrace->getBufferCount(), Buffer());
+    mHostsVersion = mrWatcher.getVersion();
+    if (!mpTrace->getRecordLayout().hasSense()) {
+        mSenseProblem = "this kernel's trace has no sense data: check conditions come without them";
+        logLibraryLine(KPM_LOG_NOTICE, mSenseProblem);
+    }
+    mPause.reset();
+    happen(ZTFH_Opened);
+}
+
+void ZTCLinuxOutcomeFeed::close() {
+    mBuffers.clear();
+    mpTrace.reset();
+    mSenseProblem.clear();
+}
+
+void ZTCLinuxOutcomeFeed::tell() const {
+    if (mState.isOpen()) {
+        logLibraryLine(KPM_LOG_NOTICE, "SCSI outcomes are delivered again");
+    } else {
+        logLibraryLine(KPM_LOG_WARNING, "no SCSI outcomes: " + mState.getReason());
+    }
+}
+
+void ZTCLinuxOutcomeFeed::noteHosts() {
+    happen(ZTFH_HostFound);
+    if (mpTrace != nullptr && mHostsVersion != mrWatcher.getVersion()) {
+        followHosts();
+    }
+}
+
+/// Has the filter name the hosts there are. Tried again with the next look where the kernel refuses.
+void ZTCLinuxOutcomeFeed::followHosts() {
+    ZTSFeedProblem lProblem;
+    switch (mpTrace->watchHosts(mrWatcher.getHosts(), lProblem)) {
+        case ZTTF_Set:
+            if (!std::exchange(mFilterProblem, std::string()).empty()) {
+                logLibraryLine(KPM_LOG_NOTICE, "SCSI outcomes of all FC hosts are delivered again");
+            }
+            mHostsVersion = mrWatcher.getVersion();
+            return;
+        case ZTTF_Kept:
+            mHostsVersion = 0;
+            if (lProblem.mText != mFilterProblem) {
+                mFilterProblem = lProblem.mText;
+                logLibraryLine(KPM_LOG_WARNING, "no SCSI outcomes of FC hosts that have come since: " + mFilterProblem);
+            }
+            return;
+        case ZTTF_Off:
+            happen(lProblem.mHappening, lProblem.mText);
+            return;
+    }
+}
+
+// ---- Reading ----
+
+int ZTCLinuxOutcomeFeed::getDescriptor(std::size_t aBuffer) const {
+    return mBuffers[aBuffer].mState == ZTBS_Resting ? -1 : mpTrace->getDescriptor(aBuffer);
+}
+
+void ZTCLinuxOutcomeFeed::serve() {
+    for (std::size_t lBuffer = 0; lBuffer < mBuffers.size(); ++lBuffer) {
+        if (mBuffers[lBuffer].mState == ZTBS_Ready) {
+            readBuffer(lBuffer);
+        }
+    }
+}
+
+void ZTCLinuxOutcomeFeed::look() {
+    happen(ZTFH_Look);
+    noteHosts();
+    for (std::size_t lBuffer = 0; lBuffer < mBuffers.size(); ++lBuffer) {
+        readBuffer(lBuffer);
+        // A buffer that has nothing may be waited for again: what it was left alone for may be over.
+        mBuffers[lBuffer].mState = ZTBS_Waiting;
+    }
+    readLosses();
+}
+
+void ZTCLinuxOutcomeFeed::stop() {
+    if (mpTrace != nullptr) {
+        mpTrace->switchOff();
+        for (std::size_t lBuffer = 0; lBuffer < mBuffers.size(); ++lBuffer) {
+            do {
+                readBuffer(lBuffer);
+            } while (mBuffers[lBuffer].mState == ZTBS_Ready);
+        }
+        readLosses();
+    }
+    happen(ZTFH_Stop);
+}
+
+/// Leaves the buffer Ready where the limit was reached, Resting where nothing was there.
+void ZTCLinuxOutcomeFeed::readBuffer(std::size_t aBuffer) {
+    Buffer& lrBuffer = mBuffers[aBuffer];
+    for (unsigned lPages = 0; lPages < scPagesInARound; ++lPages) {
+        std::size_t lSize = 0;
+        const ZTETraceRead lRead = mpTrace->read(aBuffer, mPage, lSize);
+        if (lRead != ZTTR_Page) {
+            if (lRead == ZTTR_Failed) {
+                mrLosses.count(ZTLO_Failure);
+            }
+            // Readable with nothing to read: it would wake the thread again at once.
+            lrBuffer.mState = lRead == ZTTR_Failed || lPages == 0 ? ZTBS_Resting : ZTBS_Waiting;
+            return;
+        }
+        lrBuffer.mHasRecords = true;
+        if (readPage(ZTCByteSpan(mPage).first(lSize))) {
+            lrBuffer.mHasLoss = true;
+        }
+    }
+    lrBuffer.mState = ZTBS_Ready;
+}
+
+/// Whether the page says that records before it are lost.
+bool ZTCLinuxOutcomeFeed::readPage(ZTCByteSpan aPage) {
+    ZTCTracePage lPage(aPage, mpTrace->getPageLayout());
+    while (const std::optional<ZTCByteSpan> lRecord = lPage.next()) {
+        try {
+            readRecord(*lRecord);
+        } catch (const std::exception&) {
+            // Memory has run out over one outcome: the others of the page may fare better.
+            mrLosses.count(ZTLO_Failure);
+        }
+    }
+    if (lPage.isMalformed()) {
+        mrLosses.count(ZTLO_MalformedRecord);
+    }
+    return lPage.hasLossBefore();
+}
+
+void ZTCLinuxOutcomeFeed::readRecord(ZTCByteSpan aRecord) {
+    const ZTSScsiDoneLayout& lrLayout = mpTrace->getRecordLayout();
+    const std::optional<std::uint32_t> lId = getTraceRecordId(aRecord, lrLayout);
+    if (lId && *lId != lrLayout.mId) {
+        return;
+    }
+    const std::optional<ZTSScsiOutcome> lOutcome = lId ? parseScsiOutcome(aRecord, lrLayout) : std::nullopt;
+    if (lOutcome) {
+        handle(*lOutcome);
+    } else {
+        mrLosses.count(ZTLO_MalformedRecord);
+    }
+}
+
+/// A buffer that nothing came from has lost nothing either: the newest records are kept.
+void ZTCLinuxOutcomeFeed::readLosses() {
+    for (std::size_t lBuffer = 0; lBuffer < mBuffers.size(); ++lBuffer) {
+        Buffer& lrBuffer = mBuffers[lBuffer];
+        if (lrBuffer.mHasRecords) {
+            mrLosses.count(ZTLO_TraceOverrun, mpTrace->takeLosses(lBuffer).value_or(lrBuffer.mHasLoss ? 1 : 0));
+            lrBuffer.mHasRecords = false;
+            lrBuffer.mHasLoss = false;
+        }
+    }
+}
+
+// ---- Delivery ----
+
+void ZTCLinuxOutcomeFeed::handle(const ZTSScsiOutcome& acrOutcome) {
+    const std::optional<std::uint32_t> lBoard = mrWatcher.findKnownBoard(acrOutcome.mHost);
+    const bool lIsEvent = acrOutcome.mStatus == ZTLSS_CheckCondition || acrOutcome.mStatus == ZTLSS_Busy ||
+                          acrOutcome.mStatus == ZTLSS_TaskSetFull;
+    if (!lBoard || !lIsEvent) {
+        return;
+    }
+    const HBA_wwn lPort = mrWatcher.findRemotePort(acrOutcome.mHost, acrOutcome.mChannel, acrOutcome.mTarget);
+    const HBA_wwn& lrLocal = mrWatcher.getBoard(*lBoard).mPortName;
+    if (acrOutcome.mStatus == ZTLSS_CheckCondition) {
+        zt_scsi_checkcondition_v0 lData{};
+        lData.zt_checkcondition_rport = lPort;
+        lData.zt_checkcondition_lun = acrOutcome.mLun;
+        lData.zt_checkcondition_cmdcode = acrOutcome.mOpcode;
+        lData.zt_checkcondition_senskey = acrOutcome.mSenseKey;
+        lData.zt_checkcondition_asc = acrOutcome.mAsc;
+        lData.zt_checkcondition_ascq = acrOutcome.mAscq;
+        mrDelivery.deliverScope(*lBoard, lrLocal, gcLinuxCheckCondition, &lData, sizeof lData);
+        return;
+    }
+    ZT_scsi_generic_v0 lData{};
+    lData.zt_scsi_generic_rport = lPort;
+    lData.zt_scsi_generic_lun = acrOutcome.mLun;
+    const bool lIsFull = acrOutcome.mStatus == ZTLSS_TaskSetFull;
+    mrDelivery.deliverScope(*lBoard, lrLocal, lIsFull ? gcLinuxQueueFull : gcLinuxDeviceBusy, &lData, sizeof lData);
+}

@@ -1,0 +1,95 @@
+/// Outcomes of SCSI commands: opens the trace instance, keeps its filter at the hosts there are, reads its buffers, and
+/// delivers queue full, device busy and check condition. Opened, lost, retried and told by itself.
+///
+/// Used by the library's thread alone (and by start(), before there is one), save for getState().get().
+#ifndef LIBKPM_LINUX_SRC_OUTCOMEFEED_H
+#define LIBKPM_LINUX_SRC_OUTCOMEFEED_H
+
+#include <cstddef>
+#include <cstdint>
+#include <memory>
+#include <string>
+#include <vector>
+
+#include "libkpm/common/include/Losses.h"
+#include "libkpm/linux/src/Delivery.h"
+#include "libkpm/linux/src/FeedState.h"
+#include "libkpm/linux/src/HostWatcher.h"
+#include "libkpm/linux/src/ScsiOutcome.h"
+#include "libkpm/linux/src/TraceInstance.h"
+
+class ZTCLinuxOutcomeFeed {
+public:
+    /// All but the place outlive the feed.
+    ZTCLinuxOutcomeFeed(ZTSTracePlace aPlace, ZTCTraceFiles& arFiles, ZTCLinuxHostWatcher& arWatcher,
+                        const ZTCLinuxDelivery& acrDelivery, ZTCLosses& arLosses);
+
+    /// The hosts may have changed: the instance is opened, if it was not tried before, and its filter follows them.
+    void noteHosts();
+
+    std::size_t getBufferCount() const { return mBuffers.size(); }
+
+    /// The descriptor to wait for; -1 where the buffer is not to be waited for.
+    int getDescriptor(std::size_t aBuffer) const;
+
+    /// The buffer's descriptor is readable.
+    void markReady(std::size_t aBuffer) { mBuffers[aBuffer].mState = ZTBS_Ready; }
+
+    /// Reads the buffers that are marked, each up to a limit, so that the other sources have their turn.
+    void serve();
+
+    /// A regular look, after the watcher's: every buffer is read, whether it was said to be readable or not, and asked
+    /// for its losses.
+    void look();
+
+    /// The library is closing: recording ends, and what is left in the buffers is delivered.
+    void stop();
+
+    const ZTCFeedState& getState() const { return mState; }
+
+    /// Why check conditions come without sense data; empty where they have them, or nothing is open.
+    const std::string& getSenseProblem() const { return mSenseProblem; }
+
+private:
+    enum ZTEBufferState : std::uint8_t {
+        ZTBS_Waiting,
+        ZTBS_Ready,   ///< to be read
+        ZTBS_Resting  ///< was said to be readable and was not: left alone until the next look
+    };
+
+    struct Buffer {
+        ZTEBufferState mState = ZTBS_Waiting;
+        bool mHasRecords = false;  ///< was read from since its losses were looked at
+        bool mHasLoss = false;     ///< a page said so since then
+    };
+
+    void happen(ZTEFeedHappening aHappening, const std::string& acrReason = std::string());
+    void open();
+    void close();
+    void tell() const;
+    void followHosts();
+    void readBuffer(std::size_t aBuffer);
+    bool readPage(ZTCByteSpan aPage);
+    void readRecord(ZTCByteSpan aRecord);
+    void readLosses();
+    void handle(const ZTSScsiOutcome& acrOutcome);
+
+    // Constant after construction.
+    const ZTSTracePlace mPlace;
+    ZTCTraceFiles& mrFiles;
+    ZTCLinuxHostWatcher& mrWatcher;
+    const ZTCLinuxDelivery& mrDelivery;
+    ZTCLosses& mrLosses;
+
+    // Used by the library's thread alone.
+    ZTCFeedState mState;
+    ZTCRetryPause mPause;
+    std::unique_ptr<ZTCTraceInstance> mpTrace;  // set while the state is Working
+    std::vector<Buffer> mBuffers;
+    std::uint64_t mHostsVersion = 0;  // of the hosts that the filter names; 0: to be set
+    std::string mFilterProblem;       // as it was told last
+    std::string mSenseProblem;
+    std::vector<std::uint8_t> mPage;
+};
+
+#endif
