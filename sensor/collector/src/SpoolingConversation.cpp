@@ -70,7 +70,8 @@ ZTESending ZTCSpoolingConversation::request(ZTERequest aRequest, std::span<const
     }
     const std::uint64_t lReserve = aRequest == ZTRQ_Get || aRequest == ZTRQ_Marker ? gcResponseReserve : gcShortReserve;
     if (!mPart) {
-        mPart = mrSpool.createPart(mrSpool.takeNumber(), mGeneration, lReserve);
+        mPart = mrSpool.createPart(mNextNumber, mGeneration, lReserve);
+        ++mNextNumber;
     } else {
         mrSpool.reserve(*mPart, lReserve);
     }
@@ -166,7 +167,8 @@ static bool sHasBytes(int aFifo) {
 /// Makes the next `.part` where one is needed. False: none is, since nothing comes.
 bool ZTCSpoolingConversation::preparePart(bool aIsExpecting) {
     if (!mPart && (aIsExpecting || sHasBytes(mResponseFifo.get()))) {
-        mPart = mrSpool.createPart(mrSpool.takeNumber(), mGeneration, gcResponseReserve);
+        mPart = mrSpool.createPart(mNextNumber, mGeneration, gcResponseReserve);
+        ++mNextNumber;
     }
     return mPart.has_value();
 }

@@ -17,13 +17,13 @@ public:
 };
 
 struct ZTSFilterTexts {
-    std::string mSince;  ///< empty: not given
-    std::string mUntil;
-    std::vector<std::string> mKinds;
-    std::vector<std::string> mPorts;
-    std::vector<std::string> mInitiators;
-    std::vector<std::string> mLuns;
-    std::string mLimit;
+    std::string mSince{};  ///< empty: not given
+    std::string mUntil{};
+    std::vector<std::string> mKinds{};
+    std::vector<std::string> mPorts{};
+    std::vector<std::string> mInitiators{};
+    std::vector<std::string> mLuns{};
+    std::string mLimit{};
     bool mIsOpenOnly = false;
 };
 

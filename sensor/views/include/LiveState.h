@@ -119,6 +119,9 @@ struct ZTSLiveKinds {
     ZTSInitiator mInitiator;
     std::map<std::string, std::string> mStates;  ///< kind's name to the name of its state
     std::map<std::string, std::string> mWords;   ///< kind's name to the library's words
+
+    /// The kinds and their states, in the order of the table of kinds; what is not in it comes behind.
+    std::vector<std::pair<std::string, std::string>> getOrdered() const;
 };
 
 struct ZTSLiveLedgerRow {

@@ -4,6 +4,8 @@
 #include <charconv>
 
 #include "libkpm/include/ScopeEventKinds.h"
+#include "sensor/client/include/ClientErrors.h"
+#include "sensor/settings/include/Quantities.h"
 #include "sensor/views/include/TextTable.h"
 #include "sensor/views/include/TimeText.h"
 
@@ -18,18 +20,12 @@ static std::optional<std::uint64_t> sParseNumber(const std::string& acrText, std
     return lError == std::errc() && lpStop == lpEnd && lNumber <= aMost ? std::optional(lNumber) : std::nullopt;
 }
 
-/// "90s", "10m", "24h", "30d", or a number of seconds.
 static std::optional<std::chrono::microseconds> sParseSpan(const std::string& acrText) {
-    static constexpr std::uint64_t scMost = 100ULL * 365 * 86400;
-    static constexpr std::string_view scUnits = "smhd";
-    static constexpr std::array<std::uint64_t, 4> scSeconds{1, 60, 3600, 86400};
-    const std::size_t lUnit = acrText.empty() ? std::string_view::npos : scUnits.find(acrText.back());
-    const bool lHasUnit = lUnit != std::string_view::npos;
-    const auto lNumber = sParseNumber(lHasUnit ? acrText.substr(0, acrText.size() - 1) : acrText, scMost);
-    if (!lNumber || *lNumber > scMost / (lHasUnit ? scSeconds.at(lUnit) : 1)) {
+    try {
+        return durationFromText(acrText);
+    } catch (const ZTCBadInputEx&) {
         return std::nullopt;
     }
-    return std::chrono::seconds(*lNumber * (lHasUnit ? scSeconds.at(lUnit) : 1));
 }
 
 bool isTimeOrDuration(const std::string& acrText) {

@@ -61,8 +61,11 @@ std::vector<ZTSKindText> parseKindTexts(std::string_view aPage) {
         }
         while (!lSection.empty()) {
             std::string_view lParagraph = sCutOff(lSection, "\n\n");
-            while (lParagraph.starts_with("\n")) {
+            while (lParagraph.starts_with('\n')) {
                 lParagraph.remove_prefix(1);
+            }
+            while (lParagraph.ends_with('\n')) {
+                lParagraph.remove_suffix(1);
             }
             sReadParagraph(lParagraph, lText);
         }

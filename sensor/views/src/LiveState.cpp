@@ -3,6 +3,7 @@
 #include <array>
 #include <nlohmann/json.hpp>
 
+#include "libkpm/include/ScopeEventKinds.h"
 #include "sensor/views/include/NameBook.h"
 #include "sensor/views/include/TimeText.h"
 
@@ -18,6 +19,22 @@ const char* getKeeperStateName(ZTEKeeperState aState) {
 
 const char* getDiskStateName(ZTEDiskState aState) {
     return scDiskStates.at(aState);
+}
+
+std::vector<std::pair<std::string, std::string>> ZTSLiveKinds::getOrdered() const {
+    std::vector<std::pair<std::string, std::string>> lOrdered;
+    for (const ZTSScopeEventKind& lrKind : gcScopeEventKinds) {
+        const auto lFound = mStates.find(lrKind.mpName);
+        if (lFound != mStates.end()) {
+            lOrdered.emplace_back(*lFound);
+        }
+    }
+    for (const auto& lrPair : mStates) {
+        if (!findKind(lrPair.first)) {
+            lOrdered.emplace_back(lrPair);
+        }
+    }
+    return lOrdered;
 }
 
 /// One object of the document. What is missing, null or of a wrong type leaves its place as it is; the latter is noted.
@@ -38,8 +55,8 @@ public:
         }
     }
     void read(const char* apKey, std::optional<std::uint64_t>& arPlace) const {
-        if (const ZTCJson* lpValue = find(apKey, &ZTCJson::is_number_unsigned, "a whole number")) {
-            arPlace = lpValue->get<std::uint64_t>();
+        if (const ZTCJson* lpValue = find(apKey, &ZTCJson::is_number_integer, "a whole number")) {
+            readNumber(mPath + apKey, *lpValue, arPlace);
         }
     }
     void read(const char* apKey, std::optional<bool>& arPlace) const {
@@ -88,10 +105,12 @@ public:
     }
     void read(const char* apKey, std::map<std::string, std::uint64_t>& arPlace) const {
         eachMember(apKey, [&](const std::string& acrKey, const ZTCJson& acrValue) {
-            if (acrValue.is_number_unsigned()) {
-                arPlace[acrKey] = acrValue.get<std::uint64_t>();
-            } else if (!acrValue.is_null()) {
-                complain(mPath + apKey + "." + acrKey, "a whole number");
+            std::optional<std::uint64_t> lNumber;
+            if (!acrValue.is_null()) {
+                readNumber(mPath + apKey + "." + acrKey, acrValue, lNumber);
+            }
+            if (lNumber) {
+                arPlace[acrKey] = *lNumber;
             }
         });
     }
@@ -124,6 +143,16 @@ public:
     }
 
 private:
+    /// Numbers are never negative.
+    void readNumber(const std::string& acrWhere, const ZTCJson& acrValue, std::optional<std::uint64_t>& arPlace) const {
+        const bool lIsGood =
+            acrValue.is_number_unsigned() || (acrValue.is_number_integer() && acrValue.get<std::int64_t>() >= 0);
+        if (lIsGood) {
+            arPlace = acrValue.get<std::uint64_t>();
+        } else {
+            complain(acrWhere, "a whole number");
+        }
+    }
     const ZTCJson* find(const char* apKey, bool (ZTCJson::*apIsRight)() const, const char* apWanted) const {
         if (mpJson == nullptr) {
             return nullptr;

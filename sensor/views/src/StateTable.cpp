@@ -185,7 +185,7 @@ static std::vector<ZTSKindGroup> sGroupKinds(const ZTSStatusFacts& acrFacts, boo
                                              bool (*apIsWanted)(std::string_view)) {
     std::vector<ZTSKindGroup> lGroups;
     for (const ZTSLiveKinds& lrKinds : *acrFacts.mLive->mKinds) {
-        for (const auto& [lKind, lState] : lrKinds.mStates) {
+        for (const auto& [lKind, lState] : lrKinds.getOrdered()) {
             if (!apIsWanted(lState)) {
                 continue;
             }

@@ -112,8 +112,12 @@ static ZTCJson sKinds(const std::optional<std::vector<ZTSLiveKinds>>& acrKinds) 
     }
     ZTCJson lKinds = ZTCJson::array();
     for (const ZTSLiveKinds& lrKinds : *acrKinds) {
+        ZTCJson lStates = ZTCJson::object();
+        for (const auto& [lKind, lState] : lrKinds.getOrdered()) {
+            lStates[lKind] = lState;
+        }
         lKinds.push_back({{"initiator", toJson(lrKinds.mInitiator)},
-                          {"kinds", ZTCJson(lrKinds.mStates)},
+                          {"kinds", std::move(lStates)},
                           {"words", ZTCJson(lrKinds.mWords)}});
     }
     return lKinds;

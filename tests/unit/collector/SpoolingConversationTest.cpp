@@ -57,7 +57,7 @@ protected:
                 lPart = lrEntry.mName;
             }
         }
-        mSpool.raiseNumber(lNext);
+        mTalk->setNextNumber(lNext);
         mTalk->attach(openResponseFifo(), "ab", lPart);
     }
     void send(ZTERequest aRequest, const ZTCWireBytes& acrBody) {

@@ -1,0 +1,125 @@
+#include <fcntl.h>
+#include <signal.h>
+#include <unistd.h>
+
+#include <CLI/CLI.hpp>
+#include <cerrno>
+#include <functional>
+#include <system_error>
+
+#include "sensor/store/include/StoreErrors.h"
+#include "sensor/tavik/src/Tavik.h"
+
+/// Descriptors 0 to 2 belong to the standard streams even where the parent has closed them: nothing else may get them.
+static void sReserveStandardStreams() {
+    const bool lHasOutput = fcntl(STDOUT_FILENO, F_GETFD) >= 0;
+    int lDescriptor;
+    do {
+        lDescriptor = open("/dev/null", O_RDWR | O_CLOEXEC);
+    } while (lDescriptor >= 0 && lDescriptor <= STDERR_FILENO);
+    if (lDescriptor >= 0) {
+        close(lDescriptor);
+    }
+    if (!lHasOutput) {
+        throw std::system_error(EBADF, std::generic_category(), "cannot write standard output");
+    }
+}
+
+/// A reader that goes away ends this process without a word, whatever the parent has made of the signal.
+static void sEndWithReader() {
+    signal(SIGPIPE, SIG_DFL);
+    sigset_t lPipe;
+    sigemptyset(&lPipe);
+    sigaddset(&lPipe, SIGPIPE);
+    sigprocmask(SIG_UNBLOCK, &lPipe, nullptr);
+}
+
+static void sAddFilter(CLI::App& arCommand, ZTSFilterTexts& arFilter) {
+    arCommand.add_option("--since", arFilter.mSince, "From a time, a duration back from now, or a mark's name on");
+    arCommand.add_option("--until", arFilter.mUntil, "Up to a time, a duration back from now, or a mark's name");
+    arCommand.add_option("--kind", arFilter.mKinds, "Of this kind; may be repeated")->expected(1)->take_all();
+    arCommand.add_option("--port", arFilter.mPorts, "Of this remote port: WWPN or name; may be repeated")
+        ->expected(1)
+        ->take_all();
+    arCommand
+        .add_option("--initiator", arFilter.mInitiators, "Of this adapter port: WWPN, name or hostN; may be repeated")
+        ->expected(1)
+        ->take_all();
+}
+
+/// Parses the line and runs its command.
+static int sRun(int aCount, const char* const* appArguments) {
+    ZTSTavikOptions lOptions;
+    std::function<int(const ZTSTavikOptions&)> lCommand = runStatus;
+    CLI::App lApp{"Shows what Tavik has collected from this host's Fibre Channel adapters, and how Tavik itself is.",
+                  "tavik"};
+    lApp.require_subcommand(0, 1);
+    lApp.fallthrough();
+    lApp.set_version_flag("--version", "tavik v" TAVIK_VERSION);
+    lApp.add_option("--config", lOptions.mConfig, "Configuration; default: $TAVIK_CONFIG, else /etc/tavik/tavik.toml");
+    lApp.add_flag("--json", lOptions.mIsJson, "Print JSON instead of text");
+    lApp.footer(
+        "Without a command: status. Exit status of status: 0 collecting, 1 collecting but deaf for a kind or with\n"
+        "losses in the last 24 hours, 3 not collecting. Of the others: 0 done. Of all: 2 wrong use, 3 what was asked\n"
+        "for cannot be learned now, 4 standard output cannot be written.");
+
+    const auto lAdd = [&](const char* apName, const char* apText, int (*apRun)(const ZTSTavikOptions&)) {
+        CLI::App* const lpCommand = lApp.add_subcommand(apName, apText);
+        lpCommand->callback([&lCommand, apRun] { lCommand = apRun; });
+        return lpCommand;
+    };
+    lAdd("status", "Say whether Tavik collects, and what to do if it does not", runStatus)
+        ->add_flag("--watch", lOptions.mIsWatch, "A live screen; q quits");
+    CLI::App* const lpEvents = lAdd("events", "List episodes of like events, the newest last", runEvents);
+    sAddFilter(*lpEvents, lOptions.mFilter);
+    lpEvents->add_option("--lun", lOptions.mFilter.mLuns, "With this LUN, or all; may be repeated")
+        ->expected(1)
+        ->take_all();
+    lpEvents->add_option("--limit", lOptions.mFilter.mLimit, "The newest so many; 0: all; default: 100, JSON: all");
+    lpEvents->add_flag("--open", lOptions.mFilter.mIsOpenOnly, "Only those that have not ended");
+    lpEvents->add_flag("--records", lOptions.mIsRecords, "The raw records that are kept of them");
+    lpEvents->add_flag("--follow", lOptions.mIsFollow, "Then print what comes, until interrupted");
+    sAddFilter(*lAdd("ports", "List remote ports by how many events they had", runPorts), lOptions.mFilter);
+    lAdd("explain", "Say what a kind, a state or an episode means, and what to look at", runExplain)
+        ->add_option("WHAT", lOptions.mSubject, "A kind, a state, or an episode's number; without: a list");
+    lAdd("mark", "Give this moment a name, for --since and --until", runMark)
+        ->add_option("NAME", lOptions.mMark, "The name; an earlier mark of that name moves")
+        ->required();
+
+    try {
+        lApp.parse(aCount, appArguments);
+    } catch (const CLI::CallForVersion& lrVersion) {
+        writeOutput(std::string(lrVersion.what()) + "\n");
+        return ZTTX_Done;
+    } catch (const CLI::Success&) {
+        CLI::App* const lpAsked = lApp.get_subcommands().empty() ? &lApp : lApp.get_subcommands().front();
+        writeOutput(lpAsked->help(lpAsked == &lApp ? "" : lApp.get_name()));
+        return ZTTX_Done;
+    } catch (const CLI::ParseError& lrError) {
+        throw ZTCWrongUseEx(std::string(lrError.what()) + "; see tavik --help");
+    }
+    return lCommand(lOptions);
+}
+
+int main(int aCount, char** appArguments) {
+    try {
+        sReserveStandardStreams();
+        sEndWithReader();
+        return sRun(aCount, appArguments);
+    } catch (const ZTCWrongUseEx& lrEx) {
+        complain(lrEx.what());
+        return ZTTX_WrongUse;
+    } catch (const ZTCBadFilterEx& lrEx) {
+        complain(lrEx.what());
+        return ZTTX_WrongUse;
+    } catch (const ZTCNotKnownEx& lrEx) {
+        complain(lrEx.what());
+        return ZTTX_NotKnown;
+    } catch (const ZTCStoreEx& lrEx) {
+        complain(lrEx.what());
+        return ZTTX_NotKnown;
+    } catch (const std::exception& lrEx) {
+        complain(lrEx.what());
+        return ZTTX_LocalFailure;
+    }
+}

@@ -1,0 +1,47 @@
+/// `tavik explain`: what a kind, a state or an episode means, what is known of it, and what to look at next.
+#ifndef SENSOR_VIEWS_INCLUDE_EXPLANATION_H
+#define SENSOR_VIEWS_INCLUDE_EXPLANATION_H
+
+#include <cstdint>
+#include <nlohmann/json_fwd.hpp>
+#include <optional>
+#include <string>
+#include <string_view>
+#include <vector>
+
+#include "sensor/store/include/History.h"
+#include "sensor/views/include/NameBook.h"
+#include "sensor/views/include/StatusView.h"
+
+/// A paragraph with what it is about: "means", "usual causes", "look at", "facts", "evidence".
+struct ZTSExplainedPart {
+    std::string mLabel;
+    std::vector<std::string> mTexts;
+};
+
+struct ZTSExplanation {
+    std::string mSubject;  ///< "kind", "state", "episode" or "topics"
+    std::string mId;       ///< "queue-full", "deaf", "118"
+    std::string mTitle;
+    std::vector<ZTSExplainedPart> mParts;
+    std::vector<std::uint64_t> mEvidence;  ///< sequence numbers of records
+    std::optional<ZTSEpisode> mEpisode;
+};
+
+/// A kind or a state by its name; nothing where the text is neither.
+std::optional<ZTSExplanation> explainTopic(std::string_view aText);
+
+/// Everything that can be explained, a line each.
+ZTSExplanation explainTopics();
+
+/// @param aEvidence  sequence numbers of the episode's records that are kept
+ZTSExplanation explainEpisode(const ZTSEpisode& acrEpisode, std::vector<std::uint64_t> aEvidence,
+                              const ZTCNameBook& acrNames, ZTCHistoryTime aNow);
+
+std::string formatExplanation(const ZTSExplanation& acrExplanation, const ZTSTextStyle& acrStyle);
+
+/// The document `tavik.explain/1`.
+nlohmann::ordered_json makeExplainDocument(const ZTSExplanation& acrExplanation, const std::string& acrHost,
+                                           const std::string& acrStoreId, const ZTCNameBook& acrNames);
+
+#endif
