@@ -21,8 +21,9 @@ ZTCLinuxEngine::ZTCLinuxEngine(ZTSLinuxOptions aOptions, ZTCLinuxSources& arSour
       mDelivery(getRegistry()),
       mLosses(gcLinuxLosses),
       mWatcher(mSysfs, mDelivery, mLosses),
+      mDepths(mSysfs, mWatcher, mDelivery),
       mMessages(arSources, mWatcher, mDelivery, mLosses, mOptions.mPollInterval),
-      mOutcomes(mOptions.mTracePlace, arSources, mWatcher, mDelivery, mLosses) {
+      mOutcomes(mOptions.mTracePlace, arSources, mWatcher, mDepths, mDelivery, mLosses) {
     if (!mWake.isOpen()) {
         throw std::system_error(errno, std::generic_category(), "eventfd");
     }
@@ -37,6 +38,8 @@ ZTCLinuxEngine::~ZTCLinuxEngine() {
 void ZTCLinuxEngine::start() {
     mWatcher.look();
     noteHosts();
+    mDepths.look(Clock::now());
+    mDepths.serve(Clock::now());
     report();
     tellMissing();
     mNextLook = Clock::now() + mOptions.mPollInterval;
@@ -98,6 +101,7 @@ void ZTCLinuxEngine::runRound() {
     if (mHostsVersion != mWatcher.getVersion()) {
         noteHosts();
     }
+    mDepths.serve(Clock::now());
     report();
 }
 
@@ -123,7 +127,8 @@ void ZTCLinuxEngine::waitForWork() {
     for (std::size_t lBuffer = 0; lBuffer < mOutcomes.getBufferCount(); ++lBuffer) {
         mPolls[scFirstBuffer + lBuffer] = {mOutcomes.getDescriptor(lBuffer), POLLIN, 0};
     }
-    const auto lLeft = std::chrono::duration_cast<std::chrono::milliseconds>(mNextLook - Clock::now()).count() + 1;
+    const Clock::time_point lNext = std::min(mNextLook, mDepths.getNextTime().value_or(mNextLook));
+    const auto lLeft = std::chrono::duration_cast<std::chrono::milliseconds>(lNext - Clock::now()).count() + 1;
     const auto lTimeout = static_cast<int>(std::clamp<long long>(lLeft, 0, mOptions.mPollInterval.count() + 1));
     if (::poll(mPolls.data(), mPolls.size(), lTimeout) < 0 && errno != EINTR) {
         // Memory is short, or fewer descriptors are allowed than are open: until the next look, only a stop is waited
@@ -151,6 +156,7 @@ void ZTCLinuxEngine::look() {
     noteHosts();
     mMessages.look();
     mOutcomes.look();
+    mDepths.look(Clock::now());
 }
 
 /// The sources are opened with the first board: a machine without FC hosts is left alone.

@@ -25,6 +25,7 @@
 #include "libkpm/linux/src/KindSources.h"
 #include "libkpm/linux/src/MessageFeed.h"
 #include "libkpm/linux/src/OutcomeFeed.h"
+#include "libkpm/linux/src/QueueDepths.h"
 #include "libkpm/linux/src/SourceReports.h"
 #include "libkpm/linux/src/Sources.h"
 #include "libkpm/linux/src/Sysfs.h"
@@ -90,6 +91,7 @@ private:
     // Used by start() before the thread is there, and by the thread; some of their operations by any thread.
     ZTCLosses mLosses;
     ZTCLinuxHostWatcher mWatcher;
+    ZTCLinuxQueueDepths mDepths;
     ZTCLinuxMessageFeed mMessages;
     ZTCLinuxOutcomeFeed mOutcomes;
 

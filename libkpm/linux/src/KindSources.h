@@ -12,7 +12,7 @@
 
 enum ZTELinuxSource : std::uint8_t {
     ZTLSO_None,      ///< the kernel has no generic source
-    ZTLSO_Hosts,     ///< the hosts in sysfs
+    ZTLSO_Hosts,     ///< the hosts, and what is behind them, in sysfs
     ZTLSO_Messages,  ///< FC events of the netlink family
     ZTLSO_Trace      ///< trace events of finished SCSI commands
 };
@@ -24,10 +24,11 @@ struct ZTSLinuxKindSource {
     ZTELinuxSource mSource;
 };
 
-inline constexpr std::array<ZTSLinuxKindSource, 6> gcLinuxKindSources{{{"rscn", ZTLSO_Messages},
+inline constexpr std::array<ZTSLinuxKindSource, 7> gcLinuxKindSources{{{"rscn", ZTLSO_Messages},
                                                                        {"queue-full", ZTLSO_Trace},
                                                                        {"device-busy", ZTLSO_Trace},
                                                                        {"check-condition", ZTLSO_Trace},
+                                                                       {"queue-depth", ZTLSO_Hosts},
                                                                        {"link", ZTLSO_Hosts},
                                                                        {"adapter-arrival", ZTLSO_Hosts}}};
 
@@ -53,6 +54,7 @@ inline constexpr std::size_t gcLinuxRscn = getLinuxKind("rscn");
 inline constexpr std::size_t gcLinuxQueueFull = getLinuxKind("queue-full");
 inline constexpr std::size_t gcLinuxDeviceBusy = getLinuxKind("device-busy");
 inline constexpr std::size_t gcLinuxCheckCondition = getLinuxKind("check-condition");
+inline constexpr std::size_t gcLinuxQueueDepth = getLinuxKind("queue-depth");
 inline constexpr std::size_t gcLinuxLink = getLinuxKind("link");
 inline constexpr std::size_t gcLinuxAdapterArrival = getLinuxKind("adapter-arrival");
 

@@ -13,8 +13,14 @@
 static constexpr unsigned scPagesInARound = 16;
 
 ZTCLinuxOutcomeFeed::ZTCLinuxOutcomeFeed(ZTSTracePlace aPlace, ZTCTraceFiles& arFiles, ZTCLinuxHostWatcher& arWatcher,
-                                         const ZTCLinuxDelivery& acrDelivery, ZTCLosses& arLosses)
-    : mPlace(std::move(aPlace)), mrFiles(arFiles), mrWatcher(arWatcher), mrDelivery(acrDelivery), mrLosses(arLosses) {}
+                                         ZTCLinuxQueueDepths& arDepths, const ZTCLinuxDelivery& acrDelivery,
+                                         ZTCLosses& arLosses)
+    : mPlace(std::move(aPlace)),
+      mrFiles(arFiles),
+      mrWatcher(arWatcher),
+      mrDepths(arDepths),
+      mrDelivery(acrDelivery),
+      mrLosses(arLosses) {}
 
 // ---- The state ----
 
@@ -226,5 +232,9 @@ void ZTCLinuxOutcomeFeed::handle(const ZTSScsiOutcome& acrOutcome) {
     lData.zt_scsi_generic_rport = lPort;
     lData.zt_scsi_generic_lun = acrOutcome.mLun;
     const bool lIsFull = acrOutcome.mStatus == ZTLSS_TaskSetFull;
+    if (lIsFull) {
+        mrDepths.noteQueueFull({acrOutcome.mHost, acrOutcome.mChannel, acrOutcome.mTarget, acrOutcome.mLun},
+                               ZTCLinuxQueueDepths::Clock::now());
+    }
     mrDelivery.deliverScope(*lBoard, lrLocal, lIsFull ? gcLinuxQueueFull : gcLinuxDeviceBusy, &lData, sizeof lData);
 }

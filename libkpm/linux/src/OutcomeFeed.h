@@ -15,6 +15,7 @@
 #include "libkpm/linux/src/Delivery.h"
 #include "libkpm/linux/src/FeedState.h"
 #include "libkpm/linux/src/HostWatcher.h"
+#include "libkpm/linux/src/QueueDepths.h"
 #include "libkpm/linux/src/ScsiOutcome.h"
 #include "libkpm/linux/src/TraceInstance.h"
 
@@ -22,7 +23,7 @@ class ZTCLinuxOutcomeFeed {
 public:
     /// All but the place outlive the feed.
     ZTCLinuxOutcomeFeed(ZTSTracePlace aPlace, ZTCTraceFiles& arFiles, ZTCLinuxHostWatcher& arWatcher,
-                        const ZTCLinuxDelivery& acrDelivery, ZTCLosses& arLosses);
+                        ZTCLinuxQueueDepths& arDepths, const ZTCLinuxDelivery& acrDelivery, ZTCLosses& arLosses);
 
     /// The hosts may have changed: the instance is opened, if it was not tried before, and its filter follows them.
     void noteHosts();
@@ -78,6 +79,7 @@ private:
     const ZTSTracePlace mPlace;
     ZTCTraceFiles& mrFiles;
     ZTCLinuxHostWatcher& mrWatcher;
+    ZTCLinuxQueueDepths& mrDepths;  // told of each queue full
     const ZTCLinuxDelivery& mrDelivery;
     ZTCLosses& mrLosses;
 

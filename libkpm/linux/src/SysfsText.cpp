@@ -92,6 +92,29 @@ std::optional<ZTSLinuxRportName> parseSysfsRportName(std::string_view aName) {
     return ZTSLinuxRportName{*lHost, *lChannel};
 }
 
+std::optional<ZTSLinuxLunName> parseSysfsLunName(std::string_view aName) {
+    std::uint64_t lParts[4];
+    for (std::size_t lPart = 0; lPart < 4; ++lPart) {
+        const std::size_t lEnd = lPart == 3 ? aName.size() : aName.find(':');
+        if (lEnd == std::string_view::npos) {
+            return std::nullopt;
+        }
+        const std::optional<std::uint64_t> lNumber = sNumber<std::uint64_t>(aName.substr(0, lEnd), 10);
+        if (!lNumber || (lPart != 3 && *lNumber > std::numeric_limits<std::uint32_t>::max())) {
+            return std::nullopt;
+        }
+        lParts[lPart] = *lNumber;
+        aName.remove_prefix(std::min(lEnd + 1, aName.size()));
+    }
+    return ZTSLinuxLunName{static_cast<std::uint32_t>(lParts[0]), static_cast<std::uint32_t>(lParts[1]),
+                           static_cast<std::uint32_t>(lParts[2]), lParts[3]};
+}
+
+std::string formatSysfsLunName(const ZTSLinuxLunName& acrName) {
+    return std::to_string(acrName.mHost) + ":" + std::to_string(acrName.mChannel) + ":" +
+           std::to_string(acrName.mTarget) + ":" + std::to_string(acrName.mLun);
+}
+
 std::optional<std::uint64_t> parseTraceLosses(std::string_view aText) {
     static constexpr std::string_view scCounts[] = {"overrun", "commit overrun", "dropped events"};
     static constexpr std::uint64_t scAllOnes = std::numeric_limits<std::uint64_t>::max();

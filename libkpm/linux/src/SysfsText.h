@@ -2,8 +2,10 @@
 #ifndef LIBKPM_LINUX_SRC_SYSFSTEXT_H
 #define LIBKPM_LINUX_SRC_SYSFSTEXT_H
 
+#include <compare>
 #include <cstdint>
 #include <optional>
+#include <string>
 #include <string_view>
 
 #include "libkpm/include/libkpm.h"
@@ -35,6 +37,18 @@ struct ZTSLinuxRportName {
     std::uint32_t mChannel = 0;
 };
 std::optional<ZTSLinuxRportName> parseSysfsRportName(std::string_view aName);
+
+/// "12:0:3:5": host, channel, target and LUN, the name of a SCSI device.
+struct ZTSLinuxLunName {
+    std::uint32_t mHost = 0;
+    std::uint32_t mChannel = 0;
+    std::uint32_t mTarget = 0;
+    std::uint64_t mLun = 0;
+
+    auto operator<=>(const ZTSLinuxLunName&) const = default;
+};
+std::optional<ZTSLinuxLunName> parseSysfsLunName(std::string_view aName);
+std::string formatSysfsLunName(const ZTSLinuxLunName& acrName);
 
 /// The records that a processor's trace buffer has lost, from its `stats` file: those overwritten and those that found
 /// no place. Nothing where no such count is in the text, or one is all ones, which is what a kernel shows that does not

@@ -22,7 +22,7 @@ TEST_F(LinuxEngine, StoppingWaitsForTheCallbackAndRemovesTheInstance) {
     mKernel.sendDone({.mResult = 0x28});
     waitUntil([&] { return lIsIn.load(); }, "the callback");
     EXPECT_EQ(mpEngine->getNumberOfAdapters(), 1u) << "answered while a callback is held up";
-    EXPECT_EQ(registerPort(0, portName(1), 4, 0x40), KPM_STATUS_NO_SOURCE);
+    EXPECT_EQ(registerPort(0, portName(1), 4, 0x08), KPM_STATUS_NO_SOURCE);
     std::atomic<bool> lHasStopped{false};
     std::thread lStopper([&] {
         mpEngine->stop();

@@ -57,6 +57,11 @@ public:
     void addTarget(std::uint32_t aHost, std::uint32_t aChannel, std::uint32_t aTarget, const std::string& acrName);
     void addRport(std::uint32_t aHost, std::uint32_t aNumber, std::int64_t aTarget, const std::string& acrName);
 
+    /// A SCSI device of this name ("HOST:CHANNEL:TARGET:LUN").
+    void setDepth(const std::string& acrLun, std::uint32_t aDepth) {
+        setAttribute("scsi_device/" + acrLun + "/device/queue_depth", std::to_string(aDepth) + "\n");
+    }
+
     // ---- FC events ----
     std::unique_ptr<ZTCFcEventSource> openFcEvents(ZTSFeedProblem& arProblem) override;
     /// Says one outcome of receive, with these bytes.

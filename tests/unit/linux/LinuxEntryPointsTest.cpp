@@ -88,7 +88,7 @@ TEST_F(LinuxEntryPoints, RegistersDeliversAndUnregistersThroughTheTable) {
         mrList.KpmRegEvent(0, FC_REG_LINK_EVENT, nullptr, 168, ZTCLinuxRecorder::linkCallback());
     EXPECT_NE(lHandle, 0u);
     std::uint32_t lPortHandle = 0;
-    EXPECT_EQ(mrList.ZtapiRegEvent(0, portName(1), 4, 0x40, &mRecorder, &lPortHandle, &ZTCLinuxRecorder::onScope),
+    EXPECT_EQ(mrList.ZtapiRegEvent(0, portName(1), 4, 0x08, &mRecorder, &lPortHandle, &ZTCLinuxRecorder::onScope),
               KPM_STATUS_NO_SOURCE);
     EXPECT_EQ(mrList.ZtapiUnregEvent(0, portName(1), lPortHandle), 0u);
     mKernel.setState(0, "Linkdown");

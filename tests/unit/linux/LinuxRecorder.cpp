@@ -72,6 +72,12 @@ void ZTCLinuxRecorder::onScope(unsigned aBoard, HBA_wwn aPort, unsigned aCategor
                                   sHex(lData.zt_checkcondition_lun) + " " + sHex(lData.zt_checkcondition_cmdcode) +
                                   " " + sHex(lData.zt_checkcondition_senskey) + " " +
                                   sHex(lData.zt_checkcondition_asc) + " " + sHex(lData.zt_checkcondition_ascq));
+    } else if (aCategory == 4 && aSubcategory == 0x40) {
+        const auto lData = sData<zt_scsi_varquedepth_v0>(*apEvent);
+        EXPECT_EQ(lData.zt_varquedepth_version, 0u);
+        gpRecorder.load()->record(lBoard + " queue-depth " + sName(lData.zt_varquedepth_rport) + " " +
+                                  sHex(lData.zt_varquedepth_lun) + " " + std::to_string(lData.zt_varquedepth_oldval) +
+                                  "->" + std::to_string(lData.zt_varquedepth_newval));
     } else if (aCategory == 16 && aSubcategory == 1) {
         EXPECT_EQ(apEvent->zt_evt_payload, nullptr);
         EXPECT_EQ(apEvent->zt_evt_size, ZT_EVENT_HEADER_SIZE);
@@ -114,7 +120,7 @@ void ZTCLinuxRecorder::registerAll(ZTCLinuxEngine& arEngine, std::uint32_t aBoar
     HBA_wwn lNode{};
     HBA_wwn lPort{};
     ASSERT_EQ(arEngine.getAdapterInfo(aBoard, &lNode, &lPort), 0u);
-    for (const auto& [lCategory, lSubcategory] : {std::pair{4u, 1u}, {4u, 2u}, {4u, 4u}, {16u, 1u}}) {
+    for (const auto& [lCategory, lSubcategory] : {std::pair{4u, 1u}, {4u, 2u}, {4u, 4u}, {4u, 0x40u}, {16u, 1u}}) {
         std::uint32_t lHandle = 0;
         arEngine.registerForPort(aBoard, lPort, lCategory, lSubcategory, this, &lHandle, &onScope);
         EXPECT_NE(lHandle, 0u);

@@ -26,6 +26,7 @@ public:
     /// What was delivered, in order:
     ///   "BOARD queue-full PORT LUN", device-busy likewise
     ///   "BOARD check-condition PORT LUN OPCODE KEY ASC ASCQ", in hex
+    ///   "BOARD queue-depth PORT LUN OLD->NEW", the depths in decimal
     ///   "BOARD link up|down tag=N up=N down=N id=HEX PORT NODE"
     ///   "BOARD rscn BYTES", in hex
     ///   "BOARD arrival"

@@ -92,3 +92,17 @@ TEST(SysfsText, AllOnesIsNoName) {
     EXPECT_FALSE(parseSysfsWwn("0xffffffffffffffff\n").has_value());
     EXPECT_TRUE(parseSysfsWwn("0xfffffffffffffffe\n").has_value());
 }
+
+TEST(SysfsText, ALunsNameIsReadAndWrittenInFull) {
+    const auto lName = parseSysfsLunName("12:1:70000:18446744073709551615");
+    ASSERT_TRUE(lName.has_value());
+    EXPECT_EQ(lName->mHost, 12u);
+    EXPECT_EQ(lName->mChannel, 1u);
+    EXPECT_EQ(lName->mTarget, 70000u);
+    EXPECT_EQ(lName->mLun, 18446744073709551615u);
+    EXPECT_EQ(formatSysfsLunName(*lName), "12:1:70000:18446744073709551615");
+    for (const char* lpText : {"", "1", "1:2:3", "1:2:3:", ":2:3:4", "1:2:3:4:5", "1:2:3:x", "4294967296:0:0:0",
+                               "0:0:0:18446744073709551616", "-1:0:0:0", "target0:0:0"}) {
+        EXPECT_FALSE(parseSysfsLunName(lpText).has_value()) << lpText;
+    }
+}

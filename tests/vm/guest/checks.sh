@@ -56,7 +56,7 @@ check_adapters() { # every FC host is a board, in the order of host numbers, wit
   expect_text "boards in an answer" "$(colons $gInitiatorName) $(colons $gTargetName)" \
     "$(echo $(jq -r '.lists[].initiator.portName' $gRecords))"
   expect_text "what the kernel cannot tell is said" \
-    "plogi prlo adisc lsrjt logo fabric-busy port-busy fcp-read-check lun-reset target-reset bus-reset queue-depth port-interrupt temperature" \
+    "plogi prlo adisc lsrjt logo fabric-busy port-busy fcp-read-check lun-reset target-reset bus-reset port-interrupt temperature" \
     "$(echo $(logged 'cannot deliver' | sed 's/.*deliver: //; s/,//g'))"
 }
 
@@ -350,7 +350,7 @@ check_no_network_rights() { # without the right to listen there are no messages,
 check_nobody() { # a user without rights has links, by polling
   stop_agent
   start_agent /vm/bin/setpriv --reuid 65534 --clear-groups --inh-caps -all
-  expect_reason "why there are no outcomes" "no SCSI outcomes: there is no tracefs at $gTracing: Permission denied"
+  expect_reason "why there are no outcomes" "no SCSI outcomes: no tracefs can be reached at $gTracing: Permission denied"
   expect_reason "why there are no messages" \
     "no RSCNs, and link states only every 2000 ms: FC events cannot be subscribed to: Operation not permitted"
   set_link veth0 down
