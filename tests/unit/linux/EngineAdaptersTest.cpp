@@ -43,7 +43,11 @@ TEST_F(LinuxEngine, AHostThatComesLaterIsTheNextBoardAndAnArrivalOnEveryBoardTha
     HBA_wwn lPort{};
     EXPECT_EQ(mpEngine->getAdapterInfo(2, &lNode, &lPort), 0u);
     EXPECT_TRUE(isSameName(lPort, portName(2)));
-    EXPECT_EQ(mKernel.instanceFile("events/scsi/scsi_dispatch_cmd_done/filter"), makeScsiFilter({1, 4, 5}));
+    waitUntil(
+        [&] {
+            return mKernel.instanceFile("events/scsi/scsi_dispatch_cmd_done/filter") == makeScsiFilter({1, 4, 5});
+        },
+        "the filter to name it");
     // The new board is like any other, once it is registered.
     mRecorder.registerAll(*mpEngine, 2);
     mKernel.sendDone({.mHost = 1, .mResult = 0x08});
