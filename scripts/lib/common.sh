@@ -8,12 +8,13 @@ cd "$gRoot"
 # What each step builds with, as Debian's package names.
 gCompilerPackages=(g++ gcc cmake ninja-build)
 gClientPackages=(libcli11-dev nlohmann-json3-dev)
-gSensorPackages=(libsqlite3-dev libtomlplusplus-dev)
+gSensorPackages=(libsqlite3-dev libtomlplusplus-dev libmicrohttpd-dev prometheus-cpp-dev)
 gTestPackages=(libgtest-dev libgmock-dev)
 gBenchPackages=(libbenchmark-dev prometheus-cpp-dev libspdlog-dev python3)
 gClangPackages=(clang libclang-rt-14-dev llvm)
 gCoveragePackages=(gcovr python3)
 gStylePackages=(clang-format clang-tidy)
+gPackagePackages=(dpkg-dev debhelper lintian fakeroot lowdown git)
 gVmPackages=(make qemu-system-x86 busybox-static kmod cpio xz-utils iproute2 jq sg3-utils)
 
 say() { printf '\n== %s\n' "$*"; }

@@ -38,8 +38,8 @@ void complain(const std::string& acrText);
 /// Writes all of it to standard output, or throws ZTCSystemCallEx.
 void writeOutput(const std::string& acrText);
 
-/// The same for a process that has to go on while its reader does not read. Calls acrPause at least once a second. Where
-/// it returns false and the reader still does not read, some of the text stays unwritten and the result is false.
+/// The same for a process that has to go on while its reader does not read. Calls acrPause at least once a second.
+/// Where it returns false and the reader still does not read, some of the text stays unwritten and the result is false.
 bool writeOutputPatiently(const std::string& acrText, const std::function<bool()>& acrPause);
 
 /// Says on standard error what is remarkable about an answer. Returns what it means for the exit status.

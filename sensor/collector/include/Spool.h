@@ -55,6 +55,7 @@
 #ifndef SENSOR_COLLECTOR_INCLUDE_SPOOL_H
 #define SENSOR_COLLECTOR_INCLUDE_SPOOL_H
 
+#include <algorithm>
 #include <cstdint>
 #include <string>
 #include <vector>
@@ -106,6 +107,11 @@ public:
     /// The spool's files in the order of their numbers. Files with other names are left out, and left alone.
     std::vector<ZTSSpoolEntry> list() const;
 
+    /// The number of the next file. Numbers rise for ever; some may never be used.
+    std::uint64_t takeNumber() { return mNextNumber++; }
+    /// From now on numbers are at least this one.
+    void raiseNumber(std::uint64_t aNumber) { mNextNumber = std::max(mNextNumber, aNumber); }
+
     /// Makes an empty `.part` with this room. Where there is no room, no file is left.
     ZTSSpoolPart createPart(std::uint64_t aNumber, const std::string& acrGeneration, std::uint64_t aReserve);
     /// Opens one that is there, to go on with it. Nothing is reserved yet.
@@ -134,6 +140,7 @@ private:
     ZTSSpoolName settle(ZTSSpoolPart& arPart, ZTESpoolState aState);
 
     const std::string mFolder;
+    std::uint64_t mNextNumber = 1;
 };
 
 #endif

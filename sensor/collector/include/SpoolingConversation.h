@@ -62,9 +62,6 @@ public:
     ZTCSpoolingConversation(ZTCSpool& arSpool, std::string aDirectory)
         : mrSpool(arSpool), mDirectory(std::move(aDirectory)) {}
 
-    /// The number of the next file. To be set before the first attach().
-    void setNextNumber(std::uint64_t aNumber) { mNextNumber = aNumber; }
-
     /// Begins to read from an agent. @param acrPart  the `.part` that an earlier collector left for this agent
     /// Throws ZTCSpoolTroubleEx, and is not attached then.
     void attach(ZTCFileDescriptor aResponseFifo, std::string aGeneration,
@@ -101,7 +98,6 @@ private:
 
     ZTCSpool& mrSpool;
     const std::string mDirectory;
-    std::uint64_t mNextNumber = 1;
     std::string mGeneration;
     ZTCFileDescriptor mResponseFifo;
     ZTCFileDescriptor mCommandFifo;

@@ -70,8 +70,7 @@ ZTESending ZTCSpoolingConversation::request(ZTERequest aRequest, std::span<const
     }
     const std::uint64_t lReserve = aRequest == ZTRQ_Get || aRequest == ZTRQ_Marker ? gcResponseReserve : gcShortReserve;
     if (!mPart) {
-        mPart = mrSpool.createPart(mNextNumber, mGeneration, lReserve);
-        ++mNextNumber;
+        mPart = mrSpool.createPart(mrSpool.takeNumber(), mGeneration, lReserve);
     } else {
         mrSpool.reserve(*mPart, lReserve);
     }
@@ -167,8 +166,7 @@ static bool sHasBytes(int aFifo) {
 /// Makes the next `.part` where one is needed. False: none is, since nothing comes.
 bool ZTCSpoolingConversation::preparePart(bool aIsExpecting) {
     if (!mPart && (aIsExpecting || sHasBytes(mResponseFifo.get()))) {
-        mPart = mrSpool.createPart(mNextNumber, mGeneration, gcResponseReserve);
-        ++mNextNumber;
+        mPart = mrSpool.createPart(mrSpool.takeNumber(), mGeneration, gcResponseReserve);
     }
     return mPart.has_value();
 }

@@ -18,4 +18,7 @@ struct ZTSTopologyRoots {
 /// by name, so that two scans of the same state are equal.
 ZTSTopology scanTopology(const ZTSTopologyRoots& acrRoots, ZTCPatientReader& arReader);
 
+/// The same for initiators and remote ports alone: a few files a port.
+ZTSTopology scanPorts(const std::string& acrSysfs, ZTCPatientReader& arReader);
+
 #endif

@@ -289,3 +289,13 @@ ZTSTopology scanTopology(const ZTSTopologyRoots& acrRoots, ZTCPatientReader& arR
     lTopology.mBlocked = arReader.getBlockedPaths();
     return lTopology;
 }
+
+ZTSTopology scanPorts(const std::string& acrSysfs, ZTCPatientReader& arReader) {
+    ZTSTopology lTopology;
+    ZTCWishes lWishes;
+    sFindInitiators(acrSysfs, lTopology, lWishes);
+    sFindRemotePorts(acrSysfs, lTopology, lWishes);
+    lWishes.fulfil(arReader);
+    lTopology.mBlocked = arReader.getBlockedPaths();
+    return lTopology;
+}

@@ -71,7 +71,7 @@ protected:
         const std::vector<ZTSSpoolEntry> lFound = lSpool.list();
         const ZTSSpoolPlan lPlan = planSpoolRecovery(lFound, "ab");
         ZTCSpoolingConversation lTalk(lSpool, mDirectory.path("agent"));
-        lTalk.setNextNumber(lPlan.mNextNumber);
+        lSpool.raiseNumber(lPlan.mNextNumber);
         std::optional<ZTSSpoolName> lPart;
         if (lPlan.mResume) {
             lPart = lPlan.mResume->mName;
@@ -95,7 +95,7 @@ protected:
         ASSERT_EQ(collect(), 0);
         ZTCSpool lSpool(mDirectory.path("spool"));
         ZTCSpoolingConversation lTalk(lSpool, mDirectory.path("agent"));
-        lTalk.setNextNumber(planSpoolRecovery(lSpool.list(), "ab").mNextNumber);
+        lSpool.raiseNumber(planSpoolRecovery(lSpool.list(), "ab").mNextNumber);
         lTalk.attach(ZTCFileDescriptor(fcntl(mKeepersEnd.get(), F_DUPFD_CLOEXEC, 3)), "ab");
         waitUntil(
             [&] {

@@ -57,7 +57,7 @@ protected:
                 lPart = lrEntry.mName;
             }
         }
-        mTalk->setNextNumber(lNext);
+        mSpool.raiseNumber(lNext);
         mTalk->attach(openResponseFifo(), "ab", lPart);
     }
     void send(ZTERequest aRequest, const ZTCWireBytes& acrBody) {

@@ -1,0 +1,114 @@
+/// The collecting loop: one thread over the link to the keeper, the agent's FIFO and bell, the control socket and the
+/// clock. It decides nothing itself: agents are the sessions', the database is the worker's.
+#ifndef SENSOR_COLLECTOR_INCLUDE_COLLECTOR_H
+#define SENSOR_COLLECTOR_INCLUDE_COLLECTOR_H
+
+#include <poll.h>
+
+#include <deque>
+#include <memory>
+#include <optional>
+#include <string>
+#include <vector>
+
+#include "sensor/collector/include/AgentSession.h"
+#include "sensor/collector/include/ControlRequest.h"
+#include "sensor/collector/include/ControlServer.h"
+#include "sensor/collector/include/HistoryWorker.h"
+#include "sensor/collector/include/LiveStateJson.h"
+#include "sensor/collector/include/LossWindow.h"
+#include "sensor/collector/include/Spool.h"
+#include "sensor/link/include/Inheritance.h"
+#include "sensor/settings/include/Settings.h"
+#include "sensor/topology/include/TopologyScan.h"
+
+/// Environment variable with another root than "/sys", for tests.
+inline constexpr const char* gcSysfsVariable = "TAVIK_SYSFS";
+
+class ZTCCollector {
+public:
+    using ZTCTime = std::chrono::steady_clock::time_point;
+
+    /// Starts the worker of the history.
+    ZTCCollector(ZTSInheritance aInheritance, const ZTSSettings& acrSettings);
+    ~ZTCCollector();
+    ZTCCollector(const ZTCCollector&) = delete;
+    ZTCCollector& operator=(const ZTCCollector&) = delete;
+
+    /// Until the keeper says so, or is gone. Returns the exit status: 0 for an orderly end, 1 where the keeper is gone,
+    /// 2 where this program must not use the database.
+    int run();
+
+private:
+    /// An agent that waits until the one before it is drained.
+    struct ZTSWaitingAgent {
+        ZTSAgentStart mStart;
+        std::optional<int> mWaitStatus;  ///< it has ended
+    };
+
+    void turn(ZTCTime aNow);
+    void poll(ZTCTime aNow);
+    int getPollTime(ZTCTime aNow) const;
+    bool isOver(ZTCTime aNow);
+
+    void receiveFromKeeper(ZTCTime aNow);
+    void handle(ZTSLinkMessage aMessage, ZTCTime aNow);
+    void noteAgentStarted(ZTSLinkMessage aMessage);
+    void noteAgentEnded(const ZTSLinkMessage& acrMessage, ZTCTime aNow);
+    void reload(const ZTSLinkMessage& acrMessage, ZTCTime aNow);
+    void send(ZTELinkMessageType aType, std::uint64_t aStart, const std::string& acrText = {});
+    void sendLook(ZTCTime aNow);
+    void flushToKeeper();
+
+    void openSpool(ZTCTime aNow);
+    void beginNextSession(ZTCTime aNow);
+    void runSession(ZTCTime aNow);
+    void sweep();
+    void sweepParts();
+    void sweepPages();
+    void scanPorts(ZTCTime aNow);
+    void noteHistory();
+    void tellState();
+
+    std::optional<std::string> serve(std::uint64_t aTicket, const std::string& acrRequest);
+    std::string describeState();
+
+    ZTSInheritance mInheritance;
+    ZTSSettings mSettings;
+    const std::string mAgentDirectory;
+    const std::string mSysfsRoot;
+    const ZTCHistoryTime mSince;
+    ZTCSpool mSpool;
+    ZTCHistoryWorker mHistory;
+    ZTCControlServer mControl;
+
+    bool mIsKeeperGone = false;
+    bool mIsReady = false;  ///< the database is open, and what was found in the spool is handed to it
+    bool mIsSwept = false;
+    ZTCTime mNextSpoolTry{};
+    std::string mSpoolProblem;
+    int mSpoolErrno = 0;
+
+    std::deque<ZTSWaitingAgent> mWaiting;
+    std::unique_ptr<ZTCAgentSession> mpSession;
+    bool mIsSessionDue = false;
+    ZTCPagePointer mpLastPage;
+    std::optional<ZTCHistoryTime> mLastAsked;
+    std::uint64_t mRestarts = 0;
+    std::optional<ZTSLinkMessage> mKeeperState;
+    std::optional<ZTCTime> mFinishBy;
+
+    std::deque<ZTSLinkMessage> mOutgoing;
+    ZTCTime mLastLook{};
+    std::string mToldState;
+
+    ZTCTime mNextScan{};
+    ZTCPatientReader mPortReader;
+    std::shared_ptr<const ZTSTopology> mpPorts;
+    std::vector<ZTSTargetPort> mTargets;
+    std::string mTargetFileProblem;
+    ZTCLossWindow mLosses;
+    std::vector<pollfd> mFds;
+};
+
+#endif

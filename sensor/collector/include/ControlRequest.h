@@ -1,0 +1,27 @@
+/// Requests on the control socket as values, and the answers that are not the live state.
+#ifndef SENSOR_COLLECTOR_INCLUDE_CONTROLREQUEST_H
+#define SENSOR_COLLECTOR_INCLUDE_CONTROLREQUEST_H
+
+#include <cstdint>
+#include <string>
+
+#include "sensor/collector/include/HistoryWorker.h"
+
+enum ZTEControlRequest : std::uint8_t { ZTCR_Status, ZTCR_Mark, ZTCR_Wrong };
+
+struct ZTSControlRequest {
+    ZTEControlRequest mKind = ZTCR_Wrong;
+    std::string mName;   ///< of a mark
+    std::string mError;  ///< of a wrong request: one line
+};
+
+/// Longest name of a mark in bytes.
+inline constexpr std::size_t gcMaxMarkName = 200;
+
+/// Never throws for what the line holds.
+ZTSControlRequest parseControlRequest(const std::string& acrLine);
+
+std::string toErrorJson(const std::string& acrError);
+std::string toMarkJson(const ZTSMarkResult& acrMark);
+
+#endif

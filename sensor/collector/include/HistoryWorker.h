@@ -1,0 +1,168 @@
+/// The one thread that writes the history.
+///
+/// It takes what it is handed in the order of the calls, in transactions that it commits as soon as nothing more waits,
+/// and at least every second. Files of the spool are removed behind the commit. So a slow disk delays the history, and
+/// never the retrieval.
+///
+/// When the disk is full, nothing is dropped: the work is done again, whole, until it succeeds. A damaged database is
+/// set aside and the work goes into a new one.
+///
+/// All public functions may be called from one other thread. None of them waits for the disk, but for finish().
+#ifndef SENSOR_COLLECTOR_INCLUDE_HISTORYWORKER_H
+#define SENSOR_COLLECTOR_INCLUDE_HISTORYWORKER_H
+
+#include <condition_variable>
+#include <deque>
+#include <functional>
+#include <memory>
+#include <mutex>
+#include <optional>
+#include <string>
+#include <thread>
+#include <variant>
+#include <vector>
+
+#include "sensor/collector/include/HistorySink.h"
+#include "sensor/store/include/Store.h"
+#include "sensor/topology/include/Topology.h"
+
+/// What can be seen of the worker at any time.
+struct ZTSHistoryState {
+    bool mIsOpen = false;  ///< the database is open: numbers and id below are known
+    std::string mStoreId;
+    std::uint64_t mLastFrame = 0;  ///< highest number of a frame that the database had when it was opened
+    std::string mFatal;            ///< not empty: the database can never be used by this program
+    std::string mProblem;          ///< not empty: nothing can be written now; one line with the reason
+    bool mIsReadOnly = false;      ///< the problem is a read-only file system
+    std::uint64_t mWaitingFrames = 0;
+    std::uint64_t mWaitingBytes = 0;
+    std::uint64_t mTakenFrames = 0;  ///< taken in and committed by this process
+    std::uint64_t mTakenRecords = 0;
+    ZTCHistoryTime mLastTaken;  ///< when the last of them was committed; the epoch: none
+    std::uint64_t mOpenEpisodes = 0;
+};
+
+/// A mark that was asked for, and what came of it.
+struct ZTSMarkResult {
+    std::uint64_t mTicket = 0;
+    std::string mName;
+    ZTCHistoryTime mTime;
+    std::string mError;  ///< empty: it is stored
+};
+
+class ZTCHistoryWorker : public ZTCHistorySink {
+public:
+    using Report = std::function<void(const std::string& acrLine)>;
+
+    /// Starts the thread. @param arSpool  outlives this object  @param aReport  called on the worker's thread
+    ZTCHistoryWorker(ZTCSpool& arSpool, std::string aStateDirectory, const ZTSStoreLimits& acrLimits, Report aReport);
+    /// Ends the thread behind the transaction that it is at; what was not committed stays in the spool.
+    ~ZTCHistoryWorker() override;
+    ZTCHistoryWorker(const ZTCHistoryWorker&) = delete;
+    ZTCHistoryWorker& operator=(const ZTCHistoryWorker&) = delete;
+
+    // ---- ZTCHistorySink ----
+    void takeIn(const ZTSSpoolEntry& acrEntry, ZTCPagePointer apPage) override;
+    void notePage(ZTCPagePointer apPage) override;
+    void endAgent(ZTSEndedAgent aAgent) override;
+
+    /// An agent that another process of this kind saw last, and that nobody has heard of since. Does nothing when it is
+    /// one that runs, or when there is none.
+    void endForgottenAgents(const std::string& acrRunningGeneration);
+    void notePorts(std::shared_ptr<const ZTSTopology> apPorts);
+    void setLimits(const ZTSStoreLimits& acrLimits);
+    void setMark(std::uint64_t aTicket, const std::string& acrName, ZTCHistoryTime aTime);
+    /// Marks that are done since the last call.
+    std::vector<ZTSMarkResult> takeMarkResults();
+
+    ZTSHistoryState getState() const;
+    /// An eventfd that becomes readable whenever the state has changed. The caller reads it empty.
+    int getBell() const { return mBell.get(); }
+
+    /// Waits until everything is stored, at most so long; then ends the run in the history, and the thread. Returns
+    /// whether everything was stored.
+    bool finish(std::chrono::milliseconds aAtMost);
+
+private:
+    struct ZTSFrameJob {
+        ZTSSpoolEntry mEntry;
+        ZTCPagePointer mpPage;
+        std::chrono::steady_clock::time_point mSince;
+        bool mIsSynced = false;
+    };
+    struct ZTSPageJob {
+        ZTCPagePointer mpPage;
+    };
+    struct ZTSForgottenJob {
+        std::string mRunningGeneration;
+    };
+    struct ZTSPortsJob {
+        std::shared_ptr<const ZTSTopology> mpPorts;
+    };
+    struct ZTSMarkJob {
+        ZTSMarkResult mMark;
+    };
+    using ZTCJob = std::variant<ZTSFrameJob, ZTSPageJob, ZTSEndedAgent, ZTSForgottenJob, ZTSPortsJob, ZTSMarkJob>;
+
+    void submit(ZTCJob aJob);
+    void run();
+    bool openStore();
+    void beginRun();
+    bool nextBatch(std::deque<ZTCJob>& arBatch);
+    void work(std::deque<ZTCJob>& arBatch);
+    void storeBatch(std::deque<ZTCJob>& arBatch);
+    void settle(std::deque<ZTCJob>& arBatch, std::size_t aCount);
+    void syncWaiting(std::deque<ZTCJob>& arBatch);
+    void upkeep();
+    void closeRun();
+
+    void store(ZTSFrameJob& arJob);
+    void store(ZTSPageJob& arJob);
+    void store(ZTSEndedAgent& arAgent);
+    void store(ZTSForgottenJob& arJob);
+    void store(ZTSPortsJob& arJob);
+    void store(ZTSMarkJob& arJob);
+    void storePage(const ZTCPagePointer& acrPage);
+    void closeEpisodes();
+    void noteSeen(const std::string& acrGeneration);
+    void noteEnded(const std::string& acrGeneration);
+    void setAside(const ZTSFrameJob& acrJob, const std::string& acrReason);
+    std::optional<ZTSRemotePort> resolve(const ZTSFcName& acrInitiator, std::uint32_t aFcId) const;
+
+    bool pause(std::chrono::milliseconds aTime);
+    void setProblem(const std::string& acrProblem);
+    void ring();
+
+    // ---- constant after construction ----
+    ZTCSpool& mrSpool;
+    const std::string mDirectory;
+    const Report mReport;
+    ZTCFileDescriptor mBell;
+
+    // ---- of the worker's thread ----
+    std::unique_ptr<ZTCStore> mpStore;
+    std::string mLastProblem;
+    ZTCPagePointer mpPage;  ///< of the running agent, as last stored
+    std::chrono::steady_clock::time_point mLastCheckpoint{};
+    std::chrono::steady_clock::time_point mLastUpkeep{};
+    bool mHasMoreToRetire = false;
+    std::uint64_t mBatchFrames = 0;
+    std::uint64_t mBatchRecords = 0;
+
+    // ---- guarded by mMutex ----
+    mutable std::mutex mMutex;
+    std::condition_variable mWake;
+    std::deque<ZTCJob> mQueue;
+    std::shared_ptr<const ZTSTopology> mpPorts;
+    ZTSStoreLimits mLimits;
+    bool mHasNewLimits = false;
+    bool mIsStopping = false;   ///< end at once
+    bool mIsFinishing = false;  ///< end when all is stored
+    bool mIsDone = false;
+    ZTSHistoryState mState;
+    std::vector<ZTSMarkResult> mMarkResults;
+
+    std::thread mThread;
+};
+
+#endif

@@ -1,0 +1,53 @@
+#include "sensor/collector/include/ControlRequest.h"
+
+#include <nlohmann/json.hpp>
+
+#include "sensor/client/include/RecordJson.h"
+#include "sensor/views/include/TimeText.h"
+
+static ZTSControlRequest sWrong(const std::string& acrError) {
+    return {.mKind = ZTCR_Wrong, .mName = {}, .mError = acrError};
+}
+
+static bool sHasControlCharacters(const std::string& acrText) {
+    for (const char lCharacter : acrText) {
+        if (static_cast<unsigned char>(lCharacter) < 0x20 || lCharacter == 0x7F) {
+            return true;
+        }
+    }
+    return false;
+}
+
+ZTSControlRequest parseControlRequest(const std::string& acrLine) {
+    const nlohmann::json lJson = nlohmann::json::parse(acrLine, nullptr, false);
+    if (!lJson.is_object() || !lJson.contains("request") || !lJson["request"].is_string()) {
+        return sWrong("a request is a JSON object with a text \"request\"");
+    }
+    const auto lRequest = lJson["request"].get<std::string>();
+    if (lRequest == "status") {
+        return {.mKind = ZTCR_Status, .mName = {}, .mError = {}};
+    }
+    if (lRequest != "mark") {
+        return sWrong("unknown request \"" + lRequest + "\": status and mark are known");
+    }
+    if (!lJson.contains("name") || !lJson["name"].is_string()) {
+        return sWrong("a mark needs a text \"name\"");
+    }
+    const auto lName = lJson["name"].get<std::string>();
+    if (lName.empty() || lName.size() > gcMaxMarkName || sHasControlCharacters(lName)) {
+        return sWrong("a mark's name has 1 to " + std::to_string(gcMaxMarkName) +
+                      " bytes without control characters, this one has " + std::to_string(lName.size()));
+    }
+    return {.mKind = ZTCR_Mark, .mName = lName, .mError = {}};
+}
+
+std::string toErrorJson(const std::string& acrError) {
+    return dumpJson({{"error", acrError}}, -1);
+}
+
+std::string toMarkJson(const ZTSMarkResult& acrMark) {
+    if (!acrMark.mError.empty()) {
+        return toErrorJson(acrMark.mError);
+    }
+    return dumpJson({{"mark", acrMark.mName}, {"time", toRfc3339(acrMark.mTime)}}, -1);
+}

@@ -1,0 +1,514 @@
+#include "sensor/collector/include/HistoryWorker.h"
+
+#include <sys/eventfd.h>
+#include <sys/statvfs.h>
+#include <unistd.h>
+
+#include <algorithm>
+#include <cerrno>
+#include <cstdio>
+#include <sstream>
+
+#include "sensor/collector/include/PageCounts.h"
+#include "sensor/collector/include/SpoolRecovery.h"
+
+using std::chrono::milliseconds;
+using std::chrono::seconds;
+using std::chrono::steady_clock;
+
+/// A transaction is committed at the latest so long after it began.
+static constexpr milliseconds scLongestTransaction{500};
+/// A frame that waits longer than this is synced itself.
+static constexpr seconds scLongestUnsynced{1};
+static constexpr seconds scRetryPause{1};
+static constexpr seconds scUpkeepPeriod{60};
+static constexpr seconds scCheckpointPeriod{1};
+
+/// Name of the store's value with the generations that were seen running and not yet ended, a blank behind each.
+static constexpr const char* scRunningValue = "collector.generations";
+/// The same with the time when a frame was last taken in: microseconds since the epoch.
+static constexpr const char* scLastTakenValue = "collector.lastTaken";
+
+ZTCHistoryWorker::ZTCHistoryWorker(ZTCSpool& arSpool, std::string aStateDirectory, const ZTSStoreLimits& acrLimits,
+                                   Report aReport)
+    : mrSpool(arSpool),
+      mDirectory(std::move(aStateDirectory)),
+      mReport(std::move(aReport)),
+      mBell(eventfd(0, EFD_CLOEXEC | EFD_NONBLOCK)),
+      mLimits(acrLimits) {
+    if (!mBell.isOpen()) {
+        throw ZTCSystemCallEx("cannot make an eventfd", errno);
+    }
+    mThread = std::thread([this] { run(); });
+}
+
+ZTCHistoryWorker::~ZTCHistoryWorker() {
+    {
+        const std::lock_guard lLock(mMutex);
+        mIsStopping = true;
+    }
+    mWake.notify_all();
+    if (mThread.joinable()) {
+        mThread.join();
+    }
+}
+
+// ---- for the other thread ----
+
+void ZTCHistoryWorker::submit(ZTCJob aJob) {
+    {
+        const std::lock_guard lLock(mMutex);
+        if (const auto* lpFrame = std::get_if<ZTSFrameJob>(&aJob)) {
+            ++mState.mWaitingFrames;
+            mState.mWaitingBytes += lpFrame->mEntry.mSize;
+        }
+        // Of pages in a row the last one says it all.
+        if (std::holds_alternative<ZTSPageJob>(aJob) && !mQueue.empty() &&
+            std::holds_alternative<ZTSPageJob>(mQueue.back())) {
+            mQueue.back() = std::move(aJob);
+        } else {
+            mQueue.push_back(std::move(aJob));
+        }
+    }
+    mWake.notify_all();
+}
+
+void ZTCHistoryWorker::takeIn(const ZTSSpoolEntry& acrEntry, ZTCPagePointer apPage) {
+    submit(ZTSFrameJob{.mEntry = acrEntry, .mpPage = std::move(apPage), .mSince = steady_clock::now()});
+}
+
+void ZTCHistoryWorker::notePage(ZTCPagePointer apPage) {
+    submit(ZTSPageJob{std::move(apPage)});
+}
+
+void ZTCHistoryWorker::endAgent(ZTSEndedAgent aAgent) {
+    submit(std::move(aAgent));
+}
+
+void ZTCHistoryWorker::endForgottenAgents(const std::string& acrRunningGeneration) {
+    submit(ZTSForgottenJob{acrRunningGeneration});
+}
+
+void ZTCHistoryWorker::notePorts(std::shared_ptr<const ZTSTopology> apPorts) {
+    submit(ZTSPortsJob{std::move(apPorts)});
+}
+
+void ZTCHistoryWorker::setLimits(const ZTSStoreLimits& acrLimits) {
+    const std::lock_guard lLock(mMutex);
+    mLimits = acrLimits;
+    mHasNewLimits = true;
+}
+
+void ZTCHistoryWorker::setMark(std::uint64_t aTicket, const std::string& acrName, ZTCHistoryTime aTime) {
+    submit(ZTSMarkJob{{.mTicket = aTicket, .mName = acrName, .mTime = aTime, .mError = {}}});
+}
+
+std::vector<ZTSMarkResult> ZTCHistoryWorker::takeMarkResults() {
+    const std::lock_guard lLock(mMutex);
+    return std::exchange(mMarkResults, {});
+}
+
+ZTSHistoryState ZTCHistoryWorker::getState() const {
+    const std::lock_guard lLock(mMutex);
+    return mState;
+}
+
+bool ZTCHistoryWorker::finish(milliseconds aAtMost) {
+    bool lIsDone = false;
+    {
+        std::unique_lock lLock(mMutex);
+        mIsFinishing = true;
+        mWake.notify_all();
+        lIsDone = mWake.wait_for(lLock, aAtMost, [this] { return mIsDone; });
+        mIsStopping = true;
+    }
+    mWake.notify_all();
+    mThread.join();
+    return lIsDone;
+}
+
+// ---- the thread ----
+
+void ZTCHistoryWorker::ring() {
+    const std::uint64_t lOne = 1;
+    [[maybe_unused]] const ssize_t lWritten = write(mBell.get(), &lOne, sizeof(lOne));
+}
+
+/// False: the thread is to end.
+bool ZTCHistoryWorker::pause(milliseconds aTime) {
+    std::unique_lock lLock(mMutex);
+    return !mWake.wait_for(lLock, aTime, [this] { return mIsStopping; });
+}
+
+void ZTCHistoryWorker::setProblem(const std::string& acrProblem) {
+    if (acrProblem != mLastProblem) {
+        mReport(acrProblem.empty() ? "the history can be written again" : acrProblem);
+        mLastProblem = acrProblem;
+    }
+    struct statvfs lRoom {};
+    const bool lIsReadOnly =
+        !acrProblem.empty() && statvfs(mDirectory.c_str(), &lRoom) == 0 && (lRoom.f_flag & ST_RDONLY) != 0;
+    {
+        const std::lock_guard lLock(mMutex);
+        mState.mProblem = acrProblem;
+        mState.mIsReadOnly = lIsReadOnly;
+    }
+    ring();
+}
+
+/// False: the thread is to end.
+bool ZTCHistoryWorker::openStore() {
+    while (true) {
+        try {
+            ZTSStoreLimits lLimits;
+            {
+                const std::lock_guard lLock(mMutex);
+                lLimits = mLimits;
+                mHasNewLimits = false;
+            }
+            mpStore = std::make_unique<ZTCStore>(mDirectory, lLimits, mReport);
+            mpStore->setAddressResolver(
+                [this](const ZTSFcName& acrInitiator, std::uint32_t aFcId) { return resolve(acrInitiator, aFcId); });
+            beginRun();
+            break;
+        } catch (const ZTCStoreNewerEx& lrEx) {
+            {
+                const std::lock_guard lLock(mMutex);
+                mState.mFatal = lrEx.what();
+            }
+            ring();
+            return false;
+        } catch (const ZTCStoreEx& lrEx) {
+            mpStore.reset();
+            setProblem(lrEx.what());
+        }
+        if (!pause(scRetryPause)) {
+            return false;
+        }
+    }
+    setProblem("");
+    return true;
+}
+
+void ZTCHistoryWorker::beginRun() {
+    ZTCStoreTransaction lTransaction = mpStore->begin();
+    mpStore->beginRun(getHistoryTime());
+    lTransaction.commit();
+    const std::lock_guard lLock(mMutex);
+    mState.mIsOpen = true;
+    mState.mStoreId = mpStore->getStoreId();
+    mState.mLastFrame = mpStore->getLastFrame();
+}
+
+/// The remote port that has the address now, seen from the initiator. Well-known addresses have none.
+std::optional<ZTSRemotePort> ZTCHistoryWorker::resolve(const ZTSFcName& acrInitiator, std::uint32_t aFcId) const {
+    std::shared_ptr<const ZTSTopology> lpPorts;
+    {
+        const std::lock_guard lLock(mMutex);
+        lpPorts = mpPorts;
+    }
+    if (lpPorts == nullptr) {
+        return std::nullopt;
+    }
+    const auto lpHost = std::ranges::find(lpPorts->mInitiators, acrInitiator, &ZTSTopologyInitiator::mWwpn);
+    for (const ZTSTopologyRemotePort& lrPort : lpPorts->mRemotePorts) {
+        if (lpHost != lpPorts->mInitiators.end() && lrPort.mHost == lpHost->mHost && lrPort.mFcId == aFcId &&
+            lrPort.mWwpn) {
+            return ZTSRemotePort{.mWwpn = *lrPort.mWwpn, .mWwnn = lrPort.mWwnn, .mFcId = aFcId};
+        }
+    }
+    return std::nullopt;
+}
+
+/// Adds what waits to the batch; waits for something where the batch is empty. False: the thread is to end.
+bool ZTCHistoryWorker::nextBatch(std::deque<ZTCJob>& arBatch) {
+    std::unique_lock lLock(mMutex);
+    const auto lHasWork = [this] { return mIsStopping || mIsFinishing || !mQueue.empty(); };
+    if (arBatch.empty()) {
+        mWake.wait_until(lLock, mHasMoreToRetire ? mLastUpkeep : mLastUpkeep + scUpkeepPeriod, lHasWork);
+    }
+    std::ranges::move(mQueue, std::back_inserter(arBatch));
+    mQueue.clear();
+    return !mIsStopping && !(mIsFinishing && arBatch.empty());
+}
+
+void ZTCHistoryWorker::run() {
+    std::deque<ZTCJob> lBatch;
+    if (openStore()) {
+        while (nextBatch(lBatch)) {
+            work(lBatch);
+        }
+        bool lIsFinished = false;
+        {
+            const std::lock_guard lLock(mMutex);
+            lIsFinished = mIsFinishing && !mIsStopping;
+        }
+        if (lIsFinished) {
+            closeRun();
+        }
+        mpStore.reset();
+        const std::lock_guard lLock(mMutex);
+        mIsDone = lIsFinished;
+    }
+    mWake.notify_all();
+    ring();
+}
+
+/// Stores as much of the batch as one transaction takes. What is not stored stays in the batch.
+void ZTCHistoryWorker::work(std::deque<ZTCJob>& arBatch) {
+    try {
+        ZTSStoreLimits lLimits;
+        bool lHasLimits = false;
+        {
+            const std::lock_guard lLock(mMutex);
+            lHasLimits = std::exchange(mHasNewLimits, false);
+            lLimits = mLimits;
+        }
+        if (lHasLimits) {
+            mpStore->setLimits(lLimits);
+        }
+        storeBatch(arBatch);
+        if (!mLastProblem.empty()) {
+            setProblem("");
+        }
+        upkeep();
+        return;
+    } catch (const ZTCStoreDamagedEx& lrEx) {
+        setProblem(lrEx.what());
+        try {
+            mpStore->reopen();
+            beginRun();
+            return;
+        } catch (const ZTCStoreEx& lrReopenEx) {
+            setProblem(lrReopenEx.what());
+        }
+    } catch (const ZTCStoreEx& lrEx) {
+        setProblem(lrEx.what());
+    } catch (const ZTCSpoolTroubleEx& lrEx) {
+        setProblem(lrEx.what());
+    }
+    syncWaiting(arBatch);
+    pause(scRetryPause);
+}
+
+void ZTCHistoryWorker::storeBatch(std::deque<ZTCJob>& arBatch) {
+    if (arBatch.empty()) {
+        return;
+    }
+    const auto lBegin = steady_clock::now();
+    mBatchFrames = 0;
+    mBatchRecords = 0;
+    std::size_t lCount = 0;
+    ZTCStoreTransaction lTransaction = mpStore->begin();
+    while (lCount < arBatch.size() && steady_clock::now() - lBegin < scLongestTransaction) {
+        std::visit([this](auto& arJob) { store(arJob); }, arBatch[lCount]);
+        ++lCount;
+    }
+    lTransaction.commit();
+    settle(arBatch, lCount);
+    syncWaiting(arBatch);
+}
+
+/// Behind the commit: removes what is stored from the spool and from the batch.
+void ZTCHistoryWorker::settle(std::deque<ZTCJob>& arBatch, std::size_t aCount) {
+    const std::size_t lOpenEpisodes = mpStore->countOpenEpisodes();
+    {
+        const std::lock_guard lLock(mMutex);
+        mState.mTakenFrames += mBatchFrames;
+        mState.mTakenRecords += mBatchRecords;
+        mState.mOpenEpisodes = lOpenEpisodes;
+        if (mBatchFrames != 0) {
+            mState.mLastTaken = getHistoryTime();
+        }
+    }
+    for (; aCount > 0; --aCount) {
+        if (const auto* lpFrame = std::get_if<ZTSFrameJob>(&arBatch.front())) {
+            mrSpool.remove(lpFrame->mEntry.mName);
+            const std::lock_guard lLock(mMutex);
+            --mState.mWaitingFrames;
+            mState.mWaitingBytes -= lpFrame->mEntry.mSize;
+        } else if (const auto* lpAgent = std::get_if<ZTSEndedAgent>(&arBatch.front())) {
+            if (!lpAgent->mPagePath.empty()) {
+                unlink(lpAgent->mPagePath.c_str());
+            }
+        } else if (const auto* lpMark = std::get_if<ZTSMarkJob>(&arBatch.front())) {
+            const std::lock_guard lLock(mMutex);
+            mMarkResults.push_back(lpMark->mMark);
+        }
+        arBatch.pop_front();
+    }
+    ring();
+}
+
+/// A power cut must not cost more than the last second: what has to wait longer is written to the disk as it is.
+void ZTCHistoryWorker::syncWaiting(std::deque<ZTCJob>& arBatch) {
+    const auto lNow = steady_clock::now();
+    for (ZTCJob& lrJob : arBatch) {
+        auto* lpFrame = std::get_if<ZTSFrameJob>(&lrJob);
+        if (lpFrame == nullptr || lpFrame->mIsSynced || lNow - lpFrame->mSince < scLongestUnsynced) {
+            continue;
+        }
+        try {
+            mrSpool.sync(lpFrame->mEntry.mName);
+            lpFrame->mIsSynced = true;
+        } catch (const ZTCSpoolTroubleEx& lrEx) {
+            setProblem(lrEx.what());
+            return;
+        }
+    }
+}
+
+void ZTCHistoryWorker::upkeep() {
+    const auto lNow = steady_clock::now();
+    if (lNow - mLastCheckpoint >= scCheckpointPeriod) {
+        mLastCheckpoint = lNow;
+        mpStore->checkpoint();
+    }
+    if (lNow - mLastUpkeep < scUpkeepPeriod && !mHasMoreToRetire) {
+        return;
+    }
+    mLastUpkeep = lNow;
+    ZTCStoreTransaction lTransaction = mpStore->begin();
+    mpStore->noteRunning(getHistoryTime());
+    closeEpisodes();
+    lTransaction.commit();
+    mHasMoreToRetire = mpStore->retireStep(getHistoryTime(), lNow);
+}
+
+void ZTCHistoryWorker::closeRun() {
+    try {
+        ZTCStoreTransaction lTransaction = mpStore->begin();
+        mpStore->noteCoverage(getHistoryTime(), {});
+        mpStore->endRun(getHistoryTime());
+        lTransaction.commit();
+    } catch (const ZTCStoreEx& lrEx) {
+        mReport(std::string("the end of this run is not in the history: ") + lrEx.what());
+    }
+}
+
+// ---- what is stored; each within a transaction ----
+
+void ZTCHistoryWorker::closeEpisodes() {
+    mpStore->closeEpisodes(getHistoryTime(), [this](const ZTSInitiator& acrInitiator, ZTCKindKey aKind) {
+        return mpPage == nullptr || holdsNothing(*mpPage, acrInitiator, aKind);
+    });
+}
+
+void ZTCHistoryWorker::storePage(const ZTCPagePointer& acrPage) {
+    const std::vector<ZTSPageCounts> lCounts = toPageCounts(*acrPage);
+    mpStore->noteLedger(acrPage->mStartId, lCounts);
+    mpPage = acrPage;
+}
+
+void ZTCHistoryWorker::setAside(const ZTSFrameJob& acrJob, const std::string& acrReason) {
+    const std::string lPath = mrSpool.pathOf(acrJob.mEntry.mName);
+    mReport(acrReason + ": it is set aside as " + lPath + ".unreadable, and a gap is written");
+    rename(lPath.c_str(), (lPath + ".unreadable").c_str());
+    ZTSGap lGap;
+    lGap.mFrom = lGap.mTo = getHistoryTime();
+    lGap.mReason = "a spooled response cannot be read: " + acrJob.mEntry.mName.toText();
+    lGap.mGeneration = acrJob.mEntry.mName.mGeneration;
+    mpStore->noteGap(lGap);
+}
+
+void ZTCHistoryWorker::store(ZTSFrameJob& arJob) {
+    const ZTSSpoolName& lrName = arJob.mEntry.mName;
+    if (!mpStore->hasFrame(lrName.mNumber)) {
+        std::vector<std::uint8_t> lBytes;
+        try {
+            lBytes = mrSpool.read(lrName);
+        } catch (const ZTCSpoolTroubleEx& lrEx) {
+            setAside(arJob, lrEx.what());
+            return;
+        }
+        const ZTSSpooledBody lBody = readSpooledBody(lBytes);
+        const ZTSTakenIn lTaken = mpStore->takeIn(lrName.mNumber, lrName.mGeneration, lBody.mBody,
+                                                  lrName.mState == ZTSPS_Torn || !lBody.isWhole(), getHistoryTime());
+        if (!lTaken.mProblem.empty()) {
+            mReport(mrSpool.pathOf(lrName) + ": " + lTaken.mProblem + "; its " + std::to_string(lTaken.mRecords) +
+                    " whole records are stored");
+        }
+        mpStore->setValue(scLastTakenValue, std::to_string(toMicroseconds(getHistoryTime())));
+        ++mBatchFrames;
+        mBatchRecords += lTaken.mRecords;
+    }
+    if (arJob.mpPage != nullptr) {
+        storePage(arJob.mpPage);
+    }
+}
+
+void ZTCHistoryWorker::store(ZTSPageJob& arJob) {
+    noteSeen(arJob.mpPage->mStartId);
+    storePage(arJob.mpPage);
+    const std::vector<ZTSKindStateNow> lStates = toKindStates(*arJob.mpPage);
+    mpStore->noteCoverage(getHistoryTime(), lStates);
+    closeEpisodes();
+}
+
+void ZTCHistoryWorker::store(ZTSEndedAgent& arAgent) {
+    if (arAgent.mpPage != nullptr) {
+        storePage(arAgent.mpPage);
+    }
+    if (mpStore->endAgent(arAgent.mGeneration, arAgent.mFrom, arAgent.mTo, arAgent.mIsVanished, arAgent.mReason)) {
+        mReport("a gap is in the history: " + arAgent.mReason);
+    }
+    if (mpPage != nullptr && mpPage->mStartId == arAgent.mGeneration) {
+        mpPage = nullptr;
+        mpStore->noteCoverage(arAgent.mTo, {});
+    }
+    noteEnded(arAgent.mGeneration);
+    closeEpisodes();
+}
+
+void ZTCHistoryWorker::noteSeen(const std::string& acrGeneration) {
+    const std::string lRunning = mpStore->getValue(scRunningValue);
+    if (lRunning.find(acrGeneration + " ") == std::string::npos) {
+        mpStore->setValue(scRunningValue, lRunning + acrGeneration + " ");
+    }
+}
+
+void ZTCHistoryWorker::noteEnded(const std::string& acrGeneration) {
+    std::string lRunning = mpStore->getValue(scRunningValue);
+    const std::size_t lAt = lRunning.find(acrGeneration + " ");
+    if (lAt != std::string::npos) {
+        mpStore->setValue(scRunningValue, lRunning.erase(lAt, acrGeneration.size() + 1));
+    }
+}
+
+void ZTCHistoryWorker::store(ZTSForgottenJob& arJob) {
+    std::istringstream lRunning(mpStore->getValue(scRunningValue));
+    std::int64_t lLastTaken = 0;
+    std::istringstream(mpStore->getValue(scLastTakenValue)) >> lLastTaken;
+    const ZTCHistoryTime lFrom = lLastTaken == 0 ? getHistoryTime() : fromMicroseconds(lLastTaken);
+    std::string lGeneration;
+    while (lRunning >> lGeneration) {
+        if (lGeneration != arJob.mRunningGeneration) {
+            ZTSEndedAgent lAgent;
+            lAgent.mGeneration = lGeneration;
+            lAgent.mTo = getHistoryTime();
+            lAgent.mFrom = lFrom;
+            lAgent.mIsVanished = true;
+            lAgent.mReason = "the agent vanished without a trace: the host went down, or its directory was removed";
+            store(lAgent);
+        }
+    }
+}
+
+void ZTCHistoryWorker::store(ZTSPortsJob& arJob) {
+    for (const ZTSTopologyInitiator& lrPort : arJob.mpPorts->mInitiators) {
+        if (lrPort.mWwpn) {
+            mpStore->noteInitiator({.mWwpn = lrPort.mWwpn, .mWwnn = lrPort.mWwnn, .mHost = lrPort.mHost});
+        }
+    }
+    for (const ZTSTopologyRemotePort& lrPort : arJob.mpPorts->mRemotePorts) {
+        if (lrPort.mWwpn) {
+            mpStore->noteRemotePort({.mWwpn = *lrPort.mWwpn, .mWwnn = lrPort.mWwnn, .mFcId = lrPort.mFcId});
+        }
+    }
+    const std::lock_guard lLock(mMutex);
+    mpPorts = arJob.mpPorts;
+}
+
+void ZTCHistoryWorker::store(ZTSMarkJob& arJob) {
+    mpStore->setMark(arJob.mMark.mName, arJob.mMark.mTime);
+}
