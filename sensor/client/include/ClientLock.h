@@ -15,6 +15,16 @@ public:
     /// where the lock file cannot be opened or locked.
     bool tryAcquire();
     void release() noexcept { mFile.reset(); }
+
+    /// Writes the own pid into the lock that is held. A sensor does that, which holds it as long as it runs; a client
+    /// that talks for a moment does not. Throws ZTCSystemCallEx.
+    void nameHolder();
+    /// The process that has written its pid there, runs, and is not this one; 0 where the holder is only a client, or
+    /// nobody. Ask when tryAcquire() has said false.
+    long getNamedHolder() const;
+    /// One line about who holds the lock.
+    std::string describeHolder() const;
+
     bool isHeld() const { return mFile.isOpen(); }
     const std::string& getPath() const { return mPath; }
 

@@ -116,7 +116,11 @@ bool ZTCFifoConversation::tryOpenResponseFifo() {
 bool ZTCFifoConversation::tryTakeLock() {
     if (!mLock.tryAcquire()) {
         mObstacle = ZTNA_LockHeld;
-        mObstacleText = "another client holds " + mLock.getPath();
+        mObstacleText = mLock.describeHolder();
+        if (mLock.getNamedHolder() != 0) {
+            throw ZTCNoAnswerEx(mObstacle, "no turn to talk in " + mDirectory + ": " + mObstacleText +
+                                               " as long as it runs; ask it with 'tavik', or stop it");
+        }
         return false;
     }
     return true;

@@ -1,0 +1,69 @@
+#include <fcntl.h>
+#include <unistd.h>
+
+#include <CLI/CLI.hpp>
+#include <cstdio>
+
+#include "sensor/client/include/ClientErrors.h"
+#include "sensor/keeper/include/HostWorld.h"
+#include "sensor/keeper/include/KeeperLoop.h"
+
+enum ZTEExitStatus { ZTEX_Done = 0, ZTEX_Failed = 1, ZTEX_BadSettings = 2 };
+
+/// Descriptors 0 to 2 belong to the standard streams even where the parent has closed them: nothing else may get them.
+static void sReserveStandardStreams() {
+    int lDescriptor;
+    do {
+        lDescriptor = open("/dev/null", O_RDWR);
+    } while (lDescriptor >= 0 && lDescriptor <= STDERR_FILENO);
+    if (lDescriptor >= 0) {
+        close(lDescriptor);
+    }
+}
+
+static void sPrint(const std::vector<ZTSSettingsProblem>& acrProblems) {
+    for (const ZTSSettingsProblem& lcrProblem : acrProblems) {
+        std::fprintf(stderr, "%s\n", lcrProblem.toText().c_str());
+    }
+}
+
+static ZTEExitStatus sRun(const std::string& acrConfigOption, bool aIsCheck) {
+    const ZTSSettingsReading lReading = readSettings(acrConfigOption);
+    sPrint(lReading.mErrors);
+    sPrint(lReading.mNotes);
+    if (!lReading.isGood()) {
+        return ZTEX_BadSettings;
+    }
+    if (aIsCheck) {
+        return ZTEX_Done;
+    }
+    const ZTCFileDescriptor lSignals = openSignals();
+    ZTCHostWorld lWorld(lReading, acrConfigOption);
+    return runKeeper(lWorld, lSignals) == 0 ? ZTEX_Done : ZTEX_Failed;
+}
+
+int main(int aCount, char** appArguments) {
+    sReserveStandardStreams();
+    std::string lConfigOption;
+    bool lIsCheck = false;
+    CLI::App lApp{"Keeps the Fibre Channel event agent and the collector running, in the foreground.", "tavik-sensor"};
+    lApp.set_version_flag("--version", "tavik-sensor v" TAVIK_VERSION);
+    lApp.add_option("--config", lConfigOption,
+                    "The configuration file; default: $TAVIK_CONFIG, else " + std::string(gcDefaultSettingsFile));
+    lApp.add_flag("--check", lIsCheck, "Report what is wrong with the configuration file, and start nothing");
+    lApp.footer(
+        "SIGTERM and SIGINT stop in order, SIGHUP reads the configuration file again.\n"
+        "Exit status: 0 done, 1 failed, or another sensor runs, 2 wrong use or a bad configuration file.");
+    try {
+        lApp.parse(aCount, appArguments);
+        return sRun(lConfigOption, lIsCheck);
+    } catch (const CLI::Success& lcrSuccess) {
+        return lApp.exit(lcrSuccess);
+    } catch (const CLI::ParseError& lcrError) {
+        std::fprintf(stderr, "tavik-sensor: %s\n", lcrError.what());
+        return ZTEX_BadSettings;
+    } catch (const std::exception& lcrEx) {
+        sayLine(lcrEx.what());
+        return ZTEX_Failed;
+    }
+}
