@@ -17,9 +17,9 @@
 #include <utility>
 #include <vector>
 
+#include "libkpm/common/include/LibraryThread.h"
 #include "libkpm/sim/src/Report.h"
 #include "libkpm/sim/src/Scenario.h"
-#include "libkpm/sim/src/SimThread.h"
 
 static constexpr std::size_t gcMaxClients = 32;
 static constexpr int gcAcceptPause = 100;  // ms that a client waits while the process has no descriptor left
@@ -52,7 +52,7 @@ ZTCSimControlSocket::ZTCSimControlSocket(std::string aPath, Answer aAnswer)
     removeStale();
     listenOn(lAddress);
     try {
-        mThread = startSimThread([this] { serve(); });
+        mThread = startLibraryThread([this] { serve(); });
     } catch (...) {
         ::unlink(mPath.c_str());
         throw;

@@ -7,17 +7,10 @@
 #include <string>
 #include <utility>
 
+#include "libkpm/common/include/Callbacks.h"
+#include "libkpm/common/include/LibraryThread.h"
+#include "libkpm/common/include/PortName.h"
 #include "libkpm/sim/src/Report.h"
-#include "libkpm/sim/src/SimThread.h"
-
-static bool sIsSameName(const HBA_wwn& acrOne, const HBA_wwn& acrOther) {
-    return std::memcmp(acrOne.wwn, acrOther.wwn, sizeof acrOne.wwn) == 0;
-}
-
-static bool sIsAccepted(std::uint32_t aStatus) {
-    return aStatus == KPM_STATUS_SUCCESS || aStatus == KPM_STATUS_INFO_5 || aStatus == KPM_STATUS_NO_SOURCE ||
-           aStatus == KPM_STATUS_NO_RIGHTS;
-}
 
 /// Memory that lives for one callback: what a callback is given stands at the end of its block, at an odd address
 /// unless the scenario wants it aligned, and is overwritten before it is freed. An agent that keeps a pointer, reads
@@ -46,8 +39,9 @@ private:
 };
 
 ZTCSimEngine::ZTCSimEngine(ZTSSimScenario aScenario)
-    : mScenario(std::move(aScenario)),
-      mRegistry(mScenario.mAdapters.size()),
+    : ZTCRegistrationDesk(gcScopeEventKindCount),
+      mScenario(std::move(aScenario)),
+      mSources(mScenario.mAdapters.size()),
       mCount(mScenario.mCount.value_or(static_cast<std::uint32_t>(mScenario.mAdapters.size()))),
       mLinkTags(mScenario.mAdapters.size()),
       mAnswerUses(mScenario.mAnswers.size()) {}
@@ -56,36 +50,58 @@ ZTCSimEngine::~ZTCSimEngine() {
     stop();
 }
 
+static std::uint64_t sGetDueTime(const ZTSSimCountChange& acrChange, std::uint64_t) {
+    return acrChange.mAt;
+}
+
+static std::uint64_t sGetDueTime(const ZTSSimState& acrState, std::uint64_t) {
+    return acrState.mAt;
+}
+
+static std::uint64_t sGetDueTime(const ZTSSimEvent& acrEvent, std::uint64_t aOccurrence) {
+    return acrEvent.mAt + aOccurrence * acrEvent.mEvery;
+}
+
+static std::uint64_t sGetDueTime(const ZTSSimLoss& acrLoss, std::uint64_t aOccurrence) {
+    return acrLoss.mAt + aOccurrence * acrLoss.mEvery;
+}
+
+static std::uint64_t sGetDueTime(const ZTSSimStorm& acrStorm, std::uint64_t aOccurrence) {
+    return acrStorm.mAt + aOccurrence * acrStorm.mOver / acrStorm.mCount;
+}
+
 std::uint64_t ZTCSimEngine::Share::getDueTime() const {
-    if (mpCountChange != nullptr) {
-        return mpCountChange->mAt;
-    }
-    if (mpEvent != nullptr) {
-        return mpEvent->mAt + mNext * mpEvent->mEvery;
-    }
-    return mpStorm->mAt + mNext * mpStorm->mOver / mpStorm->mCount;
+    return std::visit([this](const auto* apLine) { return sGetDueTime(*apLine, mNext); }, mLine);
 }
 
 std::vector<ZTCSimEngine::Lane> ZTCSimEngine::makeLanes() const {
     std::vector<Lane> lLanes;
     Lane lTimer;
     for (const ZTSSimCountChange& lrChange : mScenario.mCountChanges) {
-        lTimer.push_back({nullptr, nullptr, &lrChange, 0, 1, 1});
+        lTimer.push_back({&lrChange, 0, 1, 1});
+    }
+    for (const ZTSSimState& lrState : mScenario.mStates) {
+        if (lrState.mIsTimed) {
+            lTimer.push_back({&lrState, 0, 1, 1});
+        }
+    }
+    for (const ZTSSimLoss& lrLoss : mScenario.mLosses) {
+        lTimer.push_back({&lrLoss, 0, 1, lrLoss.mTimes});
     }
     for (const ZTSSimEvent& lrEvent : mScenario.mEvents) {
         if (lrEvent.mThreads == 1) {
-            lTimer.push_back({&lrEvent, nullptr, nullptr, 0, 1, lrEvent.mTimes});
+            lTimer.push_back({&lrEvent, 0, 1, lrEvent.mTimes});
             continue;
         }
         for (std::uint64_t lThread = 0; lThread < lrEvent.mThreads; ++lThread) {
             if (lrEvent.mTimes == 0 || lThread < lrEvent.mTimes) {
-                lLanes.push_back({{&lrEvent, nullptr, nullptr, lThread, lrEvent.mThreads, lrEvent.mTimes}});
+                lLanes.push_back({{&lrEvent, lThread, lrEvent.mThreads, lrEvent.mTimes}});
             }
         }
     }
     for (const ZTSSimStorm& lrStorm : mScenario.mStorms) {
         for (std::uint64_t lThread = 0; lThread < std::min(lrStorm.mThreads, lrStorm.mCount); ++lThread) {
-            lLanes.push_back({{nullptr, &lrStorm, nullptr, lThread, lrStorm.mThreads, lrStorm.mCount}});
+            lLanes.push_back({{&lrStorm, lThread, lrStorm.mThreads, lrStorm.mCount}});
         }
     }
     if (!lTimer.empty()) {
@@ -95,6 +111,11 @@ std::vector<ZTCSimEngine::Lane> ZTCSimEngine::makeLanes() const {
 }
 
 void ZTCSimEngine::start() {
+    for (const ZTSSimState& lrState : mScenario.mStates) {
+        if (!lrState.mIsTimed) {
+            mSources.change(lrState);
+        }
+    }
     std::vector<Lane> lLanes = makeLanes();
     mThreads.reserve(lLanes.size());
     {
@@ -103,7 +124,7 @@ void ZTCSimEngine::start() {
     }
     try {
         for (Lane& lrLane : lLanes) {
-            mThreads.push_back(startSimThread([this, lLane = std::move(lrLane)] { runLane(lLane); }));
+            mThreads.push_back(startLibraryThread([this, lLane = std::move(lrLane)] { runLane(lLane); }));
         }
     } catch (...) {
         stop();
@@ -191,14 +212,21 @@ void ZTCSimEngine::runLane(Lane aLane) {
 }
 
 std::uint64_t ZTCSimEngine::play(const Share& acrShare) {
-    if (acrShare.mpCountChange != nullptr) {
-        mCount.store(acrShare.mpCountChange->mCount, std::memory_order_relaxed);
+    if (const auto* lpChange = std::get_if<const ZTSSimCountChange*>(&acrShare.mLine)) {
+        mCount.store((*lpChange)->mCount, std::memory_order_relaxed);
         return 0;
     }
-    if (acrShare.mpEvent != nullptr) {
-        return deliverToBoards(*acrShare.mpEvent, acrShare.mNext);
+    if (const auto* lpState = std::get_if<const ZTSSimState*>(&acrShare.mLine)) {
+        return mSources.change(**lpState);
     }
-    return deliverToBoards(drawSimEvent(*acrShare.mpStorm, acrShare.mNext), 0);
+    if (const auto* lpLoss = std::get_if<const ZTSSimLoss*>(&acrShare.mLine)) {
+        mSources.lose(**lpLoss);
+        return 1;
+    }
+    if (const auto* lpEvent = std::get_if<const ZTSSimEvent*>(&acrShare.mLine)) {
+        return deliverToBoards(**lpEvent, acrShare.mNext);
+    }
+    return deliverToBoards(drawSimEvent(*std::get<const ZTSSimStorm*>(acrShare.mLine), acrShare.mNext), 0);
 }
 
 std::uint64_t ZTCSimEngine::deliverToBoards(const ZTSSimEvent& acrEvent, std::uint64_t aOccurrence) {
@@ -219,7 +247,7 @@ std::uint64_t ZTCSimEngine::deliverToBoards(const ZTSSimEvent& acrEvent, std::ui
     return lDelivered;
 }
 
-void ZTCSimEngine::callScope(const ZTSSimRegistration& acrRegistration, const ZTSSimDelivery& acrDelivery) const {
+void ZTCSimEngine::lendToScope(const ZTSLibraryRegistration& acrRegistration, const ZTSSimDelivery& acrDelivery) const {
     const bool lIsOdd = mScenario.mHasOddAddresses;
     const ZTCSimLoan lData(acrDelivery.mData.data(), acrDelivery.mData.size(), lIsOdd);
     ZT_event_payload lPayload{};
@@ -230,39 +258,36 @@ void ZTCSimEngine::callScope(const ZTSSimRegistration& acrRegistration, const ZT
     lEvent.zt_evt_size = acrDelivery.mEventSize;
     lEvent.zt_evt_payload = acrDelivery.mIsPayloadNull ? nullptr : lLentPayload.get();
     const ZTCSimLoan lLentEvent(&lEvent, sizeof lEvent, lIsOdd);
-    acrRegistration.mpScopeCallback(acrDelivery.mToldBoard, acrDelivery.mLocal, acrDelivery.mCategory,
-                                    acrDelivery.mSubcategory, acrRegistration.mpContext,
-                                    static_cast<ZT_event*>(lLentEvent.get()));
+    callScope(acrRegistration, acrDelivery.mToldBoard, acrDelivery.mLocal, acrDelivery.mCategory,
+              acrDelivery.mSubcategory, static_cast<ZT_event*>(lLentEvent.get()));
 }
 
 bool ZTCSimEngine::deliver(const ZTSSimDelivery& acrDelivery) {
-    const std::optional<ZTSSimRegistration> lRegistration = mRegistry.find(acrDelivery.mBoard, acrDelivery.mKind);
-    if (!lRegistration || !lRegistration->mHasSource) {
+    const std::optional<ZTSLibraryRegistration> lRegistration =
+        getRegistry().find(acrDelivery.mBoard, acrDelivery.mKind);
+    if (!lRegistration || !lRegistration->mHasSource || !mSources.isWorking(acrDelivery.mBoard, acrDelivery.mKind)) {
         mDropped.fetch_add(1, std::memory_order_relaxed);
         return false;
     }
-    const ZTESimDelivery lDelivery = getSimKind(acrDelivery.mKind).mDelivery;
-    // The detour over void(*)(): a generic function pointer that the compiler knows as such.
-    const auto lpGeneric = reinterpret_cast<void (*)()>(lRegistration->mpEventCallback);
     const std::vector<std::uint8_t>& lrData = acrDelivery.mData;
-    switch (lDelivery) {
+    switch (getSimKind(acrDelivery.mKind).mDelivery) {
         case ZTSD_Scope:
-            callScope(*lRegistration, acrDelivery);
+            lendToScope(*lRegistration, acrDelivery);
             break;
         case ZTSD_Link: {
             const ZTCSimLoan lInfo(lrData.data(), lrData.size(), mScenario.mHasOddAddresses);
-            reinterpret_cast<KPM_LinkCallback>(lpGeneric)(acrDelivery.mToldBoard, lInfo.get());
+            callLink(*lRegistration, acrDelivery.mToldBoard, lInfo.get());
             break;
         }
         case ZTSD_Rscn: {
             const ZTCSimLoan lPayload(lrData.data(), lrData.size(), mScenario.mHasOddAddresses);
-            reinterpret_cast<KPM_RscnCallback>(lpGeneric)(acrDelivery.mToldBoard, lPayload.get(), acrDelivery.mLength);
+            callRscn(*lRegistration, acrDelivery.mToldBoard, lPayload.get(), acrDelivery.mLength);
             break;
         }
         case ZTSD_Temperature: {
             unsigned lValues[2];
             std::memcpy(lValues, lrData.data(), sizeof lValues);
-            reinterpret_cast<KPM_TemperatureCallback>(lpGeneric)(acrDelivery.mToldBoard, lValues[0], lValues[1]);
+            callTemperature(*lRegistration, acrDelivery.mToldBoard, lValues[0], lValues[1]);
             break;
         }
     }
@@ -272,14 +297,35 @@ bool ZTCSimEngine::deliver(const ZTSSimDelivery& acrDelivery) {
     return true;
 }
 
+/// All occurrences of a line, for as many threads as it asks for.
+static std::pair<std::uint64_t, std::uint64_t> sGetTimesAndThreads(const ZTSSimEventLine& acrLine) {
+    struct Visitor {
+        std::pair<std::uint64_t, std::uint64_t> operator()(const ZTSSimEvent& acrEvent) const {
+            return {acrEvent.mTimes, acrEvent.mThreads};
+        }
+        std::pair<std::uint64_t, std::uint64_t> operator()(const ZTSSimStorm& acrStorm) const {
+            return {acrStorm.mCount, acrStorm.mThreads};
+        }
+        std::pair<std::uint64_t, std::uint64_t> operator()(const ZTSSimState&) const { return {1, 1}; }
+        std::pair<std::uint64_t, std::uint64_t> operator()(const ZTSSimLoss& acrLoss) const {
+            return {acrLoss.mTimes, 1};
+        }
+    };
+    return std::visit(Visitor{}, acrLine);
+}
+
 std::uint64_t ZTCSimEngine::inject(const ZTSSimEventLine& acrLine) {
-    const auto* lpEvent = std::get_if<ZTSSimEvent>(&acrLine);
-    const auto* lpStorm = lpEvent != nullptr ? nullptr : &std::get<ZTSSimStorm>(acrLine);
-    const std::uint64_t lEnd = lpEvent != nullptr ? lpEvent->mTimes : lpStorm->mCount;
-    const std::uint64_t lThreads = std::min(lpEvent != nullptr ? lpEvent->mThreads : lpStorm->mThreads, lEnd);
+    const auto [lEnd, lAskedThreads] = sGetTimesAndThreads(acrLine);
+    const std::uint64_t lThreads = std::min(lAskedThreads, lEnd);
+    const Share lWhole = std::visit(
+        [lStride = lThreads, lLast = lEnd](const auto& acrOf) {
+            return Share{&acrOf, 0, lStride, lLast};
+        },
+        acrLine);
     std::atomic<std::uint64_t> lDelivered{0};
     const auto lDeliver = [&](std::uint64_t aFirst) {
-        Share lShare{lpEvent, lpStorm, nullptr, aFirst, lThreads, lEnd};
+        Share lShare = lWhole;
+        lShare.mNext = aFirst;
         while (!mIsStopping.load(std::memory_order_relaxed)) {
             lDelivered.fetch_add(play(lShare), std::memory_order_relaxed);
             if (lShare.isLast()) {
@@ -301,7 +347,7 @@ std::uint64_t ZTCSimEngine::inject(const ZTSSimEventLine& acrLine) {
     };
     try {
         for (std::uint64_t lThread = 1; lThread < lThreads; ++lThread) {
-            lHelpers.push_back(startSimThread([&lDeliverGuarded, lThread] { lDeliverGuarded(lThread); }));
+            lHelpers.push_back(startLibraryThread([&lDeliverGuarded, lThread] { lDeliverGuarded(lThread); }));
         }
     } catch (...) {
         const std::lock_guard<std::mutex> lGuard(lProblemLock);
@@ -332,20 +378,62 @@ std::optional<ZTSSimAnswer> ZTCSimEngine::findAnswer(ZTESimOperation aOperation,
     return std::nullopt;
 }
 
-std::uint32_t ZTCSimEngine::getAdapterInfo(std::uint32_t aIndex, HBA_wwn* apNodeName, HBA_wwn* apPortName) {
-    if (apNodeName == nullptr || apPortName == nullptr) {
-        return ZTLST_NullPointer;
+std::uint32_t ZTCSimEngine::getNumberOfBoardsEver() const {
+    return static_cast<std::uint32_t>(mScenario.mAdapters.size());
+}
+
+std::uint32_t ZTCSimEngine::answerAdapterInfo(std::uint32_t aBoard, ZTSBoardNames& arNames) {
+    arNames = {mScenario.mAdapters[aBoard].mWwnn, mScenario.mAdapters[aBoard].mWwpn};
+    return findAnswer(ZTSO_GetAdapterInfo, std::nullopt, aBoard).value_or(ZTSSimAnswer{}).mStatus;
+}
+
+bool ZTCSimEngine::isPortOf(std::uint32_t aBoard, const HBA_wwn& acrPort) const {
+    return isSameName(acrPort, mScenario.mAdapters[aBoard].mWwpn);
+}
+
+std::optional<std::size_t> ZTCSimEngine::findKind(std::uint32_t aCategory, std::uint32_t aSubcategory) const {
+    return findRegisteredKindIndex(aCategory, aSubcategory);
+}
+
+/// How the registration of a kind is answered that is in this state.
+static ZTSSimAnswer sAnswerState(std::size_t aKind, std::uint32_t aState) {
+    ZTSSimAnswer lAnswer;
+    if (aState == KPM_STATE_NO_SOURCE) {
+        lAnswer.mStatus = KPM_STATUS_NO_SOURCE;
+        // The agent starts without temperatures, but not without a handle for the others.
+        if (getSimKind(aKind).mDelivery == ZTSD_Temperature) {
+            lAnswer.mHandle = 0;
+        }
+    } else if (aState == KPM_STATE_NO_RIGHTS) {
+        lAnswer.mStatus = KPM_STATUS_NO_RIGHTS;
     }
-    if (aIndex >= getNumberOfAdapters()) {
-        return ZTLST_NoSuchBoard;
+    return lAnswer;
+}
+
+/// What a registration that answers with a handle alone says through its report.
+static ZTSSimSource sDescribe(const ZTSSimAnswer& acrAnswer) {
+    switch (acrAnswer.mStatus) {
+        case KPM_STATUS_SUCCESS:
+        case KPM_STATUS_INFO_5:
+            return acrAnswer.mHandle == 0u ? ZTSSimSource{KPM_STATE_FAILED, "no handle is given"} : ZTSSimSource{};
+        case KPM_STATUS_NO_SOURCE:
+            return {KPM_STATE_NO_SOURCE, ""};
+        case KPM_STATUS_NO_RIGHTS:
+            return {KPM_STATE_NO_RIGHTS, ""};
+        default:
+            return {KPM_STATE_FAILED, "refused with status " + std::to_string(acrAnswer.mStatus)};
     }
-    const std::optional<ZTSSimAnswer> lAnswer = findAnswer(ZTSO_GetAdapterInfo, std::nullopt, aIndex);
-    if (lAnswer && lAnswer->mStatus != ZTLST_Success) {
-        return lAnswer->mStatus;
+}
+
+ZTSRegistrationAnswer ZTCSimEngine::answerRegistration(std::uint32_t aBoard, std::size_t aKind) {
+    const std::optional<ZTSSimAnswer> lScripted = findAnswer(ZTSO_Register, aKind, aBoard);
+    const ZTSSimSource lSource = mSources.get(aBoard, aKind);
+    const ZTSSimAnswer lAnswer = lScripted.value_or(sAnswerState(aKind, lSource.mState));
+    if (!gcScopeEventKinds[aKind].isScope()) {
+        reportSimSource(aBoard, aKind, lScripted ? sDescribe(*lScripted) : lSource);
     }
-    std::memcpy(apNodeName, &mScenario.mAdapters[aIndex].mWwnn, sizeof *apNodeName);
-    std::memcpy(apPortName, &mScenario.mAdapters[aIndex].mWwpn, sizeof *apPortName);
-    return ZTLST_Success;
+    const bool lHasSource = lAnswer.mStatus != KPM_STATUS_NO_SOURCE && lAnswer.mHandle != 0u;
+    return {lAnswer.mStatus, lAnswer.mHandle, lHasSource};
 }
 
 void ZTCSimEngine::noteRegistration(std::uint32_t aBoard, std::size_t aKind) {
@@ -355,87 +443,8 @@ void ZTCSimEngine::noteRegistration(std::uint32_t aBoard, std::size_t aKind) {
     }
 }
 
-std::uint32_t ZTCSimEngine::registerForPort(std::uint32_t aBoard, const HBA_wwn& acrPort, std::uint32_t aCategory,
-                                            std::uint32_t aSubcategory, void* apContext, std::uint32_t* apHandle,
-                                            KPM_ScopeCallback apCallback) {
-    if (apHandle == nullptr || apCallback == nullptr) {
-        return ZTLST_NullPointer;
-    }
-    if (aBoard >= getNumberOfAdapters()) {
-        return ZTLST_NoSuchBoard;
-    }
-    if (!sIsSameName(acrPort, mScenario.mAdapters[aBoard].mWwpn)) {
-        return ZTLST_NotItsPort;
-    }
-    const std::optional<std::size_t> lKind = findRegisteredKindIndex(aCategory, aSubcategory);
-    if (!lKind || getSimKind(*lKind).mDelivery != ZTSD_Scope) {
-        return ZTLST_NoSuchKind;
-    }
-    const ZTSSimAnswer lAnswer = findAnswer(ZTSO_Register, lKind, aBoard).value_or(ZTSSimAnswer{});
-    if (!sIsAccepted(lAnswer.mStatus)) {
-        return lAnswer.mStatus;
-    }
-    ZTSSimRegistration lRegistration;
-    lRegistration.mHasSource = lAnswer.mStatus != KPM_STATUS_NO_SOURCE && lAnswer.mHandle != 0u;
-    lRegistration.mpContext = apContext;
-    lRegistration.mpScopeCallback = apCallback;
-    *apHandle = mRegistry.put(aBoard, *lKind, lRegistration, lAnswer.mHandle);
-    noteRegistration(aBoard, *lKind);
-    return lAnswer.mStatus;
-}
-
-std::uint32_t ZTCSimEngine::registerForBoard(std::uint32_t aBoard, std::uint32_t aEventType, void* apContext,
-                                             KPM_EventCallback apCallback) {
-    const std::optional<std::size_t> lKind = findRegisteredKindIndex(0, aEventType);
-    if (apCallback == nullptr || aBoard >= getNumberOfAdapters() || !lKind) {
-        return 0;
-    }
-    const ZTSSimAnswer lAnswer = findAnswer(ZTSO_Register, lKind, aBoard).value_or(ZTSSimAnswer{});
-    if (!sIsAccepted(lAnswer.mStatus) || lAnswer.mHandle == 0u) {
-        return 0;
-    }
-    ZTSSimRegistration lRegistration;
-    lRegistration.mHasSource = lAnswer.mStatus != KPM_STATUS_NO_SOURCE;
-    lRegistration.mpContext = apContext;
-    lRegistration.mpEventCallback = apCallback;
-    const std::uint32_t lHandle = mRegistry.put(aBoard, *lKind, lRegistration, lAnswer.mHandle);
-    noteRegistration(aBoard, *lKind);
-    return lHandle;
-}
-
-std::uint32_t ZTCSimEngine::unregisterForPort(std::uint32_t aBoard, const HBA_wwn& acrPort, std::uint32_t aHandle) {
-    if (aBoard >= mScenario.mAdapters.size()) {
-        return ZTLST_NoSuchBoard;
-    }
-    if (!sIsSameName(acrPort, mScenario.mAdapters[aBoard].mWwpn)) {
-        return ZTLST_NotItsPort;
-    }
-    const std::optional<std::size_t> lKind = mRegistry.findKind(aBoard, aHandle);
-    if (!lKind || getSimKind(*lKind).mDelivery != ZTSD_Scope) {
-        return ZTLST_NoSuchHandle;
-    }
-    const std::optional<ZTSSimAnswer> lAnswer = findAnswer(ZTSO_Unregister, lKind, aBoard);
-    if (lAnswer && lAnswer->mStatus != ZTLST_Success) {
-        return lAnswer->mStatus;
-    }
-    mRegistry.remove(aBoard, *lKind, aHandle);
-    return ZTLST_Success;
-}
-
-std::uint32_t ZTCSimEngine::unregisterForBoard(std::uint32_t aBoard, std::uint32_t aHandle) {
-    if (aBoard >= mScenario.mAdapters.size()) {
-        return ZTLST_NoSuchBoard;
-    }
-    const std::optional<std::size_t> lKind = mRegistry.findKind(aBoard, aHandle);
-    if (!lKind || getSimKind(*lKind).mDelivery == ZTSD_Scope) {
-        return ZTLST_NoSuchHandle;
-    }
-    const std::optional<ZTSSimAnswer> lAnswer = findAnswer(ZTSO_Unregister, lKind, aBoard);
-    if (lAnswer && lAnswer->mStatus != ZTLST_Success) {
-        return lAnswer->mStatus;
-    }
-    mRegistry.remove(aBoard, *lKind, aHandle);
-    return ZTLST_Success;
+std::uint32_t ZTCSimEngine::answerUnregistration(std::uint32_t aBoard, std::size_t aKind) {
+    return findAnswer(ZTSO_Unregister, aKind, aBoard).value_or(ZTSSimAnswer{}).mStatus;
 }
 
 ZTSSimStatus ZTCSimEngine::getStatus() const {
@@ -452,7 +461,7 @@ ZTSSimStatus ZTCSimEngine::getStatus() const {
     }
     lStatus.mDropped = mDropped.load(std::memory_order_relaxed);
     lStatus.mPages = mPages.load(std::memory_order_relaxed);
-    lStatus.mRegistered = mRegistry.size();
+    lStatus.mRegistered = getRegistry().size();
     lStatus.mAdapters = getNumberOfAdapters();
     return lStatus;
 }

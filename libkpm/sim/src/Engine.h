@@ -1,10 +1,10 @@
 /// Plays one scenario: answers the entry points' questions, keeps the registrations, and delivers the events of the
 /// schedule from threads of its own.
 ///
-/// Threads. One thread, the timer, delivers all lines that ask for no threads of their own and changes the number of
-/// boards; every line with threads= and every storm has its own. All are started by start(), wait for the schedule's
-/// start, and have ended when stop() returns. inject() delivers on the thread that calls it. A callback is called with
-/// no lock held.
+/// Threads. One thread, the timer, delivers all lines that ask for no threads of their own, changes the number of
+/// boards and the states of kinds, and loses what there is to lose; every line with threads= and every storm has its
+/// own. All are started by start(), wait for the schedule's start, and have ended when stop() returns. inject()
+/// delivers on the thread that calls it. A callback is called with no lock held.
 #ifndef LIBKPM_SIM_SRC_ENGINE_H
 #define LIBKPM_SIM_SRC_ENGINE_H
 
@@ -18,19 +18,20 @@
 #include <mutex>
 #include <optional>
 #include <thread>
+#include <variant>
 #include <vector>
 
-#include "libkpm/common/include/LibraryStatus.h"
+#include "libkpm/common/include/RegistrationDesk.h"
 #include "libkpm/include/libkpm.h"
 #include "libkpm/sim/src/Delivery.h"
-#include "libkpm/sim/src/Registry.h"
 #include "libkpm/sim/src/Scenario.h"
+#include "libkpm/sim/src/Sources.h"
 
 enum ZTESimSchedule : std::uint8_t { ZTSSC_Waiting, ZTSSC_Running, ZTSSC_Done };
 
 struct ZTSSimStatus {
     std::uint64_t mDelivered = 0;  ///< callbacks that have returned
-    std::uint64_t mDropped = 0;    ///< events that nothing was registered for, or that have no source
+    std::uint64_t mDropped = 0;    ///< events that nothing was registered for, that have no source, or do not work now
     std::uint64_t mPages = 0;      ///< pages of the RSCNs among the delivered
     std::array<std::uint64_t, gcSimKindCount> mDeliveredByKind{};
     std::size_t mRegistered = 0;
@@ -39,14 +40,13 @@ struct ZTSSimStatus {
 };
 
 /// All operations but start and stop may be called from any thread.
-class ZTCSimEngine {
+class ZTCSimEngine : public ZTCRegistrationDesk {
 public:
     explicit ZTCSimEngine(ZTSSimScenario aScenario);
-    ~ZTCSimEngine();
-    ZTCSimEngine(const ZTCSimEngine&) = delete;
-    ZTCSimEngine& operator=(const ZTCSimEngine&) = delete;
+    ~ZTCSimEngine() override;
 
-    /// Starts the threads. Throws std::system_error or std::bad_alloc, with none left running.
+    /// Reports the states that the scenario begins with, and starts the threads. Throws std::system_error or
+    /// std::bad_alloc, with none left running.
     void start();
 
     /// Tells the threads and inject() to end after the callback they are in. Does not wait.
@@ -57,18 +57,10 @@ public:
 
     const ZTSSimScenario& getScenario() const { return mScenario; }
 
-    std::uint32_t getNumberOfAdapters() const { return mCount.load(std::memory_order_relaxed); }
-    std::uint32_t getAdapterInfo(std::uint32_t aIndex, HBA_wwn* apNodeName, HBA_wwn* apPortName);
-    std::uint32_t registerForPort(std::uint32_t aBoard, const HBA_wwn& acrPort, std::uint32_t aCategory,
-                                  std::uint32_t aSubcategory, void* apContext, std::uint32_t* apHandle,
-                                  KPM_ScopeCallback apCallback);
-    std::uint32_t unregisterForPort(std::uint32_t aBoard, const HBA_wwn& acrPort, std::uint32_t aHandle);
-    std::uint32_t registerForBoard(std::uint32_t aBoard, std::uint32_t aEventType, void* apContext,
-                                   KPM_EventCallback apCallback);
-    std::uint32_t unregisterForBoard(std::uint32_t aBoard, std::uint32_t aHandle);
+    std::uint32_t getNumberOfAdapters() const override { return mCount.load(std::memory_order_relaxed); }
 
-    /// Delivers all occurrences of a line now and returns how many callbacks there were. Ends early when the engine
-    /// stops.
+    /// Plays all occurrences of a line now. Returns how many callbacks there were, or how many reports to the agent.
+    /// Ends early when the engine stops.
     std::uint64_t inject(const ZTSSimEventLine& acrLine);
 
     ZTSSimStatus getStatus() const;
@@ -78,9 +70,9 @@ private:
 
     /// A share of a line's occurrences: aFirst, aFirst + aStride, ... below aEnd; aEnd 0: without end.
     struct Share {
-        const ZTSSimEvent* mpEvent = nullptr;
-        const ZTSSimStorm* mpStorm = nullptr;
-        const ZTSSimCountChange* mpCountChange = nullptr;
+        std::variant<const ZTSSimCountChange*, const ZTSSimEvent*, const ZTSSimStorm*, const ZTSSimState*,
+                     const ZTSSimLoss*>
+            mLine;
         std::uint64_t mNext = 0;
         std::uint64_t mStride = 1;
         std::uint64_t mEnd = 1;
@@ -97,16 +89,23 @@ private:
     std::uint64_t play(const Share& acrShare);
     std::uint64_t deliverToBoards(const ZTSSimEvent& acrEvent, std::uint64_t aOccurrence);
     bool deliver(const ZTSSimDelivery& acrDelivery);
-    void callScope(const ZTSSimRegistration& acrRegistration, const ZTSSimDelivery& acrDelivery) const;
+    void lendToScope(const ZTSLibraryRegistration& acrRegistration, const ZTSSimDelivery& acrDelivery) const;
     std::optional<ZTSSimAnswer> findAnswer(ZTESimOperation aOperation, std::optional<std::size_t> aKind,
                                            std::uint32_t aBoard);
-    void noteRegistration(std::uint32_t aBoard, std::size_t aKind);
+
+    std::uint32_t getNumberOfBoardsEver() const override;
+    std::uint32_t answerAdapterInfo(std::uint32_t aBoard, ZTSBoardNames& arNames) override;
+    bool isPortOf(std::uint32_t aBoard, const HBA_wwn& acrPort) const override;
+    std::optional<std::size_t> findKind(std::uint32_t aCategory, std::uint32_t aSubcategory) const override;
+    ZTSRegistrationAnswer answerRegistration(std::uint32_t aBoard, std::size_t aKind) override;
+    void noteRegistration(std::uint32_t aBoard, std::size_t aKind) override;
+    std::uint32_t answerUnregistration(std::uint32_t aBoard, std::size_t aKind) override;
 
     // Constant after construction.
     const ZTSSimScenario mScenario;
 
     // With synchronisation of their own.
-    ZTCSimRegistry mRegistry;
+    ZTCSimSources mSources;
     std::atomic<std::uint32_t> mCount;
     std::atomic<bool> mIsStopping{false};
     std::vector<std::atomic<std::uint32_t>> mLinkTags;  // by board; only counted, nothing hangs on their order

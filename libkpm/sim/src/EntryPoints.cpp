@@ -7,6 +7,7 @@
 #include <string_view>
 #include <utility>
 
+#include "libkpm/common/include/AgentLink.h"
 #include "libkpm/common/include/OpenLibrary.h"
 #include "libkpm/sim/src/Control.h"
 #include "libkpm/sim/src/ControlSocket.h"
@@ -141,6 +142,6 @@ const KPM_FunctionList* getSimFunctionList() {
                                              ZTCSimEntries::registerForBoard,
                                              ZTCSimEntries::unregisterForBoard,
                                              nullptr,
-                                             nullptr};
+                                             setLibraryReport};
     return &scList;
 }

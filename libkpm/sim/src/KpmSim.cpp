@@ -108,6 +108,8 @@ static ZTESimExit sCheck(const std::string& acrFile) {
         }
         std::cout << "event lines: " << lScenario.mEvents.size() << '\n'
                   << "storms: " << lScenario.mStorms.size() << " with " << lStormEvents << " events\n"
+                  << "states: " << lScenario.mStates.size() << '\n'
+                  << "losses: " << lScenario.mLosses.size() << '\n'
                   << "changes of the number of boards: " << lScenario.mCountChanges.size() << '\n'
                   << "answers set: " << lScenario.mAnswers.size() << '\n'
                   << "Init answers: " << lScenario.mInitStatus << '\n'
@@ -202,9 +204,9 @@ static int sMain(int aCount, char** apArguments) {
     std::vector<std::string> lWords;
     ZTSSimWaitOptions lWait;
     lApp.add_option("--socket", lSocket, "Path of the library's socket")->envname("KPM_SIM_SOCKET");
-    CLI::App* lpInject = lApp.add_subcommand("inject", "Deliver event or storm lines now");
+    CLI::App* lpInject = lApp.add_subcommand("inject", "Play event, storm, state or loss lines now");
     lpInject->add_option("LINE", lWords, "KIND FIELD=VALUE ..., or storm count=N ...")->required();
-    CLI::App* lpRun = lApp.add_subcommand("run", "Deliver the event and storm lines of a file now");
+    CLI::App* lpRun = lApp.add_subcommand("run", "Play the event, storm, state and loss lines of a file now");
     lpRun->add_option("FILE", lFile)->required();
     CLI::App* lpCheck = lApp.add_subcommand("check", "Read a scenario and print what it holds");
     lpCheck->add_option("FILE", lFile)->required();

@@ -39,13 +39,7 @@ static ZTSSimAnswer sParseAnswer(ZTCSimLine& arLine, ZTESimOperation aOperation,
     ZTSSimAnswer lAnswer;
     lAnswer.mOperation = aOperation;
     if (aOperation != ZTSO_GetAdapterInfo) {
-        const std::string_view lName = arLine.takeWord("an event kind, or all");
-        if (lName != "all") {
-            lAnswer.mKind = findKindIndex(lName);
-            if (!lAnswer.mKind) {
-                refuseSim(quoteSimWord(lName) + " is no event kind");
-            }
-        }
+        lAnswer.mKind = takeSimKind(arLine);
     }
     if (const auto lText = arLine.take("board"); lText && *lText != "all") {
         lAnswer.mBoard = readSimBoard("board", *lText, acrScenario);
@@ -148,6 +142,12 @@ static std::optional<ZTSSimEventLine> sParseEventLine(ZTCSimLine& arLine, const 
     if (arLine.getDirective() == "storm") {
         return parseSimStorm(arLine, acrScenario);
     }
+    if (arLine.getDirective() == "state") {
+        return parseSimState(arLine, acrScenario);
+    }
+    if (arLine.getDirective() == "loss") {
+        return parseSimLoss(arLine);
+    }
     if (const std::optional<std::size_t> lKind = findKindIndex(arLine.getDirective())) {
         return parseSimEvent(arLine, *lKind, acrScenario);
     }
@@ -160,6 +160,27 @@ static void sCountThreads(std::uint64_t aThreads, ZTSSimScenario& arScenario) {
         refuseSim("threads= of all lines so far make " + std::to_string(arScenario.mThreads) + ", more than " +
                   std::to_string(gcSimMaxTotalThreads));
     }
+}
+
+static void sAdd(ZTSSimEvent aEvent, ZTSSimScenario& arScenario) {
+    if (aEvent.mBoards.mAll && arScenario.mAdapters.empty()) {
+        refuseSim("board=all needs an adapter in the lines above");
+    }
+    sCountThreads(aEvent.mThreads > 1 ? aEvent.mThreads : 0, arScenario);
+    arScenario.mEvents.push_back(std::move(aEvent));
+}
+
+static void sAdd(ZTSSimStorm aStorm, ZTSSimScenario& arScenario) {
+    sCountThreads(aStorm.mThreads, arScenario);
+    arScenario.mStorms.push_back(std::move(aStorm));
+}
+
+static void sAdd(ZTSSimState aState, ZTSSimScenario& arScenario) {
+    arScenario.mStates.push_back(std::move(aState));
+}
+
+static void sAdd(ZTSSimLoss aLoss, ZTSSimScenario& arScenario) {
+    arScenario.mLosses.push_back(std::move(aLoss));
 }
 
 static void sParseLine(std::string_view aText, ZTSSimScenario& arScenario) {
@@ -176,20 +197,13 @@ static void sParseLine(std::string_view aText, ZTSSimScenario& arScenario) {
     if (!lEventLine) {
         refuseSim(quoteSimWord(lLine.getDirective()) + " is neither a directive nor an event kind");
     }
-    if (arScenario.mEvents.size() + arScenario.mStorms.size() >= gcSimMaxEventLines) {
-        refuseSim("there are more than " + std::to_string(gcSimMaxEventLines) + " lines with events");
+    const std::size_t lLines =
+        arScenario.mEvents.size() + arScenario.mStorms.size() + arScenario.mStates.size() + arScenario.mLosses.size();
+    if (lLines >= gcSimMaxEventLines) {
+        refuseSim("there are more than " + std::to_string(gcSimMaxEventLines) +
+                  " lines with events, states and losses");
     }
-    if (auto* lpEvent = std::get_if<ZTSSimEvent>(&*lEventLine)) {
-        if (lpEvent->mBoards.mAll && arScenario.mAdapters.empty()) {
-            refuseSim("board=all needs an adapter in the lines above");
-        }
-        sCountThreads(lpEvent->mThreads > 1 ? lpEvent->mThreads : 0, arScenario);
-        arScenario.mEvents.push_back(std::move(*lpEvent));
-    } else {
-        ZTSSimStorm& lrStorm = std::get<ZTSSimStorm>(*lEventLine);
-        sCountThreads(lrStorm.mThreads, arScenario);
-        arScenario.mStorms.push_back(std::move(lrStorm));
-    }
+    std::visit([&arScenario](auto& arHappening) { sAdd(std::move(arHappening), arScenario); }, *lEventLine);
 }
 
 ZTSSimScenario parseSimScenario(std::string_view aText) {
@@ -219,7 +233,7 @@ ZTSSimEventLine parseSimEventLine(std::string_view aLine, const ZTSSimScenario& 
     }
     std::optional<ZTSSimEventLine> lEventLine = sParseEventLine(lLine, acrScenario);
     if (!lEventLine) {
-        refuseSim(quoteSimWord(lLine.getDirective()) + " is neither an event kind nor storm");
+        refuseSim(quoteSimWord(lLine.getDirective()) + " is neither an event kind nor storm, state or loss");
     }
     return std::move(*lEventLine);
 }

@@ -26,9 +26,10 @@ inline constexpr std::uint64_t gcSimMaxThreads = 64;        ///< of one line
 inline constexpr std::uint64_t gcSimMaxTotalThreads = 256;  ///< of a scenario
 inline constexpr std::size_t gcSimMaxAdapters = 256;
 inline constexpr std::size_t gcSimMaxPorts = 4096;
-inline constexpr std::size_t gcSimMaxEventLines = 4096;  ///< event and storm lines
+inline constexpr std::size_t gcSimMaxEventLines = 4096;  ///< event, storm, state and loss lines
 inline constexpr std::size_t gcSimMaxListSize = 4096;    ///< values of a list
 inline constexpr std::uint64_t gcSimMaxDataSize = 65536;
+inline constexpr std::size_t gcSimMaxTextValue = 1024;  ///< bytes of a reason, and of the name of a loss
 
 /// A text that was refused. getLine() counts from 1; 0 where no line is to blame.
 class ZTCSimRefusal : public std::runtime_error {
@@ -99,6 +100,26 @@ struct ZTSSimStorm {
     std::vector<std::uint32_t> mLuns;
 };
 
+/// A line that says what state a kind is in on some boards, and why.
+struct ZTSSimState {
+    std::optional<std::size_t> mKind;  ///< none: all kinds
+    ZTSSimBoards mBoards;
+    std::uint32_t mState = KPM_STATE_WORKING;  ///< KPM_STATE_...
+    std::string mReason;
+    std::uint64_t mAt = 0;  ///< ms after the schedule's start
+    bool mIsTimed = false;  ///< false: from Init on
+};
+
+/// A line that loses things under a name.
+struct ZTSSimLoss {
+    std::string mName;
+    std::uint64_t mCount = 0;  ///< lost at each occurrence
+    std::uint64_t mAt = 0;     ///< ms after the schedule's start
+    std::uint64_t mEvery = 0;  ///< ms between two occurrences
+    std::uint64_t mTimes = 1;  ///< occurrences; 0: without end
+    bool mIsTimed = false;     ///< the line says when
+};
+
 enum ZTESimOperation : std::uint8_t { ZTSO_GetAdapterInfo, ZTSO_Register, ZTSO_Unregister };
 
 /// What the library answers instead of doing what it is asked.
@@ -135,16 +156,19 @@ struct ZTSSimScenario {
     std::vector<ZTSSimCountChange> mCountChanges;
     std::vector<ZTSSimEvent> mEvents;
     std::vector<ZTSSimStorm> mStorms;
+    std::vector<ZTSSimState> mStates;
+    std::vector<ZTSSimLoss> mLosses;
     std::uint64_t mThreads = 0;  ///< threads that the lines ask for
 };
 
-using ZTSSimEventLine = std::variant<ZTSSimEvent, ZTSSimStorm>;
+/// A line that makes something happen: in a scenario at its time, injected at once.
+using ZTSSimEventLine = std::variant<ZTSSimEvent, ZTSSimStorm, ZTSSimState, ZTSSimLoss>;
 
 /// Reads a whole scenario. Throws ZTCSimRefusal.
 ZTSSimScenario parseSimScenario(std::string_view aText);
 
-/// Reads one event or storm line that uses the adapters and ports of `acrScenario`. Throws ZTCSimRefusal, also for
-/// every other directive; its line number is 0.
+/// Reads one event, storm, state or loss line that uses the adapters and ports of `acrScenario`. Throws ZTCSimRefusal,
+/// also for every other directive; its line number is 0.
 ZTSSimEventLine parseSimEventLine(std::string_view aLine, const ZTSSimScenario& acrScenario);
 
 /// The scenario that is played where none is named: two adapters, four remote ports, no events.

@@ -136,6 +136,25 @@ static void sParseOverrides(ZTCSimLine& arLine, const ZTSSimScenario& acrScenari
     }
 }
 
+/// The fields by which a line says when it happens, and how often.
+template <class Line>
+static void sTakeTimes(ZTCSimLine& arLine, Line& arHappening) {
+    if (const auto lText = arLine.take("at")) {
+        arHappening.mAt = readSimNumber("at", *lText, 0, gcSimMaxMilliseconds);
+        arHappening.mIsTimed = true;
+    }
+    if (const auto lText = arLine.take("every")) {
+        arHappening.mEvery = readSimNumber("every", *lText, 0, gcSimMaxMilliseconds);
+        arHappening.mIsTimed = true;
+    }
+    if (const auto lText = arLine.take("times")) {
+        arHappening.mTimes = *lText == "forever" ? 0 : readSimNumber("times", *lText, 1, gcSimMaxTimes);
+    }
+    if (arHappening.mTimes == 0 && arHappening.mEvery == 0) {
+        refuseSim("times=forever needs every= of at least 1");
+    }
+}
+
 ZTSSimEvent parseSimEvent(ZTCSimLine& arLine, std::size_t aKind, const ZTSSimScenario& acrScenario) {
     ZTSSimEvent lEvent;
     lEvent.mKind = aKind;
@@ -144,20 +163,7 @@ ZTSSimEvent parseSimEvent(ZTCSimLine& arLine, std::size_t aKind, const ZTSSimSce
     if (const auto lText = arLine.take("as")) {
         lEvent.mAs = readSimNumber32("as", *lText);
     }
-    if (const auto lText = arLine.take("at")) {
-        lEvent.mAt = readSimNumber("at", *lText, 0, gcSimMaxMilliseconds);
-        lEvent.mIsTimed = true;
-    }
-    if (const auto lText = arLine.take("every")) {
-        lEvent.mEvery = readSimNumber("every", *lText, 0, gcSimMaxMilliseconds);
-        lEvent.mIsTimed = true;
-    }
-    if (const auto lText = arLine.take("times")) {
-        lEvent.mTimes = *lText == "forever" ? 0 : readSimNumber("times", *lText, 1, gcSimMaxTimes);
-    }
-    if (lEvent.mTimes == 0 && lEvent.mEvery == 0) {
-        refuseSim("times=forever needs every= of at least 1");
-    }
+    sTakeTimes(arLine, lEvent);
     lEvent.mThreads = takeSimNumber(arLine, "threads", 1, gcSimMaxThreads, 1);
     for (const ZTSSimField& lrField : getSimKind(aKind).mFields) {
         if (const auto lText = arLine.take(lrField.mpName)) {
@@ -214,4 +220,42 @@ ZTSSimStorm parseSimStorm(ZTCSimLine& arLine, const ZTSSimScenario& acrScenario)
     lStorm.mLuns = readSimNumberList("lun", arLine.take("lun").value_or("0-15"), gcSimMax32);
     arLine.finish();
     return lStorm;
+}
+
+static std::string sText(std::string_view aWhat, std::string_view aText) {
+    if (aText.size() > gcSimMaxTextValue) {
+        refuseSim(std::string(aWhat) + " has " + std::to_string(aText.size()) + " bytes, more than " +
+                  std::to_string(gcSimMaxTextValue));
+    }
+    return std::string(aText);
+}
+
+ZTSSimState parseSimState(ZTCSimLine& arLine, const ZTSSimScenario& acrScenario) {
+    static constexpr std::array<std::pair<std::string_view, std::uint32_t>, 4> scStates{
+        {{"working", KPM_STATE_WORKING},
+         {"no-source", KPM_STATE_NO_SOURCE},
+         {"no-rights", KPM_STATE_NO_RIGHTS},
+         {"failed", KPM_STATE_FAILED}}};
+    ZTSSimState lState;
+    lState.mKind = takeSimKind(arLine);
+    lState.mState = takeSimChoice(arLine, scStates);
+    lState.mBoards = takeSimBoards(arLine, acrScenario, true);
+    if (const auto lText = arLine.take("reason")) {
+        lState.mReason = sText("reason=", *lText);
+    }
+    if (const auto lText = arLine.take("at")) {
+        lState.mAt = readSimNumber("at", *lText, 0, gcSimMaxMilliseconds);
+        lState.mIsTimed = true;
+    }
+    arLine.finish();
+    return lState;
+}
+
+ZTSSimLoss parseSimLoss(ZTCSimLine& arLine) {
+    ZTSSimLoss lLoss;
+    lLoss.mName = sText("the name of a loss", arLine.takeWord("a name"));
+    lLoss.mCount = readSimNumber("count", arLine.takeRequired("count"), 1, gcSimMaxTimes);
+    sTakeTimes(arLine, lLoss);
+    arLine.finish();
+    return lLoss;
 }

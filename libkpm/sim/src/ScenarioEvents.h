@@ -1,4 +1,4 @@
-/// The two lines of a scenario that deliver events: one kind of event, and a storm of many.
+/// The lines of a scenario that make something happen: events of one kind, a storm of many kinds, a state, a loss.
 #ifndef LIBKPM_SIM_SRC_SCENARIOEVENTS_H
 #define LIBKPM_SIM_SRC_SCENARIOEVENTS_H
 
@@ -12,5 +12,11 @@ ZTSSimEvent parseSimEvent(ZTCSimLine& arLine, std::size_t aKind, const ZTSSimSce
 
 /// Reads the rest of a line that begins with `storm`. Throws ZTCSimRefusal.
 ZTSSimStorm parseSimStorm(ZTCSimLine& arLine, const ZTSSimScenario& acrScenario);
+
+/// Reads the rest of a line that begins with `state`. Throws ZTCSimRefusal.
+ZTSSimState parseSimState(ZTCSimLine& arLine, const ZTSSimScenario& acrScenario);
+
+/// Reads the rest of a line that begins with `loss`. Throws ZTCSimRefusal.
+ZTSSimLoss parseSimLoss(ZTCSimLine& arLine);
 
 #endif

@@ -217,3 +217,12 @@ HBA_wwn takeSimWwn(ZTCSimLine& arLine, std::string_view aField) {
     }
     return *lWwn;
 }
+
+std::optional<std::size_t> takeSimKind(ZTCSimLine& arLine) {
+    const std::string_view lName = arLine.takeWord("an event kind, or all");
+    const std::optional<std::size_t> lKind = findKindIndex(lName);
+    if (!lKind && lName != "all") {
+        refuseSim(quoteSimWord(lName) + " is no event kind");
+    }
+    return lKind;
+}

@@ -59,6 +59,9 @@ ZTSSimBoards takeSimBoards(ZTCSimLine& arLine, const ZTSSimScenario& acrScenario
 /// name that no line above declares may be a world wide name. Never empty.
 std::vector<ZTSSimPort> takeSimPorts(ZTCSimLine& arLine, const ZTSSimScenario& acrScenario, bool aAllByDefault);
 
+/// The kind that the next word of the line names; none for `all`.
+std::optional<std::size_t> takeSimKind(ZTCSimLine& arLine);
+
 /// Refuses a list of more than gcSimMaxListSize values.
 void checkSimListSize(std::string_view aField, std::size_t aSize);
 

@@ -36,44 +36,76 @@ static bool sIsBlank(char aChar) {
     return aChar == ' ' || aChar == '\t' || aChar == '\r';
 }
 
+/// The end of the quoted text that begins at `aBegin`, behind its opening quotation mark.
+static std::size_t sFindClosingQuote(std::string_view aText, std::size_t aBegin) {
+    const std::size_t lClose = aText.find('"', aBegin);
+    if (lClose == std::string_view::npos) {
+        refuseSim("the quotation mark in front of " + quoteSimWord(aText.substr(aBegin)) + " has no counterpart");
+    }
+    if (lClose + 1 < aText.size() && !sIsBlank(aText[lClose + 1])) {
+        refuseSim("behind the quoted " + quoteSimWord(aText.substr(aBegin, lClose - aBegin)) + " there is no blank");
+    }
+    return lClose;
+}
+
+/// Takes the word or the field at `arPlace`, which is no blank, and moves behind it.
+void ZTCSimLine::addWord(std::string_view aText, std::size_t& arPlace) {
+    if (aText[arPlace] == '"') {
+        const std::size_t lBegin = arPlace + 1;
+        const std::size_t lClose = sFindClosingQuote(aText, lBegin);
+        if (lClose == lBegin) {
+            refuseSim("there is nothing between the quotation marks");
+        }
+        mWords.push_back(aText.substr(lBegin, lClose - lBegin));
+        arPlace = lClose + 1;
+        return;
+    }
+    std::size_t lEnd = arPlace;
+    while (lEnd < aText.size() && !sIsBlank(aText[lEnd])) {
+        ++lEnd;
+    }
+    const std::string_view lWord = aText.substr(arPlace, lEnd - arPlace);
+    const std::size_t lEquals = lWord.find('=');
+    if (lEquals == std::string_view::npos) {
+        mWords.push_back(lWord);
+        arPlace = lEnd;
+        return;
+    }
+    const std::string_view lName = lWord.substr(0, lEquals);
+    std::string_view lValue = lWord.substr(lEquals + 1);
+    if (lValue.starts_with('"')) {
+        const std::size_t lBegin = arPlace + lEquals + 2;
+        lEnd = sFindClosingQuote(aText, lBegin);
+        lValue = aText.substr(lBegin, lEnd - lBegin);
+        ++lEnd;
+    }
+    arPlace = lEnd;
+    if (mWords.empty()) {
+        refuseSim("the line begins with " + quoteSimWord(lWord) + ", not with a directive or an event kind");
+    }
+    if (lValue.empty()) {
+        refuseSim(nameSimField(lName) + "has no value");
+    }
+    for (const auto& [lrName, lrValue] : mFields) {
+        if (lrName == lName) {
+            refuseSim(nameSimField(lName) + "stands twice");
+        }
+    }
+    mFields.emplace_back(lName, lValue);
+}
+
 ZTCSimLine::ZTCSimLine(std::string_view aText) {
     if (aText.size() > gcSimMaxLineSize) {
         refuseSim("the line has " + std::to_string(aText.size()) + " bytes, more than " +
                   std::to_string(gcSimMaxLineSize));
     }
     std::size_t lPlace = 0;
-    while (lPlace < aText.size()) {
+    while (lPlace < aText.size() && aText[lPlace] != '#') {
         if (sIsBlank(aText[lPlace])) {
             ++lPlace;
-            continue;
+        } else {
+            addWord(aText, lPlace);
         }
-        if (aText[lPlace] == '#') {
-            break;
-        }
-        std::size_t lEnd = lPlace;
-        while (lEnd < aText.size() && !sIsBlank(aText[lEnd])) {
-            ++lEnd;
-        }
-        const std::string_view lWord = aText.substr(lPlace, lEnd - lPlace);
-        lPlace = lEnd;
-        const std::size_t lEquals = lWord.find('=');
-        if (lEquals == std::string_view::npos) {
-            mWords.push_back(lWord);
-            continue;
-        }
-        const std::string_view lName = lWord.substr(0, lEquals);
-        if (mWords.empty()) {
-            refuseSim("the line begins with " + quoteSimWord(lWord) + ", not with a directive or an event kind");
-        }
-        if (lEquals + 1 == lWord.size()) {
-            refuseSim(nameSimField(lName) + "has no value");
-        }
-        for (const auto& [lrName, lrValue] : mFields) {
-            if (lrName == lName) {
-                refuseSim(nameSimField(lName) + "stands twice");
-            }
-        }
-        mFields.emplace_back(lName, lWord.substr(lEquals + 1));
     }
 }
 

@@ -21,7 +21,8 @@ std::string nameSimField(std::string_view aName);
 /// Throws ZTCSimRefusal without a line number: the reader of the whole text adds it.
 [[noreturn]] void refuseSim(const std::string& acrReason);
 
-/// The words of a line. A word with `=` is a field. Each field is taken once. finish() refuses what is left.
+/// The words of a line. A word with `=` is a field. Quotation marks around a word, or around the value of a field, let
+/// it hold blanks. Each field is taken once. finish() refuses what is left.
 ///
 /// It refers to the text that it is made of. What it refuses is thrown as ZTCSimRefusal.
 class ZTCSimLine {
@@ -45,6 +46,8 @@ public:
     void finish() const;
 
 private:
+    void addWord(std::string_view aText, std::size_t& arPlace);
+
     std::vector<std::string_view> mWords;
     std::size_t mNextWord = 1;
     std::vector<std::pair<std::string_view, std::string_view>> mFields;

@@ -195,7 +195,7 @@ TEST_F(ControlSocketOnEngine, AnInjectedLineIsAnsweredWithTheNumberOfItsCallback
 
 TEST_F(ControlSocketOnEngine, ALineThatIsRefusedIsAnsweredWithTheReason) {
     EXPECT_EQ(mClient.ask("queue-full lun=x"), "error: lun= takes a number, not \"x\"");
-    EXPECT_EQ(mClient.ask("count 1"), "error: \"count\" is neither an event kind nor storm");
+    EXPECT_EQ(mClient.ask("count 1"), "error: \"count\" is neither an event kind nor storm, state or loss");
     EXPECT_EQ(mClient.ask(""), "error: the line is empty");
     EXPECT_EQ(mClient.ask("plogi at=5"),
               "error: at=, every= and over= are for scenarios: an injected line is delivered at once");

@@ -14,27 +14,19 @@
 #include "tests/support/Waiting.h"
 #include "tests/unit/sim/Recorder.h"
 
-static ZTSSimScenario sScenario(const std::string& acrLines = "") {
-    return readScenario(gcTwoAdapters + acrLines);
-}
-
-static std::uint64_t sInject(ZTCSimEngine& arEngine, const std::string& acrLine) {
-    return arEngine.inject(parseSimEventLine(acrLine, arEngine.getScenario()));
-}
-
 static void sWaitForSchedule(const ZTCSimEngine& acrEngine) {
     waitUntil([&] { return acrEngine.getStatus().mSchedule == ZTSSC_Done; }, "the end of the schedule");
 }
 
 TEST(Engine, DeliversOnlyWhatIsRegistered) {
     ZTCRecorder lRecorder;
-    ZTCSimEngine lEngine(sScenario());
+    ZTCSimEngine lEngine(readTwoAdapters());
     lRecorder.registerKind(lEngine, 0, "queue-full");
     lRecorder.registerKind(lEngine, 1, "rscn");
     for (const ZTSScopeEventKind& lrKind : gcScopeEventKinds) {
         const std::string lName = lrKind.mpName;
         const std::uint64_t lExpected = lName == "queue-full" || lName == "rscn" ? 1 : 0;
-        EXPECT_EQ(sInject(lEngine, lName + " board=all"), lExpected) << lName;
+        EXPECT_EQ(injectLine(lEngine, lName + " board=all"), lExpected) << lName;
     }
     EXPECT_EQ(lRecorder.getCount(), 2u);
     EXPECT_EQ(lEngine.getStatus().mDelivered, 2u);
@@ -43,12 +35,12 @@ TEST(Engine, DeliversOnlyWhatIsRegistered) {
 
 TEST(Engine, DeliversEveryKindOnItsOwnCallback) {
     ZTCRecorder lRecorder;
-    ZTCSimEngine lEngine(sScenario());
+    ZTCSimEngine lEngine(readTwoAdapters());
     lRecorder.registerAll(lEngine, 0);
     lRecorder.registerAll(lEngine, 1);
     EXPECT_EQ(lEngine.getStatus().mRegistered, 40u);
     for (const ZTSScopeEventKind& lrKind : gcScopeEventKinds) {
-        EXPECT_EQ(sInject(lEngine, std::string(lrKind.mpName) + " board=1"), 1u);
+        EXPECT_EQ(injectLine(lEngine, std::string(lrKind.mpName) + " board=1"), 1u);
         const ZTSRecordedEvent lEvent = lRecorder.getEvents().back();
         EXPECT_EQ(lEvent.mBoard, 1u);
         EXPECT_EQ(lEvent.mCategory, lrKind.mRegisteredCategory) << lrKind.mpName;
@@ -66,19 +58,19 @@ TEST(Engine, DeliversEveryKindOnItsOwnCallback) {
 TEST(Engine, HandsOutOddAddressesUnlessToldOtherwise) {
     for (const bool lIsOdd : {true, false}) {
         ZTCRecorder lRecorder;
-        ZTCSimEngine lEngine(sScenario(lIsOdd ? "" : "addresses aligned\n"));
+        ZTCSimEngine lEngine(readTwoAdapters(lIsOdd ? "" : "addresses aligned\n"));
         lRecorder.registerKind(lEngine, 0, "plogi");
-        sInject(lEngine, "plogi");
+        injectLine(lEngine, "plogi");
         EXPECT_EQ(lRecorder.getEvents().at(0).mAddress % 2, lIsOdd ? 1u : 0u);
     }
 }
 
 TEST(Engine, NullPayloadsAndNullDataReachTheCallback) {
     ZTCRecorder lRecorder;
-    ZTCSimEngine lEngine(sScenario());
+    ZTCSimEngine lEngine(readTwoAdapters());
     lRecorder.registerKind(lEngine, 0, "plogi");
-    sInject(lEngine, "plogi payload=null");
-    sInject(lEngine, "plogi data=null");
+    injectLine(lEngine, "plogi payload=null");
+    injectLine(lEngine, "plogi data=null");
     EXPECT_FALSE(lRecorder.getEvents().at(0).mHasPayload);
     EXPECT_TRUE(lRecorder.getEvents().at(1).mHasPayload);
     EXPECT_FALSE(lRecorder.getEvents().at(1).mHasData);
@@ -86,125 +78,15 @@ TEST(Engine, NullPayloadsAndNullDataReachTheCallback) {
 
 TEST(Engine, ACallbackCanBeToldABoardThatDoesNotExist) {
     ZTCRecorder lRecorder;
-    ZTCSimEngine lEngine(sScenario());
+    ZTCSimEngine lEngine(readTwoAdapters());
     lRecorder.registerKind(lEngine, 0, "temperature");
-    EXPECT_EQ(sInject(lEngine, "temperature as=4000000000"), 1u);
+    EXPECT_EQ(injectLine(lEngine, "temperature as=4000000000"), 1u);
     EXPECT_EQ(lRecorder.getEvents().at(0).mBoard, 4000000000u);
-}
-
-TEST(Engine, ARegistrationAgainDeliversEachEventOnce) {
-    ZTCRecorder lRecorder;
-    ZTCSimEngine lEngine(sScenario());
-    const std::uint32_t lOld = lRecorder.registerKind(lEngine, 0, "plogi");
-    const std::uint32_t lNew = lRecorder.registerKind(lEngine, 0, "plogi");
-    EXPECT_NE(lOld, lNew);
-    EXPECT_EQ(sInject(lEngine, "plogi times=5"), 5u);
-    EXPECT_EQ(lRecorder.getCount(), 5u);
-}
-
-TEST(Engine, WhatIsUnregisteredIsNotDelivered) {
-    ZTCRecorder lRecorder;
-    ZTCSimEngine lEngine(sScenario());
-    const HBA_wwn lPort = lEngine.getScenario().mAdapters[0].mWwpn;
-    const HBA_wwn lOther = lEngine.getScenario().mAdapters[1].mWwpn;
-    const std::uint32_t lPlogi = lRecorder.registerKind(lEngine, 0, "plogi");
-    const std::uint32_t lLink = lRecorder.registerKind(lEngine, 0, "link");
-    EXPECT_EQ(lEngine.unregisterForPort(7, lPort, lPlogi), ZTLST_NoSuchBoard);
-    EXPECT_EQ(lEngine.unregisterForPort(0, lOther, lPlogi), ZTLST_NotItsPort);
-    EXPECT_EQ(lEngine.unregisterForPort(0, lPort, lLink), ZTLST_NoSuchHandle);
-    EXPECT_EQ(lEngine.unregisterForBoard(0, lPlogi), ZTLST_NoSuchHandle);
-    EXPECT_EQ(lEngine.unregisterForPort(0, lPort, lPlogi), ZTLST_Success);
-    EXPECT_EQ(lEngine.unregisterForBoard(0, lLink), ZTLST_Success);
-    EXPECT_EQ(lEngine.unregisterForPort(0, lPort, lPlogi), ZTLST_NoSuchHandle);
-    EXPECT_EQ(sInject(lEngine, "plogi") + sInject(lEngine, "link"), 0u);
-}
-
-TEST(Engine, RegistrationsOfWhatDoesNotExistAreRefused) {
-    ZTCSimEngine lEngine(sScenario());
-    const HBA_wwn lPort = lEngine.getScenario().mAdapters[0].mWwpn;
-    const HBA_wwn lOther = lEngine.getScenario().mAdapters[1].mWwpn;
-    std::uint32_t lHandle = 99;
-    const auto lRegister = [&](std::uint32_t aBoard, const HBA_wwn& acrPort, std::uint32_t aCategory,
-                               std::uint32_t aSubcategory) {
-        return lEngine.registerForPort(aBoard, acrPort, aCategory, aSubcategory, nullptr, &lHandle,
-                                       ZTCRecorder::onScope);
-    };
-    EXPECT_EQ(lRegister(2, lPort, 1, 1), ZTLST_NoSuchBoard);
-    EXPECT_EQ(lRegister(0, lOther, 1, 1), ZTLST_NotItsPort);
-    EXPECT_EQ(lRegister(0, lPort, 1, 0x20), ZTLST_NoSuchKind);
-    EXPECT_EQ(lRegister(0, lPort, 0, FC_REG_LINK_EVENT), ZTLST_NoSuchKind);
-    EXPECT_EQ(lEngine.registerForPort(0, lPort, 1, 1, nullptr, &lHandle, nullptr), ZTLST_NullPointer);
-    EXPECT_EQ(lEngine.registerForPort(0, lPort, 1, 1, nullptr, nullptr, ZTCRecorder::onScope), ZTLST_NullPointer);
-    const KPM_EventCallback lpCallback = ZTCRecorder::getEventCallback(FC_REG_LINK_EVENT);
-    EXPECT_EQ(lEngine.registerForBoard(2, FC_REG_LINK_EVENT, nullptr, lpCallback), 0u);
-    EXPECT_EQ(lEngine.registerForBoard(0, 3, nullptr, lpCallback), 0u);
-    EXPECT_EQ(lEngine.registerForBoard(0, FC_REG_LINK_EVENT, nullptr, nullptr), 0u);
-    EXPECT_EQ(lHandle, 99u);
-    EXPECT_EQ(lEngine.getStatus().mRegistered, 0u);
-}
-
-TEST(Engine, PlaysRefusedRegistrationsAsOftenAsTold) {
-    ZTCRecorder lRecorder;
-    ZTCSimEngine lEngine(sScenario("register plogi board=1 status=33 times=2\nregister temperature status=34\n"));
-    EXPECT_NE(lRecorder.registerKind(lEngine, 0, "plogi"), 0u);
-    EXPECT_EQ(lRecorder.registerKind(lEngine, 1, "plogi"), 0u);
-    EXPECT_EQ(lRecorder.registerKind(lEngine, 1, "plogi"), 0u);
-    EXPECT_NE(lRecorder.registerKind(lEngine, 1, "plogi"), 0u);
-    EXPECT_EQ(lRecorder.registerKind(lEngine, 0, "temperature"), 0u);
-    EXPECT_EQ(sInject(lEngine, "temperature"), 0u);
-}
-
-TEST(Engine, PlaysInformationalStatuses) {
-    ZTCRecorder lRecorder;
-    ZTCSimEngine lEngine(
-        sScenario("register plogi status=5\nregister prlo status=6\nregister adisc status=7 handle=4711\n"
-                  "register logo status=0 handle=0\n"));
-    const auto lRegister = [&](const char* apKind, std::uint32_t& arHandle) {
-        const ZTSScopeEventKind& lrKind = gcScopeEventKinds.at(findKindIndex(apKind).value());
-        return lEngine.registerForPort(0, lEngine.getScenario().mAdapters[0].mWwpn, lrKind.mRegisteredCategory,
-                                       lrKind.mRegisteredSubcategory, nullptr, &arHandle, ZTCRecorder::onScope);
-    };
-    std::uint32_t lHandle = 0;
-    EXPECT_EQ(lRegister("plogi", lHandle), 5u);
-    EXPECT_NE(lHandle, 0u);
-    EXPECT_EQ(lRegister("prlo", lHandle), 6u);
-    EXPECT_EQ(lRegister("adisc", lHandle), 7u);
-    EXPECT_EQ(lHandle, 4711u);
-    EXPECT_EQ(lRegister("logo", lHandle), 0u);
-    EXPECT_EQ(lHandle, 0u);
-    EXPECT_EQ(sInject(lEngine, "plogi"), 1u);
-    EXPECT_EQ(sInject(lEngine, "prlo"), 0u);
-    EXPECT_EQ(sInject(lEngine, "adisc"), 1u);
-    EXPECT_EQ(sInject(lEngine, "logo"), 0u);
-}
-
-TEST(Engine, PlaysRefusedUnregistrations) {
-    ZTCRecorder lRecorder;
-    ZTCSimEngine lEngine(sScenario("unregister all status=12 times=2\n"));
-    const HBA_wwn lPort = lEngine.getScenario().mAdapters[0].mWwpn;
-    const std::uint32_t lPlogi = lRecorder.registerKind(lEngine, 0, "plogi");
-    const std::uint32_t lLink = lRecorder.registerKind(lEngine, 0, "link");
-    EXPECT_EQ(lEngine.unregisterForPort(0, lPort, lPlogi), 12u);
-    EXPECT_EQ(lEngine.unregisterForBoard(0, lLink), 12u);
-    EXPECT_EQ(lEngine.unregisterForPort(0, lPort, lPlogi), 0u);
-}
-
-TEST(Engine, PlaysAnAdapterWithoutNames) {
-    ZTCSimEngine lEngine(sScenario("info board=1 status=23\n"));
-    HBA_wwn lNode{};
-    HBA_wwn lPort{};
-    EXPECT_EQ(lEngine.getAdapterInfo(0, &lNode, &lPort), ZTLST_Success);
-    EXPECT_EQ(lNode.wwn[7], 0x81);
-    EXPECT_EQ(lPort.wwn[7], 0x01);
-    EXPECT_EQ(lEngine.getAdapterInfo(1, &lNode, &lPort), 23u);
-    EXPECT_EQ(lPort.wwn[7], 0x01);
-    EXPECT_EQ(lEngine.getAdapterInfo(2, &lNode, &lPort), ZTLST_NoSuchBoard);
-    EXPECT_EQ(lEngine.getAdapterInfo(0, nullptr, &lPort), ZTLST_NullPointer);
 }
 
 TEST(Engine, TheScheduleStartsWithTheLastKindOfTheLastBoard) {
     ZTCRecorder lRecorder;
-    ZTCSimEngine lEngine(sScenario("plogi board=all at=0\nlink board=1 at=0\n"));
+    ZTCSimEngine lEngine(readTwoAdapters("plogi board=all at=0\nlink board=1 at=0\n"));
     lEngine.start();
     lRecorder.registerAll(lEngine, 0);
     for (std::size_t lKind = 0; lKind < gcSimLastKind; ++lKind) {
@@ -219,12 +101,12 @@ TEST(Engine, TheScheduleStartsWithTheLastKindOfTheLastBoard) {
 
 TEST(Engine, TheScheduleCanStartWithTheFirstRegistrationOrAtOnce) {
     ZTCRecorder lRecorder;
-    ZTCSimEngine lFirst(sScenario("start first\nplogi at=0\n"));
+    ZTCSimEngine lFirst(readTwoAdapters("start first\nplogi at=0\n"));
     lFirst.start();
     lRecorder.registerKind(lFirst, 0, "plogi");
     sWaitForSchedule(lFirst);
     EXPECT_EQ(lRecorder.getCount(), 1u);
-    ZTCSimEngine lAtOnce(sScenario("start init\nplogi at=0\n"));
+    ZTCSimEngine lAtOnce(readTwoAdapters("start init\nplogi at=0\n"));
     lAtOnce.start();
     sWaitForSchedule(lAtOnce);
     EXPECT_EQ(lAtOnce.getStatus().mDropped, 1u);
@@ -232,7 +114,7 @@ TEST(Engine, TheScheduleCanStartWithTheFirstRegistrationOrAtOnce) {
 
 TEST(Engine, EventsOfOneThreadComeInTheOrderOfTheirTimes) {
     ZTCRecorder lRecorder;
-    ZTCSimEngine lEngine(sScenario(
+    ZTCSimEngine lEngine(readTwoAdapters(
         "start first\nqueue-full at=4 every=4 times=3 lun=1,3,5\nqueue-full at=2 every=4 times=3 lun=0,2,4\n"));
     lEngine.start();
     lRecorder.registerKind(lEngine, 0, "queue-full");
@@ -246,7 +128,7 @@ TEST(Engine, EventsOfOneThreadComeInTheOrderOfTheirTimes) {
 
 TEST(Engine, ThreadsOfALineShareItsOccurrences) {
     ZTCRecorder lRecorder;
-    ZTCSimEngine lEngine(sScenario("start first\nqueue-full times=203 threads=4 lun=0-202\n"));
+    ZTCSimEngine lEngine(readTwoAdapters("start first\nqueue-full times=203 threads=4 lun=0-202\n"));
     std::mutex lLock;
     std::condition_variable lAllThere;
     std::size_t lArrived = 0;
@@ -264,9 +146,9 @@ TEST(Engine, ThreadsOfALineShareItsOccurrences) {
     EXPECT_EQ(lRecorder.getDescriptions(), [] {
         std::multiset<std::string> lExpected;
         ZTCRecorder lOther;
-        ZTCSimEngine lAgain(sScenario());
+        ZTCSimEngine lAgain(readTwoAdapters());
         lOther.registerKind(lAgain, 0, "queue-full");
-        sInject(lAgain, "queue-full times=203 lun=0-202");
+        injectLine(lAgain, "queue-full times=203 lun=0-202");
         return lOther.getDescriptions();
     }());
     EXPECT_EQ(lRecorder.getThreads().size(), 4u);
@@ -274,7 +156,7 @@ TEST(Engine, ThreadsOfALineShareItsOccurrences) {
 
 static std::multiset<std::string> sStormOf(const std::string& acrFields) {
     ZTCRecorder lRecorder;
-    ZTCSimEngine lEngine(sScenario("storm count=3000 " + acrFields + "\n"));
+    ZTCSimEngine lEngine(readTwoAdapters("storm count=3000 " + acrFields + "\n"));
     lEngine.start();
     lRecorder.registerAll(lEngine, 0);
     lRecorder.registerAll(lEngine, 1);
@@ -293,7 +175,7 @@ TEST(Engine, AStormIsTheSameForItsSeedOnAnyNumberOfThreads) {
 
 TEST(Engine, AStormCanBeSpreadOverTime) {
     ZTCRecorder lRecorder;
-    ZTCSimEngine lEngine(sScenario("start first\nstorm count=50 threads=2 over=50 board=0 kind=plogi\n"));
+    ZTCSimEngine lEngine(readTwoAdapters("start first\nstorm count=50 threads=2 over=50 board=0 kind=plogi\n"));
     lEngine.start();
     lRecorder.registerKind(lEngine, 0, "plogi");
     sWaitForSchedule(lEngine);
@@ -302,25 +184,25 @@ TEST(Engine, AStormCanBeSpreadOverTime) {
 
 TEST(Engine, AnInjectedStormIsDeliveredWhenItReturns) {
     ZTCRecorder lRecorder;
-    ZTCSimEngine lEngine(sScenario());
+    ZTCSimEngine lEngine(readTwoAdapters());
     lRecorder.registerAll(lEngine, 0);
-    EXPECT_EQ(sInject(lEngine, "storm count=500 threads=5 board=0"), 500u);
+    EXPECT_EQ(injectLine(lEngine, "storm count=500 threads=5 board=0"), 500u);
     EXPECT_EQ(lRecorder.getCount(), 500u);
-    EXPECT_EQ(sInject(lEngine, "queue-full times=3 threads=8"), 3u);
+    EXPECT_EQ(injectLine(lEngine, "queue-full times=3 threads=8"), 3u);
 }
 
 TEST(Engine, CountsThePagesOfRscns) {
     ZTCRecorder lRecorder;
-    ZTCSimEngine lEngine(sScenario());
+    ZTCSimEngine lEngine(readTwoAdapters());
     lRecorder.registerKind(lEngine, 0, "rscn");
-    sInject(lEngine, "rscn pages=fabric,fabric,fabric times=2");
-    sInject(lEngine, "rscn pages=none");
+    injectLine(lEngine, "rscn pages=fabric,fabric,fabric times=2");
+    injectLine(lEngine, "rscn pages=none");
     EXPECT_EQ(lEngine.getStatus().mPages, 6u);
 }
 
 TEST(Engine, AdaptersComeAndGo) {
     ZTCRecorder lRecorder;
-    ZTCSimEngine lEngine(sScenario("start first\ncount 1\ncount 2 at=1\nplogi board=all at=2\n"));
+    ZTCSimEngine lEngine(readTwoAdapters("start first\ncount 1\ncount 2 at=1\nplogi board=all at=2\n"));
     EXPECT_EQ(lEngine.getNumberOfAdapters(), 1u);
     EXPECT_EQ(lRecorder.registerKind(lEngine, 1, "plogi"), 0u);
     lEngine.start();
@@ -334,12 +216,12 @@ TEST(Engine, AdaptersComeAndGo) {
 
 TEST(Engine, StopEndsASchedulesThatIsWaitingOrWithoutEnd) {
     ZTCRecorder lRecorder;
-    ZTCSimEngine lNeverStarted(sScenario("plogi at=0\nstorm count=10\n"));
+    ZTCSimEngine lNeverStarted(readTwoAdapters("plogi at=0\nstorm count=10\n"));
     lNeverStarted.start();
     lNeverStarted.stop();
     ZTCSimEngine lEngine(
-        sScenario("start first\nplogi every=1 times=forever\nprlo every=1 times=forever threads=3\n"
-                  "adisc at=86400000\nstorm count=1000000000 threads=2\n"));
+        readTwoAdapters("start first\nplogi every=1 times=forever\nprlo every=1 times=forever threads=3\n"
+                        "adisc at=86400000\nstorm count=1000000000 threads=2\n"));
     lEngine.start();
     lRecorder.registerAll(lEngine, 0);
     lRecorder.waitForCount(50);
@@ -352,7 +234,8 @@ TEST(Engine, StopEndsASchedulesThatIsWaitingOrWithoutEnd) {
 
 TEST(Engine, StopReturnsWhenNoCallbackRuns) {
     ZTCRecorder lRecorder;
-    ZTCSimEngine lEngine(sScenario("start first\nplogi every=1 times=forever\nprlo every=1 times=forever threads=2\n"));
+    ZTCSimEngine lEngine(
+        readTwoAdapters("start first\nplogi every=1 times=forever\nprlo every=1 times=forever threads=2\n"));
     std::atomic<int> lRunning{0};
     std::atomic<bool> lMayReturn{false};
     std::atomic<bool> lIsStopped{false};
@@ -382,7 +265,7 @@ TEST(Engine, StopReturnsWhenNoCallbackRuns) {
 
 TEST(Engine, CallbacksRunWithSignalsBlocked) {
     ZTCRecorder lRecorder;
-    ZTCSimEngine lEngine(sScenario("start first\nplogi at=0\n"));
+    ZTCSimEngine lEngine(readTwoAdapters("start first\nplogi at=0\n"));
     std::atomic<bool> lIsBlocked{false};
     lRecorder.setHook([&] {
         sigset_t lMask;
@@ -400,7 +283,7 @@ TEST(Engine, CallbacksRunWithSignalsBlocked) {
 
 TEST(Engine, RegistrationsMayComeWhileEventsAreDelivered) {
     ZTCRecorder lRecorder;
-    ZTCSimEngine lEngine(sScenario("start first\nstorm count=1000000000 threads=3 kind=plogi,link board=0\n"));
+    ZTCSimEngine lEngine(readTwoAdapters("start first\nstorm count=1000000000 threads=3 kind=plogi,link board=0\n"));
     lEngine.start();
     std::uint32_t lLink = 0;
     for (int lRound = 0; lRound < 200; ++lRound) {

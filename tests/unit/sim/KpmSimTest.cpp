@@ -75,7 +75,8 @@ TEST_F(KpmSim, RunsAFilesLines) {
 TEST_F(KpmSim, NamesTheLineOfAFileThatIsRefused) {
     writeFile(mDirectory.path("f"), "plogi\n\ncount 2\n");
     const ZTSToolResult lResult = runOnSocket("run '" + mDirectory.path("f") + "'");
-    EXPECT_EQ(lResult.mOutput, mDirectory.path("f") + ":3: \"count\" is neither an event kind nor storm\n");
+    EXPECT_EQ(lResult.mOutput,
+              mDirectory.path("f") + ":3: \"count\" is neither an event kind nor storm, state or loss\n");
     EXPECT_EQ(lResult.mStatus, 1);
 }
 
@@ -121,7 +122,7 @@ TEST_F(KpmSim, ChecksAScenario) {
     const ZTSToolResult lGood = sRun("check '" + mDirectory.path("f") + "'");
     EXPECT_EQ(lGood.mStatus, 0);
     EXPECT_NE(lGood.mOutput.find("adapters: 2 hba0 hba1\n"), std::string::npos);
-    EXPECT_NE(lGood.mOutput.find("storms: 1 with 9 events\n"), std::string::npos);
+    EXPECT_NE(lGood.mOutput.find("storms: 1 with 9 events\nstates: 0\nlosses: 0\n"), std::string::npos);
     writeFile(mDirectory.path("f"), "\nplogi\n");
     const ZTSToolResult lBad = sRun("check '" + mDirectory.path("f") + "'");
     EXPECT_EQ(lBad.mStatus, 1);

@@ -174,3 +174,11 @@ std::set<std::thread::id> ZTCRecorder::getThreads() const {
 ZTSSimScenario readScenario(const std::string& acrText) {
     return parseSimScenario(acrText);
 }
+
+ZTSSimScenario readTwoAdapters(const std::string& acrLines) {
+    return readScenario(gcTwoAdapters + acrLines);
+}
+
+std::uint64_t injectLine(ZTCSimEngine& arEngine, const std::string& acrLine) {
+    return arEngine.inject(parseSimEventLine(acrLine, arEngine.getScenario()));
+}

@@ -73,4 +73,10 @@ ZTSSimScenario readScenario(const std::string& acrText);
 /// Two adapters, hba0 and hba1, and two remote ports, disk0 and tape0.
 extern const char* const gcTwoAdapters;
 
+/// The scenario of these, with further lines behind them.
+ZTSSimScenario readTwoAdapters(const std::string& acrLines = "");
+
+/// Plays a line now. Returns what inject() returns.
+std::uint64_t injectLine(ZTCSimEngine& arEngine, const std::string& acrLine);
+
 #endif

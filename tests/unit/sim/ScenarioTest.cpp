@@ -241,7 +241,57 @@ INSTANTIATE_TEST_SUITE_P(
         ZTSRefusedLine{"addresses even", "addresses takes odd or aligned, not \"even\""},
         ZTSRefusedLine{"register qfull status=1", "\"qfull\" is no event kind"},
         ZTSRefusedLine{"register plogi board=0", "register needs status="},
-        ZTSRefusedLine{"info board=0 status=1 handle=2", "info has no field \"handle\""}));
+        ZTSRefusedLine{"info board=0 status=1 handle=2", "info has no field \"handle\""},
+        ZTSRefusedLine{"plogi \"a b", "the quotation mark in front of \"a b\" has no counterpart"},
+        ZTSRefusedLine{"plogi port=\"a b", "the quotation mark in front of \"a b\" has no counterpart"},
+        ZTSRefusedLine{"plogi port=\"a\"b", "behind the quoted \"a\" there is no blank"},
+        ZTSRefusedLine{"loss \"\" count=1", "there is nothing between the quotation marks"},
+        ZTSRefusedLine{"plogi port=\"\"", "port= has no value"},
+        ZTSRefusedLine{"state", "state needs an event kind, or all"},
+        ZTSRefusedLine{"state qfull failed", "\"qfull\" is no event kind"},
+        ZTSRefusedLine{"state link", "state needs working or no-source or no-rights or failed"},
+        ZTSRefusedLine{"state link broken", "state takes working or no-source or no-rights or failed, not \"broken\""},
+        ZTSRefusedLine{"state link failed every=1", "state has no field \"every\""},
+        ZTSRefusedLine{"loss count=1", "loss needs a name"}, ZTSRefusedLine{"loss messages", "loss needs count="},
+        ZTSRefusedLine{"loss messages count=0", "count= takes a number from 1 to 1000000000, not \"0\""},
+        ZTSRefusedLine{"loss messages count=1 times=forever", "times=forever needs every= of at least 1"}));
+
+TEST(Scenario, AStateNamesAKindOrAllAndHoldsFromTheBeginningOrFromATimeOn) {
+    const ZTSSimScenario lScenario =
+        readTwoAdapters("state link no-rights board=1 reason=\"needs CAP_NET_ADMIN\"\nstate all failed at=20");
+    ASSERT_EQ(lScenario.mStates.size(), 2u);
+    const ZTSSimState& lrFirst = lScenario.mStates[0];
+    EXPECT_EQ(lrFirst.mKind, findKindIndex("link"));
+    EXPECT_EQ(lrFirst.mState, KPM_STATE_NO_RIGHTS);
+    EXPECT_EQ(lrFirst.mBoards.mBoards, std::vector<std::uint32_t>{1});
+    EXPECT_EQ(lrFirst.mReason, "needs CAP_NET_ADMIN");
+    EXPECT_FALSE(lrFirst.mIsTimed);
+    const ZTSSimState& lrSecond = lScenario.mStates[1];
+    EXPECT_EQ(lrSecond.mKind, std::nullopt);
+    EXPECT_TRUE(lrSecond.mBoards.mAll);
+    EXPECT_EQ(lrSecond.mReason, "");
+    EXPECT_EQ(lrSecond.mAt, 20u);
+    EXPECT_TRUE(lrSecond.mIsTimed);
+}
+
+TEST(Scenario, ALossHasANameACountAndTimes) {
+    const ZTSSimScenario lScenario =
+        readTwoAdapters("loss \"trace events\" count=3 at=1 every=2 times=4\nloss x count=1");
+    ASSERT_EQ(lScenario.mLosses.size(), 2u);
+    EXPECT_EQ(lScenario.mLosses[0].mName, "trace events");
+    EXPECT_EQ(lScenario.mLosses[0].mCount, 3u);
+    EXPECT_EQ(lScenario.mLosses[0].mAt, 1u);
+    EXPECT_EQ(lScenario.mLosses[0].mEvery, 2u);
+    EXPECT_EQ(lScenario.mLosses[0].mTimes, 4u);
+    EXPECT_EQ(lScenario.mLosses[1].mTimes, 1u);
+}
+
+TEST(Scenario, TextsHaveALimitOfTheirLength) {
+    const std::string lLongest(gcSimMaxTextValue, 'x');
+    EXPECT_NO_THROW(readTwoAdapters("loss " + lLongest + " count=1\nstate link failed reason=" + lLongest));
+    EXPECT_EQ(sRefusal("loss x" + lLongest + " count=1"), "the name of a loss has 1025 bytes, more than 1024");
+    EXPECT_EQ(sRefusal("state link failed reason=x" + lLongest), "reason= has 1025 bytes, more than 1024");
+}
 
 TEST(Scenario, ARefusalShowsAnUnknownFieldCutAndWithoutControlCharacters) {
     EXPECT_EQ(sRefusal("plogi a\x1b[2J="), "a\\x1b[2J= has no value");
@@ -296,9 +346,11 @@ TEST(Scenario, EventsNeedAnAdapter) {
     }
 }
 
-TEST(Scenario, OnlyEventsAndStormsAreEventLines) {
+TEST(Scenario, EventsStormsStatesAndLossesAreEventLines) {
     const ZTSSimScenario lScenario = readScenario(gcTwoAdapters);
     EXPECT_TRUE(std::holds_alternative<ZTSSimStorm>(parseSimEventLine("storm count=1", lScenario)));
+    EXPECT_TRUE(std::holds_alternative<ZTSSimState>(parseSimEventLine("state all working", lScenario)));
+    EXPECT_TRUE(std::holds_alternative<ZTSSimLoss>(parseSimEventLine("loss x count=1", lScenario)));
     for (const char* lpLine : {"", "# nothing", "count 1", "adapter x", "unknown"}) {
         EXPECT_THROW(parseSimEventLine(lpLine, lScenario), ZTCSimRefusal) << lpLine;
     }

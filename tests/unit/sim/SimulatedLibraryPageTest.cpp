@@ -110,6 +110,8 @@ TEST(SimulatedLibraryPage, HasARowForEveryDirective) {
         EXPECT_TRUE(sHasRow("| `" + lrDirective + " ")) << lrDirective;
     }
     EXPECT_FALSE(sRows("`storm ").empty());
+    EXPECT_TRUE(sHasRow("| `state "));
+    EXPECT_TRUE(sHasRow("| `loss "));
 }
 
 TEST(SimulatedLibraryPage, HasARowForEveryFieldOfALine) {
@@ -135,9 +137,10 @@ TEST(SimulatedLibraryPage, HasTheLimits) {
              {"bytes of a line", gcSimMaxLineSize},
              {"adapters", gcSimMaxAdapters},
              {"remote ports", gcSimMaxPorts},
-             {"event and storm lines", gcSimMaxEventLines},
+             {"event, storm, state and loss lines", gcSimMaxEventLines},
              {"values of a list", gcSimMaxListSize},
              {"bytes of `data=` and `length=`", gcSimMaxDataSize},
+             {"bytes of `reason=` and of the name of a loss", gcSimMaxTextValue},
              {"`times=` and `count=`", gcSimMaxTimes},
              {"`at=`, `every=` and `over=`", gcSimMaxMilliseconds},
              {"`threads=` of a line", gcSimMaxThreads},
@@ -167,13 +170,14 @@ TEST(SimulatedLibraryPage, ItsExampleScenariosParse) {
         EXPECT_NO_THROW(parseSimScenario(lScenario)) << lScenario;
         ++lExamples;
     }
-    EXPECT_EQ(lExamples, 2u);
+    EXPECT_EQ(lExamples, 3u);
 }
 
 TEST(SimulatedLibraryPage, TheLinesOfItsInjectionsAreTaken) {
     const ZTSSimScenario lScenario = parseSimScenario(getDefaultSimScenario());
     for (const char* lpLine :
-         {"queue-full port=disk0 lun=0-7 times=100", "plogi board=all", "storm count=100000 threads=8"}) {
+         {"queue-full port=disk0 lun=0-7 times=100", "plogi board=all", "storm count=100000 threads=8",
+          "state link failed board=hba1 reason=\"cable pulled\""}) {
         EXPECT_NO_THROW(parseSimEventLine(lpLine, lScenario)) << lpLine;
     }
     EXPECT_EQ(sRows("kpm-sim inject queue-full port=disk0 lun=0-7 times=100 plogi board=all").size(), 1u);
