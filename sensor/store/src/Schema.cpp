@@ -115,6 +115,10 @@ void migrateSchema(ZTCDatabase& arDatabase, ZTCSchemaSteps aSteps) {
     }
 }
 
+void refuseNewerSchema(ZTCDatabase& arDatabase, ZTCSchemaSteps aSteps) {
+    sReadVersion(arDatabase, aSteps);
+}
+
 void checkSchema(ZTCDatabase& arDatabase, ZTCSchemaSteps aSteps) {
     const std::size_t lVersion = sReadVersion(arDatabase, aSteps);
     if (lVersion < aSteps.size()) {

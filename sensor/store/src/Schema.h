@@ -16,6 +16,9 @@ ZTCSchemaSteps getSchemaSteps();
 /// has had more steps than there are.
 void migrateSchema(ZTCDatabase& arDatabase, ZTCSchemaSteps aSteps);
 
+/// Throws ZTCStoreNewerEx where the database has had more steps than there are. Changes nothing.
+void refuseNewerSchema(ZTCDatabase& arDatabase, ZTCSchemaSteps aSteps);
+
 /// For readers: throws ZTCStoreNewerEx, or ZTCNoHistoryEx where steps are missing.
 void checkSchema(ZTCDatabase& arDatabase, ZTCSchemaSteps aSteps);
 

@@ -15,6 +15,10 @@ static constexpr std::uint64_t scJournalBytes = 4ULL * 1024 * 1024;
 static ZTCDatabase sOpenDatabase(const std::string& acrPath) {
     createHistoryFile(acrPath);
     ZTCDatabase lDatabase(acrPath, ZTDA_ReadWrite);
+    if (sqlite3_db_readonly(lDatabase.handle(), "main") != 0) {
+        throw ZTCStoreNoRoomEx(acrPath + ": it can be read but not written: a read-only file system, or no rights");
+    }
+    refuseNewerSchema(lDatabase, getSchemaSteps());
     // auto_vacuum has an effect only before the first page is written, which the change to WAL does.
     lDatabase.execute("PRAGMA auto_vacuum = INCREMENTAL");
     lDatabase.execute("PRAGMA journal_mode = WAL");

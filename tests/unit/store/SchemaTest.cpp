@@ -1,0 +1,175 @@
+// Versions of the schema, damaged databases, and files as operators see them.
+#include "sensor/store/src/Schema.h"
+
+#include <sys/stat.h>
+
+#include <algorithm>
+#include <array>
+#include <filesystem>
+
+#include "tests/unit/store/Integrity.h"
+#include "tests/unit/store/StoreFixture.h"
+
+namespace {
+
+class SchemaTest : public ZTCStoreTest {
+protected:
+    std::vector<std::string> files() const {
+        std::vector<std::string> lNames;
+        for (const auto& lrEntry : std::filesystem::directory_iterator(mDirectory.path())) {
+            lNames.push_back(lrEntry.path().filename());
+        }
+        std::ranges::sort(lNames);
+        return lNames;
+    }
+    void execute(const std::string& acrSql) {
+        ZTCDatabase lDatabase(path(), ZTDA_ReadWrite);
+        lDatabase.execute(acrSql.c_str());
+    }
+};
+
+}  // namespace
+
+TEST_F(SchemaTest, ANewDatabaseHasTheSettingsThatItsUpkeepNeeds) {
+    take({makeQueueFull(gcPortA, gcBase, gcBase)});
+    EXPECT_EQ(queryNumber(path(), "PRAGMA auto_vacuum"), 2) << "incremental";
+    EXPECT_EQ(queryText(path(), "PRAGMA journal_mode"), "wal");
+    EXPECT_EQ(queryNumber(path(), "PRAGMA user_version"), static_cast<std::int64_t>(getSchemaSteps().size()));
+    for (const char* const lpEnd : {"", "-wal", "-shm"}) {
+        struct stat lState {};
+        ASSERT_EQ(stat((path() + lpEnd).c_str(), &lState), 0) << lpEnd;
+        EXPECT_EQ(lState.st_mode & 07777U, 0640U) << lpEnd;
+    }
+    closeStore();
+    EXPECT_TRUE(exists(path() + "-wal")) << "readers without the right to write need it after a clean close";
+    EXPECT_EQ(episodes().size(), 1U);
+}
+
+TEST_F(SchemaTest, EachDatabaseHasANameOfItsOwnThatStays) {
+    const std::string lName = store().getStoreId();
+    EXPECT_EQ(lName.size(), 32U);
+    closeStore();
+    EXPECT_EQ(store().getStoreId(), lName);
+    EXPECT_EQ(history().getStoreId(), lName);
+    ZTCTemporaryDirectory lOther;
+    EXPECT_NE(ZTCStore(lOther.path(), {}, nullptr).getStoreId(), lName);
+}
+
+TEST_F(SchemaTest, AnEmptyFileIsANewDatabase) {
+    writeFile(path(), "");
+    take({makeQueueFull(gcPortA, gcBase, gcBase)});
+    EXPECT_EQ(episodes().size(), 1U);
+    EXPECT_TRUE(mReports.empty());
+}
+
+TEST_F(SchemaTest, ANewerSchemaIsRefusedAndTheFileStaysAsItIs) {
+    take({makeQueueFull(gcPortA, gcBase, gcBase)});
+    closeStore();
+    execute("PRAGMA user_version = 99");
+    const auto lMustRefuse = [&](const auto& acrCall) {
+        try {
+            acrCall();
+            ADD_FAILURE() << "it was accepted";
+        } catch (const ZTCStoreNewerEx& lrProblem) {
+            const std::string lText = lrProblem.what();
+            EXPECT_NE(lText.find("version 99"), std::string::npos) << lText;
+            EXPECT_NE(lText.find(path()), std::string::npos) << lText;
+        }
+    };
+    lMustRefuse([&] { store(); });
+    lMustRefuse([&] { const ZTCHistory lHistory(mDirectory.path()); });
+    EXPECT_TRUE(mReports.empty());
+    execute("PRAGMA user_version = 1");
+    EXPECT_EQ(episodes().size(), 1U);
+}
+
+TEST_F(SchemaTest, StepsThatAreMissingAreMadeInOneTransaction) {
+    static constexpr std::array scFirst = {"CREATE TABLE one(a); INSERT INTO one VALUES (7)"};
+    static constexpr std::array scBroken = {scFirst[0], "ALTER TABLE one ADD COLUMN b", "CREATE NONSENSE"};
+    static constexpr std::array scLater = {scFirst[0], "ALTER TABLE one ADD COLUMN b", "UPDATE one SET b = a + 1"};
+    writeFile(path(), "");
+    ZTCDatabase lDatabase(path(), ZTDA_ReadWrite);
+    migrateSchema(lDatabase, scFirst);
+    EXPECT_THROW(checkSchema(lDatabase, scLater), ZTCNoHistoryEx);
+    EXPECT_THROW(migrateSchema(lDatabase, scBroken), ZTCStoreEx);
+    EXPECT_EQ(lDatabase.readNumber("PRAGMA user_version"), 1);
+    EXPECT_EQ(lDatabase.readNumber("SELECT count(*) FROM pragma_table_info('one')"), 1) << "nothing of it was kept";
+    migrateSchema(lDatabase, scLater);
+    EXPECT_EQ(lDatabase.readNumber("SELECT b FROM one"), 8);
+    EXPECT_EQ(lDatabase.readNumber("PRAGMA user_version"), 3);
+    EXPECT_NO_THROW(checkSchema(lDatabase, scLater));
+    EXPECT_THROW(migrateSchema(lDatabase, scFirst), ZTCStoreNewerEx);
+}
+
+TEST_F(SchemaTest, AReaderSaysWhenThereIsNoHistoryYet) {
+    EXPECT_THROW(ZTCHistory(mDirectory.path()), ZTCNoHistoryEx);
+    writeFile(path(), "");
+    EXPECT_THROW(ZTCHistory(mDirectory.path()), ZTCNoHistoryEx);
+}
+
+TEST_F(SchemaTest, ADamagedDatabaseIsRenamedAndReportedAndANewOneBegun) {
+    take({makeQueueFull(gcPortA, gcBase, gcBase)});
+    const std::string lName = store().getStoreId();
+    closeStore();
+    for (const std::string& lrContent : {std::string(8192, 'x'), readFile(path()).substr(0, 5000)}) {
+        writeFile(path(), lrContent);
+        EXPECT_NE(store().getStoreId(), lName);
+        closeStore();
+    }
+    const auto lNames = files();
+    EXPECT_EQ(std::ranges::count_if(lNames,
+                                    [](const std::string& acrName) {
+                                        return acrName.starts_with("history.damaged-") && acrName.ends_with(".db");
+                                    }),
+              2);
+    ASSERT_EQ(mReports.size(), 2U);
+    EXPECT_NE(mReports[0].find("history.damaged-"), std::string::npos) << mReports[0];
+    take({makeQueueFull(gcPortA, gcBase, gcBase)});
+    EXPECT_EQ(episodes().size(), 1U);
+}
+
+TEST_F(SchemaTest, DamageThatShowsLaterIsSetAsideByReopening) {
+    for (std::uint64_t i = 0; i < 200; ++i) {
+        take({makeQueueFull(gcPortA + i, gcBase, gcBase)});
+    }
+    closeStore();
+    std::string lContent = readFile(path());
+    ASSERT_GT(lContent.size(), 100000U);
+    // All but the first pages: the schema can be read, the tables cannot.
+    std::fill(lContent.begin() + 4096 * 2, lContent.end(), '\x55');
+    writeFile(path(), lContent);
+    const auto lTry = [&] {
+        for (int i = 0; i < 3; ++i) {
+            take({makeQueueFull(gcPortA, gcBase, gcBase)});
+        }
+    };
+    try {
+        lTry();
+    } catch (const ZTCStoreDamagedEx&) {
+        store().reopen();
+        lTry();
+    }
+    EXPECT_EQ(mReports.size(), 1U);
+    EXPECT_EQ(episodes().size(), 1U);
+    EXPECT_EQ(episodes()[0].mCount, 3U);
+    expectIntegrity(path());
+}
+
+TEST_F(SchemaTest, NoQueryScansATableThatGrows) {
+    take({makeQueueFull(gcPortA, gcBase, gcBase)});
+    ZTCDatabase lDatabase(path(), ZTDA_ReadOnly);
+    const auto lQueries = ZTCHistory::getQueries();
+    EXPECT_GT(lQueries.size(), 10U);
+    for (const std::string& lrQuery : lQueries) {
+        ZTCStatement lPlan(lDatabase, "EXPLAIN QUERY PLAN " + lrQuery);
+        lPlan.query();
+        int lRows = 0;
+        while (lPlan.step()) {
+            ++lRows;
+            const std::string lStep = lPlan.text(3);
+            EXPECT_FALSE(lStep.starts_with("SCAN")) << lrQuery << "\n" << lStep;
+            EXPECT_EQ(lStep.find("TEMP B-TREE"), std::string::npos) << lrQuery << "\n" << lStep;
+        }
+        EXPECT_GT(lRows, 0);
+    }
+}
