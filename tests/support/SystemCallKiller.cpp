@@ -60,7 +60,6 @@ ZTSKilledRun killAtSystemCall(unsigned aStop, const std::function<int()>& acrAct
     const auto lOptions = PTRACE_O_TRACESYSGOOD | PTRACE_O_TRACECLONE | PTRACE_O_TRACEEXEC | PTRACE_O_EXITKILL;
     ptrace(PTRACE_SETOPTIONS, lChild, nullptr, lOptions);
     ptrace(PTRACE_SYSCALL, lChild, nullptr, nullptr);
-    unsigned lStops = 0;
     while (const pid_t lThread = sWait(lChild, lStatus)) {
         if (!WIFSTOPPED(lStatus)) {
             if (lThread == lChild) {
@@ -69,7 +68,7 @@ ZTSKilledRun killAtSystemCall(unsigned aStop, const std::function<int()>& acrAct
             continue;
         }
         const int lSignal = WSTOPSIG(lStatus);
-        if (lSignal == scSystemCallStop && !lRun.mIsKilled && ++lStops == aStop) {
+        if (lSignal == scSystemCallStop && !lRun.mIsKilled && ++lRun.mStops == aStop) {
             lRun.mIsKilled = true;
             kill(lChild, SIGKILL);
             continue;

@@ -8,6 +8,7 @@
 struct ZTSKilledRun {
     bool mIsTraced = false;  ///< false: processes cannot be traced here, and nothing was run
     bool mIsKilled = false;  ///< false: it ended before that call
+    unsigned mStops = 0;     ///< that it came to
     int mStatus = 0;         ///< of one that ended: its exit status, or 1000 plus the signal that killed it
 };
 

@@ -61,9 +61,10 @@ ZTCCollector::ZTCCollector(ZTSInheritance aInheritance, const ZTSSettings& acrSe
 ZTCCollector::~ZTCCollector() = default;
 
 int ZTCCollector::run() {
+    turn(std::chrono::steady_clock::now());
     while (!isOver(std::chrono::steady_clock::now())) {
-        turn(std::chrono::steady_clock::now());
         poll(std::chrono::steady_clock::now());
+        turn(std::chrono::steady_clock::now());
     }
     const std::string lFatal = mHistory.getState().mFatal;
     if (!lFatal.empty()) {
@@ -118,7 +119,12 @@ void ZTCCollector::turn(ZTCTime aNow) {
 }
 
 int ZTCCollector::getPollTime(ZTCTime aNow) const {
-    ZTCTime lNext = std::min(mLastLook + gcLookPeriod, mIsReady ? mNextScan : mNextSpoolTry);
+    ZTCTime lNext = mLastLook + gcLookPeriod;
+    if (mIsReady) {
+        lNext = std::min(lNext, mNextScan);
+    } else if (mNextSpoolTry > aNow) {
+        lNext = std::min(lNext, mNextSpoolTry);
+    }
     if (mpSession != nullptr) {
         lNext = std::min(lNext, mpSession->getNextStep());
     }
@@ -304,9 +310,8 @@ void ZTCCollector::tellState() {
 // ---- agents ----
 
 void ZTCCollector::openSpool(ZTCTime aNow) {
-    if (aNow < mNextSpoolTry || !mHistory.getState().mIsOpen) {
-        mNextSpoolTry = std::max(mNextSpoolTry, aNow + scSpoolPause);
-        return;
+    if (!mHistory.getState().mIsOpen || aNow < mNextSpoolTry) {
+        return;  // the history rings when it is open
     }
     try {
         mSpool.open();
