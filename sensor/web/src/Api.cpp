@@ -1,0 +1,209 @@
+#include "sensor/web/include/Api.h"
+
+#include <algorithm>
+#include <charconv>
+#include <nlohmann/json.hpp>
+#include <set>
+
+#include "sensor/client/include/RecordJson.h"
+#include "sensor/metrics/include/Metrics.h"
+#include "sensor/views/include/EpisodeJson.h"
+#include "sensor/views/include/FilterText.h"
+#include "sensor/views/include/StatusView.h"
+#include "sensor/views/include/Timeline.h"
+
+using ZTCJson = nlohmann::ordered_json;
+
+static constexpr const char* scDatabase = "/history.db";
+
+static ZTSWebResponse sJson(const ZTCJson& acrDocument, unsigned aStatus = 200) {
+    return {.mStatus = aStatus, .mType = "application/json", .mBody = dumpJson(acrDocument, -1) + "\n"};
+}
+
+static ZTSWebResponse sError(unsigned aStatus, const std::string& acrText) {
+    return sJson({{"error", acrText}}, aStatus);
+}
+
+/// Throws where a parameter is none of these: a filter that is spelled wrong must not answer with everything.
+static void sCheckNames(const ZTSWebRequest& acrRequest, const std::set<std::string>& acrKnown) {
+    for (const auto& [lName, lValue] : acrRequest.mParameters) {
+        if (!acrKnown.contains(lName)) {
+            throw ZTCBadFilterEx("unknown parameter \"" + lName + "\"");
+        }
+    }
+}
+
+static ZTSFilterTexts sFilterTexts(const ZTSWebRequest& acrRequest) {
+    sCheckNames(acrRequest, {"since", "until", "kind", "port", "initiator", "lun", "limit", "open"});
+    ZTSFilterTexts lTexts;
+    lTexts.mSince = acrRequest.get("since");
+    lTexts.mUntil = acrRequest.get("until");
+    lTexts.mKinds = acrRequest.getAll("kind");
+    lTexts.mPorts = acrRequest.getAll("port");
+    lTexts.mInitiators = acrRequest.getAll("initiator");
+    lTexts.mLuns = acrRequest.getAll("lun");
+    lTexts.mLimit = acrRequest.get("limit");
+    const std::string lOpen = acrRequest.get("open");
+    if (!lOpen.empty() && lOpen != "true" && lOpen != "false") {
+        throw ZTCBadFilterEx("open is true or false, not \"" + lOpen + "\"");
+    }
+    lTexts.mIsOpenOnly = lOpen == "true";
+    return lTexts;
+}
+
+ZTCApi::ZTCApi(ZTSApiSources aSources) : mSources(std::move(aSources)) {}
+
+ZTCApi::~ZTCApi() = default;
+
+const ZTCHistory& ZTCApi::openHistory() {
+    if (mpHistory == nullptr) {
+        mpHistory = std::make_unique<ZTCHistory>(mSources.mStateDirectory);
+    }
+    return *mpHistory;
+}
+
+ZTCNameBook ZTCApi::makeNames(const ZTCHistory& acrHistory) const {
+    ZTCNameBook lNames;
+    mSources.mAddNames(lNames);
+    for (const ZTSInitiator& lrInitiator : acrHistory.readInitiators()) {
+        lNames.addInitiator(lrInitiator);
+    }
+    for (const ZTSRemotePort& lrPort : acrHistory.readRemotePorts()) {
+        lNames.addRemotePort(lrPort);
+    }
+    return lNames;
+}
+
+ZTSStatusFacts ZTCApi::gatherFacts() {
+    ZTSStatusFacts lFacts;
+    lFacts.mHost = mSources.mHost;
+    lFacts.mNow = getHistoryTime();
+    lFacts.mAnswer = ZTAN_Answered;
+    lFacts.mLive = readLiveState(mSources.mReadLive());
+    try {
+        lFacts.mHistory = readHistoryFacts(openHistory(), lFacts.mNow);
+        lFacts.mNames = makeNames(*mpHistory);
+    } catch (const ZTCStoreEx& lrEx) {
+        mpHistory.reset();
+        lFacts.mHistoryProblem = lrEx.what();
+    }
+    return lFacts;
+}
+
+ZTSWebResponse ZTCApi::answer(const ZTSWebRequest& acrRequest) {
+    try {
+        return answerKnown(acrRequest);
+    } catch (const ZTCBadFilterEx& lrEx) {
+        return sError(400, lrEx.what());
+    } catch (const ZTCStoreEx& lrEx) {
+        mpHistory.reset();  // the next request opens the history anew: it may have been replaced
+        return sError(503, lrEx.what());
+    }
+}
+
+ZTSWebResponse ZTCApi::answerKnown(const ZTSWebRequest& acrRequest) {
+    const std::string& lrPath = acrRequest.mPath;
+    if (lrPath == "/healthz") {
+        return answerHealth();
+    }
+    if (lrPath == "/metrics") {
+        return answerMetrics();
+    }
+    if (lrPath == "/api/v1/status") {
+        return sJson(makeStatus());
+    }
+    if (lrPath == "/api/v1/events") {
+        return sJson(makeEvents(acrRequest));
+    }
+    if (lrPath == "/api/v1/ports") {
+        return sJson(makePorts(acrRequest));
+    }
+    if (lrPath == "/api/v1/timeline") {
+        return sJson(makeTimeline(acrRequest));
+    }
+    if (lrPath == "/api/v1/stream") {
+        return {.mType = "text/event-stream", .mBody = ": the stream begins\n\n", .mIsStream = true};
+    }
+    return sError(404, "there is no " + lrPath + " here");
+}
+
+/// 200 while Tavik collects, also where it is partly deaf; 503 otherwise, with the state's id.
+ZTSWebResponse ZTCApi::answerHealth() {
+    const ZTSJudgement lJudgement = judge(gatherFacts());
+    return {.mStatus = lJudgement.isCollecting() ? 200U : 503U,
+            .mBody = std::string(lJudgement.getWorst().mpId) + "\n"};
+}
+
+ZTSWebResponse ZTCApi::answerMetrics() {
+    ZTSStatusFacts lStatus = gatherFacts();
+    ZTSMetricFacts lFacts;
+    if (mpHistory != nullptr) {
+        lFacts = readMetricFacts(*mpHistory, std::move(lStatus), mSources.mStateDirectory + scDatabase);
+    } else {
+        lFacts.mStatus = std::move(lStatus);
+    }
+    lFacts.mVersion = mSources.mVersion;
+    return {.mType = "text/plain; version=0.0.4; charset=utf-8", .mBody = formatMetrics(makeMetrics(lFacts))};
+}
+
+ZTCJson ZTCApi::makeStatus() {
+    return makeStatusDocument(gatherFacts());
+}
+
+ZTCJson ZTCApi::makeEvents(const ZTSWebRequest& acrRequest) {
+    const ZTSFilterTexts lTexts = sFilterTexts(acrRequest);
+    checkFilter(lTexts);
+    const ZTCHistory& lrHistory = openHistory();
+    const ZTCNameBook lNames = makeNames(lrHistory);
+    ZTSHistoryFilter lFilter = readFilter(lTexts, lNames, lrHistory.readMarks(), getHistoryTime(), gcDefaultAnswerRows);
+    lFilter.mLimit = std::min(lFilter.mLimit == 0 ? gcMostAnswerRows : lFilter.mLimit, gcMostAnswerRows);
+    ZTCJson lDocument = beginDocument("events", mSources.mHost, lrHistory.getStoreId());
+    ZTCJson& lrEpisodes = lDocument["episodes"] = ZTCJson::array();
+    lrHistory.visitEpisodes(lFilter, [&](const ZTSEpisode& acrEpisode) {
+        lrEpisodes.push_back(toJson(acrEpisode, lNames));
+        return true;
+    });
+    return lDocument;
+}
+
+ZTCJson ZTCApi::makePorts(const ZTSWebRequest& acrRequest) {
+    const ZTSFilterTexts lTexts = sFilterTexts(acrRequest);
+    checkFilter(lTexts);
+    const ZTCHistory& lrHistory = openHistory();
+    const ZTCNameBook lNames = makeNames(lrHistory);
+    const ZTSHistoryFilter lFilter = readFilter(lTexts, lNames, lrHistory.readMarks(), getHistoryTime(), 0);
+    ZTCJson lDocument = beginDocument("ports", mSources.mHost, lrHistory.getStoreId());
+    ZTCJson& lrPorts = lDocument["ports"] = ZTCJson::array();
+    for (const ZTSPortSummary& lrPort : lrHistory.readPorts(lFilter)) {
+        if (lFilter.mLimit == 0 || lrPorts.size() < lFilter.mLimit) {
+            lrPorts.push_back(toJson(lrPort, lNames));
+        }
+    }
+    return lDocument;
+}
+
+ZTCJson ZTCApi::makeTimeline(const ZTSWebRequest& acrRequest) {
+    sCheckNames(acrRequest, {"from", "to", "columns"});
+    const ZTCHistory& lrHistory = openHistory();
+    const std::vector<ZTSMark> lMarks = lrHistory.readMarks();
+    const ZTCHistoryTime lNow = getHistoryTime();
+    ZTSTimelineRequest lRequest;
+    const std::string lFrom = acrRequest.get("from");
+    const std::string lTo = acrRequest.get("to");
+    lRequest.mFrom = lFrom.empty() ? lNow - std::chrono::hours(24) : readPoint(lFrom, "from", lMarks, lNow);
+    lRequest.mTo = lTo.empty() ? lNow : readPoint(lTo, "to", lMarks, lNow);
+    if (lRequest.mTo <= lRequest.mFrom) {
+        throw ZTCBadFilterEx("to has to be later than from");
+    }
+    const std::string lColumns = acrRequest.get("columns");
+    const char* const lpEnd = lColumns.data() + lColumns.size();
+    if (!lColumns.empty()) {
+        const auto [lpStop, lError] = std::from_chars(lColumns.data(), lpEnd, lRequest.mColumns);
+        if (lError != std::errc() || lpStop != lpEnd || lRequest.mColumns < gcLeastColumns ||
+            lRequest.mColumns > gcMostColumns) {
+            throw ZTCBadFilterEx("columns \"" + lColumns + "\" is not a number from " + std::to_string(gcLeastColumns) +
+                                 " to " + std::to_string(gcMostColumns));
+        }
+    }
+    return makeTimelineDocument(lrHistory, lRequest, makeNames(lrHistory), mSources.mHost);
+}
