@@ -38,6 +38,14 @@ ZTSExplanation explainTopics();
 ZTSExplanation explainEpisode(const ZTSEpisode& acrEpisode, std::vector<std::uint64_t> aEvidence,
                               const ZTCNameBook& acrNames, ZTCHistoryTime aNow);
 
+/// Whether a text can be the number of an episode. Throws ZTCBadFilterEx where it cannot.
+void checkEpisodeNumber(const std::string& acrText);
+
+/// The episode of that number, with the records that are kept of it as evidence. Throws ZTCBadFilterEx where the text
+/// is no number or the history has no such episode, and what ZTCHistory throws.
+ZTSExplanation explainEpisode(const std::string& acrNumber, const ZTCHistory& acrHistory, const ZTCNameBook& acrNames,
+                              ZTCHistoryTime aNow);
+
 std::string formatExplanation(const ZTSExplanation& acrExplanation, const ZTSTextStyle& acrStyle);
 
 /// The document `tavik.explain/1`.

@@ -47,6 +47,7 @@ private:
     nlohmann::ordered_json makeStatus();
     nlohmann::ordered_json makeEvents(const ZTSWebRequest& acrRequest);
     nlohmann::ordered_json makePorts(const ZTSWebRequest& acrRequest);
+    nlohmann::ordered_json makeExplanation(const ZTSWebRequest& acrRequest);
     nlohmann::ordered_json makeTimeline(const ZTSWebRequest& acrRequest);
     struct ZTSStatusFacts gatherFacts();
 

@@ -8,6 +8,7 @@
 #include "sensor/client/include/RecordJson.h"
 #include "sensor/metrics/include/Metrics.h"
 #include "sensor/views/include/EpisodeJson.h"
+#include "sensor/views/include/Explanation.h"
 #include "sensor/views/include/FilterText.h"
 #include "sensor/views/include/StatusView.h"
 #include "sensor/views/include/Timeline.h"
@@ -118,6 +119,9 @@ ZTSWebResponse ZTCApi::answerKnown(const ZTSWebRequest& acrRequest) {
     if (lrPath == "/api/v1/ports") {
         return sJson(makePorts(acrRequest));
     }
+    if (lrPath == "/api/v1/explain") {
+        return sJson(makeExplanation(acrRequest));
+    }
     if (lrPath == "/api/v1/timeline") {
         return sJson(makeTimeline(acrRequest));
     }
@@ -180,6 +184,16 @@ ZTCJson ZTCApi::makePorts(const ZTSWebRequest& acrRequest) {
         }
     }
     return lDocument;
+}
+
+ZTCJson ZTCApi::makeExplanation(const ZTSWebRequest& acrRequest) {
+    sCheckNames(acrRequest, {"subject"});
+    const std::string lSubject = acrRequest.get("subject");
+    const ZTCHistory& lrHistory = openHistory();
+    const ZTCNameBook lNames = makeNames(lrHistory);
+    const auto lTopic = lSubject.empty() ? explainTopics() : explainTopic(lSubject);
+    return makeExplainDocument(lTopic ? *lTopic : explainEpisode(lSubject, lrHistory, lNames, getHistoryTime()),
+                               mSources.mHost, lrHistory.getStoreId(), lNames);
 }
 
 ZTCJson ZTCApi::makeTimeline(const ZTSWebRequest& acrRequest) {

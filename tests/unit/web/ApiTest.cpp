@@ -1,0 +1,184 @@
+#include "sensor/web/include/Api.h"
+
+#include <gmock/gmock.h>
+#include <gtest/gtest.h>
+
+#include <nlohmann/json.hpp>
+
+#include "sensor/metrics/include/SeriesPorts.h"
+#include "tests/unit/store/StoreFixture.h"
+
+using testing::AllOf;
+using testing::HasSubstr;
+
+/// Answers over a history that a test fills.
+class Api : public ZTCStoreTest {
+protected:
+    ZTSWebResponse ask(const std::string& acrPath,
+                       const std::vector<std::pair<std::string, std::string>>& acrParameters = {}) {
+        if (mpApi == nullptr) {
+            ZTSApiSources lSources;
+            lSources.mStateDirectory = mDirectory.path();
+            lSources.mHost = "db07";
+            lSources.mVersion = "9.8.7";
+            lSources.mReadLive = [this] { return mLive; };
+            lSources.mAddNames = [](ZTCNameBook& arNames) { arNames.addName(makeName(gcPortA), "array7 ctrl-A"); };
+            mpApi = std::make_unique<ZTCApi>(lSources);
+        }
+        return mpApi->answer({.mPath = acrPath, .mParameters = acrParameters});
+    }
+    nlohmann::json askJson(const std::string& acrPath,
+                           const std::vector<std::pair<std::string, std::string>>& acrParameters = {}) {
+        const ZTSWebResponse lResponse = ask(acrPath, acrParameters);
+        EXPECT_EQ(lResponse.mStatus, 200U) << lResponse.mBody;
+        EXPECT_EQ(lResponse.mType, "application/json");
+        return nlohmann::json::parse(lResponse.mBody);
+    }
+    /// Two ports with trouble, one of them in two minutes.
+    void fill() {
+        take({{.mKind = gcQueueFull, .mData = makeBusyData(gcPortA, {1, 4}), .mOccurrences = 30, .mPortName = {}},
+              {.mKind = gcPlogi, .mData = makeTwoNamesData(gcPortB, gcNode), .mOccurrences = 2, .mPortName = {}},
+              {.mKind = gcQueueFull,
+               .mData = makeBusyData(gcPortA, {4}),
+               .mBegin = gcBase + 5 * gcMinute,
+               .mEnd = gcBase + 5 * gcMinute + gcSecond,
+               .mOccurrences = 12,
+               .mPortName = {}}});
+    }
+
+    nlohmann::json mLive = {{"schema", "tavik.live/1"}, {"agent", {{"running", true}}}};
+    std::unique_ptr<ZTCApi> mpApi;
+};
+
+TEST_F(Api, EventsAreTheEpisodesOfTheFilter) {
+    fill();
+    const nlohmann::json lAll = askJson("/api/v1/events");
+    EXPECT_EQ(lAll["schema"], "tavik.events/1");
+    EXPECT_EQ(lAll["host"], "db07");
+    EXPECT_EQ(lAll["storeId"], store().getStoreId());
+    EXPECT_EQ(lAll["episodes"].size(), 3U);
+    const nlohmann::json lSome = askJson("/api/v1/events", {{"port", "array7 ctrl-A"}, {"lun", "1"}});
+    ASSERT_EQ(lSome["episodes"].size(), 1U);
+    EXPECT_EQ(lSome["episodes"][0]["count"], 30);
+    EXPECT_EQ(lSome["episodes"][0]["remotePort"]["name"], "array7 ctrl-A");
+    EXPECT_EQ(askJson("/api/v1/events", {{"kind", "plogi"}, {"kind", "link"}})["episodes"].size(), 1U);
+    EXPECT_EQ(askJson("/api/v1/events", {{"limit", "2"}})["episodes"].size(), 2U);
+    EXPECT_EQ(askJson("/api/v1/events", {{"limit", "0"}})["episodes"].size(), 3U);
+}
+
+TEST_F(Api, PortsAreSummedUpMostEventsFirst) {
+    fill();
+    const nlohmann::json lPorts = askJson("/api/v1/ports")["ports"];
+    ASSERT_EQ(lPorts.size(), 2U);
+    EXPECT_EQ(lPorts[0]["remotePort"]["name"], "array7 ctrl-A");
+    EXPECT_EQ(lPorts[0]["count"], 42);
+}
+
+TEST_F(Api, AWrongParameterGets400AndSaysWhy) {
+    fill();
+    const struct {
+        const char* mpPath;
+        std::pair<std::string, std::string> mParameter;
+        const char* mpSaid;
+    } lWrong[] = {
+        {"/api/v1/events", {"kind", "nonsense"}, "nonsense"},
+        {"/api/v1/events", {"sinse", "10m"}, "sinse"},
+        {"/api/v1/events", {"open", "perhaps"}, "perhaps"},
+        {"/api/v1/events", {"lun", "-1"}, "-1"},
+        {"/api/v1/ports", {"since", "when?"}, "when?"},
+        {"/api/v1/explain", {"subject", "nonsense"}, "nonsense"},
+        {"/api/v1/explain", {"subject", "999"}, "999"},
+        {"/api/v1/timeline", {"columns", "0"}, "columns"},
+        {"/api/v1/timeline", {"columns", "4001"}, "4001"},
+        {"/api/v1/timeline", {"to", "2000-01-01"}, "later than from"},
+    };
+    for (const auto& lrWrong : lWrong) {
+        const ZTSWebResponse lResponse = ask(lrWrong.mpPath, {lrWrong.mParameter});
+        EXPECT_EQ(lResponse.mStatus, 400U) << lrWrong.mParameter.second;
+        EXPECT_THAT(nlohmann::json::parse(lResponse.mBody)["error"].get<std::string>(), HasSubstr(lrWrong.mpSaid));
+    }
+}
+
+TEST_F(Api, ExplainKnowsKindsStatesAndEpisodes) {
+    fill();
+    EXPECT_EQ(askJson("/api/v1/explain", {{"subject", "queue-full"}})["schema"], "tavik.explain/1");
+    EXPECT_EQ(ask("/api/v1/explain", {{"subject", "deaf"}}).mStatus, 200U);
+    EXPECT_EQ(ask("/api/v1/explain", {{"subject", std::to_string(episodes().front().mEpisode)}}).mStatus, 200U);
+    EXPECT_EQ(ask("/api/v1/explain").mStatus, 200U);
+}
+
+TEST_F(Api, APathThatIsNotThereGets404) {
+    EXPECT_EQ(ask("/api/v1/nonsense").mStatus, 404U);
+    EXPECT_EQ(ask("/api/v1/events/").mStatus, 404U);
+}
+
+TEST_F(Api, WithoutAHistoryStatusAndMetricsStillAnswerAndTheRestGets503) {
+    EXPECT_EQ(ask("/api/v1/events").mStatus, 503U);
+    EXPECT_EQ(askJson("/api/v1/status")["schema"], "tavik.status/1");
+    EXPECT_THAT(ask("/metrics").mBody, HasSubstr("tavik_build_info{version=\"9.8.7\"} 1\n"));
+    fill();  // it is there now: no restart is needed
+    EXPECT_EQ(askJson("/api/v1/events")["episodes"].size(), 3U);
+}
+
+TEST_F(Api, MetricsCountWhatTheHistoryHolds) {
+    fill();
+    inTransaction([this] { store().setValue(gcSeriesPortsValue, makeName(gcPortA).toText()); });
+    const ZTSWebResponse lResponse = ask("/metrics");
+    EXPECT_EQ(lResponse.mType, "text/plain; version=0.0.4; charset=utf-8");
+    EXPECT_THAT(lResponse.mBody,
+                AllOf(HasSubstr("kind=\"queue-full\",remote_port=\"" + makeName(gcPortA).toText() + "\"} 42\n"),
+                      HasSubstr("kind=\"plogi\",remote_port=\"other\"} 2\n"), HasSubstr("tavik_retrievals_total 1\n"),
+                      HasSubstr("tavik_agent_up 1\n")));
+}
+
+// ---- the timeline ----
+
+TEST_F(Api, TheTimelineCountsEachMinuteInItsColumnExactly) {
+    fill();
+    // Ten columns of one minute each.
+    const nlohmann::json lTimeline = askJson(
+        "/api/v1/timeline", {{"from", "2026-03-04T05:06:00Z"}, {"to", "2026-03-04T05:16:00Z"}, {"columns", "10"}});
+    EXPECT_EQ(lTimeline["schema"], "tavik.timeline/1");
+    EXPECT_EQ(lTimeline["columnSeconds"], 60.0);
+    ASSERT_EQ(lTimeline["rows"].size(), 2U);
+    std::uint64_t lTotal = 0;
+    for (const nlohmann::json& lrRow : lTimeline["rows"]) {
+        for (const nlohmann::json& lrCell : lrRow["cells"]) {
+            lTotal += lrCell[1].get<std::uint64_t>();
+        }
+        if (lrRow["kind"] == "queue-full") {
+            EXPECT_EQ(lrRow["cells"], (nlohmann::json{{0, 30, 0}, {5, 12, 0}}));
+            EXPECT_EQ(lrRow["remotePort"]["name"], "array7 ctrl-A");
+        }
+    }
+    EXPECT_EQ(lTotal, 44U);
+}
+
+TEST_F(Api, TheTimelineOfMonthsHasTheSameTotalAsThatOfMinutes) {
+    fill();
+    for (const char* lpColumns : {"1", "30", "1000"}) {
+        const nlohmann::json lTimeline =
+            askJson("/api/v1/timeline",
+                    {{"from", "2026-02-20T00:00:00Z"}, {"to", "2026-03-22T00:00:00Z"}, {"columns", lpColumns}});
+        std::uint64_t lTotal = 0;
+        for (const nlohmann::json& lrRow : lTimeline["rows"]) {
+            for (const nlohmann::json& lrCell : lrRow["cells"]) {
+                lTotal += lrCell[1].get<std::uint64_t>();
+            }
+        }
+        EXPECT_EQ(lTotal, 44U) << lpColumns;
+    }
+}
+
+TEST_F(Api, TheTimelineShowsWhatWasNotListenedToAndMarks) {
+    inTransaction([this] {
+        store().setMark("before update", fromMicroseconds(gcBase + gcMinute));
+        store().beginRun(fromMicroseconds(gcBase));
+    });
+    const nlohmann::json lTimeline =
+        askJson("/api/v1/timeline", {{"from", "2026-03-04T05:00:00Z"}, {"to", "2026-03-04T06:00:00Z"}});
+    ASSERT_EQ(lTimeline["marks"].size(), 1U);
+    EXPECT_EQ(lTimeline["marks"][0]["name"], "before update");
+    EXPECT_EQ(lTimeline["runs"].size(), 1U);
+    EXPECT_TRUE(lTimeline["gaps"].is_array());
+}
