@@ -9,6 +9,8 @@
 // | Command/<load>/<boards> | the whole get-scope-data command: the same, and the records freed                      |
 // | MemcpyPass/<load>/<b>   | floor: one pass over the same records in list order that copies their data by memcpy;  |
 // |                         | as many bytes are counted as for Retrieve                                              |
+// | Get/<load>/<boards>     | the whole of it by the wall clock, from the command's write into its FIFO over the     |
+// |                         | agent's command thread to the last byte of the response that the sensor reads          |
 // | LockHold/<load>/<boards>| nanoseconds for which a retrieval holds the previous-data lock, median and 99 %, with  |
 // |                         | a full load, and with no record but the pending one ("empty"; after a full load was    |
 // |                         | made and retrieved, so that the caches are as in the other cases)                      |
@@ -156,6 +158,21 @@ void sHandOver(benchmark::State& arState, ZTEWhat aWhat, ZTELoad aLoad, unsigned
     arState.SetBytesProcessed(lBytes);
 }
 
+void sGet(benchmark::State& arState, ZTELoad aLoad, unsigned aBoards) {
+    // Threads that have ended cannot be started again, so this is an agent of its own.
+    ZTCBenchAgent lAgent(aBoards, 10);
+    lAgent.startThreads();
+    std::size_t lBytes = 0;
+    for (auto lUnused : arState) {
+        sFill(lAgent, aLoad, aBoards);
+        const std::int64_t lBegin = benchNow();
+        lBytes += lAgent.requestOverPipes({1});
+        arState.SetIterationTime(static_cast<double>(benchNow() - lBegin) / 1e9);
+    }
+    lAgent.stopThreads();
+    arState.SetBytesProcessed(static_cast<std::int64_t>(lBytes));
+}
+
 void sLockHold(benchmark::State& arState, ZTELoad aLoad, unsigned aBoards) {
     ZTCBenchAgent& lrAgent = ZTCBenchAgent::use(aBoards, 10);
     auto& lrMutex = const_cast<ZTCMutex&>(lrAgent.system().getPrevDataLock());
@@ -301,6 +318,12 @@ void sRegister() {
                         ->Iterations(40)
                         ->Unit(benchmark::kMicrosecond);
                 }
+            }
+            if (lcrLoad.mLoad != ZTBL_Empty) {
+                benchmark::RegisterBenchmark(("Get" + lEnd).c_str(), sGet, lcrLoad.mLoad, lBoards)
+                    ->UseManualTime()
+                    ->Iterations(40)
+                    ->Unit(benchmark::kMicrosecond);
             }
             benchmark::RegisterBenchmark(("LockHold" + lEnd).c_str(), sLockHold, lcrLoad.mLoad, lBoards)
                 ->Iterations(100);

@@ -4,6 +4,7 @@
 #include <sys/stat.h>
 #include <unistd.h>
 
+#include <cstdint>
 #include <cstdlib>
 #include <filesystem>
 #include <map>
@@ -13,6 +14,8 @@
 
 #include "bench/support/BenchEvents.h"
 #include "common/include/Log.h"
+#include "common/include/NetworkOrder.h"
+#include "os/common/include/ProcessEvents.h"
 #include "system/include/SystemGlobals.h"
 
 namespace {
@@ -28,6 +31,17 @@ void sAppend32(std::vector<unsigned char>& arBytes, unsigned aValue) {
 void sAppendName(std::vector<unsigned char>& arBytes, std::uint64_t aValue) {
     const HBA_wwn lName = makeBenchName(aValue);
     arBytes.insert(arBytes.end(), lName.wwn, lName.wwn + sizeof lName.wwn);
+}
+
+void sReadFully(int aDescriptor, unsigned char* apTo, std::size_t aCount) {
+    while (aCount > 0) {
+        const ssize_t lCount = read(aDescriptor, apTo, aCount);
+        if (lCount <= 0) {
+            throw std::runtime_error("reading a response");
+        }
+        apTo += lCount;
+        aCount -= static_cast<std::size_t>(lCount);
+    }
 }
 
 std::string sMakeDirectory() {
@@ -118,6 +132,40 @@ ZTCPointer<ZTCBuffer> ZTCBenchAgent::request(const std::vector<unsigned char>& a
     ZTCPointer<ZTCBuffer> lResponse;
     mpSystem->getProtocolHandler()->process(lRequest, lResponse);
     return lResponse;
+}
+
+void ZTCBenchAgent::startThreads() {
+    getExitEvent().reset();
+    mCommandWriter = open(mpSystem->getTvkCmdIpcPath().get(), O_WRONLY | O_CLOEXEC);
+    if (mCommandWriter < 0 || fcntl(mResponseReader, F_SETFL, 0) != 0) {
+        throw std::runtime_error("opening the sensor's ends of the FIFOs");
+    }
+    mpSystem->createThreads();
+    mpSystem->startThreads();
+}
+
+void ZTCBenchAgent::stopThreads() {
+    mpSystem->destroyThreads();
+    getExitEvent().reset();
+    close(mCommandWriter);
+    mCommandWriter = -1;
+}
+
+std::size_t ZTCBenchAgent::requestOverPipes(const std::vector<unsigned char>& acrBody) {
+    std::vector<unsigned char> lFrame;
+    sAppend32(lFrame, static_cast<unsigned>(acrBody.size()));
+    lFrame.insert(lFrame.end(), acrBody.begin(), acrBody.end());
+    if (write(mCommandWriter, lFrame.data(), lFrame.size()) != static_cast<ssize_t>(lFrame.size())) {
+        throw std::runtime_error("writing a command");
+    }
+    static auto& srBytes = *new std::vector<unsigned char>(1 << 20);
+    sReadFully(mResponseReader, srBytes.data(), 4);
+    const std::size_t lSize = loadFromNetworkOrder<std::uint32_t>(srBytes.data());
+    if (srBytes.size() < lSize) {
+        srBytes.resize(lSize);
+    }
+    sReadFully(mResponseReader, srBytes.data(), lSize);
+    return lSize;
 }
 
 std::vector<unsigned char> ZTCBenchAgent::makeRegisterTargets(unsigned aTargets) {

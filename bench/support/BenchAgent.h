@@ -1,8 +1,10 @@
 /// The agent's system object in the benchmark's own process, brought up by its own preInit and init over a directory
-/// and an adapters' library of the benchmarks. None of its threads runs: the benchmark calls what they would call.
+/// and an adapters' library of the benchmarks. Its threads run only where a benchmark starts them: otherwise it calls
+/// what they would call.
 #ifndef BENCH_SUPPORT_BENCHAGENT_H
 #define BENCH_SUPPORT_BENCHAGENT_H
 
+#include <cstddef>
 #include <string>
 #include <vector>
 
@@ -33,6 +35,14 @@ public:
     ZTCPointer<ZTCBuffer> request(const std::vector<unsigned char>& acrBody);
     ZTCPointer<ZTCBuffer> retrieve() { return request({1}); }
 
+    /// Starts the agent's own threads, once, and ends them.
+    void startThreads();
+    void stopThreads();
+
+    /// One request to the running command thread, as the sensor makes it over the two FIFOs. Returns when the last byte
+    /// of the response was read; the number of its bytes.
+    std::size_t requestOverPipes(const std::vector<unsigned char>& acrBody);
+
     static std::vector<unsigned char> makeRegisterTargets(unsigned aTargets);
 
     /// A directory of this process on a real file system; removed at its end.
@@ -41,6 +51,7 @@ public:
 private:
     ZTCTavikSystem* mpSystem;
     int mResponseReader;
+    int mCommandWriter = -1;
 };
 
 #endif

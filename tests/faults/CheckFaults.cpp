@@ -23,6 +23,14 @@ struct ZTSRow {
     std::vector<std::string> mFindings;
 };
 
+/// Whether this program, and so the agent of the same build, is optimised. Without optimisation the compiler makes
+/// copies of what may fail to be copied, and the run reports findings that are its own.
+#ifdef __OPTIMIZE__
+constexpr bool gcIsOptimised = true;
+#else
+constexpr bool gcIsOptimised = false;
+#endif
+
 struct ZTSOptions {
     bool mIsQuick = false;
     std::string mPhase;
@@ -119,6 +127,12 @@ int main(int argc, char** argv) {
             std::cerr << "Usage: check-faults [--quick] [--phase TEXT] [--call NAME]\n";
             return 2;
         }
+    }
+
+    if (!gcIsOptimised) {
+        std::cerr << "check-faults: this build is not optimised, so that some findings would be of the build and not of "
+                     "the agent; use the release preset\n";
+        return 2;
     }
 
     ZTCChildProcess::becomeReaper();
