@@ -31,7 +31,7 @@ public:
 
     /// Adds bytes at the end; they may lie in this very buffer. The capacity grows geometrically.
     void append(const void* apBytes, Size aCount) {
-        if (aCount <= mCapacity - mSize && 0 != aCount) {
+        if (aCount <= mCapacity - mSize && aCount != 0) {
             std::memmove(mpData + mSize, apBytes, aCount);
             mSize += aCount;
         } else {

@@ -36,7 +36,7 @@ public:
     V& get(const K& acrKey) { return const_cast<V&>(static_cast<const ZTCMap&>(*this).get(acrKey)); }
     const V& get(const K& acrKey) const {
         const V* const lpValue = get(acrKey, std::nothrow);
-        if (nullptr == lpValue) {
+        if (lpValue == nullptr) {
             throw ZTCNotFoundEx("No element for the key exists in map", gcErrNotFound);
         }
         return *lpValue;

@@ -29,7 +29,7 @@ void wipeMemory(void* apBlock, std::size_t aBytes) noexcept;
 /// Frees a block from malloc, if there is one, and sets the pointer to null.
 #define ZT_FREE(apPointer)            \
     do {                              \
-        if (nullptr != (apPointer)) { \
+        if ((apPointer) != nullptr) { \
             std::free(apPointer);     \
             (apPointer) = nullptr;    \
         }                             \
@@ -38,7 +38,7 @@ void wipeMemory(void* apBlock, std::size_t aBytes) noexcept;
 /// The same, after the block's bytes were set to zero.
 #define ZT_FREEARR(apPointer, aBytes)          \
     do {                                       \
-        if (nullptr != (apPointer)) {          \
+        if ((apPointer) != nullptr) {          \
             wipeMemory((apPointer), (aBytes)); \
             std::free(apPointer);              \
             (apPointer) = nullptr;             \

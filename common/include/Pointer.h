@@ -72,7 +72,7 @@ public:
         static_assert(ZTCIsMadeWithItsCount<T>, "the class does not say that it is made so");
         static_assert(alignof(ZTSJoined) <= __STDCPP_DEFAULT_NEW_ALIGNMENT__);
         void* const lpBlock = ::operator new(sizeof(ZTSJoined), std::nothrow);
-        if (nullptr == lpBlock) {
+        if (lpBlock == nullptr) {
             throw ZTCNoMemoryEx("Out of Memory", gcErrNoMemory);
         }
         ZTCPointer lPointer;
@@ -106,11 +106,11 @@ public:
     ZTCPointer(T* apObject, ZTEPointerSizeType aSizeType = ZTPST_Individual, ZTEPointerAllocType aAllocType = ZTPAT_New)
         : mPointer(apObject), mSizeType(aSizeType), mAllocType(aAllocType) {
         static_assert(!ZTCIsMadeWithItsCount<T>, "such an object comes from make");
-        if (nullptr == mPointer) {
+        if (mPointer == nullptr) {
             throw ZTCNoMemoryEx("Out of Memory", gcErrNoMemory);
         }
         mReferenceCount = NEW ZTCReferenceCount(1);
-        if (nullptr == mReferenceCount) {
+        if (mReferenceCount == nullptr) {
             _releaseMemory();
             throw ZTCNoMemoryEx("Out of Memory", gcErrNoMemory);
         }
@@ -153,7 +153,7 @@ public:
     }
 
     ~ZTCPointer() {
-        if (nullptr != mReferenceCount && 0 == mReferenceCount->decrement()) {
+        if (mReferenceCount != nullptr && mReferenceCount->decrement() == 0) {
             _releaseMemory();
         }
         clearFields();
@@ -236,7 +236,7 @@ private:
             ::operator delete(lpCount);
         } else {
             delete lpCount;
-            if (nullptr == mPointer) {
+            if (mPointer == nullptr) {
                 return;
             }
             switch (mAllocType) {

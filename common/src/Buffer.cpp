@@ -9,11 +9,15 @@
 #include "common/include/Exception.h"
 #include "common/include/Memory.h"
 
-static constexpr std::uint64_t gcLargestBuffer = std::numeric_limits<Size>::max();
-static constexpr std::uint64_t gcLeastCapacity = 64;
+namespace {
+
+constexpr std::uint64_t scLargestBuffer = std::numeric_limits<Size>::max();
+constexpr std::uint64_t scLeastCapacity = 64;
+
+}  // namespace
 
 ZTCBuffer::ZTCBuffer(Size aCapacity) {
-    if (0 != aCapacity) {
+    if (aCapacity != 0) {
         growTo(aCapacity);
     }
 }
@@ -23,12 +27,12 @@ ZTCBuffer::~ZTCBuffer() {
 }
 
 void ZTCBuffer::growAndAppend(const void* apBytes, Size aCount) {
-    if (0 == aCount) {
+    if (aCount == 0) {
         return;
     }
     const unsigned char* lpBytes = static_cast<const unsigned char*>(apBytes);
     const std::less<const unsigned char*> lIsBefore;
-    const bool lIsOwn = nullptr != mpData && !lIsBefore(lpBytes, mpData) && lIsBefore(lpBytes, mpData + mSize);
+    const bool lIsOwn = mpData != nullptr && !lIsBefore(lpBytes, mpData) && lIsBefore(lpBytes, mpData + mSize);
     const std::ptrdiff_t lOffset = lIsOwn ? lpBytes - mpData : 0;
     makeRoomFor(std::uint64_t{mSize} + aCount);
     if (lIsOwn) {
@@ -53,16 +57,16 @@ void ZTCBuffer::reserve(Size aCapacity) {
 }
 
 void ZTCBuffer::makeRoomFor(std::uint64_t aNeeded) {
-    if (aNeeded > gcLargestBuffer) {
+    if (aNeeded > scLargestBuffer) {
         throw ZTCInvalidEx("Buffer cannot hold more than 4294967295 bytes", gcErrInvalid);
     }
-    const std::uint64_t lDoubled = ZT_MAX(std::uint64_t{mCapacity} * 2, gcLeastCapacity);
-    growTo(static_cast<Size>(ZT_MIN(ZT_MAX(aNeeded, lDoubled), gcLargestBuffer)));
+    const std::uint64_t lDoubled = ZT_MAX(std::uint64_t{mCapacity} * 2, scLeastCapacity);
+    growTo(static_cast<Size>(ZT_MIN(ZT_MAX(aNeeded, lDoubled), scLargestBuffer)));
 }
 
 void ZTCBuffer::growTo(Size aNeeded) {
     void* const lpData = std::realloc(mpData, aNeeded);
-    if (nullptr == lpData) {
+    if (lpData == nullptr) {
         throw ZTCNoMemoryEx("Out of Memory", gcErrNoMemory);
     }
     mpData = static_cast<unsigned char*>(lpData);

@@ -35,7 +35,7 @@ ZTCDateTime::ZTCDateTime(const char* apSeparator) noexcept : ZTCDateTime(sNow(),
     }
     const auto lSecond = static_cast<std::time_t>(mSecondsSinceEpoch);
     std::tm lLocal{};
-    sLatest.mIsKnown = nullptr != localtime_r(&lSecond, &lLocal);
+    sLatest.mIsKnown = localtime_r(&lSecond, &lLocal) != nullptr;
     if (sLatest.mIsKnown) {
         setLocalFields(lLocal);
         std::memcpy(sLatest.mFields, this, gcLocalSize);
@@ -46,7 +46,7 @@ ZTCDateTime::ZTCDateTime(const char* apSeparator) noexcept : ZTCDateTime(sNow(),
 ZTCDateTime::ZTCDateTime(const std::timespec& acrTime, const char* apSeparator) noexcept
     : ZTCDateTime(acrTime, apSeparator, nullptr) {
     std::tm lLocal{};
-    if (nullptr != localtime_r(&acrTime.tv_sec, &lLocal)) {
+    if (localtime_r(&acrTime.tv_sec, &lLocal) != nullptr) {
         setLocalFields(lLocal);
     }
 }
@@ -55,7 +55,7 @@ ZTCDateTime::ZTCDateTime(const std::timespec& acrTime, const char* apSeparator, 
     : mMilliSeconds(static_cast<std::uint16_t>(acrTime.tv_nsec / 1000000)),
       mMicroSeconds(static_cast<std::uint16_t>(acrTime.tv_nsec / 1000 % 1000)),
       mSecondsSinceEpoch(static_cast<std::uint64_t>(acrTime.tv_sec)) {
-    if (nullptr != apSeparator && '\0' != apSeparator[0]) {
+    if (apSeparator != nullptr && apSeparator[0] != '\0') {
         mSeparator = apSeparator[0];
     }
 }

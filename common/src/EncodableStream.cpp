@@ -129,7 +129,7 @@ ZTCEncodableInStream& ZTCEncodableInStream::operator>>(ZTCString& arText) {
 
 ZTCEncodableInStream& ZTCEncodableInStream::readBytes(void* apBytes, Size aCount) {
     const unsigned char* const lpBytes = peek(aCount);
-    if (0 != aCount) {
+    if (aCount != 0) {
         std::memcpy(apBytes, lpBytes, aCount);
         mPosition += aCount;
     }
@@ -146,5 +146,5 @@ const unsigned char* ZTCEncodableInStream::peek(Size aCount) const {
         throw ZTCInvalidEx("Not enough data in stream", gcErrInvalid);
     }
     const unsigned char* const lpData = static_cast<const ZTCBuffer&>(*mBuffer).getData();
-    return nullptr == lpData ? nullptr : lpData + mPosition;
+    return lpData == nullptr ? nullptr : lpData + mPosition;
 }

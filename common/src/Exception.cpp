@@ -3,7 +3,7 @@
 #include <cstring>
 
 ZTCException::ZTCException(const char* apMessage, ZTError aError) noexcept : mMessage{}, mError(aError) {
-    if (nullptr != apMessage) {
+    if (apMessage != nullptr) {
         std::memcpy(mMessage, apMessage, strnlen(apMessage, gcMessageCapacity - 1));
     }
 }

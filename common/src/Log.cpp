@@ -9,9 +9,11 @@
 
 constinit std::atomic<unsigned> gLogCode{gcDefaultLogCode};
 
-static constinit ZTCLogSink sLogSink;
+namespace {
 
-static void sWrite(ZTCLogLine& arLine, const char* apFormat, std::va_list aArguments) noexcept {
+constinit ZTCLogSink sLogSink;
+
+void sWrite(ZTCLogLine& arLine, const char* apFormat, std::va_list aArguments) noexcept {
     static constinit std::atomic<bool> sIsSpillRegistered{false};
     if (!sIsSpillRegistered.exchange(true, std::memory_order_relaxed)) {
         // A process that ends before it has set a log file shows its lines all the same.
@@ -20,6 +22,8 @@ static void sWrite(ZTCLogLine& arLine, const char* apFormat, std::va_list aArgum
     arLine.finish(apFormat, aArguments);
     sLogSink.write(arLine);
 }
+
+}  // namespace
 
 void PrintLogMessageWithTimeStamp(unsigned aLevel, const char* apMark, unsigned aLine, const char* apFunction,
                                   const char* apFile, const char* apFormat, ...) noexcept {

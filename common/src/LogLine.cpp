@@ -27,7 +27,7 @@ public:
         do {
             *--lpBegin = static_cast<char>('0' + aNumber % 10);
             aNumber /= 10;
-        } while (0 != aNumber);
+        } while (aNumber != 0);
         if (aIsNegative) {
             *--lpBegin = '-';
         }
@@ -56,11 +56,11 @@ bool sFormatSimply(ZTCShortText& arText, const char* apFormat, std::va_list aArg
             return false;
         }
         apFormat += lPlain;
-        if ('\0' == *apFormat) {
+        if (*apFormat == '\0') {
             return true;
         }
         ++apFormat;
-        const bool lIsLong = 'l' == *apFormat;
+        const bool lIsLong = *apFormat == 'l';
         if (lIsLong) {
             ++apFormat;
         }
@@ -68,7 +68,7 @@ bool sFormatSimply(ZTCShortText& arText, const char* apFormat, std::va_list aArg
         switch (*apFormat) {
             case 's': {
                 const char* const lpArgument = lIsLong ? nullptr : va_arg(aArguments, const char*);
-                lIsDone = nullptr != lpArgument && arText.add(lpArgument, std::strlen(lpArgument));
+                lIsDone = lpArgument != nullptr && arText.add(lpArgument, std::strlen(lpArgument));
                 break;
             }
             case 'u':
@@ -95,7 +95,7 @@ bool sHasControl(std::uint64_t aBytes) noexcept {
     constexpr std::uint64_t lcHighs = 0x8080808080808080;
     const std::uint64_t lBelowBlank = (aBytes - lcOnes * 0x20) & ~aBytes;
     const std::uint64_t lDeletes = aBytes ^ lcOnes * 0x7f;
-    return 0 != ((lBelowBlank | ((lDeletes - lcOnes) & ~lDeletes)) & lcHighs);
+    return ((lBelowBlank | ((lDeletes - lcOnes) & ~lDeletes)) & lcHighs) != 0;
 }
 
 /// How many bytes stand in front of the first control character, or a few fewer.
@@ -112,10 +112,10 @@ std::size_t sSkipPlain(const char* apText, std::size_t aLength) noexcept {
     return lSkipped;
 }
 
-}  // namespace
+constexpr char scCutMark[] = "...";
+constexpr std::size_t scEndingSize = sizeof(scCutMark);  // the cut mark and the line break
 
-static constexpr char gcCutMark[] = "...";
-static constexpr std::size_t gcEndingSize = sizeof(gcCutMark);  // the cut mark and the line break
+}  // namespace
 
 ZTCLogLine::ZTCLogLine(const char* apMark) noexcept {
     add(apMark, std::strlen(apMark));
@@ -159,8 +159,8 @@ void ZTCLogLine::finish(const char* apFormat, std::va_list aArguments) noexcept 
     va_end(lSimple);
 
     if (mIsCut) {
-        std::memcpy(mpData + mLength, gcCutMark, sizeof(gcCutMark) - 1);
-        mLength += sizeof(gcCutMark) - 1;
+        std::memcpy(mpData + mLength, scCutMark, sizeof(scCutMark) - 1);
+        mLength += sizeof(scCutMark) - 1;
     }
     mpData[mLength++] = '\n';
 }
@@ -181,7 +181,7 @@ void ZTCLogLine::formatAtLength(char* apShort, std::size_t aSize, const char* ap
         lLength = static_cast<std::size_t>(lWanted);
         if (lLength >= aSize) {
             lpLong = static_cast<char*>(std::malloc(lLength + 1));
-            if (nullptr == lpLong) {
+            if (lpLong == nullptr) {
                 lLength = aSize - 1;
                 mIsCut = true;
             } else {
@@ -198,7 +198,7 @@ void ZTCLogLine::formatAtLength(char* apShort, std::size_t aSize, const char* ap
 void ZTCLogLine::addEscaped(const char* apText, std::size_t aLength) noexcept {
     static constexpr char lcHexDigits[] = "0123456789abcdef";
 
-    if (aLength > 0 && '\n' == apText[aLength - 1]) {
+    if (aLength > 0 && apText[aLength - 1] == '\n') {
         --aLength;
     }
     std::size_t lDone = 0;
@@ -231,7 +231,7 @@ void ZTCLogLine::addEscaped(const char* apText, std::size_t aLength) noexcept {
 
 void ZTCLogLine::add(const char* apBytes, std::size_t aCount) noexcept {
     if (!makeRoomFor(aCount)) {
-        aCount = mCapacity - gcEndingSize - mLength;
+        aCount = mCapacity - scEndingSize - mLength;
         mIsCut = true;
     }
     std::memcpy(mpData + mLength, apBytes, aCount);
@@ -239,13 +239,13 @@ void ZTCLogLine::add(const char* apBytes, std::size_t aCount) noexcept {
 }
 
 bool ZTCLogLine::makeRoomFor(std::size_t aCount) noexcept {
-    const std::size_t lNeeded = mLength + aCount + gcEndingSize;
+    const std::size_t lNeeded = mLength + aCount + scEndingSize;
     if (lNeeded <= mCapacity) {
         return true;
     }
     const std::size_t lCapacity = lNeeded < mCapacity * 2 ? mCapacity * 2 : lNeeded;
     char* const lpData = static_cast<char*>(std::malloc(lCapacity));
-    if (nullptr == lpData) {
+    if (lpData == nullptr) {
         return false;
     }
     std::memcpy(lpData, mpData, mLength);

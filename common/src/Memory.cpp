@@ -8,7 +8,7 @@
 void* allocateZeroed(std::size_t aBytes) {
     // An empty block may be null, which would look like a failure.
     void* const lpBlock = std::malloc(ZT_MAX(aBytes, std::size_t{1}));
-    if (nullptr == lpBlock) {
+    if (lpBlock == nullptr) {
         throw ZTCNoMemoryEx();
     }
     std::memset(lpBlock, 0, aBytes);
@@ -16,7 +16,7 @@ void* allocateZeroed(std::size_t aBytes) {
 }
 
 void* allocateZeroed(std::size_t aCount, std::size_t aElementBytes) {
-    if (0 != aElementBytes && aCount > std::numeric_limits<std::size_t>::max() / aElementBytes) {
+    if (aElementBytes != 0 && aCount > std::numeric_limits<std::size_t>::max() / aElementBytes) {
         throw ZTCNoMemoryEx();
     }
     return allocateZeroed(aCount * aElementBytes);

@@ -19,7 +19,7 @@ std::string* sMakeText(Arguments&&... aArguments) {
 }
 
 const char* sCheckText(const char* apText) {
-    if (nullptr == apText) {
+    if (apText == nullptr) {
         throw ZTCInvalidEx("Cannot make a string from a null text", gcErrInvalid);
     }
     return apText;
@@ -30,7 +30,7 @@ const char* sCheckText(const char* apText) {
 ZTCString::ZTCString(const char* apText) : mString(sMakeText(sCheckText(apText))) {}
 
 ZTCString::ZTCString(const char* apText, std::size_t aLength)
-    : mString(sMakeText(0 == aLength ? "" : sCheckText(apText), aLength)) {}
+    : mString(sMakeText(aLength == 0 ? "" : sCheckText(apText), aLength)) {}
 
 // The log shows the conditions as they are written here: 0, not nullptr.
 
@@ -65,7 +65,7 @@ std::size_t ZTCString::length() const {
 bool ZTCString::operator==(const ZTCString& acrCopy) const {
     ZT_ASSERT(mString != 0);
     ZT_ASSERT(acrCopy.mString != 0);
-    return 0 == std::strcmp(mString->c_str(), acrCopy.mString->c_str());
+    return std::strcmp(mString->c_str(), acrCopy.mString->c_str()) == 0;
 }
 
 bool ZTCString::operator<(const ZTCString& acrCopy) const {

@@ -9,7 +9,10 @@ class ZTCSystem;
 void setSystemObject(ZTCSystem* apSystem);
 ZTCSystem* getSystemObject();
 
-/// The heartbeat period in seconds, 240 until it is set. Any thread.
+/// The heartbeat period in seconds until another one is set.
+inline constexpr unsigned gcDefaultHbTimeout = 240;
+
+/// The heartbeat period in seconds. Any thread.
 void setHbTimeout(unsigned aSeconds);
 void getHbTimeout(unsigned& arSeconds);
 

@@ -4,11 +4,10 @@
 #include <cstdint>
 
 #include "common/include/Exception.h"
+#include "common/include/ThrowWith.h"
 #include "os/common/include/Clib.h"
 
 namespace {
-
-constexpr std::size_t gcMaxText = 512;
 
 /// A text of the command line as it can stand in a message: one line, of bounded length.
 class ZTCShownText {
@@ -108,7 +107,7 @@ struct ZTSOptionRule {
     bool (*mpTake)(const char* apValue, ZTSCommandLineOptions& arOptions);
 };
 
-constexpr ZTSOptionRule gcOptionRules[] = {
+constexpr ZTSOptionRule scOptionRules[] = {
     {"-h", "", sTakeHelp},
     {"-v", "", sTakeVersion},
     {"-s", "", sTakeShutDown},
@@ -121,7 +120,7 @@ constexpr ZTSOptionRule gcOptionRules[] = {
 };
 
 const ZTSOptionRule* sFindRule(const char* apIdentifier) {
-    for (const ZTSOptionRule& lcrRule : gcOptionRules) {
+    for (const ZTSOptionRule& lcrRule : scOptionRules) {
         if (ClibStrcmp(lcrRule.mpIdentifier, apIdentifier) == 0) {
             return &lcrRule;
         }
@@ -147,31 +146,27 @@ void ZTCCommandLineParser::parse(const ZTCVector<ZTSCommandLineArgumentDesc>& ac
     mState = ZTPS_Running;
     mOptions = ZTSCommandLineOptions();
     ZTSCommandLineOptions lOptions;
-    char lText[gcMaxText];
 
     for (int lIndex = 1; lIndex < aArgc; ++lIndex) {
         const char* lpArgument = apArgv[lIndex];
         const ZTSCommandLineArgumentDesc* lpDesc = sFindDesc(acrDescs, lpArgument);
         const ZTSOptionRule* lpRule = lpDesc != nullptr ? sFindRule(lpArgument) : nullptr;
         if (lpRule == nullptr) {
-            ClibSprintf(lText, sizeof(lText), "Unknown option '%s'; -h shows those that there are",
-                        ZTCShownText(lpArgument).get());
-            throw ZTCInvalidEx(lText);
+            throwWith<ZTCInvalidEx>("Unknown option '%s'; -h shows those that there are",
+                                    ZTCShownText(lpArgument).get());
         }
 
         const char* lpValue = "";
         if (lpDesc->type == ZTCLAT_OptionValue) {
             if (lIndex + 1 >= aArgc || sFindDesc(acrDescs, apArgv[lIndex + 1]) != nullptr) {
-                ClibSprintf(lText, sizeof(lText), "Option %s: the value is missing; it has to be %s", lpArgument,
-                            lpRule->mpLimits);
-                throw ZTCInvalidEx(lText);
+                throwWith<ZTCInvalidEx>("Option %s: the value is missing; it has to be %s", lpArgument,
+                                        lpRule->mpLimits);
             }
             lpValue = apArgv[++lIndex];
         }
         if (!lpRule->mpTake(lpValue, lOptions)) {
-            ClibSprintf(lText, sizeof(lText), "Option %s: bad value '%s'; it has to be %s", lpArgument,
-                        ZTCShownText(lpValue).get(), lpRule->mpLimits);
-            throw ZTCInvalidEx(lText);
+            throwWith<ZTCInvalidEx>("Option %s: bad value '%s'; it has to be %s", lpArgument,
+                                    ZTCShownText(lpValue).get(), lpRule->mpLimits);
         }
     }
     mOptions = lOptions;

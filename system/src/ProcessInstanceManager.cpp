@@ -9,24 +9,25 @@
 
 #include "common/include/Exception.h"
 #include "common/include/Log.h"
+#include "common/include/ThrowWith.h"
 #include "os/common/include/Clib.h"
 #include "os/common/include/Descriptor.h"
 
 namespace {
 
-constexpr ::mode_t gcPidFileMode = 0644;
+constexpr ::mode_t scPidFileMode = 0644;
 
 // Who looks whether the lock is held takes it for a moment (see sLookUp): one refusal proves nothing.
-constexpr int gcLockTries = 10;
-constexpr int gcLockPauseMilliseconds = 10;
+constexpr int scLockTries = 10;
+constexpr int scLockPauseMilliseconds = 10;
 
 // Each round needs somebody who replaces the file in between.
-constexpr int gcReplacedTries = 100;
+constexpr int scReplacedTries = 100;
 
-constexpr int gcPollMilliseconds = 20;
+constexpr int scPollMilliseconds = 20;
 
-constexpr std::int32_t gcNoPid = 0;    // the file is empty
-constexpr std::int32_t gcBadPid = -1;  // it holds something else than a process id
+constexpr std::int32_t scNoPid = 0;    // the file is empty
+constexpr std::int32_t scBadPid = -1;  // it holds something else than a process id
 
 /// The process id that the text is, with blanks and line breaks around it allowed.
 std::int32_t sParsePid(const char* apText) {
@@ -37,19 +38,19 @@ std::int32_t sParsePid(const char* apText) {
         ++apText;
     }
     if (*apText == '\0') {
-        return gcNoPid;
+        return scNoPid;
     }
     std::int64_t lPid = 0;
     for (; *apText >= '0' && *apText <= '9'; ++apText) {
         lPid = lPid * 10 + (*apText - '0');
         if (lPid > INT32_MAX) {
-            return gcBadPid;
+            return scBadPid;
         }
     }
     while (lIsBlank(*apText)) {
         ++apText;
     }
-    return *apText == '\0' && lPid > 0 ? static_cast<std::int32_t>(lPid) : gcBadPid;
+    return *apText == '\0' && lPid > 0 ? static_cast<std::int32_t>(lPid) : scBadPid;
 }
 
 /// The process id in the file that the descriptor stands at the beginning of.
@@ -67,7 +68,7 @@ std::int32_t sReadPid(int aDescriptor) {
         lHad += static_cast<std::size_t>(lCount);
     }
     if (lHad == sizeof(lText)) {
-        return gcBadPid;
+        return scBadPid;
     }
     return sParsePid(lText);
 }
@@ -76,10 +77,8 @@ struct stat sRequireRegularFile(const char* apPath, int aDescriptor) {
     struct stat lStatus {};
     ClibFstat(aDescriptor, &lStatus);
     if (!S_ISREG(lStatus.st_mode)) {
-        char lText[512];
-        ClibSprintf(lText, sizeof(lText), "The pid file '%s' is %s, not a regular file; it is left untouched", apPath,
-                    ClibFileKind(lStatus.st_mode));
-        throw ZTCInvalidEx(lText);
+        throwWith<ZTCInvalidEx>("The pid file '%s' is %s, not a regular file; it is left untouched", apPath,
+                                ClibFileKind(lStatus.st_mode));
     }
     return lStatus;
 }
@@ -93,7 +92,7 @@ bool sIsAtPath(const char* apPath, int aDescriptor) {
 
 struct ZTSHolder {
     bool mIsThere;
-    std::int32_t mProcessId;  // above 0, gcNoPid or gcBadPid
+    std::int32_t mProcessId;  // above 0, scNoPid or scBadPid
     ::uid_t mFileOwner;
 };
 
@@ -109,25 +108,21 @@ bool sIsProcessOf(::uid_t aUser, std::int32_t aProcessId) {
 ZTSHolder sLookUp(const char* apPath) {
     const ZTCDescriptor lFile(ClibTryOpen(apPath, O_RDONLY | O_NONBLOCK | O_NOFOLLOW));
     if (lFile.get() == -ENOENT) {
-        return {false, gcNoPid, 0};
+        return {false, scNoPid, 0};
     }
     if (lFile.get() < 0) {
-        char lText[512];
-        ClibSprintf(lText, sizeof(lText), "Opening the pid file '%s' failed: %s", apPath,
-                    ZTCErrnoText(-lFile.get()).get());
-        throw ZTCClibOpenFailedEx(lText);
+        throwWith<ZTCClibOpenFailedEx>("Opening the pid file '%s' failed: %s", apPath,
+                                       ZTCErrnoText(-lFile.get()).get());
     }
     const ::uid_t lOwner = sRequireRegularFile(apPath, lFile.get()).st_uid;
     if (ClibTryLock(lFile.get())) {
-        return {false, gcNoPid, lOwner};
+        return {false, scNoPid, lOwner};
     }
     return {true, sReadPid(lFile.get()), lOwner};
 }
 
 [[noreturn]] void sThrowNoStatus(const char* apPath, const char* apReason) {
-    char lText[512];
-    ClibSprintf(lText, sizeof(lText), "No running process is named by the pid file '%s': %s", apPath, apReason);
-    throw ZTCClibGetProcStatusFailedEx(lText);
+    throwWith<ZTCClibGetProcStatusFailedEx>("No running process is named by the pid file '%s': %s", apPath, apReason);
 }
 
 }  // namespace
@@ -146,12 +141,12 @@ bool ZTCProcessInstanceManager::isAnInstanceRunning() {
     }
     const char* lpPath = mPidFilePath.get();
     int lLockTries = 0;
-    for (int lReplacedTries = 0; lReplacedTries < gcReplacedTries;) {
-        ZTCDescriptor lFile(ClibOpen(lpPath, O_RDWR | O_CREAT | O_NONBLOCK | O_NOFOLLOW, gcPidFileMode));
+    for (int lReplacedTries = 0; lReplacedTries < scReplacedTries;) {
+        ZTCDescriptor lFile(ClibOpen(lpPath, O_RDWR | O_CREAT | O_NONBLOCK | O_NOFOLLOW, scPidFileMode));
         const struct stat lStatus = sRequireRegularFile(lpPath, lFile.get());
         if (!ClibTryLock(lFile.get())) {
-            if (++lLockTries < gcLockTries) {
-                ClibSleep(gcLockPauseMilliseconds);
+            if (++lLockTries < scLockTries) {
+                ClibSleep(scLockPauseMilliseconds);
                 continue;
             }
             const std::int32_t lProcessId = sReadPid(lFile.get());
@@ -171,17 +166,13 @@ bool ZTCProcessInstanceManager::isAnInstanceRunning() {
         }
         ++lReplacedTries;
     }
-    char lText[512];
-    ClibSprintf(lText, sizeof(lText), "Locking the pid file '%s' failed: it was replaced %d times", lpPath,
-                gcReplacedTries);
-    throw ZTCClibLockFailedEx(lText);
+    throwWith<ZTCClibLockFailedEx>("Locking the pid file '%s' failed: it was replaced %d times", lpPath,
+                                   scReplacedTries);
 }
 
 void ZTCProcessInstanceManager::markAsRunning() {
     if (isAnInstanceRunning()) {
-        char lText[512];
-        ClibSprintf(lText, sizeof(lText), "The pid file '%s' is locked by another process", mPidFilePath.get());
-        throw ZTCExistsEx(lText);
+        throwWith<ZTCExistsEx>("The pid file '%s' is locked by another process", mPidFilePath.get());
     }
     char lPid[32];
     const int lLength = ClibSprintf(lPid, sizeof(lPid), "%d\n", static_cast<int>(::getpid()));
@@ -189,10 +180,8 @@ void ZTCProcessInstanceManager::markAsRunning() {
         ClibFtruncate(mDescriptor, 0);
         ClibPwriteAll(mDescriptor, lPid, static_cast<std::size_t>(lLength), 0);
     } catch (const ZTCClibEx& acrException) {
-        char lText[512];
-        ClibSprintf(lText, sizeof(lText), "Writing the pid file '%s' failed: %s", mPidFilePath.get(),
-                    acrException.what());
-        throw ZTCClibWriteFailedEx(lText);
+        throwWith<ZTCClibWriteFailedEx>("Writing the pid file '%s' failed: %s", mPidFilePath.get(),
+                                        acrException.what());
     }
     mProcessId = static_cast<std::int32_t>(::getpid());
     allowLogRotation(true);
@@ -225,7 +214,7 @@ void ZTCProcessInstanceManager::killRunningInstance() {
         if (ClibMonotonicMilliseconds() >= lDeadline) {
             break;
         }
-        ClibSleep(gcPollMilliseconds);
+        ClibSleep(scPollMilliseconds);
     }
     if (lAsked != 0) {
         std::cout << "Asked the running instance, process " << lAsked << ", to stop; it has not ended within "
@@ -259,16 +248,16 @@ void ZTCProcessInstanceManager::getProcStatus(const ZTCString& acrPidFilePath) c
     if (lFile.get() < 0) {
         sThrowNoStatus(lpPath, ZTCErrnoText(-lFile.get()).get());
     }
-    std::int32_t lProcessId = gcBadPid;
+    std::int32_t lProcessId = scBadPid;
     try {
         lProcessId = sReadPid(lFile.get());
     } catch (const ZTCClibReadFailedEx& acrException) {
         sThrowNoStatus(lpPath, acrException.what());
     }
-    if (lProcessId == gcNoPid) {
+    if (lProcessId == scNoPid) {
         sThrowNoStatus(lpPath, "it is empty");
     }
-    if (lProcessId == gcBadPid) {
+    if (lProcessId == scBadPid) {
         sThrowNoStatus(lpPath, "it holds no decimal process id above 0");
     }
     if (!ClibIsProcessAlive(lProcessId)) {

@@ -8,7 +8,7 @@
 
 namespace {
 
-constexpr Size gcBytesPerLine = 16;
+constexpr Size scBytesPerLine = 16;
 
 // Relaxed: a message at the moment of the change may go either way.
 std::atomic<bool> sIsSnifferModeOn{false};
@@ -16,9 +16,9 @@ std::atomic<bool> sIsSnifferModeOn{false};
 /// One line: the hex digits, padded to the width of a full line, then the bytes as text.
 void sDumpLine(const unsigned char* apBytes, Size aCount) {
     constexpr char lcDigits[] = "0123456789abcdef";
-    char lHex[3 * gcBytesPerLine + 1];
-    char lText[gcBytesPerLine + 1];
-    for (std::size_t lIndex = 0; lIndex < gcBytesPerLine; ++lIndex) {
+    char lHex[3 * scBytesPerLine + 1];
+    char lText[scBytesPerLine + 1];
+    for (std::size_t lIndex = 0; lIndex < scBytesPerLine; ++lIndex) {
         const bool lIsThere = lIndex < aCount;
         const unsigned char lByte = lIsThere ? apBytes[lIndex] : 0;
         lHex[3 * lIndex] = lIsThere ? lcDigits[lByte >> 4] : ' ';
@@ -37,7 +37,7 @@ void sDump(const ZTCPointer<ZTCBuffer>& acrBuffer) {
     const unsigned char* lpBytes = acrBuffer->getData();
     const Size lSize = acrBuffer->getSize();
     for (Size lOffset = 0; lOffset < lSize;) {
-        const Size lCount = ZT_MIN(lSize - lOffset, gcBytesPerLine);
+        const Size lCount = ZT_MIN(lSize - lOffset, scBytesPerLine);
         sDumpLine(lpBytes + lOffset, lCount);
         lOffset += lCount;
     }

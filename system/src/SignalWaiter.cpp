@@ -9,6 +9,7 @@
 
 #include "common/include/Exception.h"
 #include "common/include/Log.h"
+#include "common/include/ThrowWith.h"
 #include "os/common/include/Clib.h"
 
 namespace {
@@ -23,9 +24,7 @@ sigset_t sSignals() {
 }
 
 [[noreturn]] void sThrowSignalFailed(const char* apCall, int aErrno) {
-    char lText[256];
-    ClibSprintf(lText, sizeof(lText), "%s failed: %s", apCall, ZTCErrnoText(aErrno).get());
-    throw ZTCClibSignalFailedEx(lText);
+    throwWith<ZTCClibSignalFailedEx>("%s failed: %s", apCall, ZTCErrnoText(aErrno).get());
 }
 
 }  // namespace

@@ -12,8 +12,6 @@
 
 namespace {
 
-constexpr unsigned gcDefaultHbTimeout = 240;
-
 // Relaxed: the value stands alone.
 std::atomic<unsigned> sHbTimeout{gcDefaultHbTimeout};
 

@@ -4,6 +4,7 @@
 #include <new>
 
 #include "common/include/Exception.h"
+#include "common/include/ThrowWith.h"
 #include "os/common/include/Clib.h"
 
 void ZTCThreadTable::add(ZTCThreadComponent* apComponent, ZTCSystemInterface* apSystemInterface) {
@@ -16,10 +17,8 @@ void ZTCThreadTable::add(ZTCThreadComponent* apComponent, ZTCSystemInterface* ap
 
 void ZTCThreadTable::start(unsigned aIndex, void* (*apProcedure)(void*)) {
     if (aIndex >= mThreads.size() || isStarted(aIndex)) {
-        char lText[128];
-        ClibSprintf(lText, sizeof(lText), "Thread %u of %u cannot be started: it %s", aIndex, size(),
-                    aIndex >= mThreads.size() ? "does not exist" : "was started before");
-        throw ZTCInvalidEx(lText);
+        throwWith<ZTCInvalidEx>("Thread %u of %u cannot be started: it %s", aIndex, size(),
+                                aIndex >= mThreads.size() ? "does not exist" : "was started before");
     }
     ZTSEntry& lrEntry = *std::next(mThreads.begin(), aIndex);
     OsCreateThread(lrEntry.mThread, apProcedure, &lrEntry.mArguments);

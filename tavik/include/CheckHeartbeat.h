@@ -1,6 +1,6 @@
 /// Watches another process's heartbeat file.
-#ifndef TAVIK_CHECKHEARTBEAT_H
-#define TAVIK_CHECKHEARTBEAT_H
+#ifndef TAVIK_INCLUDE_CHECKHEARTBEAT_H
+#define TAVIK_INCLUDE_CHECKHEARTBEAT_H
 
 #include <cstdint>
 

@@ -1,7 +1,7 @@
 /// The kinds of event that carry data, in one table: what their payload is, what of it makes a record, which fields
 /// tell one record from another, and how a record goes on when the next event matches it.
-#ifndef TAVIK_CONSOLIDATIONKINDS_H
-#define TAVIK_CONSOLIDATIONKINDS_H
+#ifndef TAVIK_INCLUDE_CONSOLIDATIONKINDS_H
+#define TAVIK_INCLUDE_CONSOLIDATIONKINDS_H
 
 #include <cstdint>
 

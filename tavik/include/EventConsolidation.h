@@ -1,8 +1,8 @@
 /// The three ways in which an event continues the pending record or starts a new one, driven by the table of kinds.
 ///
 /// Everything here runs under the system's previous-data lock.
-#ifndef TAVIK_EVENTCONSOLIDATION_H
-#define TAVIK_EVENTCONSOLIDATION_H
+#ifndef TAVIK_INCLUDE_EVENTCONSOLIDATION_H
+#define TAVIK_INCLUDE_EVENTCONSOLIDATION_H
 
 #include "common/include/Pointer.h"
 #include "common/include/ThreadAnnotations.h"

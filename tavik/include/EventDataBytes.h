@@ -1,6 +1,6 @@
 /// Writing the fields of event-data records: little-endian integers and bit fields.
-#ifndef TAVIK_EVENTDATABYTES_H
-#define TAVIK_EVENTDATABYTES_H
+#ifndef TAVIK_INCLUDE_EVENTDATABYTES_H
+#define TAVIK_INCLUDE_EVENTDATABYTES_H
 
 #include <bit>
 #include <cstring>

@@ -2,8 +2,8 @@
 ///
 /// RSCN, link attention and temperature stand under category 0 with the library's event type as subcategory: so they
 /// are registered. They are delivered under other pairs (see gcRscnCategory and its neighbours in TavikCore.h).
-#ifndef TAVIK_SCOPEEVENTSUBTYPE_H
-#define TAVIK_SCOPEEVENTSUBTYPE_H
+#ifndef TAVIK_INCLUDE_SCOPEEVENTSUBTYPE_H
+#define TAVIK_INCLUDE_SCOPEEVENTSUBTYPE_H
 
 #include "common/include/Log.h"
 #include "libkpm/include/libkpm.h"

@@ -1,6 +1,6 @@
 /// Touches a heartbeat file, so that whoever watches it sees that its owner is alive.
-#ifndef TAVIK_SETHEARTBEAT_H
-#define TAVIK_SETHEARTBEAT_H
+#ifndef TAVIK_INCLUDE_SETHEARTBEAT_H
+#define TAVIK_INCLUDE_SETHEARTBEAT_H
 
 #include "common/include/Log.h"
 #include "common/include/Pointer.h"

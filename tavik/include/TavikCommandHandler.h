@@ -1,6 +1,6 @@
 /// The thread that serves the command channel: one command is read, processed and answered before the next wait.
-#ifndef TAVIK_TAVIKCOMMANDHANDLER_H
-#define TAVIK_TAVIKCOMMANDHANDLER_H
+#ifndef TAVIK_INCLUDE_TAVIKCOMMANDHANDLER_H
+#define TAVIK_INCLUDE_TAVIKCOMMANDHANDLER_H
 
 #include "os/common/include/SystemInterface.h"
 #include "os/common/include/TimedWaitThreadComponent.h"

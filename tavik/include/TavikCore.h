@@ -1,6 +1,6 @@
 /// The callbacks through which the adapters' library delivers events, and what becomes of an event behind them.
-#ifndef TAVIK_TAVIKCORE_H
-#define TAVIK_TAVIKCORE_H
+#ifndef TAVIK_INCLUDE_TAVIKCORE_H
+#define TAVIK_INCLUDE_TAVIKCORE_H
 
 #include "libkpm/include/libkpm.h"
 #include "sensor/agentcommon/include/CallbackEventData.h"

@@ -1,6 +1,6 @@
 /// The catalogue of all event kinds that the agent can collect.
-#ifndef TAVIK_TAVIKEVENTCATALOGUE_H
-#define TAVIK_TAVIKEVENTCATALOGUE_H
+#ifndef TAVIK_INCLUDE_TAVIKEVENTCATALOGUE_H
+#define TAVIK_INCLUDE_TAVIKEVENTCATALOGUE_H
 
 #include "common/include/List.h"
 #include "common/include/Map.h"

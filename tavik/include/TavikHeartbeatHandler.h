@@ -1,6 +1,6 @@
 /// The thread that shows the sensor that the agent is alive, and looks whether the sensor is.
-#ifndef TAVIK_TAVIKHEARTBEATHANDLER_H
-#define TAVIK_TAVIKHEARTBEATHANDLER_H
+#ifndef TAVIK_INCLUDE_TAVIKHEARTBEATHANDLER_H
+#define TAVIK_INCLUDE_TAVIKHEARTBEATHANDLER_H
 
 #include "common/include/Pointer.h"
 #include "os/common/include/ConditionTimedWaitThreadComponent.h"

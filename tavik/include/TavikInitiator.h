@@ -1,6 +1,6 @@
 /// A local adapter port: an initiator.
-#ifndef TAVIK_TAVIKINITIATOR_H
-#define TAVIK_TAVIKINITIATOR_H
+#ifndef TAVIK_INCLUDE_TAVIKINITIATOR_H
+#define TAVIK_INCLUDE_TAVIKINITIATOR_H
 
 #include "common/include/Exception.h"
 #include "common/include/Log.h"

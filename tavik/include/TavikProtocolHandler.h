@@ -1,6 +1,6 @@
 /// Turns one command of the sensor into one response.
-#ifndef TAVIK_TAVIKPROTOCOLHANDLER_H
-#define TAVIK_TAVIKPROTOCOLHANDLER_H
+#ifndef TAVIK_INCLUDE_TAVIKPROTOCOLHANDLER_H
+#define TAVIK_INCLUDE_TAVIKPROTOCOLHANDLER_H
 
 #include <atomic>
 

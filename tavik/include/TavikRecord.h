@@ -1,6 +1,6 @@
 /// A scope record: one event kind with one set of identifying data, how often it was seen, and when first and last.
-#ifndef TAVIK_TAVIKRECORD_H
-#define TAVIK_TAVIKRECORD_H
+#ifndef TAVIK_INCLUDE_TAVIKRECORD_H
+#define TAVIK_INCLUDE_TAVIKRECORD_H
 
 #include <cstdint>
 

@@ -1,6 +1,6 @@
 /// The scope records of one board, in the order of their creation.
-#ifndef TAVIK_TAVIKRECORDLIST_H
-#define TAVIK_TAVIKRECORDLIST_H
+#ifndef TAVIK_INCLUDE_TAVIKRECORDLIST_H
+#define TAVIK_INCLUDE_TAVIKRECORDLIST_H
 
 #include "common/include/EncodableStream.h"
 #include "common/include/List.h"

@@ -1,6 +1,6 @@
 /// The agent's one system object: its start and stop, the maps of ports and record lists, and the pending record.
-#ifndef TAVIK_TAVIKSYSTEM_H
-#define TAVIK_TAVIKSYSTEM_H
+#ifndef TAVIK_INCLUDE_TAVIKSYSTEM_H
+#define TAVIK_INCLUDE_TAVIKSYSTEM_H
 
 #include <atomic>
 #include <cstdint>

@@ -1,6 +1,6 @@
 /// A remote port that the sensor registered: a target.
-#ifndef TAVIK_TAVIKTARGET_H
-#define TAVIK_TAVIKTARGET_H
+#ifndef TAVIK_INCLUDE_TAVIKTARGET_H
+#define TAVIK_INCLUDE_TAVIKTARGET_H
 
 #include "common/include/Log.h"
 #include "common/include/Pointer.h"

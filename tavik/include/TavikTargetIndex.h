@@ -1,7 +1,7 @@
 /// The names of the registered targets by port name, in one flat table: an event's look-up reads one place of memory,
 /// however many targets there are.
-#ifndef TAVIK_TAVIKTARGETINDEX_H
-#define TAVIK_TAVIKTARGETINDEX_H
+#ifndef TAVIK_INCLUDE_TAVIKTARGETINDEX_H
+#define TAVIK_INCLUDE_TAVIKTARGETINDEX_H
 
 #include <cstddef>
 #include <vector>

@@ -28,8 +28,6 @@ char gRtDir[MAX_FILE_PATH] = "";
 namespace {
 
 constexpr char gcRuntimeDir[] = "/tmp";
-constexpr unsigned gcDefaultLogCode = 63;
-constexpr unsigned gcDefaultHbTimeout = 240;
 
 // Hexadecimal 0x777 is octal 3567: set-group-id and sticky; owner r-x, group rw-, others rwx. The umask applies.
 constexpr int gcRuntimeDirMode = 0x777;

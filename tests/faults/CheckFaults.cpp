@@ -26,9 +26,9 @@ struct ZTSRow {
 /// Whether this program, and so the agent of the same build, is optimised. Without optimisation the compiler makes
 /// copies of what may fail to be copied, and the run reports findings that are its own.
 #ifdef __OPTIMIZE__
-constexpr bool gcIsOptimised = true;
+constexpr bool scIsOptimised = true;
 #else
-constexpr bool gcIsOptimised = false;
+constexpr bool scIsOptimised = false;
 #endif
 
 struct ZTSOptions {
@@ -129,9 +129,10 @@ int main(int argc, char** argv) {
         }
     }
 
-    if (!gcIsOptimised) {
-        std::cerr << "check-faults: this build is not optimised, so that some findings would be of the build and not of "
-                     "the agent; use the release preset\n";
+    if (!scIsOptimised) {
+        std::cerr
+            << "check-faults: this build is not optimised, so that some findings would be of the build and not of "
+               "the agent; use the release preset\n";
         return 2;
     }
 

@@ -12,7 +12,7 @@
 
 namespace {
 
-constexpr unsigned gcUnlimited = 100000;
+constexpr unsigned scUnlimited = 100000;
 
 void sNothing(ZTCFaultStage&) {}
 
@@ -264,21 +264,21 @@ std::vector<ZTSFaultPhase> faultPhases() {
         ZTCAgentProcess::registerTargetsRequest({{makeWwn(gcRemoteNode), makeWwn(gcRemotePort), 0x010203},
                                                  {makeWwn(gcOtherNode), makeWwn(gcOtherPort), 0x010204}});
     std::vector<ZTSFaultPhase> lPhases = {
-        {"start", false, false, true, gcUnlimited, sNothing, sStarting(&sPlain)},
-        {"start as a daemon", false, false, true, gcUnlimited, sNothing, sStarting(&sAsDaemon)},
-        {"start without standard streams", false, false, false, gcUnlimited, sTakeStandardStreams, sStarting(&sPlain)},
-        {"a second start", false, false, false, gcUnlimited, sNothing, sRunningBeside("-S")},
-        {"option -s", false, false, false, gcUnlimited, sNothing, sRunningBeside("-s")},
-        {"command start", false, false, true, gcUnlimited, sStart,
+        {"start", false, false, true, scUnlimited, sNothing, sStarting(&sPlain)},
+        {"start as a daemon", false, false, true, scUnlimited, sNothing, sStarting(&sAsDaemon)},
+        {"start without standard streams", false, false, false, scUnlimited, sTakeStandardStreams, sStarting(&sPlain)},
+        {"a second start", false, false, false, scUnlimited, sNothing, sRunningBeside("-S")},
+        {"option -s", false, false, false, scUnlimited, sNothing, sRunningBeside("-s")},
+        {"command start", false, false, true, scUnlimited, sStart,
          sCommanding(ZTCAgentProcess::startScopeRequest(4096), gcSuccessHex)},
-        {"command start, again", true, false, false, gcUnlimited, sStartCollecting,
+        {"command start, again", true, false, false, scUnlimited, sStartCollecting,
          sCommanding(ZTCAgentProcess::startScopeRequest(4096), gcSuccessHex)},
-        {"command register-targets", false, false, true, gcUnlimited, sStart, sCommanding(lTargets, gcSuccessHex)},
-        {"command stop", true, false, false, gcUnlimited, sStartCollecting, sCommanding(bytesOf("02"), gcSuccessHex)},
-        {"command set-collection-period", true, false, false, gcUnlimited, sStart,
+        {"command register-targets", false, false, true, scUnlimited, sStart, sCommanding(lTargets, gcSuccessHex)},
+        {"command stop", true, false, false, scUnlimited, sStartCollecting, sCommanding(bytesOf("02"), gcSuccessHex)},
+        {"command set-collection-period", true, false, false, scUnlimited, sStart,
          sCommanding(bytesOf("0500000001"), gcSuccessHex)},
-        {"broken frames", true, false, true, gcUnlimited, sStart, sBreakFrames},
-        {"retrieval", true, false, true, gcUnlimited, sStartCollecting, sRetrieve},
+        {"broken frames", true, false, true, scUnlimited, sStart, sBreakFrames},
+        {"retrieval", true, false, true, scUnlimited, sStartCollecting, sRetrieve},
     };
     const std::map<std::string, ZTSLibraryEvent> lEvents = {
         {"generic", ZTSLibraryEvent::bare(0, 2, 0x01)},
@@ -287,21 +287,21 @@ std::vector<ZTSFaultPhase> faultPhases() {
         {"RSCN", ZTSLibraryEvent::rscn(0, rscnPayload({0x00010203}))},
     };
     for (const auto& [lName, lEvent] : lEvents) {
-        lPhases.push_back({"event: " + lName, true, true, false, gcUnlimited, sStartCollecting, sDelivering(lEvent)});
+        lPhases.push_back({"event: " + lName, true, true, false, scUnlimited, sStartCollecting, sDelivering(lEvent)});
     }
     for (const ZTSDataKind& lcrKind : dataKinds()) {
         const ZTSLibraryEvent lEvent =
             ZTSLibraryEvent::scope(0, lcrKind.mCategory, lcrKind.mSubcategory, lcrKind.mData);
         const bool lIsInQuickRun = lcrKind.mCategory == 1 && lcrKind.mSubcategory == 0x08;
-        lPhases.push_back({std::string("event: ") + lcrKind.mpName, true, true, lIsInQuickRun, gcUnlimited,
+        lPhases.push_back({std::string("event: ") + lcrKind.mpName, true, true, lIsInQuickRun, scUnlimited,
                            sStartCollecting, sDelivering(lEvent)});
-        lPhases.push_back({std::string("event, first: ") + lcrKind.mpName, false, true, lIsInQuickRun, gcUnlimited,
+        lPhases.push_back({std::string("event, first: ") + lcrKind.mpName, false, true, lIsInQuickRun, scUnlimited,
                            sStartCollecting, sDelivering(lEvent, true)});
     }
     lPhases.push_back({"heartbeat", true, false, false, 12, sStartWithSilentSensor, sBeat});
-    lPhases.push_back({"log reopening", true, false, true, gcUnlimited, sStart, sReopenLog});
-    lPhases.push_back({"log rotation", false, false, true, gcUnlimited, sStart, sRotateLog});
-    lPhases.push_back({"end by SIGTERM", false, false, true, gcUnlimited, sStartCollecting, sEndBySignal});
-    lPhases.push_back({"end by shut-down", false, false, true, gcUnlimited, sStartCollecting, sEndByCommand});
+    lPhases.push_back({"log reopening", true, false, true, scUnlimited, sStart, sReopenLog});
+    lPhases.push_back({"log rotation", false, false, true, scUnlimited, sStart, sRotateLog});
+    lPhases.push_back({"end by SIGTERM", false, false, true, scUnlimited, sStartCollecting, sEndBySignal});
+    lPhases.push_back({"end by shut-down", false, false, true, scUnlimited, sStartCollecting, sEndByCommand});
     return lPhases;
 }

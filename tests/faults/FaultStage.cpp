@@ -11,7 +11,7 @@
 #include <iterator>
 
 /// What takes longer hangs.
-static constexpr std::chrono::seconds gcPatience{10};
+static constexpr std::chrono::seconds scPatience{10};
 
 /// One of them is the last word of an agent that ends in order.
 static const char* const sLastWords[] = {
@@ -38,7 +38,7 @@ void ZTCFaultStage::launch(const std::vector<std::string>& acrArguments) {
 
 /// False where the agent has ended first.
 bool ZTCFaultStage::connect() {
-    if (!mAgent.pipes().openUnless([this] { return !isRunning(); }, ZTCDeadline(gcPatience))) {
+    if (!mAgent.pipes().openUnless([this] { return !isRunning(); }, ZTCDeadline(scPatience))) {
         return false;
     }
     if (mIsDaemon) {
@@ -99,7 +99,7 @@ bool ZTCFaultStage::isRunning() {
 
 ZTEFaultEnd ZTCFaultStage::waitForEnd() {
     try {
-        waitUntil([this] { return !isRunning(); }, "the end of the agent", ZTCDeadline(gcPatience));
+        waitUntil([this] { return !isRunning(); }, "the end of the agent", ZTCDeadline(scPatience));
     } catch (const std::runtime_error&) {
         const std::string lText = logText();
         kill();

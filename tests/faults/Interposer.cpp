@@ -15,7 +15,7 @@
 
 namespace {
 
-constexpr char gcAgentName[] = "qrv-tvk";
+constexpr char scAgentName[] = "qrv-tvk";
 
 struct ZTSRange {
     std::uintptr_t mBegin = 0;
@@ -27,13 +27,13 @@ struct ZTSRange {
     }
 };
 
-constexpr std::size_t gcMaxTransparent = 8;
+constexpr std::size_t scMaxTransparent = 8;
 
 ZTSFaultControl* spControl = nullptr;
 ZTSRange sProgram;
 ZTSRange sThisModule;
 /// It, and the libraries that work on behalf of whoever calls them.
-ZTSRange sTransparent[gcMaxTransparent];
+ZTSRange sTransparent[scMaxTransparent];
 std::size_t sNumberOfTransparent = 0;
 
 int sNoteObject(dl_phdr_info* apObject, std::size_t, void* apIsFirst) {
@@ -58,7 +58,7 @@ int sNoteObject(dl_phdr_info* apObject, std::size_t, void* apIsFirst) {
     }
     if (lrIsFirst) {
         sProgram = lRange;
-    } else if (sNumberOfTransparent < gcMaxTransparent &&
+    } else if (sNumberOfTransparent < scMaxTransparent &&
                (lIsThisModule || std::strstr(lpName, "libstdc++") || std::strstr(lpName, "libasan") ||
                 std::strstr(lpName, "libubsan") || std::strstr(lpName, "libtsan"))) {
         sTransparent[sNumberOfTransparent++] = lRange;
@@ -89,7 +89,7 @@ _Unwind_Reason_Code sFindCaller(_Unwind_Context* apContext, void* apCaller) {
     const char* lpPath = std::getenv(gcFaultFileVariable);
     const char* lpName = std::strrchr(program_invocation_name, '/');
     lpName = lpName != nullptr ? lpName + 1 : program_invocation_name;
-    if (lpPath == nullptr || std::strcmp(lpName, gcAgentName) != 0) {
+    if (lpPath == nullptr || std::strcmp(lpName, scAgentName) != 0) {
         return;
     }
     bool lIsFirst = true;

@@ -10,7 +10,7 @@
 #include <iostream>
 
 /// The command thread logs this when it begins to wait for a command.
-static const char* const gcRunningText = "Waiting for control availability...";
+static const char* const scRunningText = "Waiting for control availability...";
 
 /// A directory that its owner alone may write in, whatever the umask is.
 static std::string sMadeDirectory(const std::string& acrPath) {
@@ -104,10 +104,10 @@ void ZTCAgentProcess::start(const std::vector<std::string>& acrArguments) {
 }
 
 void ZTCAgentProcess::startAndConnect(const std::vector<std::string>& acrMore) {
-    const std::size_t lBefore = mLog.count(gcRunningText);
+    const std::size_t lBefore = mLog.count(scRunningText);
     start(defaultArguments(acrMore));
     mPipes.open();
-    mLog.waitFor(gcRunningText, lBefore + 1);
+    mLog.waitFor(scRunningText, lBefore + 1);
 }
 
 void ZTCAgentProcess::startAndConnectQuietly(unsigned aLogCode, const std::vector<std::string>& acrMore) {
@@ -167,7 +167,7 @@ void ZTCAgentProcess::waitForIdleCommandThread() const {
             const auto lLast = std::find_if(lLines.rbegin(), lLines.rend(), [](const ZTSLogLine& lcrLine) {
                 return lcrLine.mLabel == ".//TavikCommandHandler";
             });
-            return lLast != lLines.rend() && lLast->mText == gcRunningText;
+            return lLast != lLines.rend() && lLast->mText == scRunningText;
         },
         "an idle command thread");
 }

@@ -8,7 +8,7 @@ static thread_local constinit unsigned sUntilFailure = 0;
 static thread_local constinit bool sHasFailed = false;
 
 static bool sIsToFail() noexcept {
-    if (0 == sUntilFailure || 0 != --sUntilFailure) {
+    if (sUntilFailure == 0 || --sUntilFailure != 0) {
         return false;
     }
     sHasFailed = true;
@@ -44,12 +44,12 @@ void* __wrap_realloc(void* apBlock, std::size_t aBytes) {
 }
 
 static void* sAllocate(std::size_t aBytes) noexcept {
-    return sIsToFail() ? nullptr : __real_malloc(0 == aBytes ? 1 : aBytes);
+    return sIsToFail() ? nullptr : __real_malloc(aBytes == 0 ? 1 : aBytes);
 }
 
 void* operator new(std::size_t aBytes) {
     void* const lpBlock = sAllocate(aBytes);
-    if (nullptr == lpBlock) {
+    if (lpBlock == nullptr) {
         throw std::bad_alloc();
     }
     return lpBlock;

@@ -6,9 +6,9 @@
 #include <thread>
 
 #if defined(__SANITIZE_ADDRESS__) || defined(__SANITIZE_THREAD__)
-static constexpr double gcSanitizerFactor = 5;
+static constexpr double scSanitizerFactor = 5;
 #else
-static constexpr double gcSanitizerFactor = 1;
+static constexpr double scSanitizerFactor = 1;
 #endif
 
 std::chrono::milliseconds stretched(std::chrono::milliseconds aTime) {
@@ -16,7 +16,7 @@ std::chrono::milliseconds stretched(std::chrono::milliseconds aTime) {
     const double lProcessors = std::max(1u, std::thread::hardware_concurrency());
     const double lShare = getloadavg(&lLoad, 1) == 1 ? 1 + lLoad / lProcessors : 2;
     return std::chrono::milliseconds(
-        static_cast<std::chrono::milliseconds::rep>(static_cast<double>(aTime.count()) * lShare * gcSanitizerFactor));
+        static_cast<std::chrono::milliseconds::rep>(static_cast<double>(aTime.count()) * lShare * scSanitizerFactor));
 }
 
 int ZTCDeadline::remainingMilliseconds() const {

@@ -15,6 +15,7 @@
 #define OS_COMMON_INCLUDE_FRAMEASSEMBLER_H
 
 #include "common/include/Buffer.h"
+#include "common/include/Framing.h"
 #include "common/include/Pointer.h"
 #include "common/include/Types.h"
 
@@ -26,10 +27,7 @@ enum ZTEFrameState : unsigned char {
 
 class ZTCFrameAssembler {
 public:
-    static constexpr Size gcHeaderSize = 4;
-
-    /// The largest body of a request.
-    static constexpr Size gcMaxRequestSize = 1048576;
+    static constexpr Size gcHeaderSize = gcFrameHeaderSize;
 
     explicit ZTCFrameAssembler(Size aMaxBodySize = gcMaxRequestSize);
 

@@ -10,28 +10,25 @@
 #include "common/include/Exception.h"
 #include "common/include/Log.h"
 #include "common/include/Memory.h"
+#include "common/include/ThrowWith.h"
 #include "os/common/include/Clib.h"
 #include "os/common/include/Descriptor.h"
 #include "os/common/include/ProcessEvents.h"
 
 namespace {
 
-constexpr ::mode_t gcFifoMode = 0600;
-constexpr int gcRetryMilliseconds = 100;
-constexpr int gcWriterMilliseconds = 100;  // a writer that found room goes on within
-constexpr int gcNoTimeLimit = -1;
-constexpr int gcNotOpen = 0;
+constexpr ::mode_t scFifoMode = 0600;
+constexpr int scRetryMilliseconds = 100;
+constexpr int scWriterMilliseconds = 100;  // a writer that found room goes on within
+constexpr int scNoTimeLimit = -1;
+constexpr int scNotOpen = 0;
 
 [[noreturn]] void sThrowNoFifo(const char* apPath, ::mode_t aMode) {
-    char lText[512];
-    ClibSprintf(lText, sizeof(lText), "'%s' is %s, not a FIFO; it is left untouched", apPath, ClibFileKind(aMode));
-    throw ZTCInvalidEx(lText);
+    throwWith<ZTCInvalidEx>("'%s' is %s, not a FIFO; it is left untouched", apPath, ClibFileKind(aMode));
 }
 
 [[noreturn]] void sThrowOpenFailed(const char* apPath, const char* apReason) {
-    char lText[512];
-    ClibSprintf(lText, sizeof(lText), "Opening the FIFO '%s' failed: %s", apPath, apReason);
-    throw ZTCClibOpenFailedEx(lText);
+    throwWith<ZTCClibOpenFailedEx>("Opening the FIFO '%s' failed: %s", apPath, apReason);
 }
 
 /// Before the path is opened: opening a device or the like could have effects of its own.
@@ -49,7 +46,7 @@ struct stat sRequireFifo(const char* apPath) {
 /// A FIFO that is taken over may be open to more than the one that would have been made.
 void sWarnOfSharedFifo(const char* apPath, const struct stat& acrStatus) {
     const unsigned lMode = acrStatus.st_mode & 07777;
-    if ((lMode & ~gcFifoMode) != 0 || acrStatus.st_uid != ::geteuid()) {
+    if ((lMode & ~scFifoMode) != 0 || acrStatus.st_uid != ::geteuid()) {
         char lShown[16];
         ClibSprintf(lShown, sizeof(lShown), "%04o", lMode);
         ZT_LOG_WARN(
@@ -88,10 +85,8 @@ bool sWaitFor(int aDescriptor, short aEvents, int aMilliseconds) {
 
 [[noreturn]] void sThrowWriteFailed(const char* apPath, std::uint64_t aWritten, std::uint64_t aWanted,
                                     const char* apReason) {
-    char lText[512];
-    ClibSprintf(lText, sizeof(lText), "Writing to '%s' ended after %" PRIu64 " of %" PRIu64 " bytes: %s", apPath,
-                aWritten, aWanted, apReason);
-    throw ZTCClibWriteFailedEx(lText);
+    throwWith<ZTCClibWriteFailedEx>("Writing to '%s' ended after %" PRIu64 " of %" PRIu64 " bytes: %s", apPath,
+                                    aWritten, aWanted, apReason);
 }
 
 }  // namespace
@@ -110,7 +105,7 @@ void ZTCNamedPipe::create() {
         return;
     }
     try {
-        ClibMkfifo(mPath.get(), gcFifoMode);
+        ClibMkfifo(mPath.get(), scFifoMode);
         return;
     } catch (const ZTCExistsEx&) {
         sWarnOfSharedFifo(mPath.get(), sRequireFifo(mPath.get()));
@@ -119,7 +114,7 @@ void ZTCNamedPipe::create() {
 }
 
 void ZTCNamedPipe::open() {
-    if (mDescriptor != gcNotOpen) {
+    if (mDescriptor != scNotOpen) {
         sThrowOpenFailed(mPath.get(), "it is open already");
     }
     switch (mFileMode) {
@@ -171,7 +166,7 @@ void ZTCNamedPipe::openForWriting() {
             ZT_LOG_NOTICE("Waiting for a reader of '%s'", lpPath);
             lIsAnnounced = true;
         }
-        if (getStopEvent().waitFor(gcRetryMilliseconds)) {
+        if (getStopEvent().waitFor(scRetryMilliseconds)) {
             char lText[512];
             ClibSprintf(lText, sizeof(lText), "Told to stop while waiting for a reader of '%s'", lpPath);
             ZT_LOG_NOTICE("%s", lText);
@@ -181,13 +176,13 @@ void ZTCNamedPipe::openForWriting() {
 }
 
 void ZTCNamedPipe::close() {
-    if (mDescriptor != gcNotOpen) {
+    if (mDescriptor != scNotOpen) {
         ClibClose(mDescriptor);
-        mDescriptor = gcNotOpen;
+        mDescriptor = scNotOpen;
     }
-    if (mOwnWriterDescriptor != gcNotOpen) {
+    if (mOwnWriterDescriptor != scNotOpen) {
         ClibClose(mOwnWriterDescriptor);
-        mOwnWriterDescriptor = gcNotOpen;
+        mOwnWriterDescriptor = scNotOpen;
     }
     mAssembler.reset();
 }
@@ -212,9 +207,7 @@ void ZTCNamedPipe::accept() {}
 void ZTCNamedPipe::read(ZTCPointer<ZTCBuffer>& arBuffer, unsigned& arCount) {
     arCount = 0;
     if (mAssembler.getState() != ZTFS_Complete) {
-        char lText[512];
-        ClibSprintf(lText, sizeof(lText), "Reading from '%s' failed: no whole message is there", mPath.get());
-        throw ZTCClibReadFailedEx(lText);
+        throwWith<ZTCClibReadFailedEx>("Reading from '%s' failed: no whole message is there", mPath.get());
     }
     arBuffer = mAssembler.take();
     arCount = arBuffer->getSize();
@@ -230,7 +223,7 @@ void ZTCNamedPipe::write(const ZTCPointer<ZTCBuffer>& acrBuffer, unsigned& arCou
     const std::uint64_t lWanted = lcHeaderSize + acrBuffer->getSize();
     std::uint64_t lWritten = 0;
 
-    if (mDescriptor == gcNotOpen) {
+    if (mDescriptor == scNotOpen) {
         sThrowWriteFailed(mPath.get(), lWritten, lWanted, "it is not open");
     }
     while (lWritten < lWanted) {
@@ -255,7 +248,7 @@ void ZTCNamedPipe::write(const ZTCPointer<ZTCBuffer>& acrBuffer, unsigned& arCou
             continue;
         } else if (lResult == -EPIPE) {
             sThrowWriteFailed(mPath.get(), lWritten, lWanted, "its reader has gone");
-        } else if (!sWaitFor(mDescriptor, POLLOUT, gcNoTimeLimit)) {
+        } else if (!sWaitFor(mDescriptor, POLLOUT, scNoTimeLimit)) {
             sThrowWriteFailed(mPath.get(), lWritten, lWanted, "the threads are to exit and its reader does not read");
         }
     }
@@ -268,10 +261,8 @@ void ZTCNamedPipe::waitForActivity(unsigned aSeconds) {
 void ZTCNamedPipe::waitForActivity(std::chrono::milliseconds aTime) {
     const std::int64_t lIdleDeadline = ClibMonotonicMilliseconds() + aTime.count();
     std::int64_t lDeadline = lIdleDeadline;
-    if (mAssembler.getHad() == 0 && mDescriptor == gcNotOpen) {
-        char lText[512];
-        ClibSprintf(lText, sizeof(lText), "Waiting on '%s' failed: it is not open", mPath.get());
-        throw ZTCClibReadFailedEx(lText);
+    if (mAssembler.getHad() == 0 && mDescriptor == scNotOpen) {
+        throwWith<ZTCClibReadFailedEx>("Waiting on '%s' failed: it is not open", mPath.get());
     }
 
     while (mAssembler.getState() != ZTFS_Complete) {
@@ -312,9 +303,7 @@ bool ZTCNamedPipe::readAvailable() {
     }
     if (lCount == 0) {
         // The own writing end rules this out; going on would spin.
-        char lText[512];
-        ClibSprintf(lText, sizeof(lText), "Reading from '%s' failed: unexpected end of file", mPath.get());
-        throw ZTCClibReadFailedEx(lText);
+        throwWith<ZTCClibReadFailedEx>("Reading from '%s' failed: unexpected end of file", mPath.get());
     }
     mAssembler.commit(static_cast<Size>(lCount));
     return true;
@@ -323,10 +312,10 @@ bool ZTCNamedPipe::readAvailable() {
 void ZTCNamedPipe::discardBrokenFrame() {
     const Size lLength = mAssembler.getLength();
     mAssembler.reset();
-    const std::size_t lDrained = drain(ZT_MAX(lLength, ZTCFrameAssembler::gcMaxRequestSize));
+    const std::size_t lDrained = drain(ZT_MAX(lLength, gcMaxRequestSize));
     ZT_LOG_ERR(
         "A message of %u bytes on '%s' is refused, its length has to be 1 to %u; %zu bytes behind it are thrown away",
-        lLength, mPath.get(), ZTCFrameAssembler::gcMaxRequestSize, lDrained);
+        lLength, mPath.get(), gcMaxRequestSize, lDrained);
 }
 
 void ZTCNamedPipe::discardPartialFrame() {
@@ -355,7 +344,7 @@ std::size_t ZTCNamedPipe::drain(std::uint64_t aMost) {
             // Interrupted, or another reader has taken some.
             lWaiting = ZT_MIN(lWaiting, ClibBytesWaiting(mDescriptor));
         }
-        if (lWaiting == 0 && lIsWriterBusy && lDrained < aMost && sWaitFor(mDescriptor, POLLIN, gcWriterMilliseconds)) {
+        if (lWaiting == 0 && lIsWriterBusy && lDrained < aMost && sWaitFor(mDescriptor, POLLIN, scWriterMilliseconds)) {
             lWaiting = ClibBytesWaiting(mDescriptor);
         }
     }

@@ -4,7 +4,7 @@
 
 ZTCNamedPipeReaderServer::ZTCNamedPipeReaderServer(const ZTCString& acrPath, ZTEPipeState aPipeState) {
     ZTCNamedPipe* lpNamedPipe = NEW ZTCNamedPipe(acrPath, ZTFM_Read, aPipeState, ZTCM_Server);
-    if (nullptr != lpNamedPipe) {
+    if (lpNamedPipe != nullptr) {
         mNamedPipe = ZTCPointer<ZTCNamedPipe>(lpNamedPipe);
     }
 }

@@ -4,7 +4,7 @@
 
 ZTCNamedPipeWriterServer::ZTCNamedPipeWriterServer(const ZTCString& acrPath, ZTEPipeState aPipeState) {
     ZTCNamedPipe* lpNamedPipe = NEW ZTCNamedPipe(acrPath, ZTFM_Write, aPipeState, ZTCM_Server);
-    if (nullptr != lpNamedPipe) {
+    if (lpNamedPipe != nullptr) {
         mNamedPipe = ZTCPointer<ZTCNamedPipe>(lpNamedPipe);
     }
 }

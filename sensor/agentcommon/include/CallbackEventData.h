@@ -1,6 +1,6 @@
 /// One event as it was delivered by the adapters' library.
-#ifndef SENSOR_AGENTCOMMON_CALLBACKEVENTDATA_H
-#define SENSOR_AGENTCOMMON_CALLBACKEVENTDATA_H
+#ifndef SENSOR_AGENTCOMMON_INCLUDE_CALLBACKEVENTDATA_H
+#define SENSOR_AGENTCOMMON_INCLUDE_CALLBACKEVENTDATA_H
 
 #include "sensor/agentcommon/include/WorldWideName.h"
 

@@ -3,8 +3,8 @@
 /// Every 32-bit field is little-endian whatever the host; world wide names stand as on the wire. All structures are
 /// packed by their own types (no padding, alignment 1), so that they may be read and written at any address. A record
 /// of an appending kind starts with its first structure and goes on with any number of its `TavikCons...` structures.
-#ifndef SENSOR_AGENTCOMMON_EVENTDATARECORDS_H
-#define SENSOR_AGENTCOMMON_EVENTDATARECORDS_H
+#ifndef SENSOR_AGENTCOMMON_INCLUDE_EVENTDATARECORDS_H
+#define SENSOR_AGENTCOMMON_INCLUDE_EVENTDATARECORDS_H
 
 #include <cstddef>
 #include <cstdint>

@@ -1,6 +1,6 @@
 /// The agent's view of the adapters' library: loading it, and one operation for each of its functions (libkpm.h).
-#ifndef SENSOR_AGENTCOMMON_LIBKPMABS_H
-#define SENSOR_AGENTCOMMON_LIBKPMABS_H
+#ifndef SENSOR_AGENTCOMMON_INCLUDE_LIBKPMABS_H
+#define SENSOR_AGENTCOMMON_INCLUDE_LIBKPMABS_H
 
 #include <cstdint>
 

@@ -1,7 +1,7 @@
 /// What a scope record says beyond its counts: the event kind, the remote port's names where they are known, and the
 /// kind's event data (EventDataRecords.h).
-#ifndef SENSOR_AGENTCOMMON_SCOPEDATA_H
-#define SENSOR_AGENTCOMMON_SCOPEDATA_H
+#ifndef SENSOR_AGENTCOMMON_INCLUDE_SCOPEDATA_H
+#define SENSOR_AGENTCOMMON_INCLUDE_SCOPEDATA_H
 
 #include "common/include/Buffer.h"
 #include "common/include/EncodableStream.h"

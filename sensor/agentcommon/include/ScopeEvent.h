@@ -1,6 +1,6 @@
 /// One kind of event that can be collected: a category and a subcategory, as the adapters' library reports them.
-#ifndef SENSOR_AGENTCOMMON_SCOPEEVENT_H
-#define SENSOR_AGENTCOMMON_SCOPEEVENT_H
+#ifndef SENSOR_AGENTCOMMON_INCLUDE_SCOPEEVENT_H
+#define SENSOR_AGENTCOMMON_INCLUDE_SCOPEEVENT_H
 
 /// Never changed after construction, so it may be read by any thread. Held through ZTCPointer.
 class ZTCScopeEvent {

@@ -2,10 +2,12 @@
 ///
 /// A message is a frame: a 4-byte length N in network byte order, then N bytes. A request's first byte is a command
 /// code, a response's first byte an outcome. docs/protocol.md gives every message field by field.
-#ifndef SENSOR_AGENTCOMMON_SENSORAGENTPROTOCOL_H
-#define SENSOR_AGENTCOMMON_SENSORAGENTPROTOCOL_H
+#ifndef SENSOR_AGENTCOMMON_INCLUDE_SENSORAGENTPROTOCOL_H
+#define SENSOR_AGENTCOMMON_INCLUDE_SENSORAGENTPROTOCOL_H
 
 #include <cstdint>
+
+#include "common/include/Framing.h"
 
 /// First byte of a request.
 enum ZTETavikCommand : std::uint8_t {
@@ -41,12 +43,6 @@ enum ZTESensorAgentProtocolStatus : std::uint32_t {
     ZTSAPS_RefreshFailed = 490,
     ZTSAPS_Max = 491  ///< bound, never sent
 };
-
-/// Bytes of the length in front of every frame, which they do not count themselves.
-inline constexpr std::uint32_t gcFrameHeaderSize = 4;
-
-/// Largest body of a request frame in bytes; the least is 1. A response frame has no bound but its 32-bit length.
-inline constexpr std::uint32_t gcMaxRequestSize = 1048576;
 
 /// Environment variable that names the sensor's install directory, and the files in it, appended as they stand.
 inline constexpr const char* gcSensorDirVariable = "ZT_QRV_SENSOR_DIR";

@@ -32,8 +32,8 @@
 ///     consolidated = handed over + held + dropped
 /// where received and held are not stored: the first is the sum, the second the difference. An event that is still
 /// being worked on is in no counter.
-#ifndef SENSOR_AGENTCOMMON_STATUSPAGE_H
-#define SENSOR_AGENTCOMMON_STATUSPAGE_H
+#ifndef SENSOR_AGENTCOMMON_INCLUDE_STATUSPAGE_H
+#define SENSOR_AGENTCOMMON_INCLUDE_STATUSPAGE_H
 
 #include <array>
 #include <atomic>

@@ -1,8 +1,8 @@
 /// A Fibre Channel world wide name: the eight bytes that name a node (WWNN) or a port (WWPN).
 ///
 /// A value without a lock: an object that is shared between threads is not changed, or is guarded by its owner's lock.
-#ifndef SENSOR_AGENTCOMMON_WORLDWIDENAME_H
-#define SENSOR_AGENTCOMMON_WORLDWIDENAME_H
+#ifndef SENSOR_AGENTCOMMON_INCLUDE_WORLDWIDENAME_H
+#define SENSOR_AGENTCOMMON_INCLUDE_WORLDWIDENAME_H
 
 #include <cstdint>
 #include <cstring>

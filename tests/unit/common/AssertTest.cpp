@@ -51,7 +51,7 @@ protected:
     std::string mLogPath;
 };
 
-const std::string gcPlace = "tests/unit/common/AssertTest:# TestBody: ";
+const std::string scPlace = "tests/unit/common/AssertTest:# TestBody: ";
 
 }  // namespace
 
@@ -63,7 +63,7 @@ TEST_F(AssertDeathTest, AFailedAssertionLogsTheTextOfTheConditionAndExits) {
             ZT_ASSERT(0 == lLeft);
         },
         testing::ExitedWithCode(1), "");
-    EXPECT_EQ("-H- " + gcPlace + "Assertion [ 0 == lLeft ] failed\n", takeLog());
+    EXPECT_EQ("-H- " + scPlace + "Assertion [ 0 == lLeft ] failed\n", takeLog());
 }
 
 TEST_F(AssertDeathTest, WithLogCodeZeroTheLineIsSuppressedAndTheProcessExitsAllTheSame) {
@@ -83,7 +83,7 @@ TEST_F(AssertDeathTest, NeverGetHereFailsWithTheTextFalse) {
             ZT_NEVER_GET_HERE();
         },
         testing::ExitedWithCode(1), "");
-    EXPECT_EQ("-H- " + gcPlace + "Assertion [ false ] failed\n", takeLog());
+    EXPECT_EQ("-H- " + scPlace + "Assertion [ false ] failed\n", takeLog());
 }
 
 TEST_F(AssertDeathTest, TheMessageComesBeforeTheCondition) {
@@ -93,7 +93,7 @@ TEST_F(AssertDeathTest, TheMessageComesBeforeTheCondition) {
             ZT_ASSERT_MSG(1 == 2, "%s %d", "value", 5);
         },
         testing::ExitedWithCode(1), "");
-    EXPECT_EQ("-H- " + gcPlace + "value 5\n-H- " + gcPlace + "Assertion [ 1 == 2 ] failed\n", takeLog());
+    EXPECT_EQ("-H- " + scPlace + "value 5\n-H- " + scPlace + "Assertion [ 1 == 2 ] failed\n", takeLog());
 }
 
 #define EXPECT_LOGGED_EXIT(aStatement, aLog)                                              \
@@ -179,8 +179,8 @@ TEST(Assert, AFailedConsistencyCheckLogsAtErrorLevelAndGoesOn) {
     for (const std::string& lrLine : linesOfFile(lPath)) {
         lLines.push_back(withoutLineNumber(withoutStamp(lrLine)));
     }
-    EXPECT_EQ((std::vector<std::string>{"-E- " + gcPlace + "Check consistency [ 0 == ++lCount ] failed",
-                                        "-E- " + gcPlace + "Check consistency [ 0 == ++lCount ] failed",
-                                        "-E- " + gcPlace + "count 2", "-E- " + gcPlace + "report 7"}),
+    EXPECT_EQ((std::vector<std::string>{"-E- " + scPlace + "Check consistency [ 0 == ++lCount ] failed",
+                                        "-E- " + scPlace + "Check consistency [ 0 == ++lCount ] failed",
+                                        "-E- " + scPlace + "count 2", "-E- " + scPlace + "report 7"}),
               lLines);
 }

@@ -17,7 +17,7 @@ class DateTime : public testing::Test {
 protected:
     DateTime() {
         const char* const lpFormer = std::getenv("TZ");
-        mHadZone = nullptr != lpFormer;
+        mHadZone = lpFormer != nullptr;
         mFormerZone = mHadZone ? lpFormer : "";
     }
     ~DateTime() override {

@@ -139,7 +139,7 @@ TEST_F(LogRotation, ManyThreadsLoseNothingOverRotationsAndReopenings) {
         lThreads.emplace_back([this] {
             for (int i = 0; i < lcLines; ++i) {
                 writeTo(*mpSink, "xx");  // 7 bytes with mark and line break
-                if (0 == i % 50) {
+                if (i % 50 == 0) {
                     mpSink->reopen();
                 }
             }

@@ -211,7 +211,7 @@ TEST_F(LogSink, ProcessesThatShareAFileDoNotInterleave) {
     for (int lChild = 0; lChild < 2; ++lChild) {
         const pid_t lPid = fork();
         ASSERT_GE(lPid, 0);
-        if (0 == lPid) {
+        if (lPid == 0) {
             mpSink->setPath(mPath.c_str());
             const std::string lText(200, static_cast<char>('a' + lChild));
             for (int i = 0; i < 500; ++i) {
@@ -236,7 +236,7 @@ TEST_F(LogSink, ProcessesThatShareAFileDoNotInterleave) {
 TEST_F(LogSink, ALineSurvivesTheProcessBeingKilledRightAfterTheCall) {
     const pid_t lPid = fork();
     ASSERT_GE(lPid, 0);
-    if (0 == lPid) {
+    if (lPid == 0) {
         mpSink->setPath(mPath.c_str());
         writeTo(*mpSink, "last words");
         raise(SIGKILL);

@@ -55,10 +55,10 @@ protected:
 
 using Lines = std::vector<std::string>;
 
-const std::string gcPlace = "tests/unit/common/LogTest:# ";
+const std::string scPlace = "tests/unit/common/LogTest:# ";
 
 std::string sHere(const char* apMark, const std::string& acrText, const char* apFunction = "TestBody") {
-    return std::string(apMark) + " " + gcPlace + apFunction + ": " + acrText;
+    return std::string(apMark) + " " + scPlace + apFunction + ": " + acrText;
 }
 
 void sTraced() {
@@ -282,7 +282,7 @@ TEST_F(Log, TheCodeMayChangeWhileOthersLog) {
         }
     });
     for (unsigned i = 0; i < 200; ++i) {
-        setLogCode(0 == i % 2 ? 255u : 63u);
+        setLogCode(i % 2 == 0 ? 255u : 63u);
     }
     lOther.join();
     for (const std::string& lrLine : linesOfFile(mPath)) {

@@ -35,7 +35,7 @@ inline std::string withoutStamp(const std::string& acrLine) {
         return "";
     }
     for (std::size_t i = 0; i < scPattern.size(); ++i) {
-        const bool lFits = 'd' == scPattern[i] ? acrLine[i] >= '0' && acrLine[i] <= '9' : acrLine[i] == scPattern[i];
+        const bool lFits = scPattern[i] == 'd' ? acrLine[i] >= '0' && acrLine[i] <= '9' : acrLine[i] == scPattern[i];
         if (!lFits) {
             return "";
         }
@@ -47,7 +47,7 @@ inline std::string withoutStamp(const std::string& acrLine) {
 inline std::string withoutLineNumber(const std::string& acrLine) {
     const std::size_t lBegin = acrLine.find(':') + 1;
     const std::size_t lEnd = acrLine.find_first_not_of("0123456789", lBegin);
-    const bool lIsNumber = 0 != lBegin && lEnd != lBegin && lEnd != std::string::npos && ' ' == acrLine[lEnd];
+    const bool lIsNumber = lBegin != 0 && lEnd != lBegin && lEnd != std::string::npos && acrLine[lEnd] == ' ';
     return lIsNumber ? acrLine.substr(0, lBegin) + "#" + acrLine.substr(lEnd) : acrLine;
 }
 

@@ -63,7 +63,7 @@ using PointerDeathTest = Pointer;
 std::string sAssertion(const char* apCondition) {
     std::string lText = "-H- .*: Assertion \\[ ";
     for (const char* lpChar = apCondition; *lpChar != '\0'; ++lpChar) {
-        lText += '.' == *lpChar ? std::string("\\.") : std::string(1, *lpChar);
+        lText += *lpChar == '.' ? std::string("\\.") : std::string(1, *lpChar);
     }
     return lText + " \\] failed\n";
 }
@@ -166,7 +166,7 @@ TEST_F(Pointer, AFailedAllocationOfTheCountFreesTheObject) {
         try {
             ZTCPointer<ZTSObserved> lPointer(lpObject);
         } catch (const ZTCNoMemoryEx& lrException) {
-            lIsOutOfMemory = 0 == std::strcmp("Out of Memory", lrException.what()) && 2 == lrException.getError();
+            lIsOutOfMemory = std::strcmp("Out of Memory", lrException.what()) == 0 && lrException.getError() == 2;
         }
     }
     EXPECT_TRUE(lIsOutOfMemory);

@@ -29,11 +29,11 @@ TEST(ReferenceCount, ExactlyOneThreadGetsToZero) {
         lThreads.emplace_back([&lCount, &lZeros] {
             for (unsigned lRound = 0; lRound < lcRounds; ++lRound) {
                 lCount.increment();
-                if (0 == lCount.decrement()) {
+                if (lCount.decrement() == 0) {
                     ++lZeros;
                 }
             }
-            if (0 == lCount.decrement()) {
+            if (lCount.decrement() == 0) {
                 ++lZeros;
             }
         });

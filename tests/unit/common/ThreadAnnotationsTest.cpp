@@ -9,7 +9,7 @@ class ZT_CAPABILITY("mutex") ZTCSampleLock {
 public:
     void lock() ZT_ACQUIRE() { ++mDepth; }
     void unlock() ZT_RELEASE() { --mDepth; }
-    bool tryLock() ZT_TRY_ACQUIRE(true) { return 1 == ++mDepth; }
+    bool tryLock() ZT_TRY_ACQUIRE(true) { return ++mDepth == 1; }
     int mDepth = 0;
 };
 

@@ -10,7 +10,7 @@
 
 namespace {
 
-constexpr unsigned gcMost = std::numeric_limits<unsigned>::max();
+constexpr unsigned scMost = std::numeric_limits<unsigned>::max();
 
 /// The deadline of the wait that something makes at the time 1000.
 template <typename Wait>
@@ -31,10 +31,10 @@ TEST(ConditionalTime, TheLongestWaitIsThatLong) {
     ZTCConditional lConditional;
     EXPECT_EQ(1000 + 1000, sDeadlineOf([&] { lConditional.timedWait(1u); }));
     EXPECT_EQ(1000 + std::int64_t{2147484} * 1000, sDeadlineOf([&] { lConditional.timedWait(2147484u); }));
-    EXPECT_EQ(1000 + std::int64_t{gcMost} * 1000, sDeadlineOf([&] { lConditional.timedWait(gcMost); }));
+    EXPECT_EQ(1000 + std::int64_t{scMost} * 1000, sDeadlineOf([&] { lConditional.timedWait(scMost); }));
 }
 
 TEST(ConditionalTime, TheLongestWaitOnAnEmptyListIsThatLong) {
     ZTCSynchList lList;
-    EXPECT_EQ(1000 + std::int64_t{gcMost} * 1000, sDeadlineOf([&] { lList.waitWhileEmpty(gcMost); }));
+    EXPECT_EQ(1000 + std::int64_t{scMost} * 1000, sDeadlineOf([&] { lList.waitWhileEmpty(scMost); }));
 }

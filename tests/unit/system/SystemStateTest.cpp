@@ -51,10 +51,11 @@ public:
     }
     bool hasExitLock() const { return mExitLock != nullptr; }
     bool hasNothingInItsSlots() const {
-        return 0 == mCmdLineArgDescs.numberOfElements() + mThreadComponents.numberOfElements() +
-                        mThreadPools.numberOfElements() + mConditionals.numberOfElements() +
-                        mQueues.numberOfElements() + mLists.numberOfElements() + mReaders.numberOfElements() +
-                        mWriters.numberOfElements() + mSettings.size();
+        return mCmdLineArgDescs.numberOfElements() + mThreadComponents.numberOfElements() +
+                   mThreadPools.numberOfElements() + mConditionals.numberOfElements() + mQueues.numberOfElements() +
+                   mLists.numberOfElements() + mReaders.numberOfElements() + mWriters.numberOfElements() +
+                   mSettings.size() ==
+               0;
     }
 };
 

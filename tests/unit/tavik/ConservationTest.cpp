@@ -20,8 +20,8 @@
 
 namespace {
 
-constexpr unsigned gcBoards = 3;
-constexpr unsigned gcThreads = 4;
+constexpr unsigned scBoards = 3;
+constexpr unsigned scThreads = 4;
 
 unsigned sSeed(unsigned aSchedule) {
     if (const char* lpSeed = std::getenv("TAVIK_TEST_SEED")) {
@@ -42,7 +42,7 @@ public:
 
     /// Delivers one event, which is noted where it is to be consolidated.
     void deliverOne(bool aIsCollecting) {
-        const unsigned lBoard = below(gcBoards);
+        const unsigned lBoard = below(scBoards);
         switch (below(10)) {
             case 0:
                 deliverNumbered(lBoard, aIsCollecting);
@@ -128,7 +128,7 @@ private:
                 deliverScope(aBoard, 4, 0x80, ZTCBytes(64, 0));
                 break;
             case 2:
-                deliverNullEvent(gcBoards + aBoard, 1, 1);
+                deliverNullEvent(scBoards + aBoard, 1, 1);
                 break;
             default:
                 deliverRscn(aBoard, ZTCBytes(7, 0));
@@ -147,10 +147,10 @@ private:
 class ZTCDelivered {
 public:
     void add(const ZTSScopeDataResponse& acrResponse) {
-        ASSERT_EQ(gcBoards, acrResponse.mListCount);
-        ASSERT_EQ(gcBoards, acrResponse.mLists.size());
+        ASSERT_EQ(scBoards, acrResponse.mListCount);
+        ASSERT_EQ(scBoards, acrResponse.mLists.size());
         mLastSize = 0;
-        for (unsigned lBoard = 0; lBoard < gcBoards; ++lBoard) {
+        for (unsigned lBoard = 0; lBoard < scBoards; ++lBoard) {
             for (const ZTSEncodedRecord& lcrRecord : acrResponse.mLists[lBoard].mRecords) {
                 ASSERT_LE(mLastEnd[lBoard], lcrRecord.mBegin.total())
                     << "a record begins when the one before has ended";
@@ -169,7 +169,7 @@ public:
     const ZTCCounts& counts() const { return mCounts; }
     std::uint64_t count(unsigned aCategory, unsigned aSubcategory) const {
         std::uint64_t lCount = 0;
-        for (unsigned lBoard = 0; lBoard < gcBoards; ++lBoard) {
+        for (unsigned lBoard = 0; lBoard < scBoards; ++lBoard) {
             const auto lFound = mCounts.find({aCategory, aSubcategory, lBoard});
             lCount += lFound != mCounts.end() ? lFound->second : 0;
         }
@@ -194,7 +194,7 @@ private:
 
     ZTCCounts mCounts;
     std::set<std::pair<unsigned, std::uint64_t>> mNumbers;
-    std::array<std::uint64_t, gcBoards> mLastEnd{};
+    std::array<std::uint64_t, scBoards> mLastEnd{};
     std::uint64_t mLastSize = 0;
 };
 
@@ -225,7 +225,7 @@ protected:
 }  // namespace
 
 TEST_F(Conservation, WhatIsConsolidatedIsDeliveredOnceByKindAndBoard) {
-    collect(gcBoards);
+    collect(scBoards);
     setLogCode(0);
     for (unsigned lSchedule = 0; lSchedule < 6; ++lSchedule) {
         const unsigned lSeed = sSeed(lSchedule);
@@ -237,10 +237,10 @@ TEST_F(Conservation, WhatIsConsolidatedIsDeliveredOnceByKindAndBoard) {
         // admitted.
         std::shared_mutex lSwitch;
         std::vector<ZTCEventSource> lSources;
-        for (unsigned lThread = 0; lThread < gcThreads; ++lThread) {
+        for (unsigned lThread = 0; lThread < scThreads; ++lThread) {
             lSources.emplace_back(lSeed, lThread);
         }
-        std::atomic<unsigned> lRunning{gcThreads};
+        std::atomic<unsigned> lRunning{scThreads};
         std::vector<std::thread> lThreads;
         for (ZTCEventSource& lrSource : lSources) {
             lThreads.emplace_back([&] {
@@ -293,7 +293,7 @@ TEST_F(Conservation, WhatIsConsolidatedIsDeliveredOnceByKindAndBoard) {
 }
 
 TEST_F(Conservation, WithStopsThatRaceTheEventsWhatIsNotedAsProcessedIsDelivered) {
-    collect(gcBoards);
+    collect(scBoards);
     std::uint64_t lProcessed = 0;
     for (unsigned lSchedule = 0; lSchedule < 3; ++lSchedule) {
         const unsigned lSeed = sSeed(lSchedule);
@@ -301,9 +301,9 @@ TEST_F(Conservation, WithStopsThatRaceTheEventsWhatIsNotedAsProcessedIsDelivered
         std::mt19937_64 lRandom(lSeed);
         mDoScopeCollection = true;
         mLog.forget();
-        std::atomic<unsigned> lRunning{gcThreads};
+        std::atomic<unsigned> lRunning{scThreads};
         std::vector<std::thread> lThreads;
-        for (unsigned lThread = 0; lThread < gcThreads; ++lThread) {
+        for (unsigned lThread = 0; lThread < scThreads; ++lThread) {
             lThreads.emplace_back([&, lThread] {
                 ZTCEventSource lSource(lSeed, lThread);
                 for (unsigned lEvent = 0; lEvent < 300; ++lEvent) {

@@ -9,8 +9,8 @@
 
 namespace {
 
-const char* const gcOffText = "-N- Ignoring the event as Scope data Collection is not enabled.";
-const char* const gcLimitText = "-N- Ignoring the event as the limit on the total Event Data";
+const char* const scOffText = "-N- Ignoring the event as Scope data Collection is not enabled.";
+const char* const scLimitText = "-N- Ignoring the event as the limit on the total Event Data";
 
 class EventAdmission : public ZTCTavikFixture {
 protected:
@@ -39,7 +39,7 @@ protected:
 TEST_F(EventAdmission, WithCollectionOffEveryCallbackDropsItsEventAfterTheNotice) {
     bringUp();
     deliverOneOfEach(0);
-    EXPECT_EQ(std::vector<std::string>(4, gcOffText), mLog.texts());
+    EXPECT_EQ(std::vector<std::string>(4, scOffText), mLog.texts());
     EXPECT_FALSE(mSystem->hasPendingRecord());
     EXPECT_EQ(0u, mSystem->getTotalEventDataSize());
 }
@@ -86,7 +86,7 @@ TEST_F(EventAdmission, AtTheTotalLimitEveryCallbackDropsItsEventAfterTwoNotices)
     std::vector<std::string> lExpected;
     for (unsigned lEvent = 0; lEvent < 4; ++lEvent) {
         lExpected.emplace_back("-N- Current size = 262144");
-        lExpected.emplace_back(gcLimitText);
+        lExpected.emplace_back(scLimitText);
     }
     EXPECT_EQ(lExpected, mLog.texts());
     EXPECT_EQ(1u, retrieveTexts().size());
@@ -119,11 +119,11 @@ TEST_F(EventAdmission, CollectionIsTestedBeforeTheLimitAndTheLimitBeforeTheBoard
     collect();
     mSystem->makePendingRecord(0, 262144);
     deliverPlogi(7);
-    EXPECT_EQ((std::vector<std::string>{"-N- Current size = 262144", gcLimitText}), mLog.texts());
+    EXPECT_EQ((std::vector<std::string>{"-N- Current size = 262144", scLimitText}), mLog.texts());
     mLog.forget();
     mDoScopeCollection = false;
     deliverPlogi(7);
-    EXPECT_EQ(std::vector<std::string>{gcOffText}, mLog.texts());
+    EXPECT_EQ(std::vector<std::string>{scOffText}, mLog.texts());
 }
 
 TEST_F(EventAdmission, ABoardWithoutAListIsReportedWithTheEventsName) {

@@ -9,7 +9,7 @@
 
 namespace {
 
-const char* const gcPageNotice = "-N- Processing Rscn Event Cat=1 SubCat=32";
+const char* const scPageNotice = "-N- Processing Rscn Event Cat=1 SubCat=32";
 
 class Rscn : public ZTCTavikFixture {
 protected:
@@ -54,7 +54,7 @@ TEST_F(Rscn, ThePayloadLengthDividedByFourLessTheHeaderIsTheNumberOfPages) {
         mLog.forget();
         deliverRscn(0, makeRscn({1, 2, 3, 4, 5}, lPayloadLength));
         const unsigned lPages = lPayloadLength < 4 ? 0 : lPayloadLength / 4 - 1;
-        EXPECT_EQ(lPages, mLog.count(gcPageNotice));
+        EXPECT_EQ(lPages, mLog.count(scPageNotice));
         EXPECT_TRUE(mLog.has("-I- lPayloadLength = " + std::to_string(lPayloadLength)));
         std::vector<std::string> lExpected;
         for (std::uint32_t lPage = 1; lPage <= lPages; ++lPage) {

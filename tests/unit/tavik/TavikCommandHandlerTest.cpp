@@ -16,7 +16,7 @@
 
 namespace {
 
-const char* const gcWaitingText = "-I- Waiting for control availability...";
+const char* const scWaitingText = "-I- Waiting for control availability...";
 
 /// Does what the next scripted step says when the thread waits, and so ends by itself when the steps are used up.
 class TavikCommandHandler : public ZTCTavikFixture {
@@ -111,7 +111,7 @@ TEST_F(TavikCommandHandler, EveryWakeUpReadsAndAnswersOneCommand) {
     EXPECT_EQ((std::vector<std::string>{"wait 0 3", "read", "response 0000000000", "wait 0 3", "read",
                                         "response 0000000000", "wait 0 3", "read", "response 010006", "wait 0 3"}),
               mDone);
-    EXPECT_EQ((std::vector<std::string>{gcWaitingText, gcWaitingText, gcWaitingText, gcWaitingText,
+    EXPECT_EQ((std::vector<std::string>{scWaitingText, scWaitingText, scWaitingText, scWaitingText,
                                         "-I- Command handler thread is set for exit ..."}),
               ownTexts());
 }
@@ -122,7 +122,7 @@ TEST_F(TavikCommandHandler, ATimeOutIsSilentAndTheNextWaitBegins) {
     thenTimeOut();
     run();
     EXPECT_EQ(std::vector<std::string>(4, "wait 0 3"), mDone);
-    EXPECT_EQ((std::vector<std::string>{gcWaitingText, gcWaitingText, gcWaitingText, gcWaitingText,
+    EXPECT_EQ((std::vector<std::string>{scWaitingText, scWaitingText, scWaitingText, scWaitingText,
                                         "-I- Command handler thread is set for exit ..."}),
               ownTexts());
 }
@@ -140,7 +140,7 @@ TEST_F(TavikCommandHandler, AnExitRequestDuringAWaitLeavesACommandThatWaitsUnrea
     thenCommand("02");
     run();
     EXPECT_EQ(std::vector<std::string>{"wait 0 3"}, mDone);
-    EXPECT_EQ((std::vector<std::string>{gcWaitingText, "-I- Command handler thread is set for exit ..."}), ownTexts());
+    EXPECT_EQ((std::vector<std::string>{scWaitingText, "-I- Command handler thread is set for exit ..."}), ownTexts());
 }
 
 TEST_F(TavikCommandHandler, AnExitRequestSeenAtTheTopOfTheLoopIsNotSaid) {
@@ -148,7 +148,7 @@ TEST_F(TavikCommandHandler, AnExitRequestSeenAtTheTopOfTheLoopIsNotSaid) {
     mBeforeWritten = [this] { component().setForExit(); };
     run();
     EXPECT_EQ((std::vector<std::string>{"wait 0 3", "read", "response 0000000000"}), mDone);
-    EXPECT_EQ(std::vector<std::string>{gcWaitingText}, ownTexts());
+    EXPECT_EQ(std::vector<std::string>{scWaitingText}, ownTexts());
 }
 
 TEST_F(TavikCommandHandler, ATimeOutDuringWhichTheExitIsRequestedIsSilentToo) {
@@ -157,7 +157,7 @@ TEST_F(TavikCommandHandler, ATimeOutDuringWhichTheExitIsRequestedIsSilentToo) {
         throw ZTCTimeOutEx();
     });
     run();
-    EXPECT_EQ(std::vector<std::string>{gcWaitingText}, ownTexts());
+    EXPECT_EQ(std::vector<std::string>{scWaitingText}, ownTexts());
 }
 
 TEST_F(TavikCommandHandler, AShutDownIsAnsweredBeforeTheThreadsAreMadeToExit) {
@@ -165,7 +165,7 @@ TEST_F(TavikCommandHandler, AShutDownIsAnsweredBeforeTheThreadsAreMadeToExit) {
     thenCommand("02");
     run();
     EXPECT_EQ((std::vector<std::string>{"wait 0 3", "read", "response 0000000000", "exit"}), mDone);
-    EXPECT_EQ((std::vector<std::string>{gcWaitingText,
+    EXPECT_EQ((std::vector<std::string>{scWaitingText,
                                         "-H- Exiting TavikCommandHandler thread with error : Shutting down Tavik"}),
               ownTexts());
     EXPECT_EQ(std::vector<std::string>{"Close"}, mLibrary.calls());
@@ -184,7 +184,7 @@ TEST_F(TavikCommandHandler, AQuitThreadExceptionEndsThisThreadAlone) {
     thenThrow(ZTCQuitThreadEx("enough", 5));
     EXPECT_EQ(nullptr, run());
     EXPECT_EQ(std::vector<std::string>{"wait 0 3"}, mDone);
-    EXPECT_EQ((std::vector<std::string>{gcWaitingText, "-H- Exiting TavikCommandHnadler thread (thread-only): enough"}),
+    EXPECT_EQ((std::vector<std::string>{scWaitingText, "-H- Exiting TavikCommandHnadler thread (thread-only): enough"}),
               ownTexts());
 }
 
@@ -206,7 +206,7 @@ TEST_F(TavikCommandHandler, EveryOtherExceptionOfTheFamilyMakesAllThreadsExit) {
         then(lcrThrow);
         EXPECT_EQ(nullptr, run());
         EXPECT_EQ((std::vector<std::string>{"wait 0 3", "exit"}), mDone);
-        EXPECT_EQ((std::vector<std::string>{gcWaitingText, std::string("-H- Exiting TavikCommandHandler thread with "
+        EXPECT_EQ((std::vector<std::string>{scWaitingText, std::string("-H- Exiting TavikCommandHandler thread with "
                                                                        "error : ") +
                                                                lpText}),
                   ownTexts());
@@ -240,7 +240,7 @@ TEST_F(TavikCommandHandler, AForeignExceptionLeavesTheProcedureUnsaid) {
     thenThrow(std::runtime_error("foreign"));
     EXPECT_THROW(run(), std::runtime_error);
     EXPECT_EQ(std::vector<std::string>{"wait 0 3"}, mDone);
-    EXPECT_EQ(std::vector<std::string>{gcWaitingText}, ownTexts());
+    EXPECT_EQ(std::vector<std::string>{scWaitingText}, ownTexts());
 }
 
 TEST_F(TavikCommandHandler, EveryStepOfACycleIsTraced) {

@@ -14,10 +14,10 @@
 
 namespace {
 
-const char* const gcQueryText = "-N- Checking the status of the actual sensor process/service";
-const char* const gcAliveText = "-N- Sensor process still running, but not updating the heartbeat";
-const char* const gcGoneText = "-H- Failed in getting the status of Sensor";
-const char* const gcExitText = "-H- Exiting Heartbeat Handler Thread as it is marked for exit.";
+const char* const scQueryText = "-N- Checking the status of the actual sensor process/service";
+const char* const scAliveText = "-N- Sensor process still running, but not updating the heartbeat";
+const char* const scGoneText = "-H- Failed in getting the status of Sensor";
+const char* const scExitText = "-H- Exiting Heartbeat Handler Thread as it is marked for exit.";
 
 /// The thread procedure on the test's own thread, under a clock that the test moves: a wait of the thread sets the
 /// clock forward by the time waited for, and lets the test act at that moment. The modification times in the test's
@@ -86,7 +86,7 @@ TEST_F(TavikHeartbeatHandler, ASensorThatNeverTouchesItsFileIsQueriedThreePeriod
     std::size_t lQueryLines = 0;
     // What the last cycle logged is seen at the end of the next period.
     mAct = [&] {
-        const std::size_t lLines = mLog.count(gcQueryText);
+        const std::size_t lLines = mLog.count(scQueryText);
         if (lLines != lQueryLines) {
             lQueries.push_back(mNow - 240 - lStart);
         }
@@ -102,9 +102,9 @@ TEST_F(TavikHeartbeatHandler, EveryCycleOfASilentSensorThatLivesEarnsItsTwoNotic
     run(6);
     std::vector<std::string> lExpected;
     for (unsigned lCycle = 3; lCycle <= 6; ++lCycle) {
-        lExpected.insert(lExpected.end(), {unchangedText(), gcQueryText, gcAliveText});
+        lExpected.insert(lExpected.end(), {unchangedText(), scQueryText, scAliveText});
     }
-    lExpected.emplace_back(gcExitText);
+    lExpected.emplace_back(scExitText);
     EXPECT_EQ(lExpected, mLog.texts());
 }
 
@@ -112,7 +112,7 @@ TEST_F(TavikHeartbeatHandler, ASensorThatTouchesItsFileInEveryPeriodIsNeverQueri
     sensorIs("no process\n");
     mAct = [this] { sensorTouches(); };
     run(20);
-    EXPECT_EQ(std::vector<std::string>{gcExitText}, mLog.texts());
+    EXPECT_EQ(std::vector<std::string>{scExitText}, mLog.texts());
 }
 
 TEST_F(TavikHeartbeatHandler, ASensorThatTouchesItsFileInEverySecondPeriodIsNeverQueried) {
@@ -123,7 +123,7 @@ TEST_F(TavikHeartbeatHandler, ASensorThatTouchesItsFileInEverySecondPeriodIsNeve
         }
     };
     run(20);
-    EXPECT_EQ(std::vector<std::string>{gcExitText}, mLog.texts());
+    EXPECT_EQ(std::vector<std::string>{scExitText}, mLog.texts());
 }
 
 TEST_F(TavikHeartbeatHandler, ASensorThatTouchesItsFileInEveryThirdPeriodIsQueriedOnceInBetween) {
@@ -135,8 +135,8 @@ TEST_F(TavikHeartbeatHandler, ASensorThatTouchesItsFileInEveryThirdPeriodIsQueri
     };
     // Looks 1 and 2 find the first time; 3 finds it changed; 4 and 5 do not, and so on.
     run(12);
-    EXPECT_EQ(3u, mLog.count(gcQueryText));
-    EXPECT_EQ(3u, mLog.count(gcAliveText));
+    EXPECT_EQ(3u, mLog.count(scQueryText));
+    EXPECT_EQ(3u, mLog.count(scAliveText));
 }
 
 TEST_F(TavikHeartbeatHandler, ASensorThatTouchesItsFileAgainIsForgiven) {
@@ -148,7 +148,7 @@ TEST_F(TavikHeartbeatHandler, ASensorThatTouchesItsFileAgainIsForgiven) {
     };
     run(9);
     // Queried in the cycles 3, 4 and 5, not in 6 and 7, and again in 8 and 9.
-    EXPECT_EQ(5u, mLog.count(gcQueryText));
+    EXPECT_EQ(5u, mLog.count(scQueryText));
 }
 
 TEST_F(TavikHeartbeatHandler, LooksThatFindNoFileAndLooksThatFindNoChangeShareOneCounter) {
@@ -167,7 +167,7 @@ TEST_F(TavikHeartbeatHandler, LooksThatFindNoFileAndLooksThatFindNoChangeShareOn
         }
     };
     run(3);
-    EXPECT_EQ((std::vector<std::string>{noStatText(), unchangedText(), gcQueryText, gcAliveText, gcExitText}),
+    EXPECT_EQ((std::vector<std::string>{noStatText(), unchangedText(), scQueryText, scAliveText, scExitText}),
               mLog.texts());
 }
 
@@ -188,7 +188,7 @@ TEST_F(TavikHeartbeatHandler, ASignalOfItsConditionalIsACycleToo) {
         }
     };
     run();
-    EXPECT_EQ((std::vector<std::string>{unchangedText(), gcQueryText, gcAliveText, gcExitText}), mLog.texts());
+    EXPECT_EQ((std::vector<std::string>{unchangedText(), scQueryText, scAliveText, scExitText}), mLog.texts());
 }
 
 // ---- The own file ----
@@ -255,7 +255,7 @@ TEST_F(TavikHeartbeatHandler, ASilentSensorThatIsNoLivingProcessEndsTheAgentInTh
         };
         ZTSThreadArguments lArguments{&lHandler, mSystem.get()};
         EXPECT_EQ(nullptr, TavikHeartbeatThread(&lArguments));
-        EXPECT_EQ((std::vector<std::string>{unchangedText(), gcQueryText, gcGoneText}), mLog.texts());
+        EXPECT_EQ((std::vector<std::string>{unchangedText(), scQueryText, scGoneText}), mLog.texts());
         EXPECT_EQ(1u, mExitRequests);
         EXPECT_EQ(3u, mPeriod - lFirst);
     }
@@ -265,13 +265,13 @@ TEST_F(TavikHeartbeatHandler, APidFileThatCannotBeReadIsNoLivingProcess) {
     // A directory has a time like a file, and no text.
     ASSERT_EQ(0, mkdir(sensorPidFilePath().c_str(), 0700));
     run();
-    EXPECT_EQ((std::vector<std::string>{unchangedText(), gcQueryText, gcGoneText}), mLog.texts());
+    EXPECT_EQ((std::vector<std::string>{unchangedText(), scQueryText, scGoneText}), mLog.texts());
     EXPECT_EQ(1u, mExitRequests);
 }
 
 TEST_F(TavikHeartbeatHandler, WithoutASensorFileTheAgentEndsInTheSecondCycle) {
     run();
-    EXPECT_EQ((std::vector<std::string>{noStatText(), noStatText(), gcQueryText, gcGoneText}), mLog.texts());
+    EXPECT_EQ((std::vector<std::string>{noStatText(), noStatText(), scQueryText, scGoneText}), mLog.texts());
     EXPECT_EQ(1u, mExitRequests);
     EXPECT_EQ(2u, mPeriod);
 }
@@ -287,8 +287,8 @@ TEST_F(TavikHeartbeatHandler, ASensorThatDiesBetweenTwoCyclesEndsTheAgentInTheNe
     };
     run();
     EXPECT_EQ(5u, mPeriod);
-    EXPECT_EQ(2u, mLog.count(gcAliveText));
-    EXPECT_EQ(1u, mLog.count(gcGoneText));
+    EXPECT_EQ(2u, mLog.count(scAliveText));
+    EXPECT_EQ(1u, mLog.count(scGoneText));
 }
 
 // ---- The end of the thread ----
@@ -298,7 +298,7 @@ TEST_F(TavikHeartbeatHandler, AnExitDuringTheWaitIsSaidAtHaltLevelAndNothingIsTo
     sensorIsThisProcess();
     setFileTime(pidFilePath(), 1000);
     run(0);
-    EXPECT_EQ(std::vector<std::string>{gcExitText}, mLog.texts());
+    EXPECT_EQ(std::vector<std::string>{scExitText}, mLog.texts());
     EXPECT_EQ(1000, fileTime(pidFilePath()));
     EXPECT_EQ(0u, mExitRequests);
 }

@@ -16,25 +16,23 @@
 #include <cstdlib>
 #include <cstring>
 
+#include "common/include/ThrowWith.h"
+
 namespace {
 
-constexpr std::size_t gcMaxText = 512;
-constexpr int gcFirstOwnDescriptor = 3;
+constexpr std::size_t scMaxText = 512;
+constexpr int scFirstOwnDescriptor = 3;
 
 /// Throws the exception with "DOING 'PATH' failed: REASON".
 template <typename Exception>
 [[noreturn]] void sThrowForPath(const char* apDoing, const char* apPath, int aErrno) {
-    char lText[gcMaxText];
-    ClibSprintf(lText, sizeof(lText), "%s '%s' failed: %s", apDoing, apPath, ZTCErrnoText(aErrno).get());
-    throw Exception(lText);
+    throwWith<Exception>("%s '%s' failed: %s", apDoing, apPath, ZTCErrnoText(aErrno).get());
 }
 
 /// The same with a descriptor or a process id.
 template <typename Exception>
 [[noreturn]] void sThrowForNumber(const char* apDoing, int aNumber, int aErrno) {
-    char lText[gcMaxText];
-    ClibSprintf(lText, sizeof(lText), "%s %d failed: %s", apDoing, aNumber, ZTCErrnoText(aErrno).get());
-    throw Exception(lText);
+    throwWith<Exception>("%s %d failed: %s", apDoing, aNumber, ZTCErrnoText(aErrno).get());
 }
 
 /// The state letter of the process, or 0 where it cannot be had.
@@ -73,9 +71,7 @@ const char* ClibGetenv(const char* apName, char* apBuffer) {
 char* ClibStrcpy(char* apTo, std::size_t aSize, const char* apFrom) {
     const std::size_t lLength = std::strlen(apFrom);
     if (lLength >= aSize) {
-        char lText[gcMaxText];
-        ClibSprintf(lText, sizeof(lText), "A text of %zu characters does not fit into %zu bytes", lLength, aSize);
-        throw ZTCInvalidEx(lText);
+        throwWith<ZTCInvalidEx>("A text of %zu characters does not fit into %zu bytes", lLength, aSize);
     }
     std::memcpy(apTo, apFrom, lLength + 1);
     return apTo;
@@ -219,9 +215,7 @@ int ClibEventFd() {
     const int lDescriptor = ::eventfd(0, EFD_CLOEXEC | EFD_NONBLOCK);
     const int lLifted = ClibLiftDescriptor(lDescriptor < 0 ? -errno : lDescriptor);
     if (lLifted < 0) {
-        char lText[gcMaxText];
-        ClibSprintf(lText, sizeof(lText), "Making an event counter failed: %s", ZTCErrnoText(-lLifted).get());
-        throw ZTCClibEventFailedEx(lText);
+        throwWith<ZTCClibEventFailedEx>("Making an event counter failed: %s", ZTCErrnoText(-lLifted).get());
     }
     return lLifted;
 }
@@ -240,10 +234,10 @@ void ClibResetEvent(int aDescriptor) noexcept {
 }
 
 int ClibLiftDescriptor(int aDescriptor) noexcept {
-    if (aDescriptor < 0 || aDescriptor >= gcFirstOwnDescriptor) {
+    if (aDescriptor < 0 || aDescriptor >= scFirstOwnDescriptor) {
         return aDescriptor;
     }
-    const int lLifted = ::fcntl(aDescriptor, F_DUPFD_CLOEXEC, gcFirstOwnDescriptor);
+    const int lLifted = ::fcntl(aDescriptor, F_DUPFD_CLOEXEC, scFirstOwnDescriptor);
     const int lErrno = errno;
     ::close(aDescriptor);
     return lLifted < 0 ? -lErrno : lLifted;
@@ -329,10 +323,8 @@ int ClibPoll(struct pollfd* apDescriptors, unsigned aNumberOfDescriptors, int aM
     if (errno == EINTR) {
         return -EINTR;
     }
-    char lText[gcMaxText];
-    ClibSprintf(lText, sizeof(lText), "Waiting on %u descriptors failed: %s", aNumberOfDescriptors,
-                ZTCErrnoText(errno).get());
-    throw ZTCClibPollFailedEx(lText);
+    throwWith<ZTCClibPollFailedEx>("Waiting on %u descriptors failed: %s", aNumberOfDescriptors,
+                                   ZTCErrnoText(errno).get());
 }
 
 std::size_t ClibBytesWaiting(int aDescriptor) {
@@ -391,18 +383,14 @@ bool ClibKill(::pid_t aProcessId, int aSignal) {
 ::pid_t ClibFork() {
     const ::pid_t lProcessId = ::fork();
     if (lProcessId < 0) {
-        char lText[gcMaxText];
-        ClibSprintf(lText, sizeof(lText), "Making a process failed: %s", ZTCErrnoText(errno).get());
-        throw ZTCClibForkFailedEx(lText);
+        throwWith<ZTCClibForkFailedEx>("Making a process failed: %s", ZTCErrnoText(errno).get());
     }
     return lProcessId;
 }
 
 void ClibSetsid() {
     if (::setsid() < 0) {
-        char lText[gcMaxText];
-        ClibSprintf(lText, sizeof(lText), "Making a session failed: %s", ZTCErrnoText(errno).get());
-        throw ZTCClibSessionFailedEx(lText);
+        throwWith<ZTCClibSessionFailedEx>("Making a session failed: %s", ZTCErrnoText(errno).get());
     }
 }
 

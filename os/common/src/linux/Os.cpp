@@ -5,6 +5,7 @@
 #include <cerrno>
 
 #include "common/include/Memory.h"
+#include "common/include/ThrowWith.h"
 #include "os/common/include/Clib.h"
 
 namespace {
@@ -14,9 +15,7 @@ void sCheck(const char* apCall, int aError) {
     if (aError == 0) {
         return;
     }
-    char lText[256];
-    ClibSprintf(lText, sizeof(lText), "%s failed: %s", apCall, ZTCErrnoText(aError).get());
-    throw Exception(lText);
+    throwWith<Exception>("%s failed: %s", apCall, ZTCErrnoText(aError).get());
 }
 
 void sRequireInitialised(const char* apCall, const ZTSOsMutex& acrMutex) {

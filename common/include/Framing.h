@@ -1,0 +1,14 @@
+/// The frame of a message on the FIFOs.
+
+#ifndef COMMON_INCLUDE_FRAMING_H
+#define COMMON_INCLUDE_FRAMING_H
+
+#include <cstdint>
+
+/// Bytes of the length in front of every frame, which they do not count themselves.
+inline constexpr std::uint32_t gcFrameHeaderSize = 4;
+
+/// Largest body of a request frame in bytes; the least is 1. A response frame has no bound but its 32-bit length.
+inline constexpr std::uint32_t gcMaxRequestSize = 1048576;
+
+#endif
