@@ -15,6 +15,7 @@ struct ZTSTextColumn {
     bool mIsRight = false;        ///< numbers stand at the right edge
     unsigned mDropOrder = 0;      ///< where the width does not suffice, the highest goes first; 0: never
     std::size_t mLeastWidth = 0;  ///< it is not cut below this; 0: it is not cut at all
+    std::size_t mReserved = 0;    ///< it is this wide even before a cell needs it
 };
 
 /// Collects rows and hands out their text. Widths only grow, so that what is printed later stays aligned.

@@ -119,7 +119,7 @@ std::string describePort(const std::optional<ZTSRemotePort>& acrPort, const ZTCN
 ZTCTextTable makeEpisodeTable(std::size_t aWidth) {
     return {{{.mpTitle = "EPISODE", .mIsRight = true},
              {.mpTitle = "LAST"},
-             {.mpTitle = "STATE", .mDropOrder = 3},
+             {.mpTitle = "STATE", .mDropOrder = 3, .mReserved = std::string_view("closed").size()},
              {.mpTitle = "COUNT", .mIsRight = true},
              {.mpTitle = "KIND"},
              {.mpTitle = "INITIATOR", .mDropOrder = 2},

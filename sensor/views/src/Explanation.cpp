@@ -103,7 +103,11 @@ ZTSExplanation explainEpisode(const ZTSEpisode& acrEpisode, std::vector<std::uin
 
 static void sAddLines(std::string& arText, const std::string& acrIndent, const std::string& acrParagraph,
                       std::size_t aWidth) {
-    for (const std::string& lrLine : wrapText(escapeControls(acrParagraph), aWidth - acrIndent.size())) {
+    const std::string lParagraph = escapeControls(acrParagraph);
+    const std::size_t lRoom = aWidth - acrIndent.size();
+    // What fits keeps its blanks: a command may have columns.
+    const bool lFits = !lParagraph.empty() && countCharacters(lParagraph) <= lRoom;
+    for (const std::string& lrLine : lFits ? std::vector<std::string>{lParagraph} : wrapText(lParagraph, lRoom)) {
         arText += acrIndent + lrLine + "\n";
     }
 }

@@ -127,7 +127,7 @@ std::vector<std::string> wrapText(std::string_view aText, std::size_t aCharacter
 ZTCTextTable::ZTCTextTable(std::vector<ZTSTextColumn> aColumns, std::size_t aWidth)
     : mColumns(std::move(aColumns)), mWidth(aWidth), mWanted(mColumns.size()), mGranted(mColumns.size()) {
     for (std::size_t i = 0; i < mColumns.size(); ++i) {
-        mWanted[i] = countCharacters(mColumns[i].mpTitle);
+        mWanted[i] = std::max(countCharacters(mColumns[i].mpTitle), mColumns[i].mReserved);
     }
 }
 

@@ -1,0 +1,129 @@
+#include <gmock/gmock.h>
+#include <sys/socket.h>
+#include <sys/stat.h>
+
+#include <chrono>
+
+#include "tests/unit/commands/FakeSensor.h"
+#include "tests/unit/commands/TavikProgram.h"
+
+using testing::HasSubstr;
+using testing::StartsWith;
+
+class StatusCommand : public TavikProgram {};
+
+TEST_F(StatusCommand, CollectingIs0) {
+    store();
+    const ZTCFakeSensor lSensor(controlPath(), ZTCFakeSensor::withState(makeLiveState()));
+    const ZTSRun lRun = run({});
+    EXPECT_EQ(lRun.mStatus, 0);
+    EXPECT_THAT(lRun.mOutput, HasSubstr("\n state: COLLECTING; nothing lost\n"));
+    EXPECT_EQ(lRun.mErrors, "");
+    const nlohmann::json lDocument = runJson({"status"});
+    EXPECT_EQ(lDocument["schema"], "tavik.status/1");
+    EXPECT_EQ(lDocument["state"], "collecting");
+    EXPECT_EQ(lDocument["storeId"], store().getStoreId());
+}
+
+TEST_F(StatusCommand, DeafForAKindIs1) {
+    nlohmann::json lLive = makeLiveState();
+    lLive["kinds"][0]["kinds"]["link"] = "no_rights";
+    const ZTCFakeSensor lSensor(controlPath(), ZTCFakeSensor::withState(lLive));
+    const ZTSRun lRun = run({"status"});
+    EXPECT_EQ(lRun.mStatus, 1);
+    EXPECT_THAT(lRun.mOutput, HasSubstr("PARTLY DEAF"));
+}
+
+TEST_F(StatusCommand, AGapOfTheLast24HoursIs1AndAnOlderOneIsForgiven) {
+    const ZTCFakeSensor lSensor(controlPath(), ZTCFakeSensor::withState(makeLiveState()));
+    const auto lNoteGap = [this](const char* apReason, std::chrono::hours aAge) {
+        ZTSGap lGap;
+        lGap.mFrom = getHistoryTime() - aAge - std::chrono::seconds(1);
+        lGap.mTo = getHistoryTime() - aAge;
+        lGap.mReason = apReason;
+        lGap.mGeneration = "a1";
+        ZTCStoreTransaction lTransaction = store().begin();
+        ASSERT_TRUE(store().noteGap(lGap));
+        lTransaction.commit();
+    };
+    lNoteGap("long ago", std::chrono::hours(25));
+    EXPECT_EQ(run({"status"}).mStatus, 0);
+    lNoteGap("the agent was killed", std::chrono::hours(1));
+    const ZTSRun lRun = run({"--json", "status"});
+    EXPECT_EQ(lRun.mStatus, 1);
+    const nlohmann::json lDocument = nlohmann::json::parse(lRun.mOutput);
+    ASSERT_EQ(lDocument["gaps"].size(), 1U);
+    EXPECT_EQ(lDocument["gaps"][0]["reason"], "the agent was killed");
+}
+
+TEST_F(StatusCommand, NoSensorIs3AndTheHistoryIsStillRead) {
+    fill();
+    const ZTSRun lRun = run({"status"});
+    EXPECT_EQ(lRun.mStatus, 3);
+    EXPECT_THAT(lRun.mOutput, HasSubstr("NOT COLLECTING; no sensor is running"));
+    EXPECT_THAT(lRun.mOutput, HasSubstr("tavik events still works"));
+}
+
+TEST_F(StatusCommand, ASocketThatNobodyListensOnIsNoSensor) {
+    { const ZTCFakeSensor lSensor(controlPath(), ZTCFakeSensor::withState(makeLiveState())); }
+    ASSERT_TRUE(exists(controlPath()));
+    const ZTSRun lRun = run({"status"});
+    EXPECT_EQ(lRun.mStatus, 3);
+    EXPECT_THAT(lRun.mOutput, HasSubstr("no sensor is running"));
+}
+
+TEST_F(StatusCommand, ACollectorThatDoesNotAnswerIs3WithinTheTimeLimit) {
+    const ZTCFakeSensor lSensor(controlPath(), [](const nlohmann::json&) { return ""; });
+    const ZTSRun lRun = run({"status"});
+    EXPECT_EQ(lRun.mStatus, 3);
+    EXPECT_THAT(lRun.mOutput, HasSubstr("NOT KNOWN; the collector does not answer"));
+    EXPECT_THAT(lRun.mOutput, HasSubstr("within 1.2 s"));
+}
+
+TEST_F(StatusCommand, AnswersThatCannotBeUsedAre3AndSaid) {
+    const std::pair<const char*, const char*> lAnswers[] = {
+        {"{\"error\":\"too busy\"}\n", "too busy"}, {"[1]\n", "is not a JSON"}, {"{\"a\":\n", "is not a JSON"}};
+    for (const auto& [lpAnswer, lpText] : lAnswers) {
+        const std::string lAnswer = lpAnswer;
+        const ZTCFakeSensor lSensor(controlPath(), [lAnswer](const nlohmann::json&) { return lAnswer; });
+        const ZTSRun lRun = run({"status"});
+        EXPECT_EQ(lRun.mStatus, 3);
+        EXPECT_THAT(lRun.mOutput, HasSubstr(lpText));
+    }
+}
+
+TEST_F(StatusCommand, ADamagedDatabaseDoesNotKeepItFromAnswering) {
+    writeFile(statePath() + "/history.db", std::string(8192, 'x'));
+    const ZTCFakeSensor lSensor(controlPath(), ZTCFakeSensor::withState(makeLiveState()));
+    const ZTSRun lRun = run({"status"});
+    EXPECT_EQ(lRun.mStatus, 0);
+    EXPECT_THAT(lRun.mOutput, HasSubstr("  note: "));
+    EXPECT_THAT(lRun.mOutput, HasSubstr("history.db"));
+}
+
+TEST_F(StatusCommand, MarksGoThroughTheSensor) {
+    store();
+    const ZTCFakeSensor lSensor(controlPath(), [this](const nlohmann::json& acrRequest) -> std::string {
+        if (acrRequest != nlohmann::json{{"request", "mark"}, {"name", "before update"}}) {
+            return "{\"error\":\"unexpected\"}\n";
+        }
+        ZTCStoreTransaction lTransaction = store().begin();
+        store().setMark("before update", fromMicroseconds(gcBase));
+        lTransaction.commit();
+        return "{\"mark\":\"before update\",\"time\":\"2026-03-04T05:06:00Z\"}\n";
+    });
+    const ZTSRun lRun = run({"mark", "before update"});
+    EXPECT_EQ(lRun.mStatus, 0) << lRun.mErrors;
+    EXPECT_EQ(lRun.mOutput, "mark \"before update\" set at 2026-03-04 05:06:00\n");
+    const nlohmann::json lDocument = runJson({"mark", "before update"});
+    EXPECT_EQ(lDocument["schema"], "tavik.mark/1");
+    EXPECT_EQ(lDocument["time"], "2026-03-04T05:06:00.000000+00:00");
+    EXPECT_EQ(run({"mark", "something else"}).mStatus, 3);
+}
+
+TEST_F(StatusCommand, AMarkWithoutASensorIs3) {
+    const ZTSRun lRun = run({"mark", "x"});
+    EXPECT_EQ(lRun.mStatus, 3);
+    EXPECT_EQ(lRun.mOutput, "");
+    expectOneLine(lRun);
+}
