@@ -101,6 +101,10 @@ int ClibEventFd();
 void ClibRaiseEvent(int aDescriptor) noexcept;
 void ClibResetEvent(int aDescriptor) noexcept;
 
+/// Makes an inherited event counter this process's own: sets close-on-exec. Returns null, or in words why the
+/// descriptor cannot be used: it is not open, no event counter, or blocking.
+const char* ClibAdoptEventFd(int aDescriptor) noexcept;
+
 /// Moves a descriptor above the three standard ones, close-on-exec; the negated error number on failure. A descriptor
 /// that is high enough, and a negative one, are handed back as they are.
 int ClibLiftDescriptor(int aDescriptor) noexcept;

@@ -233,6 +233,26 @@ void ClibResetEvent(int aDescriptor) noexcept {
     }
 }
 
+const char* ClibAdoptEventFd(int aDescriptor) noexcept {
+    const int lFlags = ::fcntl(aDescriptor, F_GETFL);
+    if (lFlags < 0) {
+        return "it is not open";
+    }
+    char lPath[64];
+    char lTarget[64] = {};
+    ClibSprintf(lPath, sizeof(lPath), "/proc/self/fd/%d", aDescriptor);
+    if (::readlink(lPath, lTarget, sizeof(lTarget) - 1) < 0 || std::strcmp(lTarget, "anon_inode:[eventfd]") != 0) {
+        return "it is no eventfd";
+    }
+    if ((lFlags & O_NONBLOCK) == 0) {
+        return "it is blocking";
+    }
+    if (::fcntl(aDescriptor, F_SETFD, FD_CLOEXEC) < 0) {
+        return "it cannot be set to close-on-exec";
+    }
+    return nullptr;
+}
+
 int ClibLiftDescriptor(int aDescriptor) noexcept {
     if (aDescriptor < 0 || aDescriptor >= scFirstOwnDescriptor) {
         return aDescriptor;
