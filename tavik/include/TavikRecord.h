@@ -29,6 +29,10 @@ public:
     virtual const ZTCPointer<ZTCScopeData>& getScopeData() const { return mScopeData; }
     virtual ZTCPointer<ZTCScopeData>& getScopeData() { return mScopeData; }
 
+    /// When the latest occurrence came.
+    const ZTCDateTime& getEndTime() const { return *mEndTimeStamp; }
+    std::uint32_t getOccurrences() const { return mOccurences; }
+
     /// One occurrence more, now. The count wraps at 2^32. Cannot fail, so that what goes with it is committed as one.
     void incrementOccurrences() noexcept;
 

@@ -15,6 +15,9 @@
 #include "sensor/agentcommon/include/ScopeData.h"
 #include "sensor/agentcommon/include/WorldWideName.h"
 #include "system/include/System.h"
+#include "tavik/include/Bell.h"
+#include "tavik/include/KindStates.h"
+#include "tavik/include/StatusPageWriter.h"
 #include "tavik/include/TavikEventCatalogue.h"
 #include "tavik/include/TavikInitiator.h"
 #include "tavik/include/TavikRecord.h"
@@ -57,6 +60,7 @@ public:
     void setCmdLineArgDescs() override;
     void processConfigFile(const ZTCString& acrPath) override;
     void displayHelp() override;
+    void waitForThreads() override;
 
     ZTCString getTvkCmdIpcPath() const { return mTvkCmdIpcPath; }
     void setTvkCmdIpcPath(const ZTCString& acrPath) { mTvkCmdIpcPath = acrPath; }
@@ -79,6 +83,18 @@ public:
 
     /// Closes and unloads the adapters' library. The caller holds no lock: callbacks are waited for.
     void closeLibkpm();
+
+    // ---- The status page and the bell: made by init, where the environment asks for them.
+
+    ZTCStatusPageWriter& getStatusPage() { return mStatusPage; }
+    ZTCKindStates& getKindStates() { return mKindStates; }
+    ZTCBell& getBell() { return mBell; }
+
+    /// Shows on the page how many adapters there are now. Only the command thread, between two commands.
+    void showAdapters();
+
+    /// Counts on the page that all records are handed over now, and lets the bell ring again.
+    void noteRetrieval() ZT_REQUIRES(mPrevDataLock);
 
     // ---- Targets: changed by the command thread, read by callbacks.
 
@@ -169,6 +185,7 @@ public:
     void incrementOccurences() ZT_REQUIRES(mPrevDataLock);
 
 private:
+    void initStatusPage();
     void initSynchronizationObjects();
     void initConditionals();
     void initIpcObjects();
@@ -183,7 +200,11 @@ private:
     void destroyCommandIpc();
     void destroyOutputIpc();
     void filePrevScopeRecord() ZT_REQUIRES(mPrevDataLock);
+    void countOccurrence() noexcept ZT_REQUIRES(mPrevDataLock);
 
+    ZTCStatusPageWriter mStatusPage;
+    ZTCKindStates mKindStates{mStatusPage};
+    ZTCBell mBell{gcMaxScopeDataSize};
     std::atomic<Size> mMaxScopeEventDataSize;
     [[maybe_unused]] Size mMaxTotalEventDataSize;  ///< the admission test uses gcMaxScopeDataSize
     ZTCPointer<ZTCLibkpmAbs> mLibkpmAbs;
@@ -199,6 +220,7 @@ private:
     std::atomic<std::uint32_t> mTotalEventDataSize;  ///< written under mPrevDataLock
     unsigned int mPrevBoardId ZT_GUARDED_BY(mPrevDataLock);
     ZTCPointer<ZTCTavikRecord> mPrevScopeRecord ZT_GUARDED_BY(mPrevDataLock);
+    ZTSStatusRow* mpPrevRow ZT_GUARDED_BY(mPrevDataLock) = nullptr;  ///< of the pending record; null without a page
 
     /// Guards the pending record, the record lists, the running total and the target maps. The log's lock is the only
     /// one that is taken while it is held.

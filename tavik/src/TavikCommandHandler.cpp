@@ -29,7 +29,13 @@ void sProcessCommand(ZTCTavikSystem* apSystem, const ZTCPointer<ZTCBuffer>& acrR
 
 void sOutputResponse(ZTCTavikSystem* apSystem, const ZTCPointer<ZTCBuffer>& acrResponse) {
     ZT_ENTRY();
-    apSystem->getProtocolHelper()->send(apSystem->getWriter(gcResponseWriter), acrResponse, 0);
+    try {
+        apSystem->getProtocolHelper()->send(apSystem->getWriter(gcResponseWriter), acrResponse, 0);
+    } catch (const ZTCClibWriteFailedEx&) {
+        apSystem->getStatusPage().setEnd(ZTSE_SensorGone);
+        ZT_EXIT();
+        throw;
+    }
     ZT_EXIT();
 }
 
@@ -75,6 +81,7 @@ void* CommandHandlerThreadProcedure(void* lpArgs) {
             try {
                 lpTavikSystem->waitForActivity(gcCommandReader, lCommandHandler->getWaitTime());
             } catch (const ZTCTimeOutEx&) {
+                lpTavikSystem->showAdapters();
                 continue;
             }
             if (lCommandHandler->isSetForExit()) {

@@ -2,7 +2,6 @@
 
 #include <algorithm>
 #include <array>
-#include <bit>
 #include <cstdint>
 #include <cstring>
 #include <exception>
@@ -16,20 +15,56 @@
 #include "sensor/agentcommon/include/EventDataRecords.h"
 #include "tavik/include/EventConsolidation.h"
 #include "tavik/include/EventDataBytes.h"
+#include "tavik/include/KindSlot.h"
 #include "tavik/include/TavikProtocolHandler.h"
 #include "tavik/include/TavikSystem.h"
 
 namespace {
 
+/// One delivered event, until it is decided what becomes of it. Each counts once on the status page: the system counts
+/// what is consolidated, this object everything else. An RSCN counts as so many events as it has pages, once that is
+/// known.
+class ZTCEventOutcome {
+public:
+    ZTCEventOutcome(unsigned int aBoardId, unsigned int aCategory, unsigned int aSubcategory)
+        : mBoardId(aBoardId),
+          mCategory(static_cast<unsigned char>(aCategory)),
+          mSubcategory(static_cast<unsigned char>(aSubcategory)) {}
+
+    void setEvents(unsigned int aEvents) { mUndecided = aEvents; }
+
+    /// The system has consolidated and counted one.
+    void noteConsolidated() { --mUndecided; }
+
+    /// What is still undecided is refused.
+    void refuse(ZTEStatusRefusal aReason) noexcept {
+        ZT_ENTRY();
+        if (mUndecided != 0 && gpTavikSystem != nullptr) {
+            gpTavikSystem->getStatusPage().countRefused(mBoardId, mCategory, mSubcategory, aReason, mUndecided);
+            mUndecided = 0;
+        }
+        ZT_EXIT();
+    }
+
+private:
+    unsigned int mBoardId;
+    unsigned int mUndecided = 1;
+    unsigned char mCategory;
+    unsigned char mSubcategory;
+};
+
 // ---- Consolidation: one member a kind, each with its own notice and the identity of the last record it started ----
 
 /// A holder for the name of a previous event. Never destroyed: callbacks may run while the process exits.
 const ZTCPointer<ZTCWorldWideName>& sMakePrevName() {
+    ZT_ENTRY();
     ZTCPointer<ZTCWorldWideName> lName(NEW ZTCWorldWideName());
     auto* lpHolder = NEW ZTCPointer<ZTCWorldWideName>(lName);
     if (lpHolder == nullptr) {
+        ZT_EXIT();
         throw ZTCNoMemoryEx();
     }
+    ZT_EXIT();
     return *lpHolder;
 }
 
@@ -231,42 +266,32 @@ constexpr bool sHasEveryKindButRscn() {
 }
 static_assert(sHasEveryKindButRscn());
 
-constexpr unsigned int gcCategoryBits = 5;
-constexpr unsigned int gcSubcategoryBits = 8;
-constexpr unsigned int gcSlots = gcCategoryBits * gcSubcategoryBits;
-
-/// Category and subcategory are one bit each: the number of the pair, or gcSlots where they are something else.
-constexpr unsigned int sGetSlot(unsigned char aCategory, unsigned char aSubcategory) {
-    const bool lIsOneBitEach = aCategory != 0 && (aCategory & (aCategory - 1)) == 0 && aSubcategory != 0 &&
-                               (aSubcategory & (aSubcategory - 1)) == 0;
-    if (!lIsOneBitEach || aCategory >= 1U << gcCategoryBits) {
-        return gcSlots;
-    }
-    return static_cast<unsigned int>(std::countr_zero(aCategory)) * gcSubcategoryBits +
-           static_cast<unsigned int>(std::countr_zero(aSubcategory));
-}
-
 /// The rows of the table by slot; the last slot is that of what has none.
 constexpr auto gcDispatchBySlot = [] {
-    std::array<const ZTSDispatch*, gcSlots + 1> lRows{};
+    std::array<const ZTSDispatch*, gcKindSlots + 1> lRows{};
     for (const ZTSDispatch& lrDispatch : gcDispatch) {
-        lRows[sGetSlot(lrDispatch.mCategory, lrDispatch.mSubcategory)] = &lrDispatch;
+        lRows[getKindSlot(lrDispatch.mCategory, lrDispatch.mSubcategory)] = &lrDispatch;
     }
     return lRows;
 }();
-static_assert(gcDispatchBySlot[gcSlots] == nullptr);
+static_assert(gcDispatchBySlot[gcKindSlots] == nullptr);
 
 const ZTSDispatch* sFindDispatch(unsigned char aCategory, unsigned char aSubcategory) {
-    return gcDispatchBySlot[sGetSlot(aCategory, aSubcategory)];
+    ZT_ENTRY();
+    ZT_EXIT();
+    return gcDispatchBySlot[getKindSlot(aCategory, aSubcategory)];
 }
 
 /// Makes a kind that is never destroyed: callbacks may run while the process exits.
 const ZTCPointer<ZTCScopeEvent>* sMakeKind(unsigned char aCategory, unsigned char aSubcategory) {
+    ZT_ENTRY();
     const ZTCPointer<ZTCScopeEvent> lKind(NEW ZTCScopeEvent(aCategory, aSubcategory));
     const auto* lpKind = NEW ZTCPointer<ZTCScopeEvent>(lKind);
     if (lpKind == nullptr) {
+        ZT_EXIT();
         throw ZTCNoMemoryEx();
     }
+    ZT_EXIT();
     return lpKind;
 }
 
@@ -275,19 +300,23 @@ const ZTCPointer<ZTCScopeEvent>* sMakeKind(unsigned char aCategory, unsigned cha
 const ZTCPointer<ZTCScopeEvent>& sGetKind(unsigned char aCategory, unsigned char aSubcategory,
                                           ZTCPointer<ZTCScopeEvent>& arHolder)
     ZT_REQUIRES(gpTavikSystem->getPrevDataLock()) {
-    static const ZTCPointer<ZTCScopeEvent>* spKinds[gcSlots];
-    const unsigned int lSlot = sGetSlot(aCategory, aSubcategory);
-    if (lSlot == gcSlots) {
-        return arHolder = ZTCPointer<ZTCScopeEvent>(NEW ZTCScopeEvent(aCategory, aSubcategory));
+    ZT_ENTRY();
+    static const ZTCPointer<ZTCScopeEvent>* spKinds[gcKindSlots];
+    const unsigned int lSlot = getKindSlot(aCategory, aSubcategory);
+    if (lSlot == gcKindSlots) {
+        arHolder = ZTCPointer<ZTCScopeEvent>(NEW ZTCScopeEvent(aCategory, aSubcategory));
+        ZT_EXIT();
+        return arHolder;
     }
     if (spKinds[lSlot] == nullptr) {
         spKinds[lSlot] = sMakeKind(aCategory, aSubcategory);
     }
+    ZT_EXIT();
     return *spKinds[lSlot];
 }
 
 int sConsolidateEvents(const ZTCPointer<ZTCScopeEvent>& acrEvent, unsigned int aBoardId, const void* apData,
-                       unsigned int aLength) ZT_REQUIRES(gpTavikSystem->getPrevDataLock()) {
+                       unsigned int aLength, ZTCEventOutcome& arOutcome) ZT_REQUIRES(gpTavikSystem->getPrevDataLock()) {
     ZT_ENTRY();
     const unsigned int lCategory = acrEvent->getCategory();
     const unsigned int lSubcategory = acrEvent->getSubcategory();
@@ -299,11 +328,15 @@ int sConsolidateEvents(const ZTCPointer<ZTCScopeEvent>& acrEvent, unsigned int a
     if (lpDispatch != nullptr && lpDispatch->mpKind == nullptr) {
         ZT_LOG_NOTICE(lpDispatch->mpText, lCategory, lSubcategory);
         sConsolidateGenericEvents(acrEvent, aBoardId, lIsNew);
+        arOutcome.noteConsolidated();
     } else if (lpDispatch != nullptr && aLength < lpDispatch->mpKind->mMinimumLength) {
         ZT_LOG_WARN(lpDispatch->mpText, lpDispatch->mpKind->mMinimumLength, aLength);
+        arOutcome.refuse(ZTSR_TooShort);
     } else if (lpDispatch != nullptr) {
         lpDispatch->mpMember(acrEvent, aBoardId, apData, lIsNew);
+        arOutcome.noteConsolidated();
     } else {
+        arOutcome.refuse(ZTSR_UnknownKind);
         switch (lCategory) {
             case ZT_REG_ELS_EVENT:
                 ZT_LOG_NOTICE("Unknown ELS Event subcategory = %u, ignored", lSubcategory);
@@ -337,18 +370,22 @@ constexpr unsigned int gcRscnMinimumLength = gcRscnHeaderSize + gcRscnPageSize;
 constexpr unsigned int gcRscnFormatMask = 0x03000000;  // 0: a single port's address
 constexpr unsigned int gcRscnAddressMask = 0x00FFFFFF;
 
-void sConsolidateRscnEvent(const ZTCPointer<ZTCScopeEvent>& acrEvent, unsigned int aBoardId, unsigned int aFcId) {
-    static unsigned int lPrevFcId = 0;
+/// False where the board has no record list any more: the page is not recorded then.
+bool sConsolidateRscnEvent(const ZTCPointer<ZTCScopeEvent>& acrEvent, unsigned int aBoardId, unsigned int aFcId) {
     ZT_ENTRY();
+    static unsigned int lPrevFcId = 0;
     ZT_LOG_NOTICE("Processing Rscn Event Cat=%u SubCat=%u", acrEvent->getCategory(), acrEvent->getSubcategory());
+    bool lHasRecordList;
     {
+        // One hold for both: no list goes away between the test and the record.
         const ZTCPrevDataHold lHold(*gpTavikSystem);
-        if (gpTavikSystem->isPrevScopeDataSet() &&
+        lHasRecordList = gpTavikSystem->isRecordListExist(aBoardId);
+        if (lHasRecordList && gpTavikSystem->isPrevScopeDataSet() &&
             gpTavikSystem->getPrevScopeData()->getCategory() == acrEvent->getCategory() &&
             gpTavikSystem->getPrevScopeData()->getSubcategory() == acrEvent->getSubcategory() &&
             gpTavikSystem->getPrevBoardId() == aBoardId && aFcId == lPrevFcId) {
             gpTavikSystem->incrementOccurences();
-        } else {
+        } else if (lHasRecordList) {
             unsigned char lRecord[sizeof(TavikRscn)];
             TavikStore32(lRecord + offsetof(TavikRscn, Version), EVENTDATA_VERSION);
             TavikStore32(lRecord + offsetof(TavikRscn, FcId), aFcId);
@@ -364,41 +401,56 @@ void sConsolidateRscnEvent(const ZTCPointer<ZTCScopeEvent>& acrEvent, unsigned i
             lPrevFcId = aFcId;
         }
     }
+    gpTavikSystem->getBell().ringIfDue();
     ZT_EXIT();
+    return lHasRecordList;
 }
 
-void sProcessRscnEvent(unsigned int aBoardId, const void* apData, unsigned int aLength,
-                       const ZTCPointer<ZTCScopeEvent>& acrEvent) {
+/// False where the board has lost its record list: the pages from there on are not recorded.
+bool sProcessRscnEvent(unsigned int aBoardId, const void* apData, unsigned int aLength,
+                       const ZTCPointer<ZTCScopeEvent>& acrEvent, ZTCEventOutcome& arOutcome) {
     ZT_ENTRY();
     if (aLength < gcRscnMinimumLength) {
         ZT_LOG_WARN("Not enough data in RSCN Event %u %u", gcRscnMinimumLength, aLength);
+        arOutcome.refuse(ZTSR_TooShort);
         ZT_EXIT();
-        return;
+        return true;
     }
     ZT_LOG_INFO("Got an RSCN event: datalength:%u", aLength);
     const auto* lpPayload = static_cast<const unsigned char*>(apData);
     const auto lPayloadLength = static_cast<std::uint16_t>(lpPayload[2] << 8 | lpPayload[3]);
     if (lPayloadLength == 0) {
         ZT_LOG_NOTICE("No Payload in RSCN Event");
+        arOutcome.refuse(ZTSR_TooShort);
         ZT_EXIT();
-        return;
+        return true;
     }
     ZT_LOG_INFO("lPayloadLength = %hu", lPayloadLength);
     // The payload is as long as it says: the library delivers it whole, whatever length goes with it.
     const auto lPageCount = std::max<std::int16_t>(static_cast<std::int16_t>(lPayloadLength / gcRscnPageSize - 1), 0);
+    if (lPageCount == 0) {
+        arOutcome.refuse(ZTSR_TooShort);
+    } else {
+        arOutcome.setEvents(static_cast<unsigned int>(lPageCount));
+    }
     const unsigned char* lpPage = lpPayload + gcRscnHeaderSize;
-    for (std::int16_t lPage = 0; lPage < lPageCount; ++lPage) {
+    bool lHasRecordList = true;
+    for (std::int16_t lPage = 0; lPage < lPageCount && lHasRecordList; ++lPage) {
         unsigned int lWord;
         ClibMemcpy(&lWord, lpPage, sizeof lWord);
-        sConsolidateRscnEvent(acrEvent, aBoardId, ClibNtohl(lWord));
+        lHasRecordList = sConsolidateRscnEvent(acrEvent, aBoardId, ClibNtohl(lWord));
+        if (lHasRecordList) {
+            arOutcome.noteConsolidated();
+        }
         lpPage += gcRscnPageSize;
     }
     ZT_EXIT();
+    return lHasRecordList;
 }
 
 // ---- Admission ----
 
-void sProcessScopeEvent(const ZTCCallbackEventData* apEventData) {
+void sProcessScopeEvent(const ZTCCallbackEventData* apEventData, ZTCEventOutcome& arOutcome) {
     ZT_ENTRY();
     const unsigned int lBoardId = apEventData->getBoardId();
     const auto lCategory = static_cast<unsigned char>(apEventData->getCategory());
@@ -413,47 +465,66 @@ void sProcessScopeEvent(const ZTCCallbackEventData* apEventData) {
             ZTCPointer<ZTCScopeEvent> lUnknown;
             try {
                 sConsolidateEvents(sGetKind(lCategory, lSubcategory, lUnknown), lBoardId, apEventData->getEventData(),
-                                   apEventData->getEventDataLength());
+                                   apEventData->getEventDataLength(), arOutcome);
             } catch (const ZTCNotFoundEx&) {  // the event's port or board is gone: there is nothing to say about it
+                arOutcome.refuse(ZTSR_Failed);
             }
         }
     }
+    gpTavikSystem->getBell().ringIfDue();
+    if (lHasRecordList && lIsRscn) {
+        static const ZTCPointer<ZTCScopeEvent>& lRscnKind = *sMakeKind(gcRscnCategory, gcRscnSubcategory);
+        // Each page tests for the list again, in a hold of its own.
+        lHasRecordList = sProcessRscnEvent(lBoardId, apEventData->getEventData(), apEventData->getEventDataLength(),
+                                           lRscnKind, arOutcome);
+    }
     if (!lHasRecordList) {
+        arOutcome.refuse(ZTSR_NoList);
         ZT_LOG_ERR("Bad boardid %d in event has been recieved. Event: wwn %s; cat %d; subcat %d.  Skip event!",
                    static_cast<int>(lBoardId), ZTCWorldWideName(apEventData->getWwpn()).getString().get(),
                    static_cast<int>(apEventData->getCategory()), static_cast<int>(apEventData->getSubcategory()));
-    } else if (lIsRscn) {
-        static const ZTCPointer<ZTCScopeEvent>& lRscnKind = *sMakeKind(gcRscnCategory, gcRscnSubcategory);
-        sProcessRscnEvent(lBoardId, apEventData->getEventData(), apEventData->getEventDataLength(), lRscnKind);
     }
     ZT_EXIT();
 }
 
 /// Why an event is not admitted, as the text of a notice that is given the board id; null where it is admitted.
-const char* sFindRefusal(unsigned int aBoardId, const char* apBadBoardText) {
+const char* sFindRefusal(unsigned int aBoardId, const char* apBadBoardText, ZTCEventOutcome& arOutcome) {
+    ZT_ENTRY();
     if (!mDoScopeCollection) {
+        arOutcome.refuse(ZTSR_CollectionOff);
+        ZT_EXIT();
         return "Ignoring the event as Scope data Collection is not enabled.";
     }
+    const char* lpRefusal = nullptr;
+    // Before the total is looked at: a retrieval in between makes the next refusal ring again.
+    const std::uint64_t lRetrievals = gpTavikSystem->getBell().getRetrievals();
     if (gpTavikSystem->isTotalLimitOnScopeDataReached()) {
-        return "Ignoring the event as the limit on the total Event Data";
+        lpRefusal = "Ignoring the event as the limit on the total Event Data";
+        arOutcome.refuse(ZTSR_TotalLimit);
+        gpTavikSystem->getBell().ringForRefusal(lRetrievals);
+    } else if (!gpTavikSystem->isFcInitiatorExist(aBoardId)) {
+        lpRefusal = apBadBoardText;
+        arOutcome.refuse(ZTSR_UnknownBoard);
     }
-    if (!gpTavikSystem->isFcInitiatorExist(aBoardId)) {
-        return apBadBoardText;
-    }
-    return nullptr;
+    ZT_EXIT();
+    return lpRefusal;
 }
 
 /// The text of the exception that is being handled.
 const char* sGetExceptionText() {
+    ZT_ENTRY();
+    const char* lpText;
     try {
-        throw;
+        std::rethrow_exception(std::current_exception());
     } catch (const ZTCException& lrException) {
-        return lrException.what();
+        lpText = lrException.what();
     } catch (const std::exception& lrException) {
-        return lrException.what();
+        lpText = lrException.what();
     } catch (...) {
-        return "unknown exception";
+        lpText = "unknown exception";
     }
+    ZT_EXIT();
+    return lpText;
 }
 
 /// The event-kind data of an event and their length; null and 0 where it has none.
@@ -463,15 +534,20 @@ struct ZTSEventBytes {
 };
 
 ZTSEventBytes sTakeEventBytes(const void* apPayload, std::uint64_t aEventSize) {
+    ZT_ENTRY();
     void* lpData;
     std::memcpy(&lpData, static_cast<const unsigned char*>(apPayload) + offsetof(ZT_event_payload, zt_payload_data),
                 sizeof lpData);
     const auto lSize = static_cast<std::uint32_t>(aEventSize);
+    ZT_EXIT();
     return {static_cast<unsigned char*>(lpData), lSize > ZT_EVENT_HEADER_SIZE ? lSize - ZT_EVENT_HEADER_SIZE : 0};
 }
 
 const unsigned char* sGetInitiatorWwpn(unsigned int aBoardId) {
-    return gpTavikSystem->getFcInitiator(aBoardId)->getWwpn()->getBytes();
+    ZT_ENTRY();
+    const unsigned char* lpWwpn = gpTavikSystem->getFcInitiator(aBoardId)->getWwpn()->getBytes();
+    ZT_EXIT();
+    return lpWwpn;
 }
 
 }  // namespace
@@ -479,11 +555,13 @@ const unsigned char* sGetInitiatorWwpn(unsigned int aBoardId) {
 void ScopeCb_Generic(unsigned int aBoardId, HBA_wwn aWwn, unsigned int aCategory, unsigned int aSubcategory, void*,
                      ZT_event* apEvent) {
     ZT_ENTRY();
+    ZTCEventOutcome lOutcome(aBoardId, aCategory, aSubcategory);
     try {
         ZT_TRACE_MSG("Invoking Generic callback with boardId: %u, hba wwn: %s, Cat: %u, subCat: %u", aBoardId,
                      ZTCWorldWideName(aWwn.wwn).getString().get(), aCategory, aSubcategory);
         // An unknown board is reported in the words of the link callback.
-        const char* lpRefusal = sFindRefusal(aBoardId, "Ignoring the KpmLink event callback as boardid %d is bad");
+        const char* lpRefusal =
+            sFindRefusal(aBoardId, "Ignoring the KpmLink event callback as boardid %d is bad", lOutcome);
         if (lpRefusal != nullptr) {
             ZT_LOG_NOTICE(lpRefusal, aBoardId);
         } else {
@@ -498,9 +576,10 @@ void ScopeCb_Generic(unsigned int aBoardId, HBA_wwn aWwn, unsigned int aCategory
             }
             const ZTCCallbackEventData lEventData(aBoardId, aWwn.wwn, aCategory, aSubcategory, lBytes.mpData,
                                                   lBytes.mLength);
-            sProcessScopeEvent(&lEventData);
+            sProcessScopeEvent(&lEventData, lOutcome);
         }
     } catch (...) {
+        lOutcome.refuse(ZTSR_Failed);
         ZT_LOG_ERR("Error: %s, processing event callback", sGetExceptionText());
     }
     ZT_EXIT();
@@ -508,17 +587,20 @@ void ScopeCb_Generic(unsigned int aBoardId, HBA_wwn aWwn, unsigned int aCategory
 
 void ScopeCb_KpmTemp(unsigned int aBoardId, unsigned int, unsigned int) {
     ZT_ENTRY();
+    ZTCEventOutcome lOutcome(aBoardId, gcTemperatureCategory, gcTemperatureSubcategory);
     try {
         ZT_TRACE_MSG("Invoking TEMPERATURE callback with boardId: %u", aBoardId);
-        const char* lpRefusal = sFindRefusal(aBoardId, "Ignoring the KpmTemp event callback as boardid %d is bad");
+        const char* lpRefusal =
+            sFindRefusal(aBoardId, "Ignoring the KpmTemp event callback as boardid %d is bad", lOutcome);
         if (lpRefusal != nullptr) {
             ZT_LOG_NOTICE(lpRefusal, aBoardId);
         } else {
             const ZTCCallbackEventData lEventData(aBoardId, sGetInitiatorWwpn(aBoardId), gcTemperatureCategory,
                                                   gcTemperatureSubcategory, nullptr, 0);
-            sProcessScopeEvent(&lEventData);
+            sProcessScopeEvent(&lEventData, lOutcome);
         }
     } catch (...) {
+        lOutcome.refuse(ZTSR_Failed);
         ZT_LOG_ERR("Error: %s, processing event callback", sGetExceptionText());
     }
     ZT_EXIT();
@@ -526,9 +608,11 @@ void ScopeCb_KpmTemp(unsigned int aBoardId, unsigned int, unsigned int) {
 
 void ScopeCb_KpmLink(unsigned int aBoardId, void* apLinkInfo) {
     ZT_ENTRY();
+    ZTCEventOutcome lOutcome(aBoardId, gcLinkCategory, gcLinkSubcategory);
     try {
         ZT_TRACE_MSG("Invoking LINK callback with boardId: %u", aBoardId);
-        const char* lpRefusal = sFindRefusal(aBoardId, "Ignoring the KpmLink event callback as boardid %d is bad");
+        const char* lpRefusal =
+            sFindRefusal(aBoardId, "Ignoring the KpmLink event callback as boardid %d is bad", lOutcome);
         if (lpRefusal != nullptr) {
             ZT_LOG_NOTICE(lpRefusal, aBoardId);
         } else {
@@ -537,9 +621,10 @@ void ScopeCb_KpmLink(unsigned int aBoardId, void* apLinkInfo) {
                 lpWwpn = static_cast<const unsigned char*>(apLinkInfo) + offsetof(LINKINFO, a_wwpName);
             }
             const ZTCCallbackEventData lEventData(aBoardId, lpWwpn, gcLinkCategory, gcLinkSubcategory, nullptr, 0);
-            sProcessScopeEvent(&lEventData);
+            sProcessScopeEvent(&lEventData, lOutcome);
         }
     } catch (...) {
+        lOutcome.refuse(ZTSR_Failed);
         ZT_LOG_ERR("Error: %s, processing event callback", sGetExceptionText());
     }
     ZT_EXIT();
@@ -547,17 +632,20 @@ void ScopeCb_KpmLink(unsigned int aBoardId, void* apLinkInfo) {
 
 void ScopeCb_KpmRscn(unsigned int aBoardId, void* apData, unsigned int aLength) {
     ZT_ENTRY();
+    ZTCEventOutcome lOutcome(aBoardId, gcRscnCategory, gcRscnSubcategory);
     try {
         ZT_TRACE_MSG("Invoking RSCN callback with boardId: %u", aBoardId);
-        const char* lpRefusal = sFindRefusal(aBoardId, "Ignoring the KpmRscn event callback as boardid %d is bad");
+        const char* lpRefusal =
+            sFindRefusal(aBoardId, "Ignoring the KpmRscn event callback as boardid %d is bad", lOutcome);
         if (lpRefusal != nullptr) {
             ZT_LOG_NOTICE(lpRefusal, aBoardId);
         } else {
             const ZTCCallbackEventData lEventData(aBoardId, sGetInitiatorWwpn(aBoardId), gcRscnCategory,
                                                   gcRscnSubcategory, static_cast<unsigned char*>(apData), aLength);
-            sProcessScopeEvent(&lEventData);
+            sProcessScopeEvent(&lEventData, lOutcome);
         }
     } catch (...) {
+        lOutcome.refuse(ZTSR_Failed);
         ZT_LOG_ERR("Error: %s, processing event callback", sGetExceptionText());
     }
     ZT_EXIT();

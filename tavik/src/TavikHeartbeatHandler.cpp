@@ -73,6 +73,7 @@ void* TavikHeartbeatThread(void* lpArgs) {
             ZT_LOG_NOTICE("Sensor process still running, but not updating the heartbeat");
         } catch (const ZTCClibGetProcStatusFailedEx&) {
             ZT_LOG_HALT("Failed in getting the status of Sensor");
+            lpTavikSystem->getStatusPage().setEnd(ZTSE_SensorGone);
             lpTavikSystem->makeThreadsToExit();
             break;
         }

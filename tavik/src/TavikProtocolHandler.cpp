@@ -92,8 +92,10 @@ ZTSRegistration sRegisterForPort(ZTCTavikSystem* apSystem, const ZTCTavikInitiat
                                  const ZTCPointer<ZTCScopeEvent>& acrEvent) {
     ZT_ENTRY();
     unsigned int lHandle = 0;
+    const std::uint64_t lReports = apSystem->getKindStates().countReports();
     const unsigned int lStatus = apSystem->getLibkpmAbs()->LIBKPM_ZtapiRegEvent(
         acrInitiator.getBoardId(), acrInitiator.getWwpn(), acrEvent, apSystem, &lHandle, &ScopeCb_Generic);
+    apSystem->getKindStates().noteStatus(acrInitiator.getBoardId(), *acrEvent, lStatus, lReports);
     const ZTERegistrationOutcome lOutcome = sIsAccepted(lStatus) ? ZTRG_Registered : ZTRG_Refused;
     ZT_EXIT();
     return {lOutcome, lStatus, lHandle, nullptr};
@@ -108,6 +110,8 @@ ZTSRegistration sRegisterForBoard(ZTCTavikSystem* apSystem, const ZTCTavikInitia
         const ZTSBoardRegistration& lcrRow = *lResult.mpBoard;
         lResult.mHandle = apSystem->getLibkpmAbs()->LIBKPM_KpmRegEvent(
             acrInitiator.getBoardId(), lcrRow.mEventType, gcpBoardContext, lcrRow.mSize, lcrRow.mpCallback);
+        apSystem->getKindStates().noteHandle(acrInitiator.getBoardId(), *acrEvent, lResult.mHandle,
+                                             !lcrRow.mIsRequired);
         const ZTERegistrationOutcome lOutcomeOfFailure = lcrRow.mIsRequired ? ZTRG_Refused : ZTRG_Missing;
         lResult.mOutcome = lResult.mHandle != 0 ? ZTRG_Registered : lOutcomeOfFailure;
     }
@@ -149,7 +153,9 @@ void ZTCTavikProtocolHandler::handleStartScopeCommand(const ZTCPointer<ZTCBuffer
     unsigned int lMaxEventDataSize = 0;
     lStream >> lMaxEventDataSize;
     mpTavikSystem->setMaxEventDataSize(lMaxEventDataSize);
+    mpTavikSystem->getStatusPage().setRecordLimit(lMaxEventDataSize);
     mDoScopeCollection = true;
+    mpTavikSystem->getKindStates().setCollecting(true);
     if (mEventsRegistered) {
         ZT_LOG_NOTICE("ScopeEvents Already Registered. Hence Starting ScopeData Collection.");
         createSuccessResponse(arResponse);
@@ -223,6 +229,7 @@ void ZTCTavikProtocolHandler::handleGetScopeDataCommand(const ZTCPointer<ZTCBuff
         mpTavikSystem->clearRecordsMap(lTakenLists);
         mpTavikSystem->addNewRecordListsToRecordsMap(lFreshLists);
         mpTavikSystem->resetTotalEventDataSize();
+        mpTavikSystem->noteRetrieval();
     }
 
     // All of the room at once: growing step by step would copy the response again and again.
@@ -256,6 +263,7 @@ void ZTCTavikProtocolHandler::handleStopCommand(const ZTCPointer<ZTCBuffer>&, ZT
     ZT_ENTRY();
     ZT_LOG_NOTICE("Stopping Scope Data Collection.");
     mDoScopeCollection = false;
+    mpTavikSystem->getKindStates().setCollecting(false);
     createSuccessResponse(arResponse);
     ZT_EXIT();
 }
@@ -300,6 +308,7 @@ void ZTCTavikProtocolHandler::handleUnregisterEvents() {
         lrInitiator->cleanRegs();
     }
     mEventsRegistered = false;
+    mpTavikSystem->getKindStates().clearRegistrations();
     ZT_EXIT();
 }
 
@@ -353,6 +362,7 @@ void ZTCTavikProtocolHandler::handleSetCollectionPeriodCommand(const ZTCPointer<
 void ZTCTavikProtocolHandler::handleShutDownCommand(const ZTCPointer<ZTCBuffer>&, ZTCPointer<ZTCBuffer>& arResponse) {
     ZT_ENTRY();
     mpTavikSystem->closeLibkpm();
+    mpTavikSystem->getStatusPage().setEnd(ZTSE_ShutDown);
     createSuccessResponse(arResponse);
     ZT_THROW(ZTCShutDownEx, "Shutting down Tavik", 19);
 }

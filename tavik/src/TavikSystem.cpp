@@ -91,6 +91,13 @@ void sWarnOfSharedDirectory(const ZTCString& acrPath) {
     ZT_EXIT();
 }
 
+void sWarnOfStatusPage(const ZTCException& acrException) {
+    ZT_ENTRY();
+    ZT_LOG_WARN("The status page is missing or has no boards, the agent works without its counts: %s",
+                acrException.what());
+    ZT_EXIT();
+}
+
 }  // namespace
 
 ZTCTavikSystem::ZTCTavikSystem(const ZTCString& acrName)
@@ -132,12 +139,30 @@ void ZTCTavikSystem::init() {
     ZT_LOG_INFO("Performing Tavik system data initialization");
     ZTCSystem::init();
     sWarnOfSharedDirectory(getInstallDir());
-    // Adapters come before anything that leaves a trace in the file system: a host without any ends here.
+    initStatusPage();
+    // Adapters come before anything else that leaves a trace in the file system: a host without any ends here.
     initLibkpm();
     initSynchronizationObjects();
     initIpcObjects();
     initTavikHandlers();
     initThreadComponents();
+    ZT_EXIT();
+}
+
+void ZTCTavikSystem::initStatusPage() {
+    ZT_ENTRY();
+    const char* lpPage = ClibGetenv(gcStatusPageVariable, nullptr);
+    if (lpPage != nullptr && *lpPage != '\0') {
+        try {
+            mStatusPage.open(lpPage, gcMaxScopeDataSize);
+        } catch (const ZTCClibEx& lrException) {
+            sWarnOfStatusPage(lrException);
+        }
+    }
+    const char* lpBell = ClibGetenv(gcBellVariable, nullptr);
+    if (lpBell != nullptr && *lpBell != '\0') {
+        mBell.open(lpBell);
+    }
     ZT_EXIT();
 }
 
@@ -218,6 +243,14 @@ void ZTCTavikSystem::initCommandHandler(ZTCSystemInterface* apSystemInterface) {
     ZT_LOG_INFO("Creating Command Handler Thread object...");
     mThreadComponents.add(
         ZTCPointer<ZTCTavikCommandHandler>(NEW ZTCTavikCommandHandler(apSystemInterface, gcCommandWaitTime)));
+    ZT_EXIT();
+}
+
+void ZTCTavikSystem::waitForThreads() {
+    ZT_ENTRY();
+    ZTCSystem::waitForThreads();
+    // Threads that ended for a reason of their own have noted it before.
+    mStatusPage.setEnd(ZTSE_Other);
     ZT_EXIT();
 }
 
@@ -314,8 +347,9 @@ void ZTCTavikSystem::initLibkpm() {
     ZT_ENTRY();
     mLibkpmAbs = ZTCPointer<ZTCLibkpmAbs>(NEW ZTCLibkpmAbs());
     try {
-        mLibkpmAbs->LIBKPM_LoadLibrary();
+        mLibkpmAbs->LIBKPM_LoadLibrary(&mKindStates);
     } catch (const ZTCNotFoundEx&) {
+        mStatusPage.setEnd(ZTSE_NoLibrary);
         ZT_LOG_NOTICE("No Libkpm Found or Disabled.. Tavik would exit");
         ZT_THROW(ZTCExitConditionEx, "No Libkpm found", 19);
     }
@@ -323,11 +357,13 @@ void ZTCTavikSystem::initLibkpm() {
     const unsigned int lNumberOfAdapters = mLibkpmAbs->LIBKPM_GetNumberOfAdapters();
     if (lNumberOfAdapters == 0) {
         closeLibkpm();
+        mStatusPage.setEnd(ZTSE_NoAdapters);
         ZT_LOG_NOTICE("No QRV Adapters found.. Tavik would exit");
         ZT_THROW(ZTCExitConditionEx, "No QRV Adapters found.. Tavik would exit", 19);
     }
     if (!mLibkpmAbs->LIBKPM_IsZtapiSupported()) {
         closeLibkpm();
+        mStatusPage.setEnd(ZTSE_NoEventSupport);
         ZT_LOG_NOTICE("Old incompatible driver found.. Tavik would exit");
         ZT_THROW(ZTCExitConditionEx, "Old incompatible driver found.. Tavik would exit", 19);
     }
@@ -341,6 +377,19 @@ void ZTCTavikSystem::initLibkpm() {
         mInitiatorsMap.insert(lIndex, lInitiator);
         const ZTCPrevDataHold lHold(*this);
         mRecordsMap.insert(lIndex, lRecordList);
+    }
+    try {
+        mKindStates.addBoards(mInitiatorsMap);
+    } catch (const ZTCClibEx& lrException) {
+        sWarnOfStatusPage(lrException);
+    }
+    ZT_EXIT();
+}
+
+void ZTCTavikSystem::showAdapters() {
+    ZT_ENTRY();
+    if (mStatusPage.isOpen()) {
+        mStatusPage.setAdapters(mLibkpmAbs->LIBKPM_GetNumberOfAdapters());
     }
     ZT_EXIT();
 }
@@ -412,6 +461,7 @@ const ZTSRemotePortNames* ZTCTavikSystem::findWwpnNames(unsigned long aKey) noex
 void ZTCTavikSystem::makeRecordLists(ZTCTavikRecordsMap& arLists) {
     ZT_ENTRY();
     const unsigned int lNumberOfAdapters = mLibkpmAbs->LIBKPM_GetNumberOfAdapters();
+    mStatusPage.setAdapters(lNumberOfAdapters);
     for (unsigned int lIndex = 0; lIndex < lNumberOfAdapters; ++lIndex) {
         arLists.insert(lIndex, ZTCPointer<ZTCTavikRecordList>(NEW ZTCTavikRecordList(lIndex, this)));
     }
@@ -428,6 +478,13 @@ void ZTCTavikSystem::clearRecordsMap(ZTCTavikRecordsMap& arTaken) noexcept {
 void ZTCTavikSystem::addNewRecordListsToRecordsMap(ZTCTavikRecordsMap& arLists) noexcept {
     ZT_ENTRY();
     mRecordsMap.swap(arLists);
+    ZT_EXIT();
+}
+
+void ZTCTavikSystem::noteRetrieval() {
+    ZT_ENTRY();
+    mStatusPage.countRetrieval();
+    mBell.noteRetrieval();
     ZT_EXIT();
 }
 
@@ -456,6 +513,9 @@ void ZTCTavikSystem::filePrevScopeRecord() {
     } else {
         ZT_LOG_ERR("Dropping the pending scope record of board %u: the board has no record list any more",
                    mPrevBoardId);
+        if (mpPrevRow != nullptr) {
+            mStatusPage.countDropped(*mpPrevRow, mPrevScopeRecord->getOccurrences());
+        }
     }
     ZT_EXIT();
 }
@@ -472,6 +532,12 @@ void ZTCTavikSystem::setPrevScopeData(unsigned int aBoardId, ZTCPointer<ZTCScope
     mPrevBoardId = aBoardId;
     mPrevScopeDataSet = true;
     sAddToTotal(mTotalEventDataSize, arData->getEventDataSize());
+    mpPrevRow = mStatusPage.findRow(aBoardId, arData->getCategory(), arData->getSubcategory());
+    countOccurrence();
+    if (mpPrevRow != nullptr) {
+        mStatusPage.countRecord(getTotalEventDataSize());
+    }
+    mBell.noteHeld(getTotalEventDataSize());
     ZT_EXIT();
 }
 
@@ -489,11 +555,26 @@ void ZTCTavikSystem::appendEventData(unsigned char* apData, unsigned int aLength
     mPrevScopeData->appendEventData(apData, aLength);
     mPrevScopeRecord->incrementOccurrences();
     sAddToTotal(mTotalEventDataSize, aLength);
+    countOccurrence();
+    if (mpPrevRow != nullptr) {
+        mStatusPage.setHeldBytes(getTotalEventDataSize());
+    }
+    mBell.noteHeld(getTotalEventDataSize());
     ZT_EXIT();
 }
 
 void ZTCTavikSystem::incrementOccurences() {
     ZT_ENTRY();
     mPrevScopeRecord->incrementOccurrences();
+    countOccurrence();
+    ZT_EXIT();
+}
+
+/// Counts the latest occurrence of the pending record on the page.
+void ZTCTavikSystem::countOccurrence() noexcept {
+    ZT_ENTRY();
+    if (mpPrevRow != nullptr) {
+        ZTCStatusPageWriter::countConsolidated(*mpPrevRow, mPrevScopeRecord->getEndTime());
+    }
     ZT_EXIT();
 }

@@ -25,6 +25,10 @@ const std::vector<ZTSLogText>& logTexts() {
          "The sensor directory '%s' can be written by %s, who can so command this agent and replace its files; to make "
          "it private: %s",
          sAgent},
+        {16, "-W-", ".//TavikSystem", "sWarnOfStatusPage",
+         "The status page is missing or has no boards, the agent works without its counts: %s", sAgent},
+        {16, "-W-", ".//Bell", "open", "The sensor is not rung for: %s='%s' cannot be used, %s", sAgent},
+        {8, "-E-", ".//KindStates", "sSayNotShown", "The status page lacks a report of Libkpm: %s", sProcess},
         {64, "-I-", ".//TavikSystem", "initConditionals", "Creating HeartbeatHandler Conditional...", sAgent},
         {64, "-I-", ".//TavikSystem", "initConditionals", "Creating CommandHandler Conditional...", sAgent},
         {128, "-T-", ".//TavikSystem", "initCommandIpc", "Creating Tavik Command Reader IPC...", sAgent},

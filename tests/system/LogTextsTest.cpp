@@ -181,9 +181,11 @@ void sDriveAWaitForAReader(ZTCLogTextsSeen& arSeen) {
     sAddLogs(arSeen, lAgent);
 }
 
-/// A directory and a FIFO that are open to others.
+/// A directory and a FIFO that are open to others; and no place for a status page, and no bell.
 void sDriveSharedPlaces(ZTCLogTextsSeen& arSeen) {
     ZTCAgentProcess lAgent;
+    lAgent.setEnvironment("ZT_TVK_STATUS_PAGE", lAgent.workingDirectory() + "/nowhere/page");
+    lAgent.setEnvironment("ZT_TVK_BELL_FD", "1");
     std::filesystem::permissions(lAgent.sensorDirectory(), std::filesystem::perms::all);
     EXPECT_EQ(0, mkfifo(lAgent.commandFifoPath().c_str(), 0600));
     std::filesystem::permissions(lAgent.commandFifoPath(), std::filesystem::perms::all);

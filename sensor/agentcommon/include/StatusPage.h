@@ -218,7 +218,7 @@ static_assert(offsetof(ZTSStatusHeader, mHandedOverBytes) == 176 && offsetof(ZTS
 struct ZTSStatusPage {
     ZTSStatusHeader mHeader;
     ZTSStatusLoss mLosses[gcStatusLosses];
-    ZTSStatusRow mUnknownBoards;  ///< its lock part stays 0: nothing of an unknown board is consolidated
+    ZTSStatusRow mUnknownBoards;  ///< nothing of it is consolidated, unless the page has no boards
 };
 
 static_assert(offsetof(ZTSStatusPage, mLosses) == 256 && offsetof(ZTSStatusPage, mUnknownBoards) == 2304);

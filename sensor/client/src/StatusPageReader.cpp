@@ -98,7 +98,7 @@ std::uint64_t ZTSStatusRowCopy::getRefused() const {
 }
 
 std::uint64_t ZTSStatusSnapshot::getHeld() const {
-    std::uint64_t lSum = 0;
+    std::uint64_t lSum = mUnknownBoards.getHeld();
     for (const ZTSStatusBoardCopy& lrBoard : mBoards) {
         for (const ZTSStatusRowCopy& lrRow : lrBoard.mRows) {
             lSum += lrRow.getHeld();

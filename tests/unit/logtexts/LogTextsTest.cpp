@@ -148,6 +148,12 @@ void LogTexts::driveEvents() {
         mSystem->exchangeRecordLists(1);
         mSystem->filePendingRecord();
     });
+    drivePast("a report of the library that finds no memory", [this] {
+        setenv(gcStatusPageVariable, mDirectory.path("page").c_str(), 1);
+        bringUp();
+        setLogCode(255);
+        failAllocation(1, [this] { mSystem->getKindStates().reportState(0, 1, 1, KPM_STATE_WORKING, ""); });
+    });
     drivePast("events that find no memory", [this] {
         collect();
         setLogCode(255);

@@ -32,7 +32,7 @@ const std::vector<ZTSFunction>& sAgentFunctions() {
         const std::filesystem::path lRoot(TAVIK_SOURCE_ROOT);
         for (const auto& lcrEntry : std::filesystem::recursive_directory_iterator(lRoot / "tavik")) {
             const std::string lExtension = lcrEntry.path().extension().string();
-            if ((lExtension == ".cpp" || lExtension == ".h") && lcrEntry.path().stem() != "TavikCore") {
+            if ((lExtension == ".cpp" || lExtension == ".h")) {
                 for (const ZTSFunction& lcrFunction : readFunctions(readFile(lcrEntry.path().string()))) {
                     lpFunctions->push_back(
                         {lcrEntry.path().filename().string() + ' ' + lcrFunction.mName, lcrFunction.mBody});

@@ -227,7 +227,12 @@ TEST_F(EventAdmission, EveryCallbackTracesItsCall) {
           "-T- Invoking RSCN callback with boardId: 6"}) {
         EXPECT_TRUE(mLog.has(lpText)) << lpText;
     }
-    EXPECT_EQ(4u, mLog.count("-T- Left"));
+    EXPECT_EQ(mLog.count("-T- Entered"), mLog.count("-T- Left"));
+    unsigned lCallbacksLeft = 0;
+    for (const ZTSLogLine& lcrLine : mLog.lines()) {
+        lCallbacksLeft += lcrLine.mText == "Left" && lcrLine.mFunction.starts_with("ScopeCb_") ? 1 : 0;
+    }
+    EXPECT_EQ(4u, lCallbacksLeft);
 }
 
 TEST_F(EventAdmission, NoFailureLeavesACallbackAndEachIsReported) {

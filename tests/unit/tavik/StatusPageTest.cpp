@@ -1,0 +1,392 @@
+#include <gtest/gtest.h>
+#include <sys/resource.h>
+#include <sys/stat.h>
+#include <unistd.h>
+
+#include <csignal>
+#include <optional>
+#include <set>
+
+#include "common/include/Log.h"
+#include "libkpm/include/ScopeEventKinds.h"
+#include "tavik/include/TavikCore.h"
+#include "tests/support/FailingAllocation.h"
+#include "tests/unit/agentcommon/support/BufferBytes.h"
+#include "tests/unit/system/ForkedProcess.h"
+#include "tests/unit/tavik/support/DeliveredKinds.h"
+#include "tests/unit/tavik/support/Deliveries.h"
+#include "tests/unit/tavik/support/StatusPageFixture.h"
+
+namespace {
+
+class StatusPage : public ZTCStatusPageFixture {
+protected:
+    /// Expects that the event is counted once, in this row, with this outcome; with no reason it is consolidated.
+    template <typename TDeliver>
+    void expectOutcome(const std::string& acrKind, std::uint64_t aEvents, std::optional<ZTEStatusRefusal> aReason,
+                       TDeliver aDeliver) {
+        const ZTSStatusSnapshot lBefore = page();
+        aDeliver();
+        const ZTSStatusSnapshot lAfter = page();
+        expectEquations(lAfter);
+        for (std::size_t lBoard = 0; lBoard < lAfter.mBoards.size(); ++lBoard) {
+            for (std::size_t lRow = 0; lRow < gcStatusRowsPerBoard; ++lRow) {
+                const bool lIsIt = lBoard == 0 && acrKind == getStatusRowName(lRow);
+                SCOPED_TRACE(getStatusRowName(lRow));
+                expectAdded(lBefore.mBoards[lBoard].mRows[lRow], lAfter.mBoards[lBoard].mRows[lRow],
+                            lIsIt ? aEvents : 0, aReason);
+            }
+        }
+        expectAdded(lBefore.mUnknownBoards, lAfter.mUnknownBoards, acrKind == "unknown" ? aEvents : 0, aReason);
+    }
+
+    static void expectAdded(const ZTSStatusRowCopy& acrBefore, const ZTSStatusRowCopy& acrAfter, std::uint64_t aEvents,
+                            std::optional<ZTEStatusRefusal> aReason) {
+        EXPECT_EQ(acrAfter.mConsolidated, acrBefore.mConsolidated + (aReason ? 0 : aEvents));
+        for (std::size_t lReason = 0; lReason < gcStatusRefusals; ++lReason) {
+            EXPECT_EQ(acrAfter.mRefused[lReason], acrBefore.mRefused[lReason] + (aReason == lReason ? aEvents : 0))
+                << gcStatusRefusalNames[lReason];
+        }
+    }
+};
+
+std::string sRowNameOf(const ZTSDeliveredKind& acrKind) {
+    return findDeliveredKind(static_cast<std::uint8_t>(acrKind.mCategory),
+                             static_cast<std::uint8_t>(acrKind.mSubcategory))
+        ->mpName;
+}
+
+constexpr std::nullopt_t scConsolidated = std::nullopt;
+
+}  // namespace
+
+TEST_F(StatusPage, WithoutTheVariableThereIsNone) {
+    unsetenv(gcStatusPageVariable);
+    collect();
+    deliverTemperature(0);
+    EXPECT_FALSE(mSystem->getStatusPage().isOpen());
+    EXPECT_FALSE(exists(pagePath()));
+    EXPECT_EQ(1u, retrieveTexts().size());
+}
+
+TEST_F(StatusPage, AnEmptyVariableIsNone) {
+    setenv(gcStatusPageVariable, "", 1);
+    bringUp();
+    EXPECT_FALSE(mSystem->getStatusPage().isOpen());
+}
+
+TEST_F(StatusPage, IsAPrivateFileWhateverTheUmask) {
+    const mode_t lMask = umask(0777);
+    // As a killed start leaves it.
+    writeFile(pagePath(), "of another start");
+    writeFile(pagePath() + ".new", "of a start that was killed");
+    umask(0277);
+    mSystem->getStatusPage().open(pagePath().c_str(), 1);
+    umask(lMask);
+    struct stat lStatus {};
+    ASSERT_EQ(0, stat(pagePath().c_str(), &lStatus));
+    EXPECT_EQ(0600u, lStatus.st_mode & 07777);
+    EXPECT_FALSE(exists(pagePath() + ".new"));
+}
+
+TEST_F(StatusPage, NamesTheAgentAndItsBoards) {
+    bringUp(3);
+    const ZTSStatusSnapshot lPage = page();
+    EXPECT_EQ(static_cast<std::uint32_t>(getpid()), lPage.mPid);
+    EXPECT_EQ(32u, lPage.mStartId.size());
+    EXPECT_LT(0, lPage.mStartTime);
+    EXPECT_EQ(ZTSE_Running, lPage.mEndReason);
+    EXPECT_EQ(3u, lPage.mAdaptersAtStart);
+    EXPECT_EQ(3u, lPage.mAdaptersNow);
+    EXPECT_EQ(gcMaxScopeDataSize, lPage.mTotalLimit);
+    ASSERT_EQ(3u, lPage.mBoards.size());
+    for (unsigned lBoard = 0; lBoard < 3; ++lBoard) {
+        EXPECT_EQ(ZTCAdaptersLibraryDouble::nodeName(lBoard).mBytes, lPage.mBoards[lBoard].mWwnn);
+        EXPECT_EQ(ZTCAdaptersLibraryDouble::portName(lBoard).mBytes, lPage.mBoards[lBoard].mWwpn);
+    }
+}
+
+TEST_F(StatusPage, EveryStartHasAnIdOfItsOwn) {
+    std::set<std::string> lIds;
+    for (int lStart = 0; lStart < 20; ++lStart) {
+        ZTCStatusPageWriter lWriter;
+        lWriter.open(pagePath().c_str(), 1);
+        ZTCStatusPageReader lReader;
+        ZTSStatusSnapshot lPage;
+        ASSERT_TRUE(lReader.open(pagePath()) && lReader.read(lPage)) << lReader.getReason();
+        EXPECT_TRUE(lIds.insert(lPage.mStartId).second) << lPage.mStartId;
+    }
+}
+
+TEST_F(StatusPage, WithAPlaceThatTakesNoFileTheAgentWorksWithoutOne) {
+    setenv(gcStatusPageVariable, mDirectory.path("nowhere/page").c_str(), 1);
+    collect();
+    EXPECT_FALSE(mSystem->getStatusPage().isOpen());
+    deliverTemperature(0);
+    EXPECT_EQ(1u, retrieveTexts().size());
+}
+
+TEST_F(StatusPage, AFileSystemThatIsFullLeavesNoPageBehind) {
+    ZTCForkedProcess lChild(
+        [&](ZTCForkedProcess&) {
+            signal(SIGXFSZ, SIG_IGN);
+            const rlimit lLimit{1000, 1000};
+            setrlimit(RLIMIT_FSIZE, &lLimit);
+            ZTCStatusPageWriter lWriter;
+            EXPECT_THROW(lWriter.open(pagePath().c_str(), 1), ZTCClibEx);
+            return lWriter.isOpen() || exists(pagePath()) || exists(pagePath() + ".new") ? 1 : 0;
+        },
+        mDirectory.path("child"));
+    EXPECT_EQ(0, lChild.waitForExit());
+}
+
+TEST_F(StatusPage, APageThatCannotGrowCountsAsOfUnknownBoardsAndHoldsItsEquations) {
+    ZTCForkedProcess lChild(
+        [&](ZTCForkedProcess&) {
+            setLogCode(0);
+            signal(SIGXFSZ, SIG_IGN);
+            const rlimit lLimit{4096, 4096};
+            setrlimit(RLIMIT_FSIZE, &lLimit);
+            collect(2);
+            deliverTemperature(0);
+            deliverTemperature(1);
+            EXPECT_EQ(2u, page().getHeld());
+            retrieve();
+            deliverTemperature(0);
+            const ZTSStatusSnapshot lPage = page();
+            expectEquations(lPage);
+            EXPECT_TRUE(lPage.mBoards.empty());
+            EXPECT_EQ(2u, lPage.mAdaptersAtStart);
+            EXPECT_EQ(3u, lPage.mUnknownBoards.mConsolidated);
+            EXPECT_EQ(2u, lPage.mUnknownBoards.mHandedOver);
+            return HasFailure() ? 1 : 0;
+        },
+        mDirectory.path("child"));
+    EXPECT_EQ(0, lChild.waitForExit()) << readFile(mDirectory.path("child.err"));
+}
+
+TEST_F(StatusPage, WhatIsConsolidatedIsCountedOnceByKind) {
+    collect(2);
+    for (const ZTSDeliveredKind& lcrKind : allKinds()) {
+        SCOPED_TRACE(lcrKind.mpName);
+        const std::string lName = sRowNameOf(lcrKind);
+        const auto lDeliver = [&] { deliverScope(0, lcrKind.mCategory, lcrKind.mSubcategory, lcrKind.mPayload); };
+        expectOutcome(lName, 1, scConsolidated, lDeliver);
+        expectOutcome(lName, 1, scConsolidated, lDeliver);
+    }
+    expectOutcome("temperature", 1, scConsolidated, [] { deliverTemperature(0); });
+    expectOutcome("link", 1, scConsolidated, [] { deliverLink(0, makeWwn(1)); });
+    expectOutcome("rscn", 3, scConsolidated, [] { deliverRscn(0, makeRscn({1, 1, 2})); });
+}
+
+TEST_F(StatusPage, CategoryAndSubcategoryCountByTheirLowBytesAsTheyAreProcessed) {
+    collect();
+    expectOutcome("bus-reset", 1, scConsolidated, [] { deliverScope(0, 0x104, 0x220, {}); });
+}
+
+TEST_F(StatusPage, ATooShortEventIsCountedOnceByKind) {
+    collect();
+    for (const ZTSDeliveredKind& lcrKind : kindsWithData()) {
+        SCOPED_TRACE(lcrKind.mpName);
+        const std::string lName = sRowNameOf(lcrKind);
+        expectOutcome(lName, 1, ZTSR_TooShort, [&] {
+            deliverScope(0, lcrKind.mCategory, lcrKind.mSubcategory, ZTCBytes(lcrKind.mMinimumLength - 1, 0));
+        });
+    }
+}
+
+TEST_F(StatusPage, AnRscnWithoutAPageCountsOnceAsTooShort) {
+    collect();
+    expectOutcome("rscn", 1, ZTSR_TooShort, [] { deliverRscn(0, ZTCBytes(7, 0)); });
+    expectOutcome("rscn", 1, ZTSR_TooShort, [] { deliverRscn(0, {}, 65535); });
+    expectOutcome("rscn", 1, ZTSR_TooShort, [] { deliverRscn(0, makeRscn({7}, 0)); });
+    expectOutcome("rscn", 1, ZTSR_TooShort, [] { deliverRscn(0, makeRscn({7}, 4)); });
+    expectOutcome("rscn", 1, ZTSR_TooShort, [] { deliverRscn(0, makeRscn({7}, 7)); });
+}
+
+TEST_F(StatusPage, APairOutsideOfTheKindsIsCountedInTheOtherRow) {
+    collect();
+    for (const unsigned lCategory : {1u, 2u, 4u, 8u, 16u, 32u, 0u, 3u}) {
+        SCOPED_TRACE(lCategory);
+        expectOutcome("other", 1, ZTSR_UnknownKind, [&] { deliverScope(0, lCategory, 0x80, ZTCBytes(64, 0)); });
+    }
+}
+
+TEST_F(StatusPage, AnEventIsRefusedOnceWhileCollectionIsOff) {
+    bringUp();
+    expectOutcome("temperature", 1, ZTSR_CollectionOff, [] { deliverTemperature(0); });
+    expectOutcome("link", 1, ZTSR_CollectionOff, [] { deliverLink(0, makeWwn(1)); });
+    expectOutcome("queue-full", 1, ZTSR_CollectionOff, [] { deliverScope(0, 4, 1, ZTCBytes(16, 0)); });
+    expectOutcome("other", 1, ZTSR_CollectionOff, [] { deliverScope(0, 4, 0x80, {}); });
+    expectOutcome("rscn", 1, ZTSR_CollectionOff, [] { deliverRscn(0, makeRscn({1, 2, 3})); });
+    expectOutcome("unknown", 1, ZTSR_CollectionOff, [] { deliverTemperature(1); });
+}
+
+TEST_F(StatusPage, AnEventIsRefusedOnceForTheTotalLimit) {
+    collect();
+    mSystem->makePendingRecord(0, gcMaxScopeDataSize);
+    expectOutcome("temperature", 1, ZTSR_TotalLimit, [] { deliverTemperature(0); });
+    expectOutcome("rscn", 1, ZTSR_TotalLimit, [] { deliverRscn(0, makeRscn({1, 2, 3})); });
+    EXPECT_EQ(gcMaxScopeDataSize, page().mHeldBytes);
+    retrieve();
+    expectOutcome("temperature", 1, scConsolidated, [] { deliverTemperature(0); });
+}
+
+TEST_F(StatusPage, EventsOfUnknownBoardsShareARow) {
+    collect();
+    for (const unsigned lBoard : {1u, 2u, 0xFFFFFFFFu}) {
+        expectOutcome("unknown", 1, ZTSR_UnknownBoard, [&] { deliverTemperature(lBoard); });
+        expectOutcome("unknown", 1, ZTSR_UnknownBoard, [&] { deliverRscn(lBoard, makeRscn({1, 2})); });
+    }
+}
+
+TEST_F(StatusPage, ABoardThatHasLeftHasNoList) {
+    collect();
+    mSystem->exchangeRecordLists(0);
+    expectOutcome("temperature", 1, ZTSR_NoList, [] { deliverTemperature(0); });
+    expectOutcome("other", 1, ZTSR_NoList, [] { deliverScope(0, 4, 0x80, {}); });
+    expectOutcome("rscn", 1, ZTSR_NoList, [] { deliverRscn(0, makeRscn({1, 2, 3})); });
+}
+
+TEST_F(StatusPage, AnEventThatFindsNoMemoryFailsAndTheNextOneCounts) {
+    collect();
+    deliverTemperature(0);
+    retrieve();
+    expectOutcome("temperature", 1, ZTSR_Failed,
+                  [] { ASSERT_TRUE(failAllocation(1, [] { ScopeCb_KpmTemp(0, 1, 2); })); });
+    expectOutcome("temperature", 1, scConsolidated, [] { deliverTemperature(0); });
+}
+
+TEST_F(StatusPage, ThePagesBehindOneThatFindsNoMemoryFailWithIt) {
+    collect();
+    setLogCode(0);
+    deliverRscn(0, makeRscn({1}));
+    const ZTCBytes lPayload = makeRscn({2, 3, 4, 5});
+    const std::uint64_t lBefore = row(0, "rscn").mConsolidated;
+    std::uint64_t lDelivered = 0;
+    std::set<std::uint64_t> lConsolidated;
+    const unsigned lFailures = failEachAllocation(
+        [&] {
+            ++lDelivered;
+            ScopeCb_KpmRscn(0, const_cast<unsigned char*>(lPayload.data()), static_cast<unsigned>(lPayload.size()));
+        },
+        [&] {
+            const ZTSStatusRowCopy lRow = row(0, "rscn");
+            EXPECT_EQ(4 * lDelivered, lRow.mConsolidated - lBefore + lRow.mRefused[ZTSR_Failed]);
+            lConsolidated.insert((lRow.mConsolidated - lBefore) % 4);
+        });
+    EXPECT_LE(4u, lFailures) << "each page allocates";
+    EXPECT_LT(1u, lConsolidated.size()) << "some failures came after the first page";
+}
+
+TEST_F(StatusPage, ARetrievalHandsOverAllThatIsHeld) {
+    collect(2);
+    deliverTemperature(0);
+    deliverTemperature(0);
+    deliverRscn(1, makeRscn({1, 2}));
+    ZTSStatusSnapshot lPage = page();
+    EXPECT_EQ(2u, rowNamed(lPage.mBoards[0], "temperature").getHeld());
+    EXPECT_EQ(2u, rowNamed(lPage.mBoards[1], "rscn").getHeld());
+    EXPECT_EQ(3u, lPage.mHeldRecords);
+    EXPECT_EQ(4u + 8 + 8, lPage.mHeldBytes);
+    EXPECT_EQ(0u, lPage.mRetrievals);
+    EXPECT_EQ(0, lPage.mLastRetrieval);
+
+    retrieve();
+
+    lPage = page();
+    expectEquations(lPage);
+    EXPECT_EQ(2u, rowNamed(lPage.mBoards[0], "temperature").mHandedOver);
+    EXPECT_EQ(0u, lPage.getHeld());
+    EXPECT_EQ(0u, lPage.mHeldRecords);
+    EXPECT_EQ(0u, lPage.mHeldBytes);
+    EXPECT_EQ(1u, lPage.mRetrievals);
+    EXPECT_EQ(3u, lPage.mHandedOverRecords);
+    EXPECT_EQ(4u, lPage.mHandedOverOccurrences);
+    EXPECT_EQ(20u, lPage.mHandedOverBytes);
+    EXPECT_LE(lPage.mStartTime, lPage.mLastRetrieval);
+}
+
+TEST_F(StatusPage, ARetrievalThatFailsBeforeTheSwapHandsNothingOver) {
+    collect();
+    deliverTemperature(0);
+    mLibrary.mBeforeCounted = [] { throw ZTCNoMemoryEx(); };
+    EXPECT_THROW(retrieve(), ZTCNoMemoryEx);
+    const ZTSStatusSnapshot lPage = page();
+    expectEquations(lPage);
+    EXPECT_EQ(1u, lPage.getHeld());
+    EXPECT_EQ(0u, lPage.mRetrievals);
+}
+
+TEST_F(StatusPage, ARetrievalThatFailsAfterTheSwapHasHandedOver) {
+    collect();
+    setLogCode(0);
+    bool lHasFailedAfter = false;
+    for (unsigned lNth = 1; !lHasFailedAfter && lNth < 100; ++lNth) {
+        deliverTemperature(0);
+        const std::uint64_t lRetrievals = page().mRetrievals;
+        bool lHasThrown = false;
+        const ZTCPointer<ZTCBuffer> lRequest = makeBuffer(ZTCBytes{1});
+        mLibrary.mNotesCounting = false;
+        failAllocation(lNth, [&] {
+            ZTCPointer<ZTCBuffer> lResponse;
+            try {
+                mSystem->getProtocolHandler()->handleGetScopeDataCommand(lRequest, lResponse);
+            } catch (const ZTCException&) {
+                lHasThrown = true;
+            }
+        });
+        const ZTSStatusSnapshot lPage = page();
+        expectEquations(lPage);
+        lHasFailedAfter = lHasThrown && lPage.mRetrievals > lRetrievals;
+        EXPECT_EQ(lPage.mRetrievals > lRetrievals, lPage.getHeld() == 0);
+    }
+    EXPECT_TRUE(lHasFailedAfter);
+}
+
+TEST_F(StatusPage, ARecordThatIsDroppedWhenItIsFiledIsALoss) {
+    collect(2);
+    deliverTemperature(1);
+    deliverTemperature(1);
+    deliverTemperature(1);
+    mSystem->exchangeRecordLists(1);
+    deliverTemperature(0);
+    const ZTSStatusSnapshot lPage = page();
+    expectEquations(lPage);
+    EXPECT_EQ(3u, rowNamed(lPage.mBoards[1], "temperature").mDropped);
+    EXPECT_EQ(0u, rowNamed(lPage.mBoards[1], "temperature").getHeld());
+    EXPECT_EQ(1u, lPage.mHeldRecords);
+}
+
+TEST_F(StatusPage, TheTimeOfTheLastEventIsThatOfItsOutcomeWhateverItIs) {
+    collect();
+    deliverTemperature(0);
+    const std::int64_t lFirst = row(0, "temperature").mLastEvent;
+    EXPECT_LE(page().mStartTime, lFirst);
+    requestHex("02");
+    deliverTemperature(0);
+    EXPECT_LE(lFirst, row(0, "temperature").mLastEvent);
+    deliverLink(0, makeWwn(1));
+    EXPECT_LT(0, row(0, "link").mLastEvent);
+}
+
+TEST_F(StatusPage, ShowsTheAdaptersOfTheLastLook) {
+    collect(2);
+    mLibrary.mNumberOfAdapters = 3;
+    mSystem->showAdapters();
+    EXPECT_EQ(3u, page().mAdaptersNow);
+    mLibrary.mNumberOfAdapters = 1;
+    retrieve();
+    EXPECT_EQ(1u, page().mAdaptersNow);
+    EXPECT_EQ(2u, page().mAdaptersAtStart);
+}
+
+TEST_F(StatusPage, ShowsTheLimitsAndWhetherItCollects) {
+    bringUp();
+    EXPECT_FALSE(page().mIsCollecting);
+    startScope(900);
+    EXPECT_TRUE(page().mIsCollecting);
+    EXPECT_EQ(900u, page().mRecordLimit);
+    requestHex("02");
+    EXPECT_FALSE(page().mIsCollecting);
+}
