@@ -4,20 +4,27 @@
 
 #include "sensor/client/src/WireBytes.h"
 
+template <std::unsigned_integral T>
+static T sNumber(const std::uint8_t* apBytes) {
+    std::uint64_t lValue = 0;
+    for (std::size_t i = 0; i < sizeof(T); ++i) {
+        lValue = lValue << 8 | apBytes[i];
+    }
+    return static_cast<T>(lValue);
+}
+
 static ZTSReceivedTime sReadTime(ZTCWireReader& arReader, const char* apWhat) {
-    ZTCWireReader lFields(arReader.readBytes(20, apWhat));
-    ZTSReceivedTime lTime;
-    lTime.mYear = lFields.readNumber<std::uint16_t>(apWhat);
-    lTime.mMonth = lFields.readNumber<std::uint8_t>(apWhat);
-    lTime.mDay = lFields.readNumber<std::uint8_t>(apWhat);
-    lTime.mHour = lFields.readNumber<std::uint8_t>(apWhat);
-    lTime.mMinute = lFields.readNumber<std::uint8_t>(apWhat);
-    lTime.mSecond = lFields.readNumber<std::uint8_t>(apWhat);
-    lTime.mSeparator = lFields.readNumber<std::uint8_t>(apWhat);
-    lTime.mMilliseconds = lFields.readNumber<std::uint16_t>(apWhat);
-    lTime.mMicroseconds = lFields.readNumber<std::uint16_t>(apWhat);
-    lTime.mEpochSeconds = lFields.readNumber<std::uint64_t>(apWhat);
-    return lTime;
+    const std::uint8_t* const lpBytes = arReader.readBytes(20, apWhat).data();
+    return {.mYear = sNumber<std::uint16_t>(lpBytes),
+            .mMonth = lpBytes[2],
+            .mDay = lpBytes[3],
+            .mHour = lpBytes[4],
+            .mMinute = lpBytes[5],
+            .mSecond = lpBytes[6],
+            .mSeparator = lpBytes[7],
+            .mMilliseconds = sNumber<std::uint16_t>(lpBytes + 8),
+            .mMicroseconds = sNumber<std::uint16_t>(lpBytes + 10),
+            .mEpochSeconds = sNumber<std::uint64_t>(lpBytes + 12)};
 }
 
 static ZTSFcName sReadName(ZTCWireReader& arReader, const char* apWhat) {

@@ -31,9 +31,7 @@ public:
 
     std::span<const std::uint8_t> readBytes(std::size_t aCount, const char* apWhat) {
         if (remaining() < aCount) {
-            throw ZTCDecodeEx(mOffset, "response ends within a field: wanted " + std::string(apWhat) + " (" +
-                                           std::to_string(aCount) + " bytes) at offset " + std::to_string(mOffset) +
-                                           ", found " + std::to_string(remaining()) + " bytes");
+            fail(aCount, apWhat);
         }
         mOffset += aCount;
         return mBytes.subspan(mOffset - aCount, aCount);
@@ -49,6 +47,12 @@ public:
     }
 
 private:
+    [[noreturn]] void fail(std::size_t aCount, const char* apWhat) const {
+        throw ZTCDecodeEx(mOffset, "response ends within a field: wanted " + std::string(apWhat) + " (" +
+                                       std::to_string(aCount) + " bytes) at offset " + std::to_string(mOffset) +
+                                       ", found " + std::to_string(remaining()) + " bytes");
+    }
+
     std::span<const std::uint8_t> mBytes;
     std::size_t mOffset = 0;
 };

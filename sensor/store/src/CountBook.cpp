@@ -1,7 +1,7 @@
 #include "sensor/store/src/CountBook.h"
 
 #include <algorithm>
-#include <vector>
+#include <map>
 
 static constexpr const char* scAddMinute =
     "INSERT INTO minute(slot, initiator, kind, port, count, spread, last) VALUES (?, ?, ?, ?, ?, ?, ?) "
@@ -27,41 +27,52 @@ ZTCCountBook::ZTCCountBook(ZTCDatabase& arDatabase)
 
 void ZTCCountBook::clear() {
     mMinutes.clear();
-    mDays.clear();
-}
-
-void ZTCCountBook::addTo(Slots& arSlots, std::int64_t aLength, const ZTSCountKey& acrKey, std::int64_t aBegin,
-                         std::int64_t aEnd, std::uint64_t aOccurrences) {
-    const std::int64_t lSlot = getSlot(aEnd, aLength);
-    const auto [lPlace, lIsNew] = arSlots.try_emplace({.mSlot = lSlot, .mKey = acrKey});
-    Count& lrCount = lPlace->second;
-    lrCount.mCount += aOccurrences;
-    if (getSlot(aBegin, aLength) != lSlot) {
-        lrCount.mSpread += aOccurrences;
-    }
-    lrCount.mLast = lIsNew ? aEnd : std::max(lrCount.mLast, aEnd);
 }
 
 void ZTCCountBook::add(const ZTSCountKey& acrKey, std::int64_t aBegin, std::int64_t aEnd, std::uint64_t aOccurrences) {
-    addTo(mMinutes, gcMinuteMicroseconds, acrKey, aBegin, aEnd, aOccurrences);
-    addTo(mDays, gcDayMicroseconds, acrKey, aBegin, aEnd, aOccurrences);
+    const std::int64_t lMinute = getSlot(aEnd, gcMinuteMicroseconds);
+    const auto [lPlace, lIsNew] = mMinutes.try_emplace({.mSlot = lMinute, .mKey = acrKey});
+    Count& lrCount = lPlace->second;
+    lrCount.mCount += aOccurrences;
+    lrCount.mLast = lIsNew ? aEnd : std::max(lrCount.mLast, aEnd);
+    if (aBegin != aEnd && getSlot(aBegin, gcMinuteMicroseconds) != lMinute) {
+        lrCount.mSpread += aOccurrences;
+        if (getSlot(aBegin, gcDayMicroseconds) != getSlot(aEnd, gcDayMicroseconds)) {
+            lrCount.mDaySpread += aOccurrences;
+        }
+    }
 }
 
-void ZTCCountBook::flushSlots(Slots& arSlots, ZTCStatement& arStatement) {
-    std::vector<std::pair<SlotKey, Count>> lSorted(arSlots.begin(), arSlots.end());
-    std::ranges::sort(lSorted, {}, [](const auto& acrEntry) { return acrEntry.first; });
-    for (const auto& [lrKey, lrCount] : lSorted) {
+/// Minutes lie within days, so the days are sums of them. The minutes are sorted.
+ZTCCountBook::Sorted ZTCCountBook::makeDays(const Sorted& acrMinutes) {
+    std::map<SlotKey, Count> lDays;
+    for (const auto& [lrKey, lrCount] : acrMinutes) {
+        const std::int64_t lDay = getSlot(lrKey.mSlot, gcDayMicroseconds / gcMinuteMicroseconds);
+        const auto [lPlace, lIsNew] = lDays.try_emplace({.mSlot = lDay, .mKey = lrKey.mKey});
+        Count& lrDay = lPlace->second;
+        lrDay.mCount += lrCount.mCount;
+        lrDay.mSpread += lrCount.mDaySpread;
+        lrDay.mLast = lIsNew ? lrCount.mLast : std::max(lrDay.mLast, lrCount.mLast);
+    }
+    return {lDays.begin(), lDays.end()};
+}
+
+void ZTCCountBook::write(const Sorted& acrSlots, ZTCStatement& arStatement) {
+    for (const auto& [lrKey, lrCount] : acrSlots) {
         arStatement.run(lrKey.mSlot, lrKey.mKey.mInitiator, lrKey.mKey.mKind, lrKey.mKey.mPort, lrCount.mCount,
                         lrCount.mSpread, lrCount.mLast);
     }
-    arSlots.clear();
 }
 
 void ZTCCountBook::flush() {
+    Sorted lMinutes(mMinutes.begin(), mMinutes.end());
+    std::ranges::sort(lMinutes, {}, [](const auto& acrEntry) { return acrEntry.first; });
+    const Sorted lDays = makeDays(lMinutes);
+    write(lMinutes, mAddMinute);
+    write(lDays, mAddDay);
     // Every record is in exactly one day, so the days hold what the totals grow by.
-    for (const auto& [lrKey, lrCount] : mDays) {
+    for (const auto& [lrKey, lrCount] : lDays) {
         mAddTotal.run(lrKey.mKey.mInitiator, lrKey.mKey.mKind, lrKey.mKey.mPort, lrCount.mCount, lrCount.mLast);
     }
-    flushSlots(mMinutes, mAddMinute);
-    flushSlots(mDays, mAddDay);
+    mMinutes.clear();
 }

@@ -5,6 +5,8 @@
 
 #include <cstdint>
 #include <unordered_map>
+#include <utility>
+#include <vector>
 
 #include "sensor/store/include/Episode.h"
 #include "sensor/store/src/Database.h"
@@ -48,17 +50,16 @@ private:
     };
     struct Count {
         std::uint64_t mCount = 0;
-        std::uint64_t mSpread = 0;
+        std::uint64_t mSpread = 0;     ///< of records that began before the slot
+        std::uint64_t mDaySpread = 0;  ///< of a minute: of records that began before its day
         std::int64_t mLast = 0;
     };
-    using Slots = std::unordered_map<SlotKey, Count, Hash>;
+    using Sorted = std::vector<std::pair<SlotKey, Count>>;
 
-    static void addTo(Slots& arSlots, std::int64_t aLength, const ZTSCountKey& acrKey, std::int64_t aBegin,
-                      std::int64_t aEnd, std::uint64_t aOccurrences);
-    static void flushSlots(Slots& arSlots, ZTCStatement& arStatement);
+    static Sorted makeDays(const Sorted& acrMinutes);
+    static void write(const Sorted& acrSlots, ZTCStatement& arStatement);
 
-    Slots mMinutes;
-    Slots mDays;
+    std::unordered_map<SlotKey, Count, Hash> mMinutes;
     ZTCStatement mAddMinute, mAddDay, mAddTotal;
 };
 

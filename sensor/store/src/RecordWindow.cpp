@@ -1,5 +1,11 @@
 #include "sensor/store/src/RecordWindow.h"
 
+#include <algorithm>
+#include <string>
+
+/// No record of an agent comes near this: its event data have a limit of their own.
+static constexpr std::uint64_t scMostRecordBytes = 64ULL * 1024 * 1024;
+
 void ZTCPendingRecords::add(std::uint64_t aSeq, std::span<const std::uint8_t> aRecord) {
     mEntries.push_back({.mSeq = aSeq, .mOffset = mBytes.size(), .mSize = aRecord.size()});
     mBytes.insert(mBytes.end(), aRecord.begin(), aRecord.end());
@@ -17,17 +23,79 @@ void ZTCPendingRecords::keepLast(std::size_t aCount) {
     }
 }
 
+/// Equal bytes that end a run of different ones: fewer cost no less when they are stored with it.
+static constexpr std::size_t scRunBreak = 3;
+
+/// Appends what differs. Both have the same size.
+static void sAppendDifferences(ZTCStoreBytes& arChunk, std::span<const std::uint8_t> aBefore,
+                               std::span<const std::uint8_t> aRecord) {
+    std::size_t lPlace = 0;
+    while (lPlace < aRecord.size()) {
+        const std::size_t lStart = lPlace;
+        while (lPlace < aRecord.size() && aRecord[lPlace] == aBefore[lPlace]) {
+            ++lPlace;
+        }
+        appendVarint(arChunk, lPlace - lStart);
+        if (lPlace == aRecord.size()) {
+            return;
+        }
+        std::size_t lEnd = lPlace + 1;
+        for (std::size_t i = lEnd; i < aRecord.size() && i < lEnd + scRunBreak; ++i) {
+            if (aRecord[i] != aBefore[i]) {
+                lEnd = i + 1;
+            }
+        }
+        appendVarint(arChunk, lEnd - lPlace);
+        arChunk.insert(arChunk.end(), aRecord.begin() + static_cast<std::ptrdiff_t>(lPlace),
+                       aRecord.begin() + static_cast<std::ptrdiff_t>(lEnd));
+        lPlace = lEnd;
+    }
+}
+
 ZTCStoreBytes ZTCPendingRecords::encode() const {
     ZTCStoreBytes lChunk;
-    lChunk.reserve(mBytes.size() + 2 * mEntries.size() + 10);
-    std::uint64_t lBefore = 0;
+    lChunk.reserve(mEntries.empty() ? 0 : 2 * mEntries.front().mSize + 16 * mEntries.size());
+    std::uint64_t lSeqBefore = 0;
+    ZTCStoreBytes lBefore;
     for (const Entry& lrEntry : mEntries) {
-        appendVarint(lChunk, lrEntry.mSeq - lBefore);
-        lBefore = lrEntry.mSeq;
-        const auto lStart = mBytes.begin() + static_cast<std::ptrdiff_t>(lrEntry.mOffset);
-        lChunk.insert(lChunk.end(), lStart, lStart + static_cast<std::ptrdiff_t>(lrEntry.mSize));
+        appendVarint(lChunk, lrEntry.mSeq - lSeqBefore);
+        appendVarint(lChunk, lrEntry.mSize);
+        lSeqBefore = lrEntry.mSeq;
+        lBefore.resize(lrEntry.mSize);
+        const auto lRecord = std::span(mBytes).subspan(lrEntry.mOffset, lrEntry.mSize);
+        sAppendDifferences(lChunk, lBefore, lRecord);
+        lBefore.assign(lRecord.begin(), lRecord.end());
     }
     return lChunk;
+}
+
+/// Takes a record's differences off the front and makes them to the record before.
+static void sTakeDifferences(std::span<const std::uint8_t>& arChunk, ZTCStoreBytes& arRecord) {
+    const std::uint64_t lSize = takeVarint(arChunk);
+    if (lSize > scMostRecordBytes) {
+        throw ZTCStoreDamagedEx("history: a stored record has " + std::to_string(lSize) + " bytes, wanted at most " +
+                                std::to_string(scMostRecordBytes));
+    }
+    arRecord.resize(static_cast<std::size_t>(lSize));
+    std::size_t lPlace = 0;
+    while (lPlace < arRecord.size()) {
+        const std::uint64_t lSame = takeVarint(arChunk);
+        if (lSame >= arRecord.size() - lPlace) {
+            if (lSame == arRecord.size() - lPlace) {
+                return;
+            }
+            throw ZTCStoreDamagedEx("history: a stored record repeats more bytes than it has");
+        }
+        lPlace += static_cast<std::size_t>(lSame);
+        const std::uint64_t lCount = takeVarint(arChunk);
+        if (lCount == 0 || lCount > arRecord.size() - lPlace || lCount > arChunk.size()) {
+            throw ZTCStoreDamagedEx("history: a stored record has a run of " + std::to_string(lCount) + " bytes");
+        }
+        const auto lRun = arChunk.first(static_cast<std::size_t>(lCount));
+        std::ranges::copy(lRun, arRecord.begin() + static_cast<std::ptrdiff_t>(lPlace));
+        arChunk = arChunk.subspan(lRun.size());
+        lPlace += lRun.size();
+    }
 }
 
 void ZTCPendingRecords::clear() {
@@ -38,12 +106,12 @@ void ZTCPendingRecords::clear() {
 void visitChunk(std::span<const std::uint8_t> aChunk,
                 const std::function<void(std::uint64_t aSeq, const ZTSRecordView& acrRecord)>& acrVisitor) {
     std::uint64_t lSeq = 0;
+    ZTCStoreBytes lRecord;
     try {
         while (!aChunk.empty()) {
             lSeq += takeVarint(aChunk);
-            const ZTSRecordView lRecord = readRecordView(aChunk);
-            acrVisitor(lSeq, lRecord);
-            aChunk = aChunk.subspan(lRecord.mBytes.size());
+            sTakeDifferences(aChunk, lRecord);
+            acrVisitor(lSeq, readRecordView(lRecord));
         }
     } catch (const ZTCDecodeEx& lrProblem) {
         throw ZTCStoreDamagedEx(std::string("history: a stored record cannot be read: ") + lrProblem.what());

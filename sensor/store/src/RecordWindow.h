@@ -1,8 +1,11 @@
 /// The raw records of an episode: its first and its last ones, as many as the limit says at each end.
 ///
-/// Records are stored in chunks, one row a transaction: the first record's number, then for each record the difference
-/// to the number before and its bytes as on the wire. Chunks that fall out at the back are deleted whole; readers cut
-/// what is left to the limit.
+/// Records are stored in chunks, one row a transaction. Like records differ in few bytes, so each is stored as what
+/// differs from the one before it in the chunk: the difference of its number to the number before; its size; then,
+/// until the size is reached, bytes that are the same (a count) and bytes that are not (a count and the bytes). Bytes
+/// behind the end of the record before count as 0. The record's bytes are those on the wire.
+///
+/// Chunks that fall out at the back are deleted whole; readers cut what is left to the limit.
 #ifndef SENSOR_STORE_SRC_RECORDWINDOW_H
 #define SENSOR_STORE_SRC_RECORDWINDOW_H
 
@@ -35,7 +38,8 @@ private:
     std::vector<Entry> mEntries;
 };
 
-/// Reads a chunk record by record. The view points into the chunk. Throws ZTCStoreDamagedEx where it is no chunk.
+/// Reads a chunk record by record. A view lives as long as the visitor's call. Throws ZTCStoreDamagedEx where it is no
+/// chunk.
 void visitChunk(std::span<const std::uint8_t> aChunk,
                 const std::function<void(std::uint64_t aSeq, const ZTSRecordView& acrRecord)>& acrVisitor);
 
