@@ -127,7 +127,8 @@ void ZTCLinuxEngine::waitForWork() {
     for (std::size_t lBuffer = 0; lBuffer < mOutcomes.getBufferCount(); ++lBuffer) {
         mPolls[scFirstBuffer + lBuffer] = {mOutcomes.getDescriptor(lBuffer), POLLIN, 0};
     }
-    const Clock::time_point lNext = std::min(mNextLook, mDepths.getNextTime().value_or(mNextLook));
+    const Clock::time_point lNext =
+        std::min({mNextLook, mDepths.getNextTime().value_or(mNextLook), mOutcomes.getNextTime().value_or(mNextLook)});
     const auto lLeft = std::chrono::duration_cast<std::chrono::milliseconds>(lNext - Clock::now()).count() + 1;
     const auto lTimeout = static_cast<int>(std::clamp<long long>(lLeft, 0, mOptions.mPollInterval.count() + 1));
     if (::poll(mPolls.data(), mPolls.size(), lTimeout) < 0 && errno != EINTR) {

@@ -1,6 +1,7 @@
 #include "libkpm/linux/src/EntryPoints.h"
 
 #include <cstdlib>
+#include <cstring>
 #include <exception>
 #include <memory>
 #include <string>
@@ -39,6 +40,7 @@ static ZTSLinuxOptions sOptions() {
     const char* lpSysfs = std::getenv("KPM_LINUX_SYSFS");
     if (lpSysfs != nullptr && *lpSysfs != '\0') {
         lOptions.mSysfsRoot = lpSysfs;
+        lOptions.mTracePlace.mSysfsRoot = lpSysfs;
     }
     const char* lpTracefs = std::getenv("KPM_LINUX_TRACEFS");
     if (lpTracefs != nullptr && *lpTracefs != '\0') {
@@ -47,6 +49,8 @@ static ZTSLinuxOptions sOptions() {
     if (const char* lpInstance = std::getenv("KPM_LINUX_INSTANCE"); lpInstance != nullptr) {
         lOptions.mTracePlace.mPrepared = lpInstance;
     }
+    const char* lpProbe = std::getenv("KPM_LINUX_PROBE");
+    lOptions.mTracePlace.mForcesProbe = lpProbe != nullptr && std::strcmp(lpProbe, "1") == 0;
     return lOptions;
 }
 

@@ -51,17 +51,33 @@ void ZTCLinuxOutcomeFeed::open() {
     mPage.resize(mpTrace->getPageLayout().mPageSize);
     mBuffers.assign(mpTrace->getBufferCount(), Buffer());
     mHostsVersion = mrWatcher.getVersion();
-    if (!mpTrace->getRecordLayout().hasSense()) {
-        mSenseProblem = "this kernel's trace has no sense data: check conditions come without them";
-        logLibraryLine(KPM_LOG_NOTICE, mSenseProblem);
-    }
+    openProbe();
     mPause.reset();
     happen(ZTFH_Opened);
 }
 
+/// Where the trace has no sense data, they come by a probe, if this host grants it.
+void ZTCLinuxOutcomeFeed::openProbe() {
+    if (mpTrace->getRecordLayout().hasSense() && !mPlace.mForcesProbe) {
+        return;
+    }
+    ZTSFeedProblem lProblem;
+    mpProbe = ZTCSenseProbe::open(mpTrace->getPath(), mPlace.mSysfsRoot, mrFiles, lProblem);
+    if (mpProbe != nullptr) {
+        mpProbe->watchHosts(mrWatcher.getHosts());
+        return;
+    }
+    mSenseProblem = "no sense data: this kernel's trace has none, and " + lProblem.mText;
+    logLibraryLine(KPM_LOG_WARNING, "check conditions come with " + mSenseProblem);
+}
+
 void ZTCLinuxOutcomeFeed::close() {
     mBuffers.clear();
+    if (mpProbe != nullptr) {
+        mpProbe->switchOff();
+    }
     mpTrace.reset();
+    mpProbe.reset();
     mSenseProblem.clear();
 }
 
@@ -87,6 +103,9 @@ void ZTCLinuxOutcomeFeed::followHosts() {
         case ZTTF_Set:
             if (!std::exchange(mFilterProblem, std::string()).empty()) {
                 logLibraryLine(KPM_LOG_NOTICE, "SCSI outcomes of all FC hosts are delivered again");
+            }
+            if (mpProbe != nullptr) {
+                mpProbe->watchHosts(mrWatcher.getHosts());
             }
             mHostsVersion = mrWatcher.getVersion();
             return;
@@ -115,6 +134,9 @@ void ZTCLinuxOutcomeFeed::serve() {
             readBuffer(lBuffer);
         }
     }
+    if (mpProbe != nullptr) {
+        deliverMatched(mMatcher.take(ZTCSenseMatcher::Clock::now()));
+    }
 }
 
 void ZTCLinuxOutcomeFeed::look() {
@@ -136,6 +158,7 @@ void ZTCLinuxOutcomeFeed::stop() {
                 readBuffer(lBuffer);
             } while (mBuffers[lBuffer].mState == ZTBS_Ready);
         }
+        deliverMatched(mMatcher.takeAll());
         readLosses();
     }
     happen(ZTFH_Stop);
@@ -168,7 +191,7 @@ bool ZTCLinuxOutcomeFeed::readPage(ZTCByteSpan aPage) {
     ZTCTracePage lPage(aPage, mpTrace->getPageLayout());
     while (const std::optional<ZTCByteSpan> lRecord = lPage.next()) {
         try {
-            readRecord(*lRecord);
+            readRecord(*lRecord, lPage.getTime());
         } catch (const std::exception&) {
             // Memory has run out over one outcome: the others of the page may fare better.
             mrLosses.count(ZTLO_Failure);
@@ -180,17 +203,39 @@ bool ZTCLinuxOutcomeFeed::readPage(ZTCByteSpan aPage) {
     return lPage.hasLossBefore();
 }
 
-void ZTCLinuxOutcomeFeed::readRecord(ZTCByteSpan aRecord) {
+void ZTCLinuxOutcomeFeed::readRecord(ZTCByteSpan aRecord, std::uint64_t aTime) {
     const ZTSScsiDoneLayout& lrLayout = mpTrace->getRecordLayout();
     const std::optional<std::uint32_t> lId = getTraceRecordId(aRecord, lrLayout);
+    if (mpProbe != nullptr && lId == mpProbe->getLayout().mId) {
+        if (const std::optional<ZTSSenseRecord> lSense = parseSenseRecord(aRecord, mpProbe->getLayout())) {
+            mMatcher.addSense(*lSense, aTime, ZTCSenseMatcher::Clock::now());
+        } else {
+            mrLosses.count(ZTLO_MalformedRecord);
+        }
+        return;
+    }
     if (lId && *lId != lrLayout.mId) {
         return;
     }
-    const std::optional<ZTSScsiOutcome> lOutcome = lId ? parseScsiOutcome(aRecord, lrLayout) : std::nullopt;
-    if (lOutcome) {
-        handle(*lOutcome);
-    } else {
+    std::optional<ZTSScsiOutcome> lOutcome = lId ? parseScsiOutcome(aRecord, lrLayout) : std::nullopt;
+    if (!lOutcome) {
         mrLosses.count(ZTLO_MalformedRecord);
+    } else if (mpProbe != nullptr && lOutcome->mStatus == ZTLSS_CheckCondition) {
+        // What the trace itself says, where it says it, does not count while the probe is in use.
+        lOutcome->mSenseKey = lOutcome->mAsc = lOutcome->mAscq = gcUnknownSense;
+        mMatcher.addOutcome(*lOutcome, aTime, ZTCSenseMatcher::Clock::now());
+    } else {
+        handle(*lOutcome);
+    }
+}
+
+void ZTCLinuxOutcomeFeed::deliverMatched(const std::vector<ZTSScsiOutcome>& acrOutcomes) {
+    for (const ZTSScsiOutcome& lrOutcome : acrOutcomes) {
+        try {
+            handle(lrOutcome);
+        } catch (const std::exception&) {
+            mrLosses.count(ZTLO_Failure);
+        }
     }
 }
 

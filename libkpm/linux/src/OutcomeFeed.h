@@ -5,9 +5,11 @@
 #ifndef LIBKPM_LINUX_SRC_OUTCOMEFEED_H
 #define LIBKPM_LINUX_SRC_OUTCOMEFEED_H
 
+#include <chrono>
 #include <cstddef>
 #include <cstdint>
 #include <memory>
+#include <optional>
 #include <string>
 #include <vector>
 
@@ -17,6 +19,8 @@
 #include "libkpm/linux/src/HostWatcher.h"
 #include "libkpm/linux/src/QueueDepths.h"
 #include "libkpm/linux/src/ScsiOutcome.h"
+#include "libkpm/linux/src/SenseMatcher.h"
+#include "libkpm/linux/src/SenseProbe.h"
 #include "libkpm/linux/src/TraceInstance.h"
 
 class ZTCLinuxOutcomeFeed {
@@ -46,6 +50,9 @@ public:
     /// The library is closing: recording ends, and what is left in the buffers is delivered.
     void stop();
 
+    /// When an outcome has waited long enough for its sense data; nothing where none waits.
+    std::optional<std::chrono::steady_clock::time_point> getNextTime() const { return mMatcher.getNextTime(); }
+
     const ZTCFeedState& getState() const { return mState; }
 
     /// Why check conditions come without sense data; empty where they have them, or nothing is open.
@@ -71,7 +78,9 @@ private:
     void followHosts();
     void readBuffer(std::size_t aBuffer);
     bool readPage(ZTCByteSpan aPage);
-    void readRecord(ZTCByteSpan aRecord);
+    void readRecord(ZTCByteSpan aRecord, std::uint64_t aTime);
+    void openProbe();
+    void deliverMatched(const std::vector<ZTSScsiOutcome>& acrOutcomes);
     void readLosses();
     void handle(const ZTSScsiOutcome& acrOutcome);
 
@@ -86,7 +95,9 @@ private:
     // Used by the library's thread alone.
     ZTCFeedState mState;
     ZTCRetryPause mPause;
+    std::unique_ptr<ZTCSenseProbe> mpProbe;     // where sense data come by it; closed after the instance
     std::unique_ptr<ZTCTraceInstance> mpTrace;  // set while the state is Working
+    ZTCSenseMatcher mMatcher;                   // check conditions that wait for their sense data
     std::vector<Buffer> mBuffers;
     std::uint64_t mHostsVersion = 0;  // of the hosts that the filter names; 0: to be set
     std::string mFilterProblem;       // as it was told last

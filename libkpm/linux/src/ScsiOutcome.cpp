@@ -2,8 +2,7 @@
 
 #include <cstddef>
 
-static std::optional<std::uint64_t> sLoad(ZTCByteSpan aRecord, const ZTSScsiDoneLayout::Place& acrPlace,
-                                          std::endian aOrder) {
+static std::optional<std::uint64_t> sLoad(ZTCByteSpan aRecord, const ZTSTraceFieldPlace& acrPlace, std::endian aOrder) {
     return loadUnsigned(aRecord, acrPlace.mOffset, acrPlace.mSize, aOrder);
 }
 
@@ -20,7 +19,7 @@ std::optional<ZTSScsiOutcome> parseScsiOutcome(ZTCByteSpan aRecord, const ZTSScs
                                                std::endian aOrder) {
     ZTSScsiOutcome lOutcome;
     bool lIsWhole = true;
-    const auto lRead = [&](const ZTSScsiDoneLayout::Place& acrPlace) {
+    const auto lRead = [&](const ZTSTraceFieldPlace& acrPlace) {
         const std::optional<std::uint64_t> lValue = sLoad(aRecord, acrPlace, aOrder);
         lIsWhole = lIsWhole && lValue.has_value();
         return static_cast<std::uint32_t>(lValue.value_or(0));
@@ -31,6 +30,10 @@ std::optional<ZTSScsiOutcome> parseScsiOutcome(ZTCByteSpan aRecord, const ZTSScs
     lOutcome.mLun = lRead(acrLayout.mLun);
     lOutcome.mStatus = static_cast<std::uint8_t>(lRead(acrLayout.mResult));
     lOutcome.mOpcode = static_cast<std::uint8_t>(lRead(acrLayout.mOpcode));
+    if (acrLayout.mDriverTag.mSize != 0 && acrLayout.mSchedulerTag.mSize != 0) {
+        lOutcome.mDriverTag = lRead(acrLayout.mDriverTag);
+        lOutcome.mSchedulerTag = lRead(acrLayout.mSchedulerTag);
+    }
     if (acrLayout.hasSense()) {
         lOutcome.mSenseKey = lRead(acrLayout.mSenseKey);
         lOutcome.mAsc = lRead(acrLayout.mAsc);
@@ -42,7 +45,7 @@ std::optional<ZTSScsiOutcome> parseScsiOutcome(ZTCByteSpan aRecord, const ZTSScs
     return lOutcome;
 }
 
-static std::string sHosts(const std::vector<std::uint32_t>& acrHosts) {
+std::string makeHostFilter(const std::string& acrField, const std::vector<std::uint32_t>& acrHosts) {
     std::string lText;
     for (std::size_t lFirst = 0; lFirst < acrHosts.size();) {
         std::size_t lLast = lFirst;
@@ -51,10 +54,10 @@ static std::string sHosts(const std::vector<std::uint32_t>& acrHosts) {
         }
         lText += lText.empty() ? "" : " || ";
         if (lLast == lFirst) {
-            lText += "host_no == " + std::to_string(acrHosts[lFirst]);
+            lText += acrField + " == " + std::to_string(acrHosts[lFirst]);
         } else {
-            lText += "(host_no >= " + std::to_string(acrHosts[lFirst]) +
-                     " && host_no <= " + std::to_string(acrHosts[lLast]) + ")";
+            lText += "(" + acrField + " >= " + std::to_string(acrHosts[lFirst]) + " && " + acrField +
+                     " <= " + std::to_string(acrHosts[lLast]) + ")";
         }
         lFirst = lLast + 1;
     }
@@ -68,6 +71,6 @@ std::string makeScsiFilter(const std::vector<std::uint32_t>& acrHosts) {
     if (acrHosts.empty()) {
         return spStatus;
     }
-    const std::string lFilter = std::string(spStatus) + " && (" + sHosts(acrHosts) + ")";
+    const std::string lFilter = std::string(spStatus) + " && (" + makeHostFilter("host_no", acrHosts) + ")";
     return lFilter.size() < gcScsiFilterLimit ? lFilter : spStatus;
 }

@@ -3,6 +3,7 @@
 #define LIBKPM_LINUX_SRC_SCSIOUTCOME_H
 
 #include <bit>
+#include <compare>
 #include <cstdint>
 #include <optional>
 #include <string>
@@ -17,13 +18,21 @@ enum ZTELinuxScsiStatus : std::uint8_t { ZTLSS_CheckCondition = 0x02, ZTLSS_Busy
 /// What a sense value is that the kernel does not tell.
 inline constexpr std::uint32_t gcUnknownSense = 0xFFFFFFFFu;
 
-struct ZTSScsiOutcome {
+/// What names a command among those that are under way. Tags that the kernel does not tell are 0.
+struct ZTSCommandName {
     std::uint32_t mHost = 0;
     std::uint32_t mChannel = 0;
     std::uint32_t mTarget = 0;
     std::uint32_t mLun = 0;
-    std::uint8_t mStatus = 0;
     std::uint8_t mOpcode = 0;
+    std::uint32_t mDriverTag = 0;
+    std::uint32_t mSchedulerTag = 0;
+
+    auto operator<=>(const ZTSCommandName&) const = default;
+};
+
+struct ZTSScsiOutcome : ZTSCommandName {
+    std::uint8_t mStatus = 0;
     std::uint32_t mSenseKey = gcUnknownSense;
     std::uint32_t mAsc = gcUnknownSense;
     std::uint32_t mAscq = gcUnknownSense;
@@ -41,6 +50,9 @@ std::optional<ZTSScsiOutcome> parseScsiOutcome(ZTCByteSpan aRecord, const ZTSScs
 /// has a bit of one of the three above. A few others pass, which the library drops. Runs of hosts are written as
 /// ranges; where the text would still be longer than the kernel takes, or there are no hosts, they are left out.
 std::string makeScsiFilter(const std::vector<std::uint32_t>& acrHosts);
+
+/// The part of a filter that passes these hosts, as the kernel writes them in a field of this name.
+std::string makeHostFilter(const std::string& acrField, const std::vector<std::uint32_t>& acrHosts);
 
 /// A filter this long or longer is refused by the kernel.
 inline constexpr std::size_t gcScsiFilterLimit = 4096;

@@ -112,26 +112,16 @@ std::variant<ZTSTracePageLayout, ZTSTraceProblem> makeTracePageLayout(const ZTST
                                std::to_string(lpCommit->mOffset) + " and data " + std::to_string(lpData->mSize) +
                                " bytes at " + std::to_string(lpData->mOffset) + ", which cannot be"};
     }
-    return ZTSTracePageLayout{lpCommit->mOffset, lpCommit->mSize, lpData->mOffset, lpData->mOffset + lpData->mSize};
+    ZTSTracePageLayout lLayout{lpCommit->mOffset, lpCommit->mSize, lpData->mOffset, lpData->mOffset + lpData->mSize};
+    if (const ZTSTraceField* lpTime = acrFormat.find("timestamp"); lpTime != nullptr && lpTime->mSize == 8) {
+        lLayout.mTime = {lpTime->mOffset, lpTime->mSize};
+    }
+    return lLayout;
 }
 
-std::variant<ZTSScsiDoneLayout, ZTSTraceProblem> makeScsiDoneLayout(const ZTSTraceFormat& acrFormat) {
-    ZTSScsiDoneLayout lLayout;
-    if (!acrFormat.mId) {
-        return ZTSTraceProblem{"the format has no ID"};
-    }
-    lLayout.mId = *acrFormat.mId;
-    struct Row {
-        const char* mpName;
-        ZTSScsiDoneLayout::Place* mpPlace;
-        bool mIsNeeded;
-    };
-    const Row lRows[] = {{"common_type", &lLayout.mType, true}, {"host_no", &lLayout.mHost, true},
-                         {"channel", &lLayout.mChannel, true},  {"id", &lLayout.mTarget, true},
-                         {"lun", &lLayout.mLun, true},          {"result", &lLayout.mResult, true},
-                         {"opcode", &lLayout.mOpcode, true},    {"sense_key", &lLayout.mSenseKey, false},
-                         {"asc", &lLayout.mAsc, false},         {"ascq", &lLayout.mAscq, false}};
-    for (const Row& lrRow : lRows) {
+std::optional<ZTSTraceProblem> fillTracePlaces(const ZTSTraceFormat& acrFormat,
+                                               std::span<const ZTSTraceFieldRow> aRows) {
+    for (const ZTSTraceFieldRow& lrRow : aRows) {
         const ZTSTraceField* lpField = acrFormat.find(lrRow.mpName);
         const bool lIsUsable = lpField != nullptr && sIsIntegerSize(lpField->mSize);
         if (lIsUsable) {
@@ -142,6 +132,30 @@ std::variant<ZTSScsiDoneLayout, ZTSTraceProblem> makeScsiDoneLayout(const ZTSTra
                                        : std::string("the format's field ") + lrRow.mpName + " has " +
                                              std::to_string(lpField->mSize) + " bytes, which is no integer's size"};
         }
+    }
+    return std::nullopt;
+}
+
+std::variant<ZTSScsiDoneLayout, ZTSTraceProblem> makeScsiDoneLayout(const ZTSTraceFormat& acrFormat) {
+    ZTSScsiDoneLayout lLayout;
+    if (!acrFormat.mId) {
+        return ZTSTraceProblem{"the format has no ID"};
+    }
+    lLayout.mId = *acrFormat.mId;
+    const ZTSTraceFieldRow lRows[] = {{"common_type", &lLayout.mType, true},
+                                      {"host_no", &lLayout.mHost, true},
+                                      {"channel", &lLayout.mChannel, true},
+                                      {"id", &lLayout.mTarget, true},
+                                      {"lun", &lLayout.mLun, true},
+                                      {"result", &lLayout.mResult, true},
+                                      {"opcode", &lLayout.mOpcode, true},
+                                      {"driver_tag", &lLayout.mDriverTag, false},
+                                      {"scheduler_tag", &lLayout.mSchedulerTag, false},
+                                      {"sense_key", &lLayout.mSenseKey, false},
+                                      {"asc", &lLayout.mAsc, false},
+                                      {"ascq", &lLayout.mAscq, false}};
+    if (std::optional<ZTSTraceProblem> lProblem = fillTracePlaces(acrFormat, lRows)) {
+        return std::move(*lProblem);
     }
     if (lLayout.mSenseKey.mSize == 0 || lLayout.mAsc.mSize == 0 || lLayout.mAscq.mSize == 0) {
         lLayout.mSenseKey = lLayout.mAsc = lLayout.mAscq = {};

@@ -6,6 +6,7 @@
 #include <cstddef>
 #include <cstdint>
 #include <optional>
+#include <span>
 #include <string>
 #include <string_view>
 #include <variant>
@@ -31,21 +32,24 @@ ZTSTraceFormat parseTraceFormat(std::string_view aText);
 /// No field of an event lies behind this, and no page is longer.
 inline constexpr std::size_t gcMostTraceOffset = std::size_t{1024} * 1024;
 
+/// Where a field is in a record. A size of 0 means that the kernel has no such field.
+struct ZTSTraceFieldPlace {
+    std::size_t mOffset = 0;
+    std::size_t mSize = 0;
+};
+
 /// How a page of the ring buffer begins.
 struct ZTSTracePageLayout {
     std::size_t mCommitOffset = 0;  ///< of the word with the length of the data
     std::size_t mCommitSize = 0;
     std::size_t mDataOffset = 0;
     std::size_t mPageSize = 0;
+    ZTSTraceFieldPlace mTime{};  ///< of the page; a size of 0: not told
 };
 
-/// Where the fields of a finished SCSI command stand in its record. A size of 0 means that the kernel has no such
-/// field.
+/// Where the fields of a finished SCSI command are in its record.
 struct ZTSScsiDoneLayout {
-    struct Place {
-        std::size_t mOffset = 0;
-        std::size_t mSize = 0;
-    };
+    using Place = ZTSTraceFieldPlace;
 
     std::uint32_t mId = 0;
     Place mType;
@@ -55,6 +59,8 @@ struct ZTSScsiDoneLayout {
     Place mLun;
     Place mResult;
     Place mOpcode;
+    Place mDriverTag;
+    Place mSchedulerTag;
     Place mSenseKey;
     Place mAsc;
     Place mAscq;
@@ -67,6 +73,17 @@ struct ZTSScsiDoneLayout {
 struct ZTSTraceProblem {
     std::string mText;
 };
+
+/// A field that a layout takes from a description.
+struct ZTSTraceFieldRow {
+    const char* mpName;
+    ZTSTraceFieldPlace* mpPlace;
+    bool mIsNeeded;
+};
+
+/// Fills in the places of integers. The problem of the first field that is needed and cannot be used.
+std::optional<ZTSTraceProblem> fillTracePlaces(const ZTSTraceFormat& acrFormat,
+                                               std::span<const ZTSTraceFieldRow> aRows);
 
 std::variant<ZTSTracePageLayout, ZTSTraceProblem> makeTracePageLayout(const ZTSTraceFormat& acrFormat);
 std::variant<ZTSScsiDoneLayout, ZTSTraceProblem> makeScsiDoneLayout(const ZTSTraceFormat& acrFormat);

@@ -16,6 +16,7 @@
 #include "libkpm/linux/src/ExitSwitch.h"
 #include "libkpm/linux/src/InstanceName.h"
 #include "libkpm/linux/src/ScsiOutcome.h"
+#include "libkpm/linux/src/SenseProbe.h"
 #include "libkpm/linux/src/Sysfs.h"
 
 static const char* const scDoneEvent = "events/scsi/scsi_dispatch_cmd_done";
@@ -89,6 +90,7 @@ std::unique_ptr<ZTCTraceInstance> ZTCTraceInstance::open(const ZTSTracePlace& ac
             return nullptr;
         }
         sRemoveLeftOvers(*lInstances, arFiles);
+        removeLeftOverProbes(*lInstances + "/..", arFiles);
         lPath = *lInstances + "/" + makeTraceInstanceName();
     }
     // Before the directory is made: from then on, its owner removes it.
@@ -162,6 +164,8 @@ void ZTCTraceInstance::setBufferSizes() {
         logLibraryLine(KPM_LOG_WARNING,
                        "the size of the trace buffers stays as it is: " + std::string(std::strerror(lError)));
     }
+    // Records of one command may be in the buffers of two processors: their times must be of one clock.
+    mrFiles.write(mPath + "/trace_clock", "mono");
     // Some kernels store a written 0 as 1, which would leave a single record unread: see what is there.
     const std::string lPercent = mPath + "/buffer_percent";
     mWakesAtOnce = mrFiles.write(lPercent, "0") == 0 &&

@@ -28,6 +28,10 @@ struct ZTSTracePlace {
     std::vector<std::string> mRoots{"/sys/kernel/tracing", "/sys/kernel/debug/tracing"};
     /// The directory of an instance that was prepared for the library; empty: it makes its own.
     std::string mPrepared{};
+    /// Where /sys is: the kernel describes its types there.
+    std::string mSysfsRoot = "/sys";
+    /// Sense data come by the probe even where the trace has them; for tests.
+    bool mForcesProbe = false;
 };
 
 enum ZTETraceFilter : std::uint8_t {

@@ -1,6 +1,7 @@
 #include "libkpm/linux/src/TracePage.h"
 
 static constexpr std::uint64_t scLengthMask = (1u << 27) - 1;
+static constexpr std::uint64_t scTimeStampMask = (std::uint64_t{1} << 59) - 1;
 static constexpr std::uint64_t scMissedEvents = 1u << 31;
 static constexpr std::size_t scWord = 4;
 
@@ -19,6 +20,10 @@ ZTCTracePage::ZTCTracePage(ZTCByteSpan aPage, const ZTSTracePageLayout& acrLayou
         return;
     }
     mHasLossBefore = (*lCommit & scMissedEvents) != 0;
+    const std::optional<std::uint64_t> lTime =
+        loadUnsigned(aPage, acrLayout.mTime.mOffset, acrLayout.mTime.mSize, aOrder);
+    mHasTime = lTime.has_value();
+    mTime = lTime.value_or(0);
     mRest = aPage.subspan(acrLayout.mDataOffset, static_cast<std::size_t>(lLength));
 }
 
@@ -45,15 +50,18 @@ std::optional<ZTCByteSpan> ZTCTracePage::next() {
         const std::uint64_t lType = lIsBig ? *lHeader >> 27 : *lHeader & 31;
         const std::uint64_t lTime = lIsBig ? *lHeader & scLengthMask : *lHeader >> 5;
         if (lType == scTypeTimeExtend || lType == scTypeTimeStamp) {
+            const std::uint64_t lLong = loadUnsigned(mRest, scWord, scWord, mOrder).value_or(0) << 27 | lTime;
             if (!take(2 * scWord, 0)) {
                 return std::nullopt;
             }
+            mTime = lType == scTypeTimeExtend ? mTime + lLong : (mTime & ~scTimeStampMask) | lLong;
             continue;
         }
         if (lType == scTypePadding && lTime == 0) {
             mRest = {};
             return std::nullopt;
         }
+        mTime += lTime;
         if (lType != scTypeWithLengthWord && lType != scTypePadding) {
             return take(scWord, static_cast<std::size_t>(lType) * scWord);
         }

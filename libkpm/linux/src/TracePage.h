@@ -8,7 +8,10 @@
 ///     0         a length word follows, which counts itself and the data
 ///     1 to 28   four times as many bytes of data
 ///     29        padding; the rest of the page is empty where its time is 0, else a length word follows
-///     30, 31    a time, in one more word
+///     30        so much time has passed: the word's time, and one more word with the bits above those 27
+///     31        it is now that time, in the same two words; the highest 5 of 64 bits are as before
+///
+/// The time of a word is what has passed since the record before it, or since the page's own time stamp.
 #ifndef LIBKPM_LINUX_SRC_TRACEPAGE_H
 #define LIBKPM_LINUX_SRC_TRACEPAGE_H
 
@@ -28,6 +31,9 @@ public:
     /// The data of the next record; nothing when the page is at its end.
     std::optional<ZTCByteSpan> next();
 
+    /// When the last record was written, in nanoseconds of the instance's clock; 0 where pages do not tell.
+    std::uint64_t getTime() const { return mHasTime ? mTime : 0; }
+
     /// Whether the page did not parse to its end.
     bool isMalformed() const { return mIsMalformed; }
 
@@ -39,6 +45,8 @@ private:
 
     ZTCByteSpan mRest;
     std::endian mOrder;
+    bool mHasTime = false;
+    std::uint64_t mTime = 0;
     bool mIsMalformed = false;
     bool mHasLossBefore = false;
 };

@@ -24,15 +24,6 @@ TEST_F(LinuxEngine, OutcomesAreDeliveredWithTheirPortAndLun) {
               (ZTCTexts{"1 queue-full 55 11", "1 device-busy 55 12", "1 check-condition 55 13 2a 6 29 3"}));
 }
 
-TEST_F(LinuxEngine, WithoutSenseDataACheckConditionSaysThatTheyAreUnknown) {
-    mKernel.mFormat = doneFormat(false);
-    mKernel.addHost(0);
-    start();
-    mKernel.sendDone({.mResult = 2, .mHasSense = false});
-    EXPECT_EQ(mRecorder.waitFor(1), ZTCTexts{"0 check-condition 0 0 28 ffffffff ffffffff ffffffff"});
-    EXPECT_EQ(mLog.count("this kernel's trace has no sense data"), 1u);
-}
-
 TEST_F(LinuxEngine, OtherStatusesOtherHostsAndOtherTraceEventsAreNothing) {
     mKernel.addHost(0);
     start();

@@ -13,6 +13,7 @@
 #include <utility>
 
 #include "libkpm/common/include/AgentLink.h"
+#include "tests/unit/linux/BtfBytes.h"
 
 std::string portNameText(std::uint32_t aName) {
     char lText[32];
@@ -33,12 +34,14 @@ ZTCFakeKernel::ZTCFakeKernel() : mFcWake(::eventfd(0, EFD_CLOEXEC | EFD_NONBLOCK
         std::filesystem::create_directories(sysfs() + "/class/" + lpClass);
     }
     std::filesystem::create_directories(tracefs() + "/instances");
+    std::filesystem::create_directories(tracefs() + "/events");
+    writeFile(tracefs() + "/kprobe_events", "");
 }
 
 ZTCFakeKernel::~ZTCFakeKernel() = default;
 
 ZTSLinuxOptions ZTCFakeKernel::options() const {
-    return {sysfs(), {{tracefs()}, {}}, std::chrono::milliseconds(20)};
+    return {sysfs(), {{tracefs()}, {}, sysfs()}, std::chrono::milliseconds(20)};
 }
 
 // ---- sysfs ----
@@ -234,21 +237,75 @@ void ZTCFakeKernel::refuseWrites(const std::string& acrName, const std::string& 
     mRefusals.push_back({"/" + acrName, acrText, aError, aTimes});
 }
 
+/// The error number of a refusal that is meant for this; 0 where there is none.
+int ZTCFakeKernel::refuse(const std::string& acrPath, std::string_view aText) {
+    const std::lock_guard<std::mutex> lGuard(mLock);
+    for (Refusal& lrRefusal : mRefusals) {
+        const bool lIsMeant =
+            acrPath.ends_with(lrRefusal.mName) && aText.find(lrRefusal.mText) != std::string_view::npos;
+        if (lIsMeant && lrRefusal.mTimes != 0) {
+            --lrRefusal.mTimes;
+            return lrRefusal.mError;
+        }
+    }
+    return 0;
+}
+
 int ZTCFakeKernel::write(const std::string& acrPath, std::string_view aText) {
     const ZTCTestsOwn lOwn;
-    {
-        const std::lock_guard<std::mutex> lGuard(mLock);
-        for (Refusal& lrRefusal : mRefusals) {
-            const bool lIsMeant =
-                acrPath.ends_with(lrRefusal.mName) && aText.find(lrRefusal.mText) != std::string_view::npos;
-            if (lIsMeant && lrRefusal.mTimes != 0) {
-                --lrRefusal.mTimes;
-                return lrRefusal.mError;
-            }
-        }
+    if (const int lError = refuse(acrPath, aText); lError != 0) {
+        return lError;
     }
     const bool lIsPercent = !mStoredPercent.empty() && acrPath.ends_with("/buffer_percent");
     return ZTCTraceFiles::write(acrPath, lIsPercent ? mStoredPercent : aText);
+}
+
+// ---- Dynamic probes ----
+
+void ZTCFakeKernel::addProbe(const std::string& acrGroup) {
+    for (const std::string& lrRoot : {tracefs(), mInstance}) {
+        const std::string lEvent = lrRoot + "/events/" + acrGroup + "/check_sense";
+        std::filesystem::create_directories(lEvent);
+        writeFile(lEvent + "/format", mSenseFormat);
+        writeFile(lEvent + "/enable", "0");
+        writeFile(lEvent + "/filter", "none");
+    }
+}
+
+int ZTCFakeKernel::append(const std::string& acrPath, std::string_view aText) {
+    const ZTCTestsOwn lOwn;
+    if (const int lError = refuse(acrPath, aText); lError != 0) {
+        return lError;
+    }
+    if (const int lError = ZTCTraceFiles::append(acrPath, aText); lError != 0) {
+        return lError;
+    }
+    const std::string lText(aText);
+    const std::string lGroup = lText.substr(2, lText.find('/') - 2);
+    const std::string lRoot = tracefs() + "/events/" + lGroup;
+    if (lText.starts_with("p:")) {
+        if (std::filesystem::exists(lRoot)) {
+            return EEXIST;
+        }
+        addProbe(lGroup);
+        return 0;
+    }
+    const std::string lEnable = mInstance + "/events/" + lGroup + "/check_sense/enable";
+    if (std::filesystem::exists(lEnable) && readFile(lEnable) == "1") {
+        return EBUSY;
+    }
+    return std::filesystem::remove_all(lRoot) == 0 ? ENOENT : 0;
+}
+
+std::vector<std::string> ZTCFakeKernel::probes() const {
+    return listDirectory(tracefs() + "/events").value();
+}
+
+void ZTCFakeKernel::addTypes() {
+    const ZTSScsiBtf lBtf = scsiBtf();
+    std::filesystem::create_directories(sysfs() + "/kernel/btf");
+    writeFile(sysfs() + "/kernel/btf/vmlinux", std::string(lBtf.mKernel.begin(), lBtf.mKernel.end()));
+    writeFile(sysfs() + "/kernel/btf/scsi_mod", std::string(lBtf.mModule.begin(), lBtf.mModule.end()));
 }
 
 void ZTCFakeKernel::sendPage(const ZTCBytes& acrPage, unsigned aProcessor) {

@@ -79,12 +79,24 @@ public:
     /// As the kernel does, keeps an instance that has files open outside of this object.
     int remove(const std::string& acrPath) override;
     int write(const std::string& acrPath, std::string_view aText) override;
-    /// From now on, writing a text with this in it to a control file of this name fails with the error number, so many
-    /// times.
+    /// The list of dynamic probes: one that is on in an instance is kept.
+    int append(const std::string& acrPath, std::string_view aText) override;
+    /// From now on, writing or appending a text with this in it to a control file of this name fails with the error
+    /// number, so many times.
     void refuseWrites(const std::string& acrName, const std::string& acrText, int aError, unsigned aTimes = ~0u);
+
+    /// The groups of dynamic probes there are.
+    std::vector<std::string> probes() const;
+    /// The kernel's description of its types, with the SCSI structures.
+    void addTypes();
+    /// Adds the files of a dynamic probe to the root and to the instance.
+    void addProbe(const std::string& acrGroup);
 
     /// Writes a page to a processor's buffer.
     void sendPage(const ZTCBytes& acrPage, unsigned aProcessor = 0);
+    void sendSense(const ZTSSenseRecordBytes& acrRecord, unsigned aProcessor = 0) {
+        sendPage(ZTCPageBuilder().addShort(acrRecord.make()).make(), aProcessor);
+    }
     void sendDone(const ZTSDoneRecord& acrRecord, unsigned aProcessor = 0) {
         sendPage(ZTCPageBuilder().addShort(acrRecord.make()).make(), aProcessor);
     }
@@ -94,6 +106,7 @@ public:
 
     std::atomic<int> mMakeError{0};
     unsigned mProcessors = 2;
+    std::string mSenseFormat = senseFormat();
     std::string mFormat = doneFormat();
     std::string mHeaderPage = headerPage();
     bool mHasBufferPercent = true;
@@ -106,6 +119,7 @@ public:
 private:
     friend class ZTCFakeFcSource;
 
+    int refuse(const std::string& acrPath, std::string_view aText);
     bool isOpenElsewhere(const std::string& acrPath) const;
 
     struct Refusal {

@@ -80,7 +80,8 @@ ZTCBytes ZTSDoneRecord::make() const {
     putNumber(lBytes, mId, 2, mOrder);
     putNumber(lBytes, 0, 2, mOrder);
     putNumber(lBytes, 4711, 4, mOrder);
-    for (const std::uint32_t lNumber : {mHost, mChannel, mTarget, mLun, mResult, mOpcode, 10u, 314u, 79u, 1u, 0u, 0u}) {
+    for (const std::uint32_t lNumber :
+         {mHost, mChannel, mTarget, mLun, mResult, mOpcode, 10u, mDriverTag, mSchedulerTag, 1u, 0u, 0u}) {
         putNumber(lBytes, lNumber, 4, mOrder);
     }
     putNumber(lBytes, 10u << 16 | (mHasSense ? 63u : 60u), 4, mOrder);
@@ -89,6 +90,40 @@ ZTCBytes ZTSDoneRecord::make() const {
     }
     lBytes.insert(lBytes.end(), {0x28, 0, 0x0F, 0xFF, 0xFF, 0xFF, 0, 0, 1, 0});  // the command
     lBytes.resize((lBytes.size() + 3) / 4 * 4);
+    return lBytes;
+}
+
+std::string senseFormat() {
+    return "name: check_sense\n"
+           "ID: 1742\n"
+           "format:\n"
+           "\tfield:unsigned short common_type;\toffset:0;\tsize:2;\tsigned:0;\n"
+           "\tfield:unsigned long __probe_ip;\toffset:8;\tsize:8;\tsigned:0;\n"
+           "\tfield:u32 host;\toffset:16;\tsize:4;\tsigned:0;\n"
+           "\tfield:u32 channel;\toffset:20;\tsize:4;\tsigned:0;\n"
+           "\tfield:u32 id;\toffset:24;\tsize:4;\tsigned:0;\n"
+           "\tfield:u64 lun;\toffset:28;\tsize:8;\tsigned:0;\n"
+           "\tfield:u32 result;\toffset:36;\tsize:4;\tsigned:0;\n"
+           "\tfield:u8 opcode;\toffset:40;\tsize:1;\tsigned:0;\n"
+           "\tfield:s32 driver_tag;\toffset:41;\tsize:4;\tsigned:1;\n"
+           "\tfield:s32 scheduler_tag;\toffset:45;\tsize:4;\tsigned:1;\n"
+           "\tfield:u8 sense[20];\toffset:49;\tsize:20;\tsigned:0;\n"
+           "\nprint fmt: \"(%lx) host=%u\", REC->__probe_ip, REC->host\n";
+}
+
+ZTCBytes ZTSSenseRecordBytes::make() const {
+    ZTCBytes lBytes;
+    putNumber(lBytes, gcSenseId, 2, mOrder);
+    lBytes.resize(16);
+    for (const std::uint32_t lNumber : {mHost, mChannel, mTarget}) {
+        putNumber(lBytes, lNumber, 4, mOrder);
+    }
+    putNumber(lBytes, mLun, 8, mOrder);
+    putNumber(lBytes, 2, 4, mOrder);
+    putNumber(lBytes, mOpcode, 1, mOrder);
+    putNumber(lBytes, mDriverTag, 4, mOrder);
+    putNumber(lBytes, mSchedulerTag, 4, mOrder);
+    lBytes.insert(lBytes.end(), {0x70, 0, mSenseKey, 0, 0, 0, 0, 10, 0, 0, 0, 0, mAsc, mAscq, 0, 0, 0, 0, 0, 0});
     return lBytes;
 }
 

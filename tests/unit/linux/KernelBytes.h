@@ -42,11 +42,34 @@ struct ZTSDoneRecord {
     std::uint32_t mLun = 0;
     std::uint32_t mResult = 0;
     std::uint32_t mOpcode = 0x28;
+    std::uint32_t mDriverTag = 314;
+    std::uint32_t mSchedulerTag = 79;
     std::uint8_t mSenseKey = 0;
     std::uint8_t mAsc = 0;
     std::uint8_t mAscq = 0;
     std::uint16_t mId = gcDoneId;
     bool mHasSense = true;
+    std::endian mOrder = std::endian::native;
+
+    ZTCBytes make() const;
+};
+
+/// The description of the sense data's probe.
+std::string senseFormat();
+inline constexpr std::uint16_t gcSenseId = 1742;
+
+/// A record of the probe after senseFormat: fixed sense data.
+struct ZTSSenseRecordBytes {
+    std::uint32_t mHost = 0;
+    std::uint32_t mChannel = 0;
+    std::uint32_t mTarget = 0;
+    std::uint64_t mLun = 0;
+    std::uint8_t mOpcode = 0x28;
+    std::uint32_t mDriverTag = 314;
+    std::uint32_t mSchedulerTag = 79;
+    std::uint8_t mSenseKey = 5;
+    std::uint8_t mAsc = 0x21;
+    std::uint8_t mAscq = 0;
     std::endian mOrder = std::endian::native;
 
     ZTCBytes make() const;

@@ -127,3 +127,28 @@ TEST(TracePage, AnyBytesAtAllEndWithoutReadingPastThePage) {
         EXPECT_LE(lBytes, 4080u);
     }
 }
+
+TEST(TracePage, RecordsHaveTheTimeThatTheirWordsAddUpTo) {
+    static constexpr ZTSTracePageLayout scTimed{8, 8, 16, 4096, {0, 8}};
+    static constexpr std::uint64_t scPage = 123456789;  // the builder's
+    for (const std::endian lOrder : {std::endian::little, std::endian::big}) {
+        ZTCPageBuilder lBuilder(lOrder);
+        lBuilder.addShort(scEight);            // 17 later
+        lBuilder.addWord(30, 5).addNumber(2);  // 2 * 2^27 + 5 later
+        lBuilder.addLong(scEight);             // 17 later
+        lBuilder.addWord(31, 7).addNumber(3);  // now 3 * 2^27 + 7
+        lBuilder.addShort(scEight);            // 17 later
+        const ZTCBytes lBytes = lBuilder.make();
+        ZTCTracePage lPage(lBytes, scTimed, lOrder);
+        ASSERT_TRUE(lPage.next().has_value());
+        EXPECT_EQ(lPage.getTime(), scPage + 17);
+        ASSERT_TRUE(lPage.next().has_value());
+        EXPECT_EQ(lPage.getTime(), scPage + 17 + (std::uint64_t{2} << 27) + 5 + 17);
+        ASSERT_TRUE(lPage.next().has_value());
+        EXPECT_EQ(lPage.getTime(), (std::uint64_t{3} << 27) + 7 + 17);
+    }
+    const ZTCBytes lUntimed = ZTCPageBuilder().addShort(scEight).make();
+    ZTCTracePage lPage(lUntimed, scLayout);
+    lPage.next();
+    EXPECT_EQ(lPage.getTime(), 0u);
+}

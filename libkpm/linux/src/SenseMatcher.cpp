@@ -1,0 +1,72 @@
+#include "libkpm/linux/src/SenseMatcher.h"
+
+#include <algorithm>
+
+/// Inserts where the times stay in order; behind those of the same time.
+template <class Entry>
+static void sInsert(std::vector<Entry>& arEntries, const Entry& acrEntry) {
+    const auto lPlace =
+        std::upper_bound(arEntries.begin(), arEntries.end(), acrEntry,
+                         [](const Entry& acrOne, const Entry& acrOther) { return acrOne.mTime < acrOther.mTime; });
+    arEntries.insert(lPlace, acrEntry);
+}
+
+void ZTCSenseMatcher::addOutcome(const ZTSScsiOutcome& acrOutcome, std::uint64_t aTime, Clock::time_point aNow) {
+    sInsert(mCommands[acrOutcome].mOutcomes, {acrOutcome, aTime, aNow + scWait});
+    ++mHeld;
+}
+
+void ZTCSenseMatcher::addSense(const ZTSSenseRecord& acrRecord, std::uint64_t aTime, Clock::time_point aNow) {
+    sInsert(mCommands[acrRecord.mCommand].mSenses, {acrRecord.mValues, aTime, aNow + scWait});
+    ++mHeld;
+}
+
+void ZTCSenseMatcher::settle(Command& arCommand, Clock::time_point aNow, std::vector<ZTSScsiOutcome>& arReady) {
+    std::vector<Outcome> lLeft;
+    for (std::size_t lIndex = 0; lIndex < arCommand.mOutcomes.size(); ++lIndex) {
+        Outcome& lrOutcome = arCommand.mOutcomes[lIndex];
+        const bool lIsLast = lIndex + 1 == arCommand.mOutcomes.size();
+        const auto lSense =
+            std::find_if(arCommand.mSenses.begin(), arCommand.mSenses.end(), [&](const Sense& acrSense) {
+                return acrSense.mTime >= lrOutcome.mTime &&
+                       (lIsLast || acrSense.mTime < arCommand.mOutcomes[lIndex + 1].mTime);
+            });
+        if (lSense != arCommand.mSenses.end()) {
+            lrOutcome.mOutcome.mSenseKey = lSense->mValues.mSenseKey;
+            lrOutcome.mOutcome.mAsc = lSense->mValues.mAsc;
+            lrOutcome.mOutcome.mAscq = lSense->mValues.mAscq;
+            arCommand.mSenses.erase(lSense);
+            arReady.push_back(lrOutcome.mOutcome);
+        } else if (lrOutcome.mEnd <= aNow) {
+            arReady.push_back(lrOutcome.mOutcome);
+        } else {
+            lLeft.push_back(lrOutcome);
+        }
+    }
+    arCommand.mOutcomes.swap(lLeft);
+    std::erase_if(arCommand.mSenses, [aNow](const Sense& acrSense) { return acrSense.mEnd <= aNow; });
+}
+
+std::vector<ZTSScsiOutcome> ZTCSenseMatcher::take(Clock::time_point aNow) {
+    std::vector<ZTSScsiOutcome> lReady;
+    const Clock::time_point lUntil = mHeld > scMostHeld ? Clock::time_point::max() : aNow;
+    lReady.reserve(mHeld);
+    mHeld = 0;
+    for (auto lCommand = mCommands.begin(); lCommand != mCommands.end();) {
+        settle(lCommand->second, lUntil, lReady);
+        const std::size_t lLeft = lCommand->second.mOutcomes.size() + lCommand->second.mSenses.size();
+        mHeld += lLeft;
+        lCommand = lLeft == 0 ? mCommands.erase(lCommand) : std::next(lCommand);
+    }
+    return lReady;
+}
+
+std::optional<ZTCSenseMatcher::Clock::time_point> ZTCSenseMatcher::getNextTime() const {
+    std::optional<Clock::time_point> lNext;
+    for (const auto& [lrName, lrCommand] : mCommands) {
+        for (const Outcome& lrOutcome : lrCommand.mOutcomes) {
+            lNext = std::min(lNext.value_or(lrOutcome.mEnd), lrOutcome.mEnd);
+        }
+    }
+    return lNext;
+}

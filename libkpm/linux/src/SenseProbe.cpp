@@ -1,0 +1,169 @@
+#include "libkpm/linux/src/SenseProbe.h"
+
+#include <algorithm>
+#include <cerrno>
+#include <cstring>
+#include <exception>
+#include <filesystem>
+#include <optional>
+#include <utility>
+#include <variant>
+
+#include "libkpm/common/include/AgentLink.h"
+#include "libkpm/linux/src/InstanceName.h"
+#include "libkpm/linux/src/Sysfs.h"
+
+static const char* const scPreparedGroup = "libkpm_linux";
+static constexpr std::size_t scMostDescription = 65536;
+static constexpr std::size_t scMostTypes = std::size_t{64} * 1024 * 1024;
+
+// How a probe names a function's first argument: the general form, and for older kernels the register's name.
+static const char* const scFirstArguments[] = {"$arg1",
+#if defined(__x86_64__)
+                                               "%di"
+#elif defined(__aarch64__)
+                                               "%x0"
+#elif defined(__s390x__)
+                                               "%r2"
+#elif defined(__powerpc64__)
+                                               "%gpr3"
+#else
+                                               "$arg1"
+#endif
+};
+
+/// A group's name may have letters, digits and underscores.
+static std::string sGroupOf(std::string aInstanceName) {
+    std::replace(aInstanceName.begin(), aInstanceName.end(), '-', '_');
+    return aInstanceName;
+}
+
+static ZTSFeedProblem sProblem(const std::string& acrWhat, int aError) {
+    ZTSFeedProblem lProblem{judgeFeedError(aError), acrWhat + ": " + std::strerror(aError)};
+    if (lProblem.mHappening == ZTFH_NotGranted) {
+        lProblem.mText += "; run the agent as root, or have root define the probe";
+    } else if (aError == ENOENT) {
+        lProblem.mText += "; this kernel has no kprobe events";
+    }
+    return lProblem;
+}
+
+/// The root of tracefs that an instance is of. By its name alone: the instance is gone when the probe is removed.
+static std::string sRootOf(const std::string& acrInstance) {
+    std::filesystem::path lPath(acrInstance);
+    if (!lPath.has_filename()) {
+        lPath = lPath.parent_path();
+    }
+    return lPath.parent_path().parent_path().string();
+}
+
+ZTCSenseProbe::ZTCSenseProbe(const std::string& acrInstance, const std::string& acrGroup, ZTCTraceFiles& arFiles)
+    : mGroup(acrGroup),
+      mDefinitions(sRootOf(acrInstance) + "/kprobe_events"),
+      mRemoval("-:" + acrGroup + "/" + gcSenseEvent + "\n"),
+      mEventPath(acrInstance + "/events/" + acrGroup + "/" + gcSenseEvent),
+      mEnablePath(mEventPath + "/enable"),
+      mrFiles(arFiles) {}
+
+std::unique_ptr<ZTCSenseProbe> ZTCSenseProbe::open(const std::string& acrInstance, const std::string& acrSysfsRoot,
+                                                   ZTCTraceFiles& arFiles, ZTSFeedProblem& arProblem) {
+    std::unique_ptr<ZTCSenseProbe> lpPrepared(new ZTCSenseProbe(acrInstance, scPreparedGroup, arFiles));
+    if (readSmallFile(lpPrepared->mEventPath + "/format", scMostDescription)) {
+        return lpPrepared->switchOn(arProblem) ? std::move(lpPrepared) : nullptr;
+    }
+    std::unique_ptr<ZTCSenseProbe> lpOwn(new ZTCSenseProbe(acrInstance, sGroupOf(makeTraceInstanceName()), arFiles));
+    return lpOwn->define(acrSysfsRoot, arProblem) && lpOwn->switchOn(arProblem) ? std::move(lpOwn) : nullptr;
+}
+
+ZTCSenseProbe::~ZTCSenseProbe() {
+    switchOff();
+    const int lError = mIsOwn ? mrFiles.append(mDefinitions, mRemoval) : 0;
+    if (lError == 0) {
+        return;
+    }
+    try {
+        logLibraryLine(KPM_LOG_WARNING,
+                       "the probe " + mGroup + "/" + gcSenseEvent + " stays: " + std::strerror(lError));
+    } catch (const std::exception&) {
+        return;  // no memory for a line; the next run removes the probe
+    }
+}
+
+bool ZTCSenseProbe::define(const std::string& acrSysfsRoot, ZTSFeedProblem& arProblem) {
+    const std::optional<std::string> lKernel = readSmallFile(acrSysfsRoot + "/kernel/btf/vmlinux", scMostTypes);
+    // Not there where the SCSI layer is part of the kernel itself.
+    const std::string lModule =
+        readSmallFile(acrSysfsRoot + "/kernel/btf/scsi_mod", scMostTypes).value_or(std::string());
+    if (!lKernel) {
+        arProblem = {ZTFH_Broken, "this kernel does not describe its types (no /sys/kernel/btf/vmlinux)"};
+        return false;
+    }
+    const auto lBytes = [](const std::string& acrText) {
+        return ZTCByteSpan(reinterpret_cast<const std::uint8_t*>(acrText.data()), acrText.size());
+    };
+    const ZTCBtf lBtf(lBytes(*lKernel), lBytes(lModule));
+    int lError = 0;
+    for (const char* const lpArgument : scFirstArguments) {
+        const std::variant<std::string, ZTSTraceProblem> lLine = makeSenseProbe(lBtf, mGroup, lpArgument);
+        if (const auto* lpProblem = std::get_if<ZTSTraceProblem>(&lLine)) {
+            arProblem = {ZTFH_Broken, lpProblem->mText};
+            return false;
+        }
+        lError = mrFiles.append(mDefinitions, std::get<std::string>(lLine) + "\n");
+        if (lError == EEXIST) {
+            // Left by an opening of this process that was not closed in order.
+            mrFiles.append(mDefinitions, mRemoval);
+            lError = mrFiles.append(mDefinitions, std::get<std::string>(lLine) + "\n");
+        }
+        if (lError != EINVAL) {
+            break;
+        }
+    }
+    if (lError != 0) {
+        arProblem = sProblem("the probe for them cannot be defined in kprobe_events", lError);
+        return false;
+    }
+    mIsOwn = true;
+    return true;
+}
+
+bool ZTCSenseProbe::switchOn(ZTSFeedProblem& arProblem) {
+    const std::optional<std::string> lFormat = readSmallFile(mEventPath + "/format", scMostDescription);
+    if (!lFormat) {
+        arProblem = {ZTFH_Broken, "the format of the probe's event cannot be read"};
+        return false;
+    }
+    const std::variant<ZTSSenseLayout, ZTSTraceProblem> lLayout = makeSenseLayout(parseTraceFormat(*lFormat));
+    if (const auto* lpProblem = std::get_if<ZTSTraceProblem>(&lLayout)) {
+        arProblem = {ZTFH_Broken, "the probe's event cannot be used: " + lpProblem->mText};
+        return false;
+    }
+    mLayout = std::get<ZTSSenseLayout>(lLayout);
+    if (const int lError = mrFiles.write(mEnablePath, "1"); lError != 0) {
+        arProblem = sProblem("the probe for them cannot be switched on", lError);
+        return false;
+    }
+    return true;
+}
+
+void ZTCSenseProbe::watchHosts(const std::vector<std::uint32_t>& acrHosts) {
+    mrFiles.write(mEventPath + "/filter", acrHosts.empty() ? std::string("0") : makeSenseFilter(acrHosts));
+}
+
+void removeLeftOverProbes(const std::string& acrTracefsRoot, ZTCTraceFiles& arFiles) {
+    const std::string lPrefix = std::string(scPreparedGroup) + "_";
+    const std::vector<std::string> lNames =
+        listDirectory(acrTracefsRoot + "/events").value_or(std::vector<std::string>());
+    for (const std::string& lrName : lNames) {
+        std::string lInstance = lrName;
+        std::replace(lInstance.begin(), lInstance.end(), '_', '-');
+        if (!lrName.starts_with(lPrefix) || !isTraceInstanceLeftOver(lInstance)) {
+            continue;
+        }
+        const int lError = arFiles.append(acrTracefsRoot + "/kprobe_events", "-:" + lrName + "/" + gcSenseEvent + "\n");
+        logLibraryLine(lError == 0 ? KPM_LOG_NOTICE : KPM_LOG_WARNING,
+                       lError == 0
+                           ? "removed the probe " + lrName + ", which a killed run has left"
+                           : "the probe " + lrName + ", which a killed run has left, stays: " + std::strerror(lError));
+    }
+}
