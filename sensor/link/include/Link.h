@@ -33,7 +33,8 @@ enum ZTELinkMessageType : std::uint32_t {
     ZTLM_AgentEnded = 2,    ///< mStart, mPid, mWaitStatus, mText = path of its page
     ZTLM_KeeperState = 3,   ///< mState, mSince, mNextStart, mRestarts, mText = why, for people
     ZTLM_StopAgent = 4,     ///< mStart: stop command, get until nothing is held, shut-down. The keeper starts the next
-    ZTLM_Finish = 5,        ///< the same, then take everything in and end with status 0; all within gcFinishLimit
+    ZTLM_Finish = 5,        ///< the same, wait for its AgentEnded, take everything in and end with status 0; all within
+                            ///< gcFinishLimit. No agent is started after this message
     ZTLM_Reload = 6,        ///< mSettings: the settings have changed; readable as TAVIK_SETTINGS_FD is (Inheritance.h)
     // collector to keeper
     ZTLM_Look = 32,           ///< the collecting loop has turned: a look is completed, or a frame taken in

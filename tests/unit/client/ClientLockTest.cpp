@@ -80,3 +80,33 @@ TEST(ClientLock, ALockFileThatCannotBeOpenedIsNamed) {
         EXPECT_NE(std::string(lrEx.what()).find(lDirectory.path("qrv-sn.lock")), std::string::npos);
     }
 }
+
+TEST(ClientLock, AClientThatHoldsItIsNotNamed) {
+    const ZTCTemporaryDirectory lDirectory;
+    ZTCClientLock lHolder(lDirectory.path());
+    ASSERT_TRUE(lHolder.tryAcquire());
+    ZTCClientLock lOther(lDirectory.path());
+    EXPECT_FALSE(lOther.tryAcquire());
+    EXPECT_EQ(lOther.getNamedHolder(), 0);
+    EXPECT_EQ(lOther.describeHolder(), "another client holds " + lDirectory.path("qrv-sn.lock"));
+}
+
+TEST(ClientLock, ASensorThatHoldsItIsNamed) {
+    const ZTCTemporaryDirectory lDirectory;
+    writeFile(lDirectory.path("qrv-sn.lock"), std::to_string(getppid()) + "\n");
+    const ZTCClientLock lLock(lDirectory.path());
+    EXPECT_EQ(lLock.getNamedHolder(), getppid());
+    EXPECT_EQ(lLock.describeHolder(),
+              "a sensor runs, process " + std::to_string(getppid()) + ", and holds " + lDirectory.path("qrv-sn.lock"));
+}
+
+TEST(ClientLock, TheNameOfAKilledSensorIsTakenAwayByTheNextHolder) {
+    const ZTCTemporaryDirectory lDirectory;
+    writeFile(lDirectory.path("qrv-sn.lock"), std::to_string(getppid()) + "\n");
+    ZTCClientLock lLock(lDirectory.path());
+    ASSERT_TRUE(lLock.tryAcquire());
+    EXPECT_EQ(readFile(lDirectory.path("qrv-sn.lock")), "");
+    lLock.nameHolder();
+    EXPECT_EQ(readFile(lDirectory.path("qrv-sn.lock")), std::to_string(getpid()) + "\n");
+    EXPECT_EQ(lLock.getNamedHolder(), 0) << "oneself is nobody to wait for";
+}
