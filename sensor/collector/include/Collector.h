@@ -19,6 +19,7 @@
 #include "sensor/collector/include/LossWindow.h"
 #include "sensor/collector/include/Spool.h"
 #include "sensor/link/include/Inheritance.h"
+#include "sensor/outlets/include/Outlets.h"
 #include "sensor/settings/include/Settings.h"
 #include "sensor/topology/include/TopologyScan.h"
 
@@ -69,6 +70,7 @@ private:
     void scanPorts(ZTCTime aNow);
     void noteHistory();
     void tellState();
+    void feedOutlets(ZTCTime aNow);
 
     std::optional<std::string> serve(std::uint64_t aTicket, const std::string& acrRequest);
     std::string describeState();
@@ -81,6 +83,7 @@ private:
     ZTCSpool mSpool;
     ZTCHistoryWorker mHistory;
     ZTCControlServer mControl;
+    ZTCOutlets mOutlets;
 
     bool mIsKeeperGone = false;
     bool mIsReady = false;  ///< the database is open, and what was found in the spool is handed to it
@@ -100,6 +103,7 @@ private:
 
     std::deque<ZTSLinkMessage> mOutgoing;
     ZTCTime mLastLook{};
+    ZTCTime mLastLive{};
     std::string mToldState;
 
     ZTCTime mNextScan{};

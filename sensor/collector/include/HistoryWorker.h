@@ -72,6 +72,8 @@ public:
     void notePorts(std::shared_ptr<const ZTSTopology> apPorts);
     void setLimits(const ZTSStoreLimits& acrLimits);
     void setMark(std::uint64_t aTicket, const std::string& acrName, ZTCHistoryTime aTime);
+    /// A value for those who read the history; of two of one name the later holds.
+    void setValue(const std::string& acrName, const std::string& acrValue);
     /// Marks that are done since the last call.
     std::vector<ZTSMarkResult> takeMarkResults();
 
@@ -102,7 +104,12 @@ private:
     struct ZTSMarkJob {
         ZTSMarkResult mMark;
     };
-    using ZTCJob = std::variant<ZTSFrameJob, ZTSPageJob, ZTSEndedAgent, ZTSForgottenJob, ZTSPortsJob, ZTSMarkJob>;
+    struct ZTSValueJob {
+        std::string mName;
+        std::string mValue;
+    };
+    using ZTCJob =
+        std::variant<ZTSFrameJob, ZTSPageJob, ZTSEndedAgent, ZTSForgottenJob, ZTSPortsJob, ZTSMarkJob, ZTSValueJob>;
 
     void submit(ZTCJob aJob);
     void run();
@@ -122,9 +129,11 @@ private:
     void store(ZTSForgottenJob& arJob);
     void store(ZTSPortsJob& arJob);
     void store(ZTSMarkJob& arJob);
+    void store(ZTSValueJob& arJob);
     void storePage(const ZTCPagePointer& acrPage);
     void closeEpisodes();
     void noteSeen(const std::string& acrGeneration);
+    void countStart(const std::string& acrGeneration);
     void noteEnded(const std::string& acrGeneration);
     void setAside(const ZTSFrameJob& acrJob, const std::string& acrReason);
     std::optional<ZTSRemotePort> resolve(const ZTSFcName& acrInitiator, std::uint32_t aFcId) const;

@@ -4,6 +4,7 @@
 #include <unistd.h>
 
 #include <algorithm>
+#include <array>
 #include <cerrno>
 #include <cstdlib>
 #include <filesystem>
@@ -18,6 +19,8 @@ using std::chrono::seconds;
 static constexpr seconds scSpoolPause{1};
 /// Between two looks at the ports in sysfs and in the targets' file.
 static constexpr seconds scScanPeriod{10};
+/// Between two descriptions of the live state for the outlets.
+static constexpr seconds scLivePause{1};
 /// Of an orderly end: how long a full disk may hold up the agent's shut-down, when the agent is given up, and how long
 /// the history may take after that. Together less than gcFinishLimit.
 static constexpr seconds scStopPatience{8};
@@ -28,6 +31,11 @@ static_assert(scFinishPatience + scHistoryPatience < gcFinishLimit);
 static std::string sSysfsRoot() {
     const char* const lpRoot = std::getenv(gcSysfsVariable);
     return lpRoot != nullptr && *lpRoot != '\0' ? lpRoot : "/sys";
+}
+
+static std::string sHostName() {
+    std::array<char, 256> lName{};
+    return gethostname(lName.data(), lName.size() - 1) == 0 ? lName.data() : "unknown";
 }
 
 static ZTSStoreLimits sStoreLimits(const ZTSSettings& acrSettings) {
@@ -55,6 +63,13 @@ ZTCCollector::ZTCCollector(ZTSInheritance aInheritance, const ZTSSettings& acrSe
                [](const std::string& acrLine) { logLine(acrLine); }),
       mControl(std::move(mInheritance.mControl),
                [this](std::uint64_t aTicket, const std::string& acrRequest) { return serve(aTicket, acrRequest); }),
+      mOutlets({.mStateDirectory = mInheritance.mState,
+                .mHost = sHostName(),
+                .mVersion = TAVIK_VERSION,
+                .mSetValue = [this](const std::string& acrName,
+                                    const std::string& acrValue) { mHistory.setValue(acrName, acrValue); },
+                .mReport = [](const std::string& acrLine) { logLine(acrLine); }},
+               acrSettings),
       mpPorts(std::make_shared<ZTSTopology>()),
       mLosses(mSince) {}
 
@@ -112,6 +127,7 @@ void ZTCCollector::turn(ZTCTime aNow) {
     }
     mControl.serve(aNow);
     tellState();
+    feedOutlets(aNow);
     if (aNow - mLastLook >= gcLookPeriod) {
         sendLook(aNow);
     }
@@ -253,6 +269,7 @@ void ZTCCollector::reload(const ZTSLinkMessage& acrMessage, ZTCTime aNow) {
     }
     mSettings = lReading.mSettings;
     mHistory.setLimits(sStoreLimits(mSettings));
+    mOutlets.setSettings(mSettings);
     if (mpSession != nullptr) {
         mpSession->setSettings(sSessionSettings(mSettings), aNow);
     }
@@ -304,6 +321,15 @@ void ZTCCollector::tellState() {
     if (lText != mToldState) {
         mToldState = lText;
         send(ZTLM_Text, 0, lText);
+    }
+}
+
+/// What the outlets show is at most a second older than the last thing that happened.
+void ZTCCollector::feedOutlets(ZTCTime aNow) {
+    if (aNow - mLastLive >= scLivePause) {
+        mLastLive = aNow;
+        mOutlets.setLive(describeState());
+        mOutlets.wake();
     }
 }
 

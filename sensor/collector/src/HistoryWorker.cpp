@@ -11,6 +11,7 @@
 
 #include "sensor/collector/include/PageCounts.h"
 #include "sensor/collector/include/SpoolRecovery.h"
+#include "sensor/metrics/include/Metrics.h"
 
 using std::chrono::milliseconds;
 using std::chrono::seconds;
@@ -28,6 +29,8 @@ static constexpr seconds scCheckpointPeriod{1};
 static constexpr const char* scRunningValue = "collector.generations";
 /// The same with the time when a frame was last taken in: microseconds since the epoch.
 static constexpr const char* scLastTakenValue = "collector.lastTaken";
+/// The same with the generation of the last agent whose start was counted.
+static constexpr const char* scCountedValue = "collector.countedGeneration";
 
 ZTCHistoryWorker::ZTCHistoryWorker(ZTCSpool& arSpool, std::string aStateDirectory, const ZTSStoreLimits& acrLimits,
                                    Report aReport)
@@ -101,6 +104,10 @@ void ZTCHistoryWorker::setLimits(const ZTSStoreLimits& acrLimits) {
 
 void ZTCHistoryWorker::setMark(std::uint64_t aTicket, const std::string& acrName, ZTCHistoryTime aTime) {
     submit(ZTSMarkJob{{.mTicket = aTicket, .mName = acrName, .mTime = aTime, .mError = {}}});
+}
+
+void ZTCHistoryWorker::setValue(const std::string& acrName, const std::string& acrValue) {
+    submit(ZTSValueJob{acrName, acrValue});
 }
 
 std::vector<ZTSMarkResult> ZTCHistoryWorker::takeMarkResults() {
@@ -439,6 +446,7 @@ void ZTCHistoryWorker::store(ZTSFrameJob& arJob) {
 
 void ZTCHistoryWorker::store(ZTSPageJob& arJob) {
     noteSeen(arJob.mpPage->mStartId);
+    countStart(arJob.mpPage->mStartId);
     storePage(arJob.mpPage);
     const std::vector<ZTSKindStateNow> lStates = toKindStates(*arJob.mpPage);
     mpStore->noteCoverage(getHistoryTime(), lStates);
@@ -465,6 +473,18 @@ void ZTCHistoryWorker::noteSeen(const std::string& acrGeneration) {
     if (lRunning.find(acrGeneration + " ") == std::string::npos) {
         mpStore->setValue(scRunningValue, lRunning + acrGeneration + " ");
     }
+}
+
+/// Counts the agents that were started, each once: a collector that is new meets the running one again.
+void ZTCHistoryWorker::countStart(const std::string& acrGeneration) {
+    if (mpStore->getValue(scCountedValue) == acrGeneration) {
+        return;
+    }
+    std::uint64_t lRestarts = 0;
+    std::istringstream(mpStore->getValue(gcAgentRestartsValue)) >> lRestarts;
+    lRestarts += mpStore->getValue(scCountedValue).empty() ? 0 : 1;  // the first start of all is no restart
+    mpStore->setValue(gcAgentRestartsValue, std::to_string(lRestarts));
+    mpStore->setValue(scCountedValue, acrGeneration);
 }
 
 void ZTCHistoryWorker::noteEnded(const std::string& acrGeneration) {
@@ -507,6 +527,10 @@ void ZTCHistoryWorker::store(ZTSPortsJob& arJob) {
     }
     const std::lock_guard lLock(mMutex);
     mpPorts = arJob.mpPorts;
+}
+
+void ZTCHistoryWorker::store(ZTSValueJob& arJob) {
+    mpStore->setValue(arJob.mName, arJob.mValue);
 }
 
 void ZTCHistoryWorker::store(ZTSMarkJob& arJob) {

@@ -1,0 +1,100 @@
+/// What leaves the sensor on its own: the web server with its stream, the metrics file, the file of JSON lines.
+///
+/// A thread of its own reads the history and feeds them. Nothing here holds up collecting: an outlet that fails is
+/// reported once, tried again, and catches up from where it stopped.
+#ifndef SENSOR_OUTLETS_INCLUDE_OUTLETS_H
+#define SENSOR_OUTLETS_INCLUDE_OUTLETS_H
+
+#include <condition_variable>
+#include <functional>
+#include <memory>
+#include <mutex>
+#include <optional>
+#include <string>
+#include <thread>
+
+#include "sensor/outlets/include/NdjsonFile.h"
+#include "sensor/settings/include/Settings.h"
+#include "sensor/store/include/History.h"
+#include "sensor/views/include/NameBook.h"
+#include "sensor/web/include/Api.h"
+
+/// The name of the stored value with the number of the last change that the JSON lines have.
+inline constexpr const char* gcNdjsonCursorValue = "ndjson.seq";
+
+struct ZTSOutletsSetup {
+    std::string mStateDirectory;
+    std::string mHost;
+    std::string mVersion;
+    /// Stores a value in the history, soon; called on the outlets' thread.
+    std::function<void(const std::string& acrName, const std::string& acrValue)> mSetValue;
+    /// A line for people; called on the outlets' thread.
+    std::function<void(const std::string& acrLine)> mReport;
+};
+
+class ZTCOutlets {
+public:
+    /// Starts the thread.
+    ZTCOutlets(ZTSOutletsSetup aSetup, const ZTSSettings& acrSettings);
+    /// Writes what is due, and ends the thread.
+    ~ZTCOutlets();
+    ZTCOutlets(const ZTCOutlets&) = delete;
+    ZTCOutlets& operator=(const ZTCOutlets&) = delete;
+
+    // Any thread; none of them waits for an outlet.
+    void setSettings(const ZTSSettings& acrSettings);
+    /// The running sensor's live state, as JSON in one line.
+    void setLive(std::string aLive);
+    /// Something new is in the history.
+    void wake();
+
+    /// The port of the web server; 0: none, or a Unix socket.
+    unsigned getPort() const;
+
+private:
+    void run();
+    bool waitForWork();
+    void applySettings();
+    void openServer();
+    void openHistory();
+    void feed();
+    void feedStream();
+    void feedNdjson();
+    void writeMetrics();
+    std::string toLine(const ZTSEpisode& acrEpisode, const ZTCNameBook& acrNames) const;
+    ZTCNameBook makeNames() const;
+    /// Reports a problem of one outlet when it is new, and its end.
+    void report(std::string& arLast, const std::string& acrProblem, const char* apOutlet);
+    std::string readLive() const;
+
+    const ZTSOutletsSetup mSetup;
+
+    // ---- of the outlets' thread ----
+    ZTSSettings mSettings;
+    std::unique_ptr<ZTCHistory> mpHistory;
+    std::unique_ptr<ZTCNdjsonFile> mpNdjson;
+    std::optional<std::uint64_t> mNdjsonSeq;  ///< what the file has; absent: to be read from the history
+    std::optional<std::uint64_t> mStreamSeq;  ///< what the streams have; absent: nobody listens
+    std::chrono::steady_clock::time_point mNextMetrics{};
+    std::chrono::steady_clock::time_point mNextServer{};
+    std::string mServerProblem;
+    std::string mNdjsonProblem;
+    std::string mMetricsProblem;
+
+    // ---- guarded by mMutex ----
+    mutable std::mutex mMutex;
+    std::condition_variable mWake;
+    bool mIsStopping = false;
+    bool mHasWork = true;
+    std::optional<ZTSSettings> mNewSettings;
+    std::string mLive = "{}";
+    std::map<std::string, std::string> mNames;  ///< the administrator's, for the server's thread
+    unsigned mPort = 0;
+
+    std::unique_ptr<ZTCApi> mpApi;           ///< of the server's thread; outlives the server
+    std::unique_ptr<ZTCApi> mpFileApi;       ///< of the outlets' thread
+    std::unique_ptr<ZTCWebServer> mpServer;  ///< of the outlets' thread
+    std::thread mThread;
+};
+
+#endif
