@@ -202,9 +202,6 @@ private:
     void filePrevScopeRecord() ZT_REQUIRES(mPrevDataLock);
     void countOccurrence() noexcept ZT_REQUIRES(mPrevDataLock);
 
-    ZTCStatusPageWriter mStatusPage;
-    ZTCKindStates mKindStates{mStatusPage};
-    ZTCBell mBell{gcMaxScopeDataSize};
     std::atomic<Size> mMaxScopeEventDataSize;
     [[maybe_unused]] Size mMaxTotalEventDataSize;  ///< the admission test uses gcMaxScopeDataSize
     ZTCPointer<ZTCLibkpmAbs> mLibkpmAbs;
@@ -220,7 +217,6 @@ private:
     std::atomic<std::uint32_t> mTotalEventDataSize;  ///< written under mPrevDataLock
     unsigned int mPrevBoardId ZT_GUARDED_BY(mPrevDataLock);
     ZTCPointer<ZTCTavikRecord> mPrevScopeRecord ZT_GUARDED_BY(mPrevDataLock);
-    ZTSStatusRow* mpPrevRow ZT_GUARDED_BY(mPrevDataLock) = nullptr;  ///< of the pending record; null without a page
 
     /// Guards the pending record, the record lists, the running total and the target maps. The log's lock is the only
     /// one that is taken while it is held.
@@ -229,6 +225,12 @@ private:
     ZTCString mTvkOutIpcPath;
 
     ZTCTavikTargetIndex mTargetIndex ZT_GUARDED_BY(mPrevDataLock);  ///< the names in mTargetsWwpnMap
+
+    // Each has a synchronization of its own, which its header describes.
+    ZTCStatusPageWriter mStatusPage;
+    ZTCKindStates mKindStates{mStatusPage};
+    ZTCBell mBell{gcMaxScopeDataSize};
+    ZTSStatusRow* mpPrevRow ZT_GUARDED_BY(mPrevDataLock) = nullptr;  ///< of the pending record; null without a page
 
     friend class ZTCPrevDataHold;
 };

@@ -69,11 +69,26 @@ TEST_F(TavikSystem, ItsFieldsAreDeclaredInTheirOrder) {
     for (std::sregex_iterator lMatch(lPrivate.begin(), lPrivate.end(), lField), lcEnd; lMatch != lcEnd; ++lMatch) {
         lFields.push_back((*lMatch)[1]);
     }
-    EXPECT_EQ((std::vector<std::string>{"mMaxScopeEventDataSize", "mMaxTotalEventDataSize", "mLibkpmAbs",
-                                        "mInitiatorsMap", "mTargetsMap", "mRecordsMap", "mProtocolHandler",
-                                        "mEventCatalogue", "mPrevScopeDataSet", "mPrevScopeData", "mTargetsWwpnMap",
-                                        "mPrevPortName", "mTotalEventDataSize", "mPrevBoardId", "mPrevScopeRecord",
-                                        "mPrevDataLock", "mTvkCmdIpcPath", "mTvkOutIpcPath", "mTargetIndex"}),
+    EXPECT_EQ((std::vector<std::string>{"mMaxScopeEventDataSize",
+                                        "mMaxTotalEventDataSize",
+                                        "mLibkpmAbs",
+                                        "mInitiatorsMap",
+                                        "mTargetsMap",
+                                        "mRecordsMap",
+                                        "mProtocolHandler",
+                                        "mEventCatalogue",
+                                        "mPrevScopeDataSet",
+                                        "mPrevScopeData",
+                                        "mTargetsWwpnMap",
+                                        "mPrevPortName",
+                                        "mTotalEventDataSize",
+                                        "mPrevBoardId",
+                                        "mPrevScopeRecord",
+                                        "mPrevDataLock",
+                                        "mTvkCmdIpcPath",
+                                        "mTvkOutIpcPath",
+                                        "mTargetIndex",
+                                        "mStatusPage"}),
               lFields);
 }
 
