@@ -67,6 +67,7 @@ private:
     void sweep();
     void sweepParts();
     void sweepPages();
+    ZTCPagePointer findPage(const std::string& acrGeneration) const;
     void scanPorts(ZTCTime aNow);
     void noteHistory();
     void tellState();

@@ -27,7 +27,8 @@ public:
     virtual ~ZTCHistorySink() = default;
 
     /// A frame or torn file of the spool, which is removed when it is stored. @param apPage  the page as it was when
-    /// the frame was whole; null: not known
+    /// the frame was whole, or later; null: not known. It is stored together with the frame, so that what is stored is
+    /// never more than what the page says was handed over
     virtual void takeIn(const ZTSSpoolEntry& acrEntry, ZTCPagePointer apPage) = 0;
     /// The page of the running agent, at a look.
     virtual void notePage(ZTCPagePointer apPage) = 0;

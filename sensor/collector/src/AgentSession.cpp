@@ -197,7 +197,7 @@ void ZTCAgentSession::settle(const ZTSProgress& acrProgress, ZTCTime aNow) {
     }
     for (const ZTSSpoolEntry& lrEntry : acrProgress.mSpooled) {
         ++mEvents.mFrames;
-        mrHistory.takeIn(lrEntry, &lrEntry == &acrProgress.mSpooled.back() ? mpPage : nullptr);
+        mrHistory.takeIn(lrEntry, mpPage);
     }
     for (const ZTSRequestAnswer& lrAnswer : acrProgress.mAnswers) {
         settleAnswer(lrAnswer, aNow);

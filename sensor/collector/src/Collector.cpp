@@ -346,7 +346,7 @@ void ZTCCollector::openSpool(ZTCTime aNow) {
         mSpool.raiseNumber(lPlan.mNextNumber);
         mSpool.raiseNumber(mHistory.getState().mLastFrame + 1);
         for (const ZTSSpoolEntry& lrEntry : lPlan.mWaiting) {
-            mHistory.takeIn(lrEntry, nullptr);
+            mHistory.takeIn(lrEntry, findPage(lrEntry.mName.mGeneration));
         }
         mIsReady = true;
         mSpoolProblem.clear();
@@ -434,19 +434,40 @@ void ZTCCollector::sweepParts() {
         ZTSSpoolPart lPart = mSpool.openPart(lrEntry.mName);
         const ZTSSpoolName lName = mSpool.tear(lPart);
         if (lName.mState == ZTSPS_Torn) {
-            mHistory.takeIn({lName, lrEntry.mSize}, nullptr);
+            mHistory.takeIn({lName, lrEntry.mSize}, findPage(lName.mGeneration));
         }
     }
     mSpoolProblem.clear();
 }
 
-void ZTCCollector::sweepPages() {
+/// The pages of agents that run or have ended, by path.
+static std::vector<std::string> sListPages(const std::string& acrDirectory) {
+    std::vector<std::string> lPaths;
     std::error_code lError;
-    for (std::filesystem::directory_iterator lEntry(mAgentDirectory, lError), lEnd; !lError && lEntry != lEnd;
+    for (std::filesystem::directory_iterator lEntry(acrDirectory, lError), lEnd; !lError && lEntry != lEnd;
          lEntry.increment(lError)) {
-        const std::string lPath = lEntry->path();
-        if (!lEntry->path().filename().string().starts_with("page.") ||
-            (mpSession != nullptr && lPath == mpSession->getPagePath())) {
+        if (lEntry->path().filename().string().starts_with("page.")) {
+            lPaths.push_back(lEntry->path());
+        }
+    }
+    std::ranges::sort(lPaths);
+    return lPaths;
+}
+
+ZTCPagePointer ZTCCollector::findPage(const std::string& acrGeneration) const {
+    for (const std::string& lrPath : sListPages(mAgentDirectory)) {
+        ZTCStatusPageReader lReader;
+        auto lpPage = std::make_shared<ZTSStatusSnapshot>();
+        if (lReader.open(lrPath) && lReader.read(*lpPage) && lpPage->mStartId == acrGeneration) {
+            return lpPage;
+        }
+    }
+    return nullptr;
+}
+
+void ZTCCollector::sweepPages() {
+    for (const std::string& lPath : sListPages(mAgentDirectory)) {
+        if (mpSession != nullptr && lPath == mpSession->getPagePath()) {
             continue;
         }
         ZTCStatusPageReader lReader;
