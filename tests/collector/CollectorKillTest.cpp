@@ -25,20 +25,7 @@ protected:
         waitUntilStored();
         mStage.killCollector();
     }
-    std::uint64_t stored() const {
-        std::uint64_t lSum = 0;
-        for (const ZTSLedgerRow& lrRow : mStage.history()->readLedger()) {
-            lSum += lrRow.mStored + lrRow.mRetired;
-        }
-        return lSum;
-    }
-    bool isAllStored() const {
-        try {
-            return stored() == mAgent->getHappened();
-        } catch (const ZTCStoreEx&) {
-            return false;  // there is no database yet
-        }
-    }
+    bool isAllStored() const { return mStage.countStored() == mAgent->getHappened(); }
     void waitUntilStored() {
         mStage.waitFor([this] { return isAllStored(); }, "all that happened in the history");
     }

@@ -2,11 +2,9 @@
 
 #include <fcntl.h>
 #include <gtest/gtest.h>
-#include <sqlite3.h>
 #include <sys/eventfd.h>
 #include <sys/socket.h>
 #include <sys/stat.h>
-#include <sys/un.h>
 #include <unistd.h>
 
 #include <atomic>
@@ -20,24 +18,12 @@
 
 #include "sensor/agentcommon/include/SensorAgentProtocol.h"
 #include "sensor/link/include/Inheritance.h"
+#include "tests/collector/UnixLine.h"
 
 static void sCheck(bool aIsGood, const std::string& acrWhat) {
     if (!aIsGood) {
         throw std::runtime_error(acrWhat + ": " + std::strerror(errno));
     }
-}
-
-static ZTCFileDescriptor sUnixSocket(int aFlags) {
-    ZTCFileDescriptor lSocket(socket(AF_UNIX, SOCK_STREAM | SOCK_CLOEXEC | aFlags, 0));
-    sCheck(lSocket.isOpen(), "socket");
-    return lSocket;
-}
-
-static sockaddr_un sAddress(const std::string& acrPath) {
-    sockaddr_un lAddress{};
-    lAddress.sun_family = AF_UNIX;
-    std::strncpy(lAddress.sun_path, acrPath.c_str(), sizeof(lAddress.sun_path) - 1);
-    return lAddress;
 }
 
 ZTCCollectorStage::ZTCCollectorStage(const std::string& acrSettings)
@@ -50,8 +36,8 @@ ZTCCollectorStage::ZTCCollectorStage(const std::string& acrSettings)
     std::filesystem::create_directories(mDirectory.path("sys"));
     mEnvironment.emplace_back("TAVIK_SYSFS", mDirectory.path("sys"));
     writeSettings(acrSettings);
-    mControl = sUnixSocket(SOCK_NONBLOCK);
-    const sockaddr_un lAddress = sAddress(mDirectory.path("run/control"));
+    mControl = makeUnixSocket(SOCK_NONBLOCK);
+    const sockaddr_un lAddress = makeUnixAddress(mDirectory.path("run/control"));
     sCheck(bind(mControl.get(), reinterpret_cast<const sockaddr*>(&lAddress), sizeof(lAddress)) == 0, "bind");
     sCheck(listen(mControl.get(), 8) == 0, "listen");
 }
@@ -60,7 +46,7 @@ ZTCCollectorStage::~ZTCCollectorStage() {
     mCollector.reset();
     if (testing::Test::HasFailure()) {
         std::cerr << "---- the collectors' messages\n" << log() << "---- the spool\n";
-        for (const std::string& lrFile : spoolFiles()) {
+        for (const std::string& lrFile : listSpool(mStateDirectory)) {
             std::cerr << lrFile << '\n';
         }
     }
@@ -247,61 +233,5 @@ void ZTCCollectorStage::makeRemotePort(const std::string& acrName, unsigned aFcI
 // ---- what it shows ----
 
 nlohmann::json ZTCCollectorStage::ask(const std::string& acrRequest) const {
-    const ZTCFileDescriptor lSocket = sUnixSocket(0);
-    const sockaddr_un lAddress = sAddress(mDirectory.path("run/control"));
-    sCheck(connect(lSocket.get(), reinterpret_cast<const sockaddr*>(&lAddress), sizeof(lAddress)) == 0, "connect");
-    const timeval lPatience{.tv_sec = gcTestPatience.count(), .tv_usec = 0};
-    setsockopt(lSocket.get(), SOL_SOCKET, SO_RCVTIMEO, &lPatience, sizeof(lPatience));
-    const std::string lLine = acrRequest + "\n";
-    sCheck(::send(lSocket.get(), lLine.data(), lLine.size(), MSG_NOSIGNAL) == std::ssize(lLine), "send");
-    std::string lAnswer;
-    char lByte = 0;
-    while (recv(lSocket.get(), &lByte, 1, 0) == 1 && lByte != '\n') {
-        lAnswer += lByte;
-    }
-    return nlohmann::json::parse(lAnswer);
-}
-
-std::vector<std::string> ZTCCollectorStage::spoolFiles() const {
-    std::vector<std::string> lNames;
-    std::error_code lError;
-    for (const auto& lrEntry : std::filesystem::directory_iterator(mStateDirectory + "/spool", lError)) {
-        lNames.push_back(lrEntry.path().filename());
-    }
-    return lNames;
-}
-
-std::string ZTCCollectorStage::checkIntegrity() const {
-    sqlite3* lpDatabase = nullptr;
-    std::string lResult;
-    const auto lNote = [](void* apResult, int, char** appValues, char**) {
-        *static_cast<std::string*>(apResult) += appValues[0];
-        return 0;
-    };
-    if (sqlite3_open_v2((mStateDirectory + "/history.db").c_str(), &lpDatabase, SQLITE_OPEN_READWRITE, nullptr) !=
-            SQLITE_OK ||
-        sqlite3_busy_timeout(lpDatabase, 20000) != SQLITE_OK ||
-        sqlite3_exec(lpDatabase, "PRAGMA integrity_check", lNote, &lResult, nullptr) != SQLITE_OK) {
-        lResult = sqlite3_errmsg(lpDatabase);
-    }
-    sqlite3_close(lpDatabase);
-    return lResult;
-}
-
-void ZTCCollectorStage::expectSound() const {
-    EXPECT_EQ(checkIntegrity(), "ok");
-    EXPECT_TRUE(spoolFiles().empty());
-    const auto lpHistory = history();
-    std::uint64_t lEpisodes = 0;
-    std::uint64_t lStored = 0;
-    for (const ZTSLedgerRow& lrRow : lpHistory->readLedger()) {
-        SCOPED_TRACE(getKindName(lrRow.mKind));
-        EXPECT_EQ(lrRow.mReceived, lrRow.mConsolidated + lrRow.getRefusedTotal());
-        EXPECT_EQ(lrRow.mStored + lrRow.mRetired + lrRow.mLost, lrRow.mHandedOver);
-        lStored += lrRow.mStored;
-    }
-    for (const ZTSEpisode& lrEpisode : lpHistory->readEpisodes({})) {
-        lEpisodes += lrEpisode.mCount;
-    }
-    EXPECT_EQ(lEpisodes, lStored) << "the episodes' counts and the ledger differ";
+    return nlohmann::json::parse(askLine(mDirectory.path("run/control"), acrRequest));
 }

@@ -15,6 +15,7 @@
 #include "sensor/client/include/FileDescriptor.h"
 #include "sensor/link/include/Link.h"
 #include "sensor/store/include/History.h"
+#include "tests/collector/HistoryCheck.h"
 #include "tests/support/ChildProcess.h"
 #include "tests/support/SystemCallKiller.h"
 #include "tests/support/TemporaryDirectory.h"
@@ -84,11 +85,9 @@ public:
     nlohmann::json ask(const std::string& acrRequest) const;
     nlohmann::json status() const { return ask(R"({"request":"status"})"); }
     std::unique_ptr<ZTCHistory> history() const { return std::make_unique<ZTCHistory>(mStateDirectory); }
-    std::vector<std::string> spoolFiles() const;
-    /// "ok", or what SQLite says.
-    std::string checkIntegrity() const;
-    /// The database is whole, the ledger's equation holds in each row, and the spool is empty.
-    void expectSound() const;
+    std::vector<std::string> spoolFiles() const { return listSpool(mStateDirectory); }
+    std::uint64_t countStored() const { return ::countStored(mStateDirectory); }
+    void expectSound() const { expectSoundHistory(mStateDirectory); }
 
 private:
     void tellAll();

@@ -17,17 +17,7 @@ protected:
     void waitUntilStored(std::uint64_t aCount) {
         mStage.waitFor([&] { return stored() == aCount; }, std::to_string(aCount) + " stored occurrences");
     }
-    std::uint64_t stored() const {
-        try {
-            std::uint64_t lSum = 0;
-            for (const ZTSLedgerRow& lrRow : mStage.history()->readLedger()) {
-                lSum += lrRow.mStored + lrRow.mRetired;
-            }
-            return lSum;
-        } catch (const ZTCStoreEx&) {
-            return 0;  // not there yet
-        }
-    }
+    std::uint64_t stored() const { return mStage.countStored(); }
     /// A whole orderly end.
     void finish() {
         mStage.send(ZTLM_Finish);

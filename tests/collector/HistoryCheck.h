@@ -1,0 +1,22 @@
+/// What tests look at in a history when nothing is in flight.
+#ifndef TESTS_COLLECTOR_HISTORYCHECK_H
+#define TESTS_COLLECTOR_HISTORYCHECK_H
+
+#include <cstdint>
+#include <string>
+#include <vector>
+
+/// "ok", or what SQLite says of the database in this directory.
+std::string checkIntegrity(const std::string& acrStateDirectory);
+
+/// The names of the files in the spool.
+std::vector<std::string> listSpool(const std::string& acrStateDirectory);
+
+/// Occurrences that the history has, those that retention took away included; 0 where there is no history yet.
+std::uint64_t countStored(const std::string& acrStateDirectory);
+
+/// Fails the test unless the database is whole, the ledger's equations hold in each row, the episodes have what the
+/// ledger says, and the spool is empty.
+void expectSoundHistory(const std::string& acrStateDirectory);
+
+#endif
