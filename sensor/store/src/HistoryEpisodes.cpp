@@ -129,6 +129,15 @@ static bool sVisitPage(std::vector<ZTSEpisode>& arPage, bool aIsRising, std::uin
         arPage, [&](const ZTSEpisode& acrEpisode) { return acrEpisode.mSeq <= aAfterSeq || acrVisitor(acrEpisode); });
 }
 
+std::optional<std::uint64_t> ZTCHistory::Implementation::findFirst(const ZTSHistoryFilter& acrFilter) {
+    ZTCStatement lFirst(mDatabase,
+                        acrFilter.mSince ? HistoryQueries::gcFirstEpisodeSince : HistoryQueries::gcFirstEpisode);
+    if (acrFilter.mSince) {
+        lFirst.query(toMicroseconds(*acrFilter.mSince));
+    }
+    return lFirst.step() && !lFirst.isNull(0) ? std::optional(lFirst.number<std::uint64_t>(0)) : std::nullopt;
+}
+
 void ZTCHistory::Implementation::visitPages(const ZTSHistoryFilter& acrFilter, bool aIsRising,
                                             const std::function<bool(const ZTSEpisode&)>& acrVisitor) {
     const ZTCFilterTest lTest(acrFilter, mNames);
@@ -137,12 +146,11 @@ void ZTCHistory::Implementation::visitPages(const ZTSHistoryFilter& acrFilter, b
         sVisitPage(lOpen, aIsRising, acrFilter.mAfterSeq, acrVisitor);
         return;
     }
-    ZTCStatement lFirst(mDatabase, HistoryQueries::gcFirstEpisodeSince);
-    if (!lFirst.query(lTest.getSince()).step() || lFirst.isNull(0)) {
+    const std::optional<std::uint64_t> lFirst = findFirst(acrFilter);
+    if (!lFirst) {
         return;
     }
-    const auto lBegin = lFirst.number<std::uint64_t>(0);
-    lFirst.reset();
+    const std::uint64_t lBegin = *lFirst;
     const auto lEnd = static_cast<std::uint64_t>(mDatabase.readNumber(HistoryQueries::gcLastEpisode)) + 1;
     for (std::uint64_t lDone = 0; lBegin + lDone < lEnd; lDone += scPageEpisodes) {
         const std::uint64_t lSize = std::min(scPageEpisodes, lEnd - lBegin - lDone);

@@ -30,6 +30,7 @@ inline constexpr const char* gcChanges = "SELECT " ZT_EPISODE_COLUMNS
 #undef ZT_EPISODE_COLUMNS
 inline constexpr const char* gcChangedEpisode = "SELECT episode FROM change WHERE seq = ?";
 inline constexpr const char* gcFirstEpisodeSince = "SELECT min(id) FROM episode WHERE last >= ?";
+inline constexpr const char* gcFirstEpisode = "SELECT min(id) FROM episode";
 inline constexpr const char* gcLastEpisode = "SELECT max(id) FROM episode";
 inline constexpr const char* gcRecords =
     "SELECT ordinal, data FROM record WHERE episode = ? AND ordinal >= ? ORDER BY ordinal LIMIT ?";
@@ -95,6 +96,8 @@ public:
     /// All matching episodes with numbers from `aFirst` to before `aEnd`, rising.
     std::vector<ZTSEpisode> readRange(std::uint64_t aFirst, std::uint64_t aEnd, const ZTCFilterTest& acrTest);
     std::vector<ZTSEpisode> readOpen(const ZTCFilterTest& acrTest);
+    /// The lowest number of an episode that can match; nothing where there is none.
+    std::optional<std::uint64_t> findFirst(const ZTSHistoryFilter& acrFilter);
     /// Visits matching episodes page by page, rising or falling, until the visitor returns false.
     void visitPages(const ZTSHistoryFilter& acrFilter, bool aIsRising,
                     const std::function<bool(const ZTSEpisode&)>& acrVisitor);

@@ -106,9 +106,8 @@ std::uint32_t ZTCNameTable::findOrAddPort(const ZTSFcName& acrWwpn, const std::o
 }
 
 const ZTSInitiator& ZTCNameTable::getInitiator(std::uint32_t aId) const {
-    static const ZTSInitiator scNone;
     const auto lFound = mInitiators.find(aId);
-    return lFound == mInitiators.end() ? scNone : lFound->second;
+    return lFound == mInitiators.end() ? mNone : lFound->second;
 }
 
 std::optional<ZTSRemotePort> ZTCNameTable::getPort(std::uint32_t aId) const {

@@ -42,6 +42,7 @@ private:
     };
     std::uint32_t findOrAdd(const std::string& acrKey, const ZTSInitiator& acrInitiator);
 
+    const ZTSInitiator mNone;
     ZTCDatabase& mrDatabase;
     std::map<std::uint32_t, ZTSInitiator> mInitiators;
     std::map<std::string, std::uint32_t> mInitiatorIds;
