@@ -5,6 +5,7 @@
 // | Matched/<kind>      | events that continue the pending record, one thread, one board: QUEUE FULL (counts and     |
 // |                     | sets a bit), PLOGI (counts), LS_RJT (appends 8 bytes), check condition (counts and sets    |
 // |                     | three bits), RSCN of one page (counts)                                                     |
+// | Counted/<kind>      | the same with the status page on; CountedNew/10: NewKnown/10 with it                       |
 // | PrometheusCounter   | peer: a counter of prometheus-cpp looked up by three labels, made before, and incremented  |
 // | LockAndClock        | floor: a plain pthread mutex locked and unlocked, uncontended, and one CLOCK_REALTIME      |
 // | NewKnown/<targets>  | QUEUE FULL events, each of another registered port in a scattered order: each a new record |
@@ -43,8 +44,14 @@ std::uint64_t sScatter(std::uint64_t aIndex, std::uint64_t aCount) {
     return aIndex * 7919 % aCount;
 }
 
+template <bool HasStatusPage>
+ZTCBenchAgent& sUse(unsigned aTargets = 0) {
+    return ZTCBenchAgent::use(1, aTargets, gcQuietLogCode, HasStatusPage);
+}
+
+template <bool HasStatusPage>
 void sMatched(benchmark::State& arState, ZTCBenchEvent& arEvent) {
-    ZTCBenchAgent& lrAgent = ZTCBenchAgent::use(1);
+    ZTCBenchAgent& lrAgent = sUse<HasStatusPage>();
     for (auto lUnused : arState) {
         arEvent.deliver();
     }
@@ -52,23 +59,27 @@ void sMatched(benchmark::State& arState, ZTCBenchEvent& arEvent) {
     arState.SetItemsProcessed(arState.iterations());
 }
 
+template <bool HasStatusPage>
 void sMatchedQFull(benchmark::State& arState) {
     ZTCBenchQFull lEvent;
-    sMatched(arState, lEvent);
+    sMatched<HasStatusPage>(arState, lEvent);
 }
 
+template <bool HasStatusPage>
 void sMatchedPlogi(benchmark::State& arState) {
     ZTCBenchEvent lEvent(1, 0x01, gcBenchPortBase, {0x20000000, 0xc9000000});
-    sMatched(arState, lEvent);
+    sMatched<HasStatusPage>(arState, lEvent);
 }
 
+template <bool HasStatusPage>
 void sMatchedCheckCondition(benchmark::State& arState) {
     ZTCBenchEvent lEvent(4, 0x04, gcBenchPortBase, {5, 0x28, 6, 0x29, 2});
-    sMatched(arState, lEvent);
+    sMatched<HasStatusPage>(arState, lEvent);
 }
 
+template <bool HasStatusPage>
 void sMatchedLsRjt(benchmark::State& arState) {
-    ZTCBenchAgent& lrAgent = ZTCBenchAgent::use(1);
+    ZTCBenchAgent& lrAgent = sUse<HasStatusPage>();
     ZTCBenchEvent lEvent(1, 0x08, gcBenchPortBase, {3, 9, 0x29});
     while (arState.KeepRunningBatch(gcAppendBatch)) {
         for (unsigned i = 0; i < gcAppendBatch; ++i) {
@@ -80,8 +91,9 @@ void sMatchedLsRjt(benchmark::State& arState) {
     }
 }
 
+template <bool HasStatusPage>
 void sMatchedRscn(benchmark::State& arState) {
-    ZTCBenchAgent& lrAgent = ZTCBenchAgent::use(1);
+    ZTCBenchAgent& lrAgent = sUse<HasStatusPage>();
     for (auto lUnused : arState) {
         deliverBenchRscn();
     }
@@ -109,9 +121,10 @@ void sLockAndClock(benchmark::State& arState) {
     }
 }
 
+template <bool HasStatusPage>
 void sNew(benchmark::State& arState, std::uint64_t aFirstPort) {
     const auto lTargets = static_cast<unsigned>(arState.range(0));
-    ZTCBenchAgent& lrAgent = ZTCBenchAgent::use(1, lTargets);
+    ZTCBenchAgent& lrAgent = sUse<HasStatusPage>(lTargets);
     ZTCBenchQFull lEvent;
     std::uint64_t lNext = 0;
     while (arState.KeepRunningBatch(gcBatch)) {
@@ -125,12 +138,13 @@ void sNew(benchmark::State& arState, std::uint64_t aFirstPort) {
     }
 }
 
+template <bool HasStatusPage>
 void sNewKnown(benchmark::State& arState) {
-    sNew(arState, gcBenchPortBase);
+    sNew<HasStatusPage>(arState, gcBenchPortBase);
 }
 
 void sNewUnknown(benchmark::State& arState) {
-    sNew(arState, gcBenchPortBase + 0x80000);
+    sNew<false>(arState, gcBenchPortBase + 0x80000);
 }
 
 void sMapInsert(benchmark::State& arState) {
@@ -202,14 +216,20 @@ void sEmptyCall(benchmark::State& arState) {
 
 }  // namespace
 
-BENCHMARK(sMatchedQFull)->Name("Matched/QFull");
-BENCHMARK(sMatchedPlogi)->Name("Matched/Plogi");
-BENCHMARK(sMatchedLsRjt)->Name("Matched/LsRjt");
-BENCHMARK(sMatchedCheckCondition)->Name("Matched/CheckCondition");
-BENCHMARK(sMatchedRscn)->Name("Matched/Rscn");
+BENCHMARK(sMatchedQFull<false>)->Name("Matched/QFull");
+BENCHMARK(sMatchedPlogi<false>)->Name("Matched/Plogi");
+BENCHMARK(sMatchedLsRjt<false>)->Name("Matched/LsRjt");
+BENCHMARK(sMatchedCheckCondition<false>)->Name("Matched/CheckCondition");
+BENCHMARK(sMatchedRscn<false>)->Name("Matched/Rscn");
+BENCHMARK(sMatchedQFull<true>)->Name("Counted/QFull");
+BENCHMARK(sMatchedPlogi<true>)->Name("Counted/Plogi");
+BENCHMARK(sMatchedLsRjt<true>)->Name("Counted/LsRjt");
+BENCHMARK(sMatchedCheckCondition<true>)->Name("Counted/CheckCondition");
+BENCHMARK(sMatchedRscn<true>)->Name("Counted/Rscn");
 BENCHMARK(sPrometheusCounter)->Name("PrometheusCounter");
 BENCHMARK(sLockAndClock)->Name("LockAndClock");
-BENCHMARK(sNewKnown)->Name("NewKnown")->Arg(10)->Arg(20000);
+BENCHMARK(sNewKnown<false>)->Name("NewKnown")->Arg(10)->Arg(20000);
+BENCHMARK(sNewKnown<true>)->Name("CountedNew")->Arg(10);
 BENCHMARK(sNewUnknown)->Name("NewUnknown")->Arg(10)->Arg(20000);
 BENCHMARK(sMapInsert)->Name("MapInsert");
 BENCHMARK(sSame)->Name("Same")->Arg(1)->Arg(2)->Arg(4)->Arg(8)->UseManualTime();

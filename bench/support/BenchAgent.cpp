@@ -10,12 +10,13 @@
 #include <map>
 #include <stdexcept>
 #include <system_error>
-#include <utility>
+#include <tuple>
 
 #include "bench/support/BenchEvents.h"
 #include "common/include/Log.h"
 #include "common/include/NetworkOrder.h"
 #include "os/common/include/ProcessEvents.h"
+#include "sensor/agentcommon/include/StatusPage.h"
 #include "system/include/SystemGlobals.h"
 
 namespace {
@@ -72,13 +73,14 @@ const std::string& ZTCBenchAgent::directory() {
     return srDirectory;
 }
 
-ZTCBenchAgent::ZTCBenchAgent(unsigned aBoards, unsigned aTargets) : mpSystem(nullptr) {
+ZTCBenchAgent::ZTCBenchAgent(unsigned aBoards, unsigned aTargets, bool aHasStatusPage) : mpSystem(nullptr) {
     static unsigned sAgents = 0;
     const std::string lDirectory = directory() + "/agent-" + std::to_string(getpid()) + "-" + std::to_string(++sAgents);
     std::filesystem::create_directory(lDirectory);
     setenv("ZT_QRV_SENSOR_DIR", lDirectory.c_str(), 1);
     setenv("ZT_LIBKPM_PATH", TAVIK_BENCH_LIBKPM, 1);
     setenv("TAVIK_BENCH_ADAPTERS", std::to_string(aBoards).c_str(), 1);
+    setenv(gcStatusPageVariable, aHasStatusPage ? (lDirectory + "/page").c_str() : "", 1);
 
     // A reader of the response FIFO, so that init does not wait for one.
     const std::string lFifo = lDirectory + "/qrvtvkout.fifo";
@@ -111,11 +113,11 @@ ZTCBenchAgent::~ZTCBenchAgent() {
     close(mResponseReader);
 }
 
-ZTCBenchAgent& ZTCBenchAgent::use(unsigned aBoards, unsigned aTargets, unsigned aLogCode) {
-    static auto& srAgents = *new std::map<std::pair<unsigned, unsigned>, ZTCBenchAgent*>();
-    ZTCBenchAgent*& lrpAgent = srAgents[{aBoards, aTargets}];
+ZTCBenchAgent& ZTCBenchAgent::use(unsigned aBoards, unsigned aTargets, unsigned aLogCode, bool aHasStatusPage) {
+    static auto& srAgents = *new std::map<std::tuple<unsigned, unsigned, bool>, ZTCBenchAgent*>();
+    ZTCBenchAgent*& lrpAgent = srAgents[{aBoards, aTargets, aHasStatusPage}];
     if (lrpAgent == nullptr) {
-        lrpAgent = new ZTCBenchAgent(aBoards, aTargets);
+        lrpAgent = new ZTCBenchAgent(aBoards, aTargets, aHasStatusPage);
     }
     setenv("TAVIK_BENCH_ADAPTERS", std::to_string(aBoards).c_str(), 1);
     gpTavikSystem = lrpAgent->mpSystem;

@@ -21,10 +21,11 @@ class ZTCBenchAgent {
 public:
     /// The agent with so many boards and registered targets, port gcBenchPortBase + n and FC id n + 1 each, collecting.
     /// Made at the first call, and then the one that callbacks reach. Sets the log code.
-    static ZTCBenchAgent& use(unsigned aBoards, unsigned aTargets = 0, unsigned aLogCode = gcQuietLogCode);
+    static ZTCBenchAgent& use(unsigned aBoards, unsigned aTargets = 0, unsigned aLogCode = gcQuietLogCode,
+                              bool aHasStatusPage = false);
 
     /// An agent of its own, which callbacks reach until it goes.
-    ZTCBenchAgent(unsigned aBoards, unsigned aTargets);
+    ZTCBenchAgent(unsigned aBoards, unsigned aTargets, bool aHasStatusPage = false);
     ~ZTCBenchAgent();
     ZTCBenchAgent(const ZTCBenchAgent&) = delete;
     ZTCBenchAgent& operator=(const ZTCBenchAgent&) = delete;
