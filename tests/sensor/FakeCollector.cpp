@@ -147,7 +147,8 @@ private:
         if (!readAll(lHeader, sizeof(lHeader))) {
             return false;
         }
-        std::string lBody((lHeader[0] << 24U) | (lHeader[1] << 16U) | (lHeader[2] << 8U) | lHeader[3], '\0');
+        const std::size_t lLength = lHeader[0] * 16777216U + lHeader[1] * 65536U + lHeader[2] * 256U + lHeader[3];
+        std::string lBody(lLength, '\0');
         return readAll(lBody.data(), lBody.size());
     }
 

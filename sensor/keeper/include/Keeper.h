@@ -18,9 +18,45 @@
 #include "sensor/keeper/include/KeeperWorld.h"
 #include "sensor/link/include/Link.h"
 
+using ZTCKeeperTime = std::chrono::steady_clock::time_point;
+
+/// SIGTERM has been sent, SIGKILL follows.
+struct ZTSEnding {
+    bool mIsAsked = false;
+    bool mIsKilled = false;
+    ZTCKeeperTime mKillAt{};
+};
+
+/// The agent that runs.
+struct ZTSKeptAgent {
+    ZTSLinkMessage mStarted;  ///< owns the read end of its response FIFO and its bell
+    bool mHasWorked = false;
+    bool mIsReplaced = false;       ///< the collector has been asked to stop it
+    ZTCKeeperTime mReplaceUntil{};  ///< when patience with that is over
+    std::uint32_t mAdapters = 0;    ///< at the last look; 0 = not known yet
+    std::int64_t mTouch = 0;        ///< its pid file at the last look
+    ZTCKeeperTime mTouched{};       ///< when that was seen to change
+    std::chrono::seconds mHeartbeat{};
+    std::set<std::string> mHostNames;  ///< when it was started
+    ZTSEnding mEnding;
+};
+
+/// An agent that has ended, and whose response FIFO the collector has not drained yet.
+struct ZTSEndedAgent {
+    ZTSLinkMessage mStarted;
+    ZTSLinkMessage mEnded;
+};
+
+struct ZTSKeptCollector {
+    bool mHasWorked = false;
+    bool mIsFinishing = false;    ///< it has been told to finish
+    ZTCKeeperTime mStillUntil{};  ///< without a look until then it counts as hung
+    ZTSEnding mEnding;
+};
+
 class ZTCKeeper {
 public:
-    using ZTCTime = std::chrono::steady_clock::time_point;
+    using ZTCTime = ZTCKeeperTime;
 
     /// @param arWorld     outlives the keeper
     /// @param aHeartbeat  of the agents that will be started
@@ -51,40 +87,6 @@ public:
     int getExitStatus() const { return mHasForced ? 1 : 0; }
 
 private:
-    /// SIGTERM has been sent, SIGKILL follows.
-    struct ZTSEnding {
-        bool mIsAsked = false;
-        bool mIsKilled = false;
-        ZTCTime mKillAt{};
-    };
-
-    /// The agent that runs.
-    struct ZTSAgent {
-        ZTSLinkMessage mStarted;  ///< owns the read end of its response FIFO and its bell
-        bool mHasWorked = false;
-        bool mIsReplaced = false;     ///< the collector has been asked to stop it
-        ZTCTime mReplaceUntil{};      ///< when patience with that is over
-        std::uint32_t mAdapters = 0;  ///< at the last look; 0 = not known yet
-        std::int64_t mTouch = 0;      ///< its pid file at the last look
-        ZTCTime mTouched{};           ///< when that was seen to change
-        std::chrono::seconds mHeartbeat{};
-        std::set<std::string> mHostNames;  ///< when it was started
-        ZTSEnding mEnding;
-    };
-
-    /// An agent that has ended, and whose response FIFO the collector has not drained yet.
-    struct ZTSEndedAgent {
-        ZTSLinkMessage mStarted;
-        ZTSLinkMessage mEnded;
-    };
-
-    struct ZTSCollector {
-        bool mHasWorked = false;
-        bool mIsFinishing = false;  ///< it has been told to finish
-        ZTCTime mStillUntil{};      ///< without a look until then it counts as hung
-        ZTSEnding mEnding;
-    };
-
     void startAgent(ZTCTime aNow);
     void planAgent(ZTCTime aNow, ZTEKeeperRule aRule, const std::string& acrHow);
     void startCollector(ZTCTime aNow);
@@ -105,7 +107,7 @@ private:
     ZTCKeeperWorld& mrWorld;
     std::chrono::seconds mHeartbeat;
 
-    std::optional<ZTSAgent> mAgent;
+    std::optional<ZTSKeptAgent> mAgent;
     std::deque<ZTSEndedAgent> mEndedAgents;
     std::uint64_t mStarts = 0;
     ZTCBackOff mAgentBackOff;
@@ -116,7 +118,7 @@ private:
     std::optional<ZTCTime> mReplacedAt;
     std::optional<ZTSEnding> mStranger;
 
-    std::optional<ZTSCollector> mCollector;
+    std::optional<ZTSKeptCollector> mCollector;
     ZTCBackOff mCollectorBackOff;
     std::optional<ZTCTime> mCollectorStartAt;
 

@@ -91,7 +91,7 @@ void ZTCKeeper::handleAgentEnd(ZTCTime aNow, int aWaitStatus, ZTEStatusEnd aReas
     if (!mAgent) {
         return;
     }
-    ZTSAgent lAgent = std::move(*mAgent);
+    ZTSKeptAgent lAgent = std::move(*mAgent);
     mAgent.reset();
 
     ZTSEndedAgent lEnded;
