@@ -223,7 +223,7 @@ void sEndBySignal(ZTCFaultStage& arStage) {
 void sEndByCommand(ZTCFaultStage& arStage) {
     arStage.agent().library().deliverAll(sMixture());
     arStage.arm();
-    const std::string lAnswer = arStage.agent().request("04");
+    const std::string lAnswer = arStage.agent().request(gcShutDownHex);
     if (lAnswer != gcSuccessHex) {
         throw ZTCFinding("shut-down was answered " + lAnswer);
     }
@@ -274,7 +274,8 @@ std::vector<ZTSFaultPhase> faultPhases() {
         {"command start, again", true, false, false, scUnlimited, sStartCollecting,
          sCommanding(ZTCAgentProcess::startScopeRequest(4096), gcSuccessHex)},
         {"command register-targets", false, false, true, scUnlimited, sStart, sCommanding(lTargets, gcSuccessHex)},
-        {"command stop", true, false, false, scUnlimited, sStartCollecting, sCommanding(bytesOf("02"), gcSuccessHex)},
+        {"command stop", true, false, false, scUnlimited, sStartCollecting,
+         sCommanding(bytesOf(gcStopScopeHex), gcSuccessHex)},
         {"command set-collection-period", true, false, false, scUnlimited, sStart,
          sCommanding(bytesOf("0500000001"), gcSuccessHex)},
         {"broken frames", true, false, true, scUnlimited, sStart, sBreakFrames},

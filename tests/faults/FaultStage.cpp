@@ -150,7 +150,7 @@ void ZTCFaultStage::checkNextStart() {
 }
 
 void ZTCFaultStage::probe() {
-    if (mAgent.request("0500000000") != gcInvalidHex) {
+    if (!mAgent.ping()) {
         throw ZTCFinding("a command got a wrong answer");
     }
 }

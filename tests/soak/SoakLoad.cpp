@@ -91,8 +91,8 @@ void ZTCSoakLoad::playRound() {
     mrAgent.library().startStorm(6, 2, mEvents);
     retrieve();
     command(ZTCAgentProcess::registerTargetsRequest(mTargets), gcSuccessHex);
-    command(bytesOf("02"), gcSuccessHex);
-    command(bytesOf("0500000000"), gcInvalidHex);
+    command(bytesOf(gcStopScopeHex), gcSuccessHex);
+    command(bytesOf(gcPingHex), gcInvalidHex);
     command(bytesOf("0300000000"), gcInvalidHex);
     command(ZTCAgentProcess::startScopeRequest(4096), gcSuccessHex);
     sendBrokenFrame();

@@ -115,7 +115,19 @@ void ZTCAgentProcess::startAndConnectQuietly(unsigned aLogCode, const std::vecto
     lArguments.insert(lArguments.end(), acrMore.begin(), acrMore.end());
     start(lArguments);
     mPipes.open();
-    EXPECT_EQ(request("0500000000"), gcInvalidHex);
+    EXPECT_TRUE(ping());
+}
+
+testing::AssertionResult ZTCAgentProcess::ping() {
+    const std::string lAnswer = request(gcPingHex);
+    if (lAnswer != gcInvalidHex) {
+        return testing::AssertionFailure() << "the agent answers a ping with " << lAnswer << ", not " << gcInvalidHex;
+    }
+    return testing::AssertionSuccess();
+}
+
+std::string periodHex(std::uint32_t aSeconds) {
+    return ZTCByteWriter().u8(5).u32(aSeconds).hex();
 }
 
 std::unique_ptr<ZTCChildProcess> ZTCAgentProcess::launch(const std::vector<std::string>& acrArguments) {

@@ -6,8 +6,10 @@
 #ifndef TESTS_SUPPORT_AGENTPROCESS_H
 #define TESTS_SUPPORT_AGENTPROCESS_H
 
+#include <gtest/gtest.h>
 #include <sys/types.h>
 
+#include <cstdint>
 #include <map>
 #include <memory>
 #include <string>
@@ -32,6 +34,12 @@ struct ZTSRunResult {
 /// Responses without data, as hex of their bodies.
 inline constexpr const char* gcSuccessHex = "0000000000";
 inline constexpr const char* gcInvalidHex = "010006";
+
+/// Requests, as hex of their bodies. A collection period of 0 seconds is always refused and changes nothing.
+inline constexpr const char* gcPingHex = "0500000000";
+inline constexpr const char* gcStopScopeHex = "02";
+inline constexpr const char* gcShutDownHex = "04";
+std::string periodHex(std::uint32_t aSeconds);
 inline constexpr const char* gcNotAllowedHex = "010009";
 
 /// A remote port of the register-targets command.
@@ -101,6 +109,8 @@ public:
     ZTCSensorPipes& pipes() { return mPipes; }
     /// One request and its response, as hex of the bodies.
     std::string request(std::string_view aBodyHex);
+    /// Asks for what changes nothing, and holds where the agent answers as it should.
+    testing::AssertionResult ping();
     /// Start command with this limit of event data per record; fails the test where it is not answered with success.
     void startScope(unsigned aMaxEventDataSize = 4096);
     void registerTargets(const std::vector<ZTSTarget>& acrTargets);

@@ -23,7 +23,7 @@ TEST(Admission, EveryCallbackDropsItsEventWhileCollectionIsOff) {
     ZTCAgentProcess lAgent;
     lAgent.startAndConnect();
     lAgent.startScope();
-    EXPECT_EQ(lAgent.request("02"), gcSuccessHex);
+    EXPECT_EQ(lAgent.request(gcStopScopeHex), gcSuccessHex);
     lAgent.library().deliverAll(sOneOfEach());
     EXPECT_EQ(lAgent.log().count(sSwitchedOff, "-N-"), 4u);
     EXPECT_EQ(lAgent.retrieve().texts(), ZTCTexts{});
@@ -155,7 +155,7 @@ TEST(Admission, StoppingAndStartingAgainKeepsWhatWasCollected) {
     lAgent.startScope();
     const ZTSLibraryEvent lEvent = ZTSLibraryEvent::scope(0, 4, 0x01, scsiData(gcRemotePort, 3));
     lAgent.library().deliver(lEvent);
-    EXPECT_EQ(lAgent.request("02"), gcSuccessHex);
+    EXPECT_EQ(lAgent.request(gcStopScopeHex), gcSuccessHex);
     lAgent.library().deliver(lEvent);
     lAgent.startScope();
     lAgent.library().deliver(lEvent);

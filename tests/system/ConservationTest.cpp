@@ -102,7 +102,7 @@ private:
     void step() {
         switch (mrSeed.below(12)) {
             case 0:
-                EXPECT_EQ(mAgent.request("02"), gcSuccessHex);
+                EXPECT_EQ(mAgent.request(gcStopScopeHex), gcSuccessHex);
                 break;
             case 1:
             case 2:

@@ -132,7 +132,7 @@ TEST(Fault, AnAnswerThatIsInterruptedIsWhole) {
     lAgent.startAndConnectQuietly();
     for (const int lErrno : {EINTR, EAGAIN}) {
         lFaults.arm({"writev", 1, lErrno});
-        EXPECT_EQ(lAgent.request("0500000001"), gcSuccessHex);
+        EXPECT_EQ(lAgent.request(periodHex(1)), gcSuccessHex);
         EXPECT_TRUE(lFaults.hasFired());
     }
     lFaults.disarm();
@@ -143,14 +143,14 @@ TEST(Fault, ACommandThatArrivesByteByByteAndIsInterruptedIsAnswered) {
     ZTCFaultInjection lFaults(lAgent);
     lAgent.startAndConnectQuietly();
     lFaults.arm({"read", 1, 0, 1, true});
-    EXPECT_EQ(lAgent.request("0500000001"), gcSuccessHex);
+    EXPECT_EQ(lAgent.request(periodHex(1)), gcSuccessHex);
     EXPECT_TRUE(lFaults.hasFired());
     for (const char* lpCall : {"read", "poll"}) {
         for (unsigned lNth = 1; lNth <= 2; ++lNth) {
             lFaults.arm({lpCall, lNth, EINTR});
             // The agent may be in the call already when it is told: the second one may belong to the next request.
             for (int i = 0; i < 3 && !lFaults.hasFired(); ++i) {
-                EXPECT_EQ(lAgent.request("0500000001"), gcSuccessHex);
+                EXPECT_EQ(lAgent.request(periodHex(1)), gcSuccessHex);
             }
             EXPECT_TRUE(lFaults.hasFired()) << lpCall;
         }
@@ -178,7 +178,7 @@ TEST(Fault, ACommandWhoseAnswerCannotBeWrittenEndsTheAgentInOrder) {
     ZTCFaultInjection lFaults(lAgent);
     lAgent.startAndConnect();
     lFaults.arm({"writev", 1, EIO});
-    EXPECT_THROW(lAgent.request("0500000001"), std::runtime_error);
+    EXPECT_THROW(lAgent.request(periodHex(1)), std::runtime_error);
     EXPECT_EQ(lAgent.waitForExit(), 0);
     lFaults.disarm();
     EXPECT_TRUE(lFaults.hasFired());
@@ -197,7 +197,7 @@ TEST(Fault, ALogThatCannotBeWrittenKeepsNothingFromHappeningAndTellsOfItsLoss) {
     EXPECT_EQ(lAgent.retrieve().texts(), ZTCTexts{"4/1 x1 " + qFullRecord(gcRemotePort, {3})});
     lFaults.disarm();
     EXPECT_TRUE(lFaults.hasFired());
-    EXPECT_EQ(lAgent.request("0500000001"), gcSuccessHex);
+    EXPECT_EQ(lAgent.request(periodHex(1)), gcSuccessHex);
     EXPECT_EQ(lAgent.log().containing("could not be written").size(), 1u);
 }
 

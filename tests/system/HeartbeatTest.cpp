@@ -54,7 +54,7 @@ TEST(Heartbeat, ASilentSensorThatLivesOnlyEarnsNotices) {
         lCycles += lLines[i].mText == sUpdating ? 1 : 0;
     }
     EXPECT_EQ(lCycles, 3u);
-    EXPECT_EQ(lAgent.request("0500000000"), gcInvalidHex);
+    EXPECT_TRUE(lAgent.ping());
 }
 
 TEST(Heartbeat, ASensorThatLivesAndTouchesItsFileAgainIsForgiven) {
@@ -152,7 +152,7 @@ TEST(Heartbeat, AnAgentThatCannotTouchItsOwnFileEnds) {
     ZTCAgentProcess lAgent;
     writeFile(lAgent.sensorPidFilePath(), std::to_string(getpid()) + "\n");
     sStart(lAgent);
-    EXPECT_EQ(lAgent.request("0500000000"), gcInvalidHex);
+    EXPECT_TRUE(lAgent.ping());
     std::filesystem::remove(lAgent.pidFilePath());
     EXPECT_EQ(lAgent.waitForExit(), 0);
     EXPECT_EQ(lAgent.log().count("Failed in updating the status", "-H-"), 1u);
@@ -190,7 +190,7 @@ TEST(Heartbeat, TheOwnFileIsTouchedOnceACycleBeforeTheSensorIsLookedAt) {
 TEST(Heartbeat, AnExitCutsTheWaitShortWithoutAnotherTouch) {
     ZTCAgentProcess lAgent;
     lAgent.startAndConnect();
-    EXPECT_EQ(lAgent.request("04"), gcSuccessHex);
+    EXPECT_EQ(lAgent.request(gcShutDownHex), gcSuccessHex);
     EXPECT_EQ(lAgent.waitForExit(), 0);
     EXPECT_EQ(lAgent.log().count("Exiting Heartbeat Handler Thread as it is marked for exit.", "-H-"), 1u);
     EXPECT_FALSE(lAgent.log().has(sUpdating));

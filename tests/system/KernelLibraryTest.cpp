@@ -93,6 +93,6 @@ TEST_F(KernelLibrary, TheShutDownCommandClosesItAndIsAnswered) {
     addHost(1);
     mAgent.startAndConnect();
     mAgent.startScope();
-    EXPECT_EQ(mAgent.request("04"), gcSuccessHex);
+    EXPECT_EQ(mAgent.request(gcShutDownHex), gcSuccessHex);
     EXPECT_EQ(mAgent.waitForExit(), 0);
 }

@@ -48,7 +48,7 @@ public:
             killWithin(60, [this](const std::atomic<bool>& acrIsKilled) { comeAsASensor(acrIsKilled); });
         } else {
             mAgent.pipes().open();
-            EXPECT_EQ(mAgent.request("0500000000"), gcInvalidHex);
+            EXPECT_TRUE(mAgent.ping());
             if (lPhase == ZTEKillPhase::Load) {
                 killWithin(150, [&](const std::atomic<bool>&) { load(lAcknowledged, 1u << 30); });
             } else {
@@ -110,7 +110,7 @@ private:
             mAgent.library().deliver(ZTSLibraryEvent::temperature(1));
             ++arAcknowledged.mEvents;
             mAgent.retrieve();
-            if (mAgent.request("02") == gcSuccessHex) {
+            if (mAgent.request(gcStopScopeHex) == gcSuccessHex) {
                 ++arAcknowledged.mStops;
             }
             mAgent.startScope();
@@ -121,7 +121,7 @@ private:
         if (mrSeed.below(2) == 0) {
             mAgent.process().sendSignal(SIGTERM);
         } else {
-            mAgent.request("04");
+            mAgent.request(gcShutDownHex);
         }
     }
 

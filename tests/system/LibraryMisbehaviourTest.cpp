@@ -72,7 +72,7 @@ TEST(LibraryMisbehaviour, ACloseThatDeliversOnManyThreadsAndWaitsForThemEnds) {
     }
     lAgent.library().startStorm(8, 0, sOneOfEachKind(0));
     lAgent.retrieve();
-    EXPECT_EQ(lAgent.request("04"), gcSuccessHex);
+    EXPECT_EQ(lAgent.request(gcShutDownHex), gcSuccessHex);
     EXPECT_EQ(lAgent.waitForExit(), 0);
     EXPECT_EQ(lAgent.library().callsOf("deliver-in-close returned").size(), 1u);
     EXPECT_TRUE(lAgent.library().callsOf("deliver-in-close failed").empty());

@@ -20,7 +20,7 @@ TEST(Log, EveryLineHasItsTimeMarkPlaceAndText) {
         lAgent.library().deliver(ZTSLibraryEvent::scope(0, lcrKind.mCategory, lcrKind.mSubcategory, lcrKind.mData));
     }
     lAgent.retrieve();
-    EXPECT_EQ(lAgent.request("04"), gcSuccessHex);
+    EXPECT_EQ(lAgent.request(gcShutDownHex), gcSuccessHex);
     EXPECT_EQ(lAgent.waitForExit(), 0);
     const auto lRaw = lAgent.log().rawLines();
     EXPECT_GT(lRaw.size(), 500u);
@@ -64,8 +64,8 @@ TEST(Log, EveryTracedFunctionThatIsEnteredIsLeft) {
     lAgent.library().deliver(ZTSLibraryEvent::rscn(0, rscnPayload({1, 1, 0x01000002})));
     lAgent.library().deliver(ZTSLibraryEvent::scope(0, 1, 1, {}));
     lAgent.retrieve();
-    lAgent.request("0500000000");
-    lAgent.request("02");
+    lAgent.request(gcPingHex);
+    lAgent.request(gcStopScopeHex);
     EXPECT_EQ(lAgent.stop(), 0);
     std::map<std::string, long> lBalance;
     long lEntered = 0;
@@ -107,7 +107,7 @@ TEST(Log, TheFileIsMadeForItsUserAndGroupLessTheUmask) {
 TEST(Log, LinesGoToTheDefaultFileUntilTheCommandLineNamesAnother) {
     ZTCAgentProcess lAgent;
     lAgent.startAndConnect();
-    EXPECT_EQ(lAgent.request("02"), gcSuccessHex);
+    EXPECT_EQ(lAgent.request(gcStopScopeHex), gcSuccessHex);
     EXPECT_TRUE(lAgent.defaultLog().has("Starting the Tavik"));
     EXPECT_FALSE(lAgent.defaultLog().has("Stopping Scope Data Collection."));
     EXPECT_FALSE(lAgent.log().has("Starting the Tavik"));
@@ -118,7 +118,7 @@ TEST(Log, ARelativeNameIsTakenFromTheDirectoryOfTheStart) {
     ZTCAgentProcess lAgent;
     lAgent.start({"-D", "false", "-l", "here.log"});
     lAgent.pipes().open();
-    EXPECT_EQ(lAgent.request("02"), gcSuccessHex);
+    EXPECT_EQ(lAgent.request(gcStopScopeHex), gcSuccessHex);
     EXPECT_TRUE(ZTCAgentLog(lAgent.workingDirectory() + "/here.log").has("Stopping Scope Data Collection."));
 }
 
@@ -126,7 +126,7 @@ TEST(Log, LinesAreAppendedToAFileThatExists) {
     ZTCAgentProcess lAgent;
     writeFile(lAgent.agentLogPath(), "an older line\n");
     lAgent.startAndConnect();
-    EXPECT_EQ(lAgent.request("02"), gcSuccessHex);
+    EXPECT_EQ(lAgent.request(gcStopScopeHex), gcSuccessHex);
     EXPECT_TRUE(readFile(lAgent.agentLogPath()).starts_with("an older line\n"));
 }
 
@@ -134,7 +134,7 @@ TEST(Log, ALineIsInTheFileWhenItsResponseIsThere) {
     ZTCAgentProcess lAgent;
     lAgent.startAndConnect();
     for (std::size_t i = 1; i <= 20; ++i) {
-        EXPECT_EQ(lAgent.request("02"), gcSuccessHex);
+        EXPECT_EQ(lAgent.request(gcStopScopeHex), gcSuccessHex);
         EXPECT_EQ(lAgent.log().count("Stopping Scope Data Collection."), i);
     }
     lAgent.kill();
@@ -148,7 +148,7 @@ TEST(Log, ASymbolicLinkIsNeverFollowed) {
     std::filesystem::create_symlink(lVictim, lAgent.agentLogPath());
     lAgent.start();
     lAgent.pipes().open();
-    EXPECT_EQ(lAgent.request("02"), gcSuccessHex);
+    EXPECT_EQ(lAgent.request(gcStopScopeHex), gcSuccessHex);
     EXPECT_EQ(readFile(lVictim), "untouched");
     EXPECT_NE(lAgent.process().standardError().find("Stopping Scope Data Collection."), std::string::npos);
     EXPECT_EQ(lAgent.stop(), 0);
@@ -162,7 +162,7 @@ TEST(Log, LinesThatCannotBeWrittenGoToStandardErrorAndAreCounted) {
     const ZTCAgentLog lLater(lDirectory + "/agent.log");
     lAgent.start({"-D", "false", "-d", "63", "-l", lLater.path()});
     lAgent.pipes().open();
-    EXPECT_EQ(lAgent.request("02"), gcSuccessHex);
+    EXPECT_EQ(lAgent.request(gcStopScopeHex), gcSuccessHex);
     EXPECT_NE(lAgent.process().standardError().find("Stopping Scope Data Collection."), std::string::npos);
     // Only the lines of the log count, not what is said about the file on standard error.
     const long lLost = static_cast<long>(parseLogLines(lAgent.process().standardError()).size());
@@ -170,7 +170,7 @@ TEST(Log, LinesThatCannotBeWrittenGoToStandardErrorAndAreCounted) {
     std::filesystem::create_directory(lDirectory);
     lAgent.process().sendSignal(SIGHUP);
     waitUntil([&] { return exists(lLater.path()); }, "the log to be made");
-    EXPECT_EQ(lAgent.request("0500000001"), gcSuccessHex);
+    EXPECT_EQ(lAgent.request(periodHex(1)), gcSuccessHex);
     EXPECT_TRUE(lLater.has("The limit set is 262144"));
     bool lIsReported = false;
     for (const std::string& lcrLine : lLater.rawLines()) {
@@ -196,7 +196,7 @@ TEST(Log, AFullFileIsRenamedAndBegunAnew) {
     writeFile(lAgent.agentLogPath() + ".1", "the one before");
     lAgent.start();
     lAgent.pipes().open();
-    EXPECT_EQ(lAgent.request("02"), gcSuccessHex);
+    EXPECT_EQ(lAgent.request(gcStopScopeHex), gcSuccessHex);
     EXPECT_TRUE(lAgent.log().has("Stopping Scope Data Collection."));
     EXPECT_LT(std::filesystem::file_size(lAgent.agentLogPath()), sLimit);
     EXPECT_LE(std::filesystem::file_size(lAgent.agentLogPath() + ".1"), sLimit + 65536);
@@ -210,12 +210,12 @@ TEST(Log, AFileThatFillsUpWhileTheAgentRunsIsRenamedThen) {
     lAgent.start();
     lAgent.pipes().open();
     for (int i = 0; i < 3000 && !exists(lAgent.agentLogPath() + ".1"); ++i) {
-        ASSERT_EQ(lAgent.request("02"), gcSuccessHex);
+        ASSERT_EQ(lAgent.request(gcStopScopeHex), gcSuccessHex);
     }
     EXPECT_TRUE(exists(lAgent.agentLogPath() + ".1"));
     EXPECT_LE(std::filesystem::file_size(lAgent.agentLogPath() + ".1"), sLimit + 65536);
     EXPECT_LT(std::filesystem::file_size(lAgent.agentLogPath()), 65536u);
-    EXPECT_EQ(lAgent.request("0500000007"), gcSuccessHex);
+    EXPECT_EQ(lAgent.request(periodHex(7)), gcSuccessHex);
     EXPECT_TRUE(lAgent.log().has("The limit set is 262144"));
 }
 

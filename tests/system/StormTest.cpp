@@ -102,7 +102,7 @@ TEST(Storm, StopsAndStartsInAStormLoseNothingThatWasAdmitted) {
     lAgent.library().startStorm(4, 2000, {ZTSLibraryEvent::bare(0, 2, 1), ZTSLibraryEvent::bare(1, 8, 1)});
     std::map<ZTCKind, std::uint64_t> lCounts;
     for (int i = 0; i < 25; ++i) {
-        EXPECT_EQ(lAgent.request("02"), gcSuccessHex);
+        EXPECT_EQ(lAgent.request(gcStopScopeHex), gcSuccessHex);
         lAgent.startScope();
         sAdd(lCounts, lAgent.retrieve());
     }

@@ -20,7 +20,7 @@ static const char* const sLimitLine = "The limit set is 262144";
 
 /// One command that is answered and logs one line, however the log fares.
 static void sExpectServed(ZTCAgentProcess& arAgent) {
-    ASSERT_EQ(arAgent.request("0500000007"), gcSuccessHex);
+    ASSERT_EQ(arAgent.request(periodHex(7)), gcSuccessHex);
 }
 
 static std::string sStandardError(ZTCAgentProcess& arAgent) {
