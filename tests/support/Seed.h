@@ -1,18 +1,19 @@
-/// The seed of a test with random choices: drawn anew in each run, or that of the environment variable ZT_TEST_SEED,
-/// and printed where the test fails.
+/// The seed of a test with random choices. It is that of the environment variable ZT_TEST_SEED, else the one that the
+/// test asks for, else drawn anew in each run. It is printed where the test fails.
 #ifndef TESTS_SUPPORT_SEED_H
 #define TESTS_SUPPORT_SEED_H
 
 #include <gtest/gtest.h>
 
 #include <cstdlib>
+#include <optional>
 #include <random>
 #include <string>
 
 class ZTCTestSeed {
 public:
-    ZTCTestSeed()
-        : mSeed(drawSeed()),
+    explicit ZTCTestSeed(std::optional<unsigned> aWanted = std::nullopt)
+        : mSeed(chooseSeed(aWanted)),
           mEngine(mSeed),
           mTrace(__FILE__, __LINE__, "to repeat this: ZT_TEST_SEED=" + std::to_string(mSeed)) {}
 
@@ -22,9 +23,11 @@ public:
     unsigned below(unsigned aBound) { return std::uniform_int_distribution<unsigned>(0, aBound - 1)(mEngine); }
 
 private:
-    static unsigned drawSeed() {
-        const char* const lpGiven = std::getenv("ZT_TEST_SEED");
-        return lpGiven != nullptr ? static_cast<unsigned>(std::strtoul(lpGiven, nullptr, 10)) : std::random_device()();
+    static unsigned chooseSeed(std::optional<unsigned> aWanted) {
+        if (const char* const lpGiven = std::getenv("ZT_TEST_SEED")) {
+            return static_cast<unsigned>(std::strtoul(lpGiven, nullptr, 10));
+        }
+        return aWanted ? *aWanted : std::random_device()();
     }
 
     unsigned mSeed;

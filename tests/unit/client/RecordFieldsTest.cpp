@@ -8,6 +8,7 @@
 
 #include "sensor/client/include/RecordJson.h"
 #include "sensor/client/include/RecordTable.h"
+#include "tests/support/Seed.h"
 #include "tests/unit/client/WireSamples.h"
 
 using testing::AllOf;
@@ -136,7 +137,8 @@ TEST(RecordFields, EachAddressFormatHasItsName) {
 }
 
 TEST(RecordFields, RandomDataOfAnyKindNeverCrashesIt) {
-    std::mt19937 lRandom(99);
+    ZTCTestSeed lSeed;
+    std::mt19937& lRandom = lSeed.engine();
     for (int i = 0; i < 20000; ++i) {
         ZTCBytes lData(lRandom() % 140);
         for (unsigned char& lrByte : lData) {

@@ -9,6 +9,7 @@
 
 #include "sensor/client/include/RecordJson.h"
 #include "sensor/client/include/RecordTable.h"
+#include "tests/support/Seed.h"
 #include "tests/support/TemporaryDirectory.h"
 #include "tests/unit/client/WireSamples.h"
 
@@ -221,7 +222,8 @@ static void sFeed(const ZTCBytes& acrBody) {
 }
 
 TEST(ResponseDecoder, RandomBytesNeverCrashIt) {
-    std::mt19937 lRandom(20260304);
+    ZTCTestSeed lSeed;
+    std::mt19937& lRandom = lSeed.engine();
     for (int i = 0; i < 5000; ++i) {
         ZTCBytes lBody(lRandom() % 300);
         for (unsigned char& lrByte : lBody) {
@@ -235,7 +237,8 @@ TEST(ResponseDecoder, RandomBytesNeverCrashIt) {
 }
 
 TEST(ResponseDecoder, DamagedResponsesNeverCrashIt) {
-    std::mt19937 lRandom(4711);
+    ZTCTestSeed lSeed;
+    std::mt19937& lRandom = lSeed.engine();
     const ZTCBytes lWhole = makeFullSampleResponse();
     for (int i = 0; i < 1000; ++i) {
         ZTCBytes lBody = lWhole;

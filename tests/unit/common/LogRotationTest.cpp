@@ -3,9 +3,8 @@
 #include <cstdarg>
 #include <filesystem>
 #include <string>
-#include <thread>
-#include <vector>
 
+#include "tests/support/TestThreads.h"
 #include "tests/unit/common/LogSinkTesting.h"
 
 namespace {
@@ -134,20 +133,14 @@ TEST_F(LogRotation, ManyThreadsLoseNothingOverRotationsAndReopenings) {
     mpSink->allowRotation(true);
     mpSink->setBound(lcThreads * lcLines * 7 / 2);  // one rotation in all
     mpSink->setPath(mPath.c_str());
-    std::vector<std::thread> lThreads;
-    for (int lThread = 0; lThread < lcThreads; ++lThread) {
-        lThreads.emplace_back([this] {
-            for (int i = 0; i < lcLines; ++i) {
-                writeTo(*mpSink, "xx");  // 7 bytes with mark and line break
-                if (i % 50 == 0) {
-                    mpSink->reopen();
-                }
+    runOnThreads(lcThreads, [this](unsigned) {
+        for (int i = 0; i < lcLines; ++i) {
+            writeTo(*mpSink, "xx");  // 7 bytes with mark and line break
+            if (i % 50 == 0) {
+                mpSink->reopen();
             }
-        });
-    }
-    for (std::thread& lrThread : lThreads) {
-        lrThread.join();
-    }
+        }
+    });
     EXPECT_EQ(static_cast<std::size_t>(lcThreads * lcLines), sinkLines(mPath).size() + sinkLines(mPath + ".1").size());
     EXPECT_EQ("", mStandardError.take());
 }

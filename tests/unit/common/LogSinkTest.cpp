@@ -9,11 +9,11 @@
 #include <cstdio>
 #include <ctime>
 #include <string>
-#include <thread>
 #include <vector>
 
 #include "tests/support/FailingAllocation.h"
 #include "tests/support/ResourceLimit.h"
+#include "tests/support/TestThreads.h"
 #include "tests/unit/common/LogSinkTesting.h"
 
 namespace {
@@ -181,18 +181,12 @@ TEST_F(LogSink, LinesOfManyThreadsNeverInterleave) {
     constexpr int lcThreads = 8;
     constexpr int lcLines = 300;
     mpSink->setPath(mPath.c_str());
-    std::vector<std::thread> lThreads;
-    for (int lThread = 0; lThread < lcThreads; ++lThread) {
-        lThreads.emplace_back([this, lThread] {
-            for (int i = 0; i < lcLines; ++i) {
-                const std::string lText(static_cast<std::size_t>(i * 17 % 3000), static_cast<char>('a' + lThread));
-                writeTo(*mpSink, "%d %d %s", lThread, i, lText.c_str());
-            }
-        });
-    }
-    for (std::thread& lrThread : lThreads) {
-        lrThread.join();
-    }
+    runOnThreads(lcThreads, [this](unsigned aThread) {
+        for (int i = 0; i < lcLines; ++i) {
+            const std::string lText(static_cast<std::size_t>(i * 17 % 3000), static_cast<char>('a' + aThread));
+            writeTo(*mpSink, "%u %d %s", aThread, i, lText.c_str());
+        }
+    });
     std::vector<int> lNext(lcThreads, 0);
     const Lines lLines = linesOfFile(mPath);
     ASSERT_EQ(static_cast<std::size_t>(lcThreads * lcLines), lLines.size());

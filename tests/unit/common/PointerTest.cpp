@@ -7,11 +7,11 @@
 #include <cstring>
 #include <memory>
 #include <string>
-#include <thread>
 #include <type_traits>
 #include <vector>
 
 #include "tests/support/FailingAllocation.h"
+#include "tests/support/TestThreads.h"
 
 namespace {
 
@@ -208,20 +208,13 @@ TEST_F(Pointer, ConvertsToAPointerToConst) {
 TEST_F(Pointer, CopiesMayComeAndGoOnManyThreads) {
     {
         ZTCPointer<ZTSObserved> lPointer(NEW ZTSObserved(1));
-        std::vector<std::thread> lThreads;
-        for (int i = 0; i < 4; ++i) {
-            lThreads.emplace_back([lPointer] {
-                for (int lRound = 0; lRound < 2000; ++lRound) {
-                    ZTCPointer<ZTSObserved> lCopy(lPointer);
-                    ZTCPointer<ZTSObserved> lOther;
-                    lOther = lCopy;
-                }
-            });
-        }
-        for (std::thread& lrThread : lThreads) {
-            lrThread.join();
-        }
-        lThreads.clear();
+        runOnThreads(4, [lPointer](unsigned) {
+            for (int lRound = 0; lRound < 2000; ++lRound) {
+                ZTCPointer<ZTSObserved> lCopy(lPointer);
+                ZTCPointer<ZTSObserved> lOther;
+                lOther = lCopy;
+            }
+        });
         EXPECT_EQ(1, ZTSObserved::sAlive);
     }
     EXPECT_EQ(std::vector<int>{1}, ZTSObserved::sDestroyed);

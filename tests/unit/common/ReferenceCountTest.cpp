@@ -3,8 +3,8 @@
 #include <gtest/gtest.h>
 
 #include <atomic>
-#include <thread>
-#include <vector>
+
+#include "tests/support/TestThreads.h"
 
 TEST(ReferenceCount, CountsUpAndReturnsTheNewCountOnTheWayDown) {
     ZTCReferenceCount lCount(1);
@@ -24,22 +24,16 @@ TEST(ReferenceCount, ExactlyOneThreadGetsToZero) {
     constexpr unsigned lcRounds = 2000;
     ZTCReferenceCount lCount(lcThreads);
     std::atomic<unsigned> lZeros{0};
-    std::vector<std::thread> lThreads;
-    for (unsigned i = 0; i < lcThreads; ++i) {
-        lThreads.emplace_back([&lCount, &lZeros] {
-            for (unsigned lRound = 0; lRound < lcRounds; ++lRound) {
-                lCount.increment();
-                if (lCount.decrement() == 0) {
-                    ++lZeros;
-                }
-            }
+    runOnThreads(lcThreads, [&lCount, &lZeros](unsigned) {
+        for (unsigned lRound = 0; lRound < lcRounds; ++lRound) {
+            lCount.increment();
             if (lCount.decrement() == 0) {
                 ++lZeros;
             }
-        });
-    }
-    for (std::thread& lrThread : lThreads) {
-        lrThread.join();
-    }
+        }
+        if (lCount.decrement() == 0) {
+            ++lZeros;
+        }
+    });
     EXPECT_EQ(1u, lZeros.load());
 }

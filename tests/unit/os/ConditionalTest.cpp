@@ -5,9 +5,9 @@
 #include <atomic>
 #include <chrono>
 #include <thread>
-#include <vector>
 
 #include "common/include/Exception.h"
+#include "tests/support/TestThreads.h"
 #include "tests/support/Waiting.h"
 #include "tests/unit/os/LogCapture.h"
 
@@ -56,21 +56,17 @@ TEST(Conditional, ASignalAfterATimeOutIsKept) {
 
 TEST(Conditional, ASignalWakesEveryThreadThatWaits) {
     ZTCConditional lConditional;
-    std::vector<std::thread> lThreads;
-    for (int lThread = 0; lThread < 4; ++lThread) {
-        lThreads.emplace_back([&lConditional, lThread] {
-            if (lThread % 2 == 0) {
-                lConditional.wait();
-            } else {
-                EXPECT_NO_THROW(lConditional.timedWait(4294967295u));
-            }
-        });
-    }
+    ZTCTestThreads lThreads;
+    lThreads.start(4, [&lConditional](unsigned aThread) {
+        if (aThread % 2 == 0) {
+            lConditional.wait();
+        } else {
+            EXPECT_NO_THROW(lConditional.timedWait(4294967295u));
+        }
+    });
     sWaitForWaiters(lConditional, 4);
     lConditional.signal();
-    for (std::thread& lrThread : lThreads) {
-        lrThread.join();
-    }
+    lThreads.join();
     EXPECT_THROW(lConditional.timedWait(milliseconds(0)), ZTCTimeOutEx) << "the signal was used up";
 }
 

@@ -10,6 +10,8 @@
 
 #include "common/include/Exception.h"
 
+#include "tests/support/Seed.h"
+
 static std::string sHeader(std::uint32_t aLength) {
     std::string lHeader;
     for (int lShift = 24; lShift >= 0; lShift -= 8) {
@@ -67,7 +69,8 @@ TEST(FrameAssembler, AStreamMayBeCutAtEveryPlace) {
 }
 
 TEST(FrameAssembler, RandomCutsOfRandomFramesYieldTheSameBodies) {
-    std::mt19937 lRandom(20240229);
+    ZTCTestSeed lSeed;
+    std::mt19937& lRandom = lSeed.engine();
     for (int lRound = 0; lRound < 200; ++lRound) {
         std::vector<std::string> lBodies;
         std::string lStream;

@@ -2,26 +2,18 @@
 
 #include <gtest/gtest.h>
 
-#include <thread>
-#include <vector>
-
+#include "tests/support/TestThreads.h"
 #include "tests/unit/os/LogCapture.h"
 
 TEST(Mutex, OneThreadAtATimeIsInside) {
     ZTCMutex lMutex;
     int lCount = 0;
-    std::vector<std::thread> lThreads;
-    for (int lThread = 0; lThread < 4; ++lThread) {
-        lThreads.emplace_back([&] {
-            for (int lRound = 0; lRound < 1000; ++lRound) {
-                ZTCMutexLock lLock(lMutex);
-                ++lCount;
-            }
-        });
-    }
-    for (std::thread& lrThread : lThreads) {
-        lrThread.join();
-    }
+    runOnThreads(4, [&](unsigned) {
+        for (int lRound = 0; lRound < 1000; ++lRound) {
+            ZTCMutexLock lLock(lMutex);
+            ++lCount;
+        }
+    });
     EXPECT_EQ(lCount, 4000);
 }
 

@@ -3,10 +3,11 @@
 #include <gtest/gtest.h>
 
 #include <set>
-#include <thread>
 #include <vector>
 
 #include "common/include/Memory.h"
+
+#include "tests/support/TestThreads.h"
 
 TEST(BufferManager, ABufferIsEmptyAndHasRoom) {
     ZTCBufferManager lManager;
@@ -76,19 +77,13 @@ TEST(BufferManager, ClearingLeavesTheBufferWithItsOwner) {
 
 TEST(BufferManager, ThreadsMayUseItAtOnce) {
     ZTCBufferManager lManager;
-    std::vector<std::thread> lThreads;
-    for (int lThread = 0; lThread < 4; ++lThread) {
-        lThreads.emplace_back([&] {
-            for (int lRound = 0; lRound < 500; ++lRound) {
-                ZTCPointer<ZTCBuffer> lBuffer;
-                lManager.getBuffer(16, lBuffer);
-                ASSERT_EQ(lBuffer->getSize(), 0u);
-                lBuffer->append("0123456789abcdef", 16);
-                lManager.reuseBuffer(lBuffer);
-            }
-        });
-    }
-    for (std::thread& lrThread : lThreads) {
-        lrThread.join();
-    }
+    runOnThreads(4, [&](unsigned) {
+        for (int lRound = 0; lRound < 500; ++lRound) {
+            ZTCPointer<ZTCBuffer> lBuffer;
+            lManager.getBuffer(16, lBuffer);
+            ASSERT_EQ(lBuffer->getSize(), 0u);
+            lBuffer->append("0123456789abcdef", 16);
+            lManager.reuseBuffer(lBuffer);
+        }
+    });
 }

@@ -8,6 +8,7 @@
 #include "common/include/Exception.h"
 #include "common/include/Memory.h"
 #include "tests/support/FailingAllocation.h"
+#include "tests/support/TestThreads.h"
 
 class ZTCNumber : public ZTCQueueable {
 public:
@@ -94,32 +95,28 @@ TEST(SynchList, WaitingEndsWithAnItemATimeOutOrAnInterruption) {
 TEST(SynchList, EveryItemReachesExactlyOneThread) {
     ZTCSynchList lList;
     std::vector<int> lTaken[2];
-    std::vector<std::thread> lThreads;
-    for (std::vector<int>& lrTaken : lTaken) {
-        lThreads.emplace_back([&lList, &lrTaken] {
-            for (;;) {
-                lList.waitWhileEmpty(60);
-                int lNumber;
-                try {
-                    lNumber = sNumber(lList.popFront());
-                } catch (const ZTCNotFoundEx&) {
-                    continue;  // the other one was faster
-                }
-                if (lNumber < 0) {
-                    return;
-                }
-                lrTaken.push_back(lNumber);
+    ZTCTestThreads lThreads;
+    lThreads.start(2, [&lList, &lTaken](unsigned aThread) {
+        for (;;) {
+            lList.waitWhileEmpty(60);
+            int lNumber;
+            try {
+                lNumber = sNumber(lList.popFront());
+            } catch (const ZTCNotFoundEx&) {
+                continue;  // the other one was faster
             }
-        });
-    }
+            if (lNumber < 0) {
+                return;
+            }
+            lTaken[aThread].push_back(lNumber);
+        }
+    });
     for (int lNumber = 0; lNumber < 1000; ++lNumber) {
         lList.pushBack(sItem(lNumber));
     }
     lList.pushBack(sItem(-1));
     lList.pushBack(sItem(-1));
-    for (std::thread& lrThread : lThreads) {
-        lrThread.join();
-    }
+    lThreads.join();
     std::vector<bool> lSeen(1000, false);
     for (const std::vector<int>& lcrTaken : lTaken) {
         for (const int lNumber : lcrTaken) {

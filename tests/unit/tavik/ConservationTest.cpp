@@ -1,34 +1,32 @@
 #include <gtest/gtest.h>
 
 #include <array>
-#include <atomic>
-#include <cstdlib>
 #include <map>
+#include <optional>
 #include <random>
 #include <set>
 #include <shared_mutex>
 #include <thread>
 
 #include "common/include/Log.h"
+#include "tests/support/Seed.h"
+#include "tests/support/TestThreads.h"
 #include "tests/unit/tavik/support/DeliveredKinds.h"
 #include "tests/unit/tavik/support/Deliveries.h"
 #include "tests/unit/tavik/support/TavikFixture.h"
 
 // What goes in comes out, once: threads of events against starts, stops, retrievals and registrations of targets, by
 // random schedules. A schedule follows from its seed as far as the operating system's own choices let it; the
-// environment variable TAVIK_TEST_SEED replays one.
+// environment variable ZT_TEST_SEED replays one.
 
 namespace {
 
 constexpr unsigned scBoards = 3;
 constexpr unsigned scThreads = 4;
 
-unsigned sSeed(unsigned aSchedule) {
-    if (const char* lpSeed = std::getenv("TAVIK_TEST_SEED")) {
-        return static_cast<unsigned>(std::strtoul(lpSeed, nullptr, 0));
-    }
-    // Some schedules are always the same, and one is new in every run.
-    return aSchedule == 0 ? std::random_device()() : aSchedule;
+/// Some schedules are always the same, and one is new in every run.
+std::optional<unsigned> sSeed(unsigned aSchedule) {
+    return aSchedule == 0 ? std::nullopt : std::optional(aSchedule);
 }
 
 /// Category, subcategory and board.
@@ -228,9 +226,8 @@ TEST_F(Conservation, WhatIsConsolidatedIsDeliveredOnceByKindAndBoard) {
     collect(scBoards);
     setLogCode(0);
     for (unsigned lSchedule = 0; lSchedule < 6; ++lSchedule) {
-        const unsigned lSeed = sSeed(lSchedule);
-        SCOPED_TRACE("TAVIK_TEST_SEED=" + std::to_string(lSeed));
-        std::mt19937_64 lRandom(lSeed);
+        ZTCTestSeed lSeed(sSeed(lSchedule));
+        std::mt19937_64 lRandom(lSeed.seed());
         mDoScopeCollection = true;
 
         // Held shared over an event and alone over a start or stop, so that it is known of every event whether it was
@@ -238,21 +235,17 @@ TEST_F(Conservation, WhatIsConsolidatedIsDeliveredOnceByKindAndBoard) {
         std::shared_mutex lSwitch;
         std::vector<ZTCEventSource> lSources;
         for (unsigned lThread = 0; lThread < scThreads; ++lThread) {
-            lSources.emplace_back(lSeed, lThread);
+            lSources.emplace_back(lSeed.seed(), lThread);
         }
-        std::atomic<unsigned> lRunning{scThreads};
-        std::vector<std::thread> lThreads;
-        for (ZTCEventSource& lrSource : lSources) {
-            lThreads.emplace_back([&] {
-                for (unsigned lEvent = 0; lEvent < 500; ++lEvent) {
-                    const std::shared_lock lHold(lSwitch);
-                    lrSource.deliverOne(mDoScopeCollection);
-                }
-                --lRunning;
-            });
-        }
+        ZTCTestThreads lThreads;
+        lThreads.start(scThreads, [&](unsigned aThread) {
+            for (unsigned lEvent = 0; lEvent < 500; ++lEvent) {
+                const std::shared_lock lHold(lSwitch);
+                lSources[aThread].deliverOne(mDoScopeCollection);
+            }
+        });
         ZTCDelivered lDelivered;
-        while (lRunning != 0 && !HasFatalFailure()) {
+        while (lThreads.isRunning() && !HasFatalFailure()) {
             switch (lRandom() % 4) {
                 case 0: {
                     const std::unique_lock lHold(lSwitch);
@@ -273,9 +266,7 @@ TEST_F(Conservation, WhatIsConsolidatedIsDeliveredOnceByKindAndBoard) {
             }
             std::this_thread::yield();
         }
-        for (std::thread& lrThread : lThreads) {
-            lrThread.join();
-        }
+        lThreads.join();
         retrieveRestInto(lDelivered);
 
         ZTCCounts lConsolidated;
@@ -296,24 +287,19 @@ TEST_F(Conservation, WithStopsThatRaceTheEventsWhatIsNotedAsProcessedIsDelivered
     collect(scBoards);
     std::uint64_t lProcessed = 0;
     for (unsigned lSchedule = 0; lSchedule < 3; ++lSchedule) {
-        const unsigned lSeed = sSeed(lSchedule);
-        SCOPED_TRACE("TAVIK_TEST_SEED=" + std::to_string(lSeed));
-        std::mt19937_64 lRandom(lSeed);
+        ZTCTestSeed lSeed(sSeed(lSchedule));
+        std::mt19937_64 lRandom(lSeed.seed());
         mDoScopeCollection = true;
         mLog.forget();
-        std::atomic<unsigned> lRunning{scThreads};
-        std::vector<std::thread> lThreads;
-        for (unsigned lThread = 0; lThread < scThreads; ++lThread) {
-            lThreads.emplace_back([&, lThread] {
-                ZTCEventSource lSource(lSeed, lThread);
-                for (unsigned lEvent = 0; lEvent < 300; ++lEvent) {
-                    lSource.deliverOne(false);
-                }
-                --lRunning;
-            });
-        }
+        ZTCTestThreads lThreads;
+        lThreads.start(scThreads, [&lSeed](unsigned aThread) {
+            ZTCEventSource lSource(lSeed.seed(), aThread);
+            for (unsigned lEvent = 0; lEvent < 300; ++lEvent) {
+                lSource.deliverOne(false);
+            }
+        });
         ZTCDelivered lDelivered;
-        while (lRunning != 0 && !HasFatalFailure()) {
+        while (lThreads.isRunning() && !HasFatalFailure()) {
             switch (lRandom() % 5) {
                 case 0:
                     requestHex("02");
@@ -332,9 +318,7 @@ TEST_F(Conservation, WithStopsThatRaceTheEventsWhatIsNotedAsProcessedIsDelivered
             }
             std::this_thread::yield();
         }
-        for (std::thread& lrThread : lThreads) {
-            lrThread.join();
-        }
+        lThreads.join();
         retrieveRestInto(lDelivered);
 
         std::map<std::string, std::uint64_t> lNotices;

@@ -4,57 +4,11 @@
 
 #include "common/include/Log.h"
 #include "tavik/include/TavikCore.h"
-#include "tests/support/FailingAllocation.h"
-#include "tests/unit/tavik/support/DeliveredKinds.h"
-#include "tests/unit/tavik/support/Deliveries.h"
-#include "tests/unit/tavik/support/TavikFixture.h"
+#include "tests/unit/tavik/support/ConsolidationFixture.h"
 
 namespace {
 
-class EventConsolidation : public ZTCTavikFixture {
-protected:
-    static void deliver(const ZTSDeliveredKind& acrKind, unsigned aBoard = 0) {
-        deliver(acrKind, acrKind.mPayload, aBoard);
-    }
-    static void deliver(const ZTSDeliveredKind& acrKind, const ZTCBytes& acrPayload, unsigned aBoard = 0) {
-        deliverScope(aBoard, acrKind.mCategory, acrKind.mSubcategory, acrPayload);
-    }
-
-    /// The kind's payload with another port, which is part of every identity.
-    static ZTCBytes otherPayload(const ZTSDeliveredKind& acrKind) {
-        ZTCBytes lPayload = acrKind.mPayload;
-        lPayload.at(4) ^= 0xFF;
-        return lPayload;
-    }
-
-    static std::string textOf(const ZTSDeliveredKind& acrKind, unsigned aCount, const std::string& acrDataHex) {
-        return std::to_string(acrKind.mCategory) + "/" + std::to_string(acrKind.mSubcategory) + " x" +
-               std::to_string(aCount) + " " + acrDataHex;
-    }
-    static std::string textOf(const ZTSDeliveredKind& acrKind, unsigned aCount = 1) {
-        std::string lDataHex = acrKind.mRecordHex;
-        for (unsigned lEvent = 1; lEvent < aCount; ++lEvent) {
-            lDataHex += acrKind.mAppendedHex;
-        }
-        return textOf(acrKind, aCount, lDataHex);
-    }
-    /// The record that otherPayload makes.
-    static std::string otherTextOf(const ZTSDeliveredKind& acrKind) {
-        ZTCBytes lData = bytesOf(acrKind.mRecordHex);
-        lData.at(4) ^= 0xFF;
-        return textOf(acrKind, 1, hexOf(lData));
-    }
-
-    static std::size_t dataSizeOf(const ZTSScopeDataResponse& acrResponse) {
-        std::size_t lSize = 0;
-        for (const ZTSEncodedRecordList& lcrList : acrResponse.mLists) {
-            for (const ZTSEncodedRecord& lcrRecord : lcrList.mRecords) {
-                lSize += lcrRecord.mData.size();
-            }
-        }
-        return lSize;
-    }
-};
+class EventConsolidation : public ZTCConsolidationFixture {};
 
 std::string sLunRecordHex(const std::vector<unsigned>& acrBits) {
     return hexOf(bytesOf("01000000 500601603ba01234 00010000")) + bitFieldHex(acrBits);
@@ -381,56 +335,4 @@ TEST_F(EventConsolidation, ARecordsTimesSpanItsEvents) {
     ASSERT_EQ(2u, lRecords.size());
     EXPECT_LE(lRecords[0].mBegin.total(), lRecords[0].mEnd.total());
     EXPECT_LE(lRecords[0].mEnd.total(), lRecords[1].mBegin.total());
-}
-
-TEST_F(EventConsolidation, ANewRecordThatFindsNoMemoryChangesNothing) {
-    collect();
-    for (const ZTSDeliveredKind& lcrKind : kindsWithData()) {
-        const ZTCBytes lOther = otherPayload(lcrKind);
-        unsigned lFailures = 0;
-        for (bool lFailed = true; lFailed;) {
-            SCOPED_TRACE(std::string(lcrKind.mpName) + " allocation " + std::to_string(lFailures + 1));
-            mLog.forget();
-            deliver(lcrKind);
-            // Delivered by hand: nothing but the callback's own allocations may count.
-            ZT_event_payload lPayload{0, const_cast<unsigned char*>(lOther.data())};
-            ZT_event lEvent{0, 40 + lOther.size(), &lPayload};
-            lFailed = failAllocation(lFailures + 1, [&] {
-                ScopeCb_Generic(0, HBA_wwn{}, lcrKind.mCategory, lcrKind.mSubcategory, nullptr, &lEvent);
-            });
-            deliver(lcrKind);
-            EXPECT_EQ(lFailed ? 1u : 0u, mLog.count("-E- Error: Out of Memory, processing event callback"));
-            const std::size_t lTotal = mSystem->getTotalEventDataSize();
-            const ZTSScopeDataResponse lResponse = retrieve();
-            EXPECT_EQ(lFailed ? std::vector<std::string>{textOf(lcrKind, 2)}
-                              : (std::vector<std::string>{textOf(lcrKind), otherTextOf(lcrKind), textOf(lcrKind)}),
-                      lResponse.texts());
-            EXPECT_EQ(dataSizeOf(lResponse), lTotal);
-            lFailures += lFailed ? 1 : 0;
-        }
-        EXPECT_EQ(4u, lFailures) << lcrKind.mpName << ": data object, data, record, and its place in the list";
-    }
-}
-
-TEST_F(EventConsolidation, AnAppendThatFindsNoMemoryChangesNothing) {
-    collect();
-    for (const ZTSDeliveredKind& lcrKind : kindsWithData()) {
-        unsigned lFailures = 0;
-        for (bool lFailed = true; lFailed;) {
-            SCOPED_TRACE(std::string(lcrKind.mpName) + " allocation " + std::to_string(lFailures + 1));
-            deliver(lcrKind);
-            ZT_event_payload lPayload{0, const_cast<unsigned char*>(lcrKind.mPayload.data())};
-            ZT_event lEvent{0, 40 + lcrKind.mPayload.size(), &lPayload};
-            lFailed = failAllocation(lFailures + 1, [&] {
-                ScopeCb_Generic(0, HBA_wwn{}, lcrKind.mCategory, lcrKind.mSubcategory, nullptr, &lEvent);
-            });
-            const std::size_t lTotal = mSystem->getTotalEventDataSize();
-            const ZTSScopeDataResponse lResponse = retrieve();
-            EXPECT_EQ(std::vector<std::string>{textOf(lcrKind, lFailed ? 1 : 2)}, lResponse.texts());
-            EXPECT_EQ(dataSizeOf(lResponse), lTotal);
-            lFailures += lFailed ? 1 : 0;
-        }
-        // Appending alone asks for memory.
-        EXPECT_EQ(lcrKind.mOnMatch == ZTEOnMatch::Appends ? 1u : 0u, lFailures) << lcrKind.mpName;
-    }
 }
