@@ -39,7 +39,7 @@ std::vector<std::string> makeChildEnvironment(const std::map<std::string, std::s
         }
     }
     for (const auto& [lrName, lrValue] : acrMore) {
-        lEnvironment.push_back(lrName + "=" + lrValue);
+        lEnvironment.emplace_back(lrName).append("=").append(lrValue);
     }
     return lEnvironment;
 }

@@ -68,23 +68,23 @@ std::span<const ZTSKey> settingsTable() {
         {"episode", "gap", &S::mEpisodeGap, sSeconds(1, 86400), true, "60",
          "Time without an event that ends an episode."},
 
-        {"http", "listen", &S::mHttpListen, sText(gcListenRule), false, R"("127.0.0.1:9632")",
+        {"http", "listen", &S::mHttpListen, sText(gcListenRule), true, R"("127.0.0.1:9632")",
          "\"ADDRESS:PORT\", \"unix:PATH\", or \"\" for off. A loopback port can be read by every local user; a\n"
          "socket by its mode. Any other address needs public = true."},
-        {"http", "public", &S::mHttpPublic, {}, false, "false", ""},
-        {"http", "hosts", &S::mHttpHosts, sText(gcHostRule), false, "[]",
+        {"http", "public", &S::mHttpPublic, {}, true, "false", ""},
+        {"http", "hosts", &S::mHttpHosts, sText(gcHostRule), true, "[]",
          "Names in the Host header that are accepted beside localhost, 127.0.0.1 and [::1]."},
 
-        {"metrics", "textfile", &S::mMetricsTextfile, sText(gcOptionalPathRule), false, R"("")",
+        {"metrics", "textfile", &S::mMetricsTextfile, sText(gcOptionalPathRule), true, R"("")",
          "A file for node_exporter's textfile collector. Empty: none."},
-        {"metrics", "remote_ports", &S::mMetricsRemotePorts, sCount(0, 100000), false, "500",
+        {"metrics", "remote_ports", &S::mMetricsRemotePorts, sCount(0, 100000), true, "500",
          "Most remote ports that get a label of their own."},
 
-        {"ndjson", "path", &S::mNdjsonPath, sText(gcStreamRule), false, R"("")",
+        {"ndjson", "path", &S::mNdjsonPath, sText(gcStreamRule), true, R"("")",
          "One line of JSON an episode. \"-\" is standard output, empty is none. The file is renamed at this\n"
          "size, and so many renamed ones are kept."},
-        {"ndjson", "size", &S::mNdjsonSize, sBytes(scMebibyte / 16, scTebibyte), false, R"("64MiB")", ""},
-        {"ndjson", "keep", &S::mNdjsonKeep, sCount(0, 1000), false, "5", ""},
+        {"ndjson", "size", &S::mNdjsonSize, sBytes(scMebibyte / 16, scTebibyte), true, R"("64MiB")", ""},
+        {"ndjson", "keep", &S::mNdjsonKeep, sCount(0, 1000), true, "5", ""},
 
         {"journal", "enabled", &S::mJournalEnabled, {}, false, "false", "Episodes in the system's journal."},
     });
