@@ -55,6 +55,7 @@ int runStatus(const ZTSTavikOptions& acrOptions);
 int runEvents(const ZTSTavikOptions& acrOptions);
 int runPorts(const ZTSTavikOptions& acrOptions);
 int runExplain(const ZTSTavikOptions& acrOptions);
+int runCheck(const ZTSTavikOptions& acrOptions);
 int runMark(const ZTSTavikOptions& acrOptions);
 
 #endif

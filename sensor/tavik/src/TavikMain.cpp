@@ -82,6 +82,8 @@ static int sRun(int aCount, const char* const* appArguments) {
     sAddFilter(*lAdd("ports", "List remote ports by how many events they had", runPorts), lOptions.mFilter);
     lAdd("explain", "Say what a kind, a state or an episode means, and what to look at", runExplain)
         ->add_option("WHAT", lOptions.mSubject, "A kind, a state, or an episode's number; without: a list");
+    lAdd("check", "Report in one line for a monitoring system: 0 OK, 1 WARNING, 2 CRITICAL, 3 UNKNOWN", runCheck)
+        ->add_option("--since", lOptions.mFilter.mSince, "How far back gaps and events count; default: 10m");
     lAdd("mark", "Give this moment a name, for --since and --until", runMark)
         ->add_option("NAME", lOptions.mMark, "The name; an earlier mark of that name moves")
         ->required();

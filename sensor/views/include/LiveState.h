@@ -23,8 +23,9 @@
 ///      "troubles": [{"id": "path-lost", "title": "PATH LOST", "subject": "array7 ctrl-B  50:…:34  from host8",
 ///                    "status": ["…"], "action": ["…"], "see": "tavik explain 118"}]}
 ///
-/// - `keeper.state`: `starting`, `running`, `waiting-for-adapters`, `waiting-for-library`, `waiting-to-restart` or
-///   `stopping`. `since`: when that state began. `nextStart`: when the agent is started next, where that is known.
+/// - `keeper.state`: `starting`, `running`, `waiting-for-adapters` (also for a library: `endReason` tells them apart),
+///   `waiting-to-restart` or `stopping`. `since`: when that state began. `nextStart`: when the agent is started next,
+///   where that is known.
 /// - `agent` is the running agent, or the last one. `endReason` is why the last one ended, in the words of the status
 ///   page: `shut-down`, `signal`, `no-library`, `no-adapters`, `no-event-support`, `sensor-gone`, `other`; null while
 ///   one runs. `problem` is one line for people on why it is down. `restarts`: starts since the keeper's own start,
@@ -60,7 +61,6 @@ enum ZTEKeeperState : std::uint8_t {
     ZTKP_Starting,
     ZTKP_Running,
     ZTKP_WaitingForAdapters,
-    ZTKP_WaitingForLibrary,
     ZTKP_WaitingToRestart,
     ZTKP_Stopping,
     ZTKP_Count

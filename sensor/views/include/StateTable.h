@@ -40,6 +40,7 @@ struct ZTSStateRow {
     const char* mpMeans;  ///< for `tavik explain`, as the next two
     const char* mpCauses;
     const char* mpLookAt;
+    bool mIsWithoutFc = false;  ///< nothing to collect from: no trouble for a monitoring system
 };
 
 /// The rows, the worst state first; the last one, "collecting", always holds.

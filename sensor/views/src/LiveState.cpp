@@ -9,8 +9,8 @@
 
 using ZTCJson = nlohmann::json;
 
-static constexpr std::array<const char*, ZTKP_Count> scKeeperStates{
-    "starting", "running", "waiting-for-adapters", "waiting-for-library", "waiting-to-restart", "stopping"};
+static constexpr std::array<const char*, ZTKP_Count> scKeeperStates{"starting", "running", "waiting-for-adapters",
+                                                                    "waiting-to-restart", "stopping"};
 static constexpr std::array<const char*, ZTDK_Count> scDiskStates{"ok", "full", "read-only"};
 
 const char* getKeeperStateName(ZTEKeeperState aState) {

@@ -135,7 +135,7 @@ static ZTCLines sStatusOfStopping(const ZTSStatusFacts& acrFacts) {
 }
 
 static ZTCLines sStatusOfNoAdapters(const ZTSStatusFacts& acrFacts) {
-    return {"The adapters' library found none" + sSince(acrFacts.mLive->mKeeper.mSince, acrFacts) +
+    return {"The agent found none" + sSince(acrFacts.mLive->mKeeper.mSince, acrFacts) +
             ". The sensor looks every 10 s and starts the agent by itself."};
 }
 
@@ -144,9 +144,13 @@ static ZTCLines sStatusOfNoLibrary(const ZTSStatusFacts& acrFacts) {
     return {lrProblem.empty() ? "The agent ended because it could not load the adapters' library." : lrProblem};
 }
 
+static std::string sStartedAt(const ZTSStatusFacts& acrFacts) {
+    const auto& lrSince = acrFacts.mLive->mKeeper.mSince;
+    return lrSince ? "; it was started at " + formatShortTime(*lrSince, acrFacts.mNow) : "";
+}
+
 static ZTCLines sStatusOfStarting(const ZTSStatusFacts& acrFacts) {
-    return {"The sensor starts" + sSince(acrFacts.mLive->mKeeper.mSince, acrFacts) +
-            ". Its agent has not begun to listen yet."};
+    return {"Its agent has not begun to listen yet" + sStartedAt(acrFacts) + "."};
 }
 
 static ZTCLines sStatusOfAgentDown(const ZTSStatusFacts& acrFacts) {
@@ -238,9 +242,10 @@ static ZTCLines sStatusOfGap(const ZTSStatusFacts& acrFacts) {
         const std::uint64_t lCount = lrGap.getOccurrences();
         lLines.push_back(formatShortTime(lrGap.mFrom, acrFacts.mNow) + " to " +
                          formatShortTime(lrGap.mTo, acrFacts.mNow) + ": " +
-                         (lrGap.mIsCountKnown ? formatCount(lCount, "event") + " lost"
-                          : lCount != 0       ? "at least " + formatCount(lCount, "event") + " lost"
-                                              : "unknown how many events are lost") +
+                         (lrGap.mIsCountKnown && lCount == 0 ? "nothing is known to be lost"
+                          : lrGap.mIsCountKnown              ? formatCount(lCount, "event") + " lost"
+                          : lCount != 0                      ? "at least " + formatCount(lCount, "event") + " lost"
+                                                             : "unknown how many events are lost") +
                          (lrGap.mReason.empty() ? "" : "; " + lrGap.mReason));
     }
     if (lrGaps.size() > scMostGaps) {
@@ -356,6 +361,19 @@ static constexpr std::array scTable{
         .mpCauses = "Somebody stopped the service, or the host shuts down.",
         .mpLookAt = "Nothing, if the stop was meant. What happens from now on is not seen."},
     ZTSStateRow{
+        .mpId = "no-library",
+        .mVerdict = ZTVD_NotCollecting,
+        .mpHolds = [](const ZTSStatusFacts& acrFacts) { return sHasEndReason(acrFacts, "no-library"); },
+        .mpHeadline = "the adapters' library cannot be loaded",
+        .mpStatus = sStatusOfNoLibrary,
+        .mpAction = "sudo grep -n library /etc/tavik/tavik.toml;  journalctl -u tavik -n 50",
+        .mpSee = "tavik explain no-library",
+        .mpMeans = "The agent could not load the adapters' library, which all events come from. The sensor tries "
+                   "again, at the latest after a minute.",
+        .mpCauses = "The library is not installed; agent.library names a file that does not exist, lacks the entry "
+                    "point, or is of another version.",
+        .mpLookAt = "The agent's log has the loader's own words."},
+    ZTSStateRow{
         .mpId = "no-adapters",
         .mVerdict = ZTVD_NotCollecting,
         .mpHolds =
@@ -372,23 +390,8 @@ static constexpr std::array scTable{
         .mpCauses = "The host has no Fibre Channel adapter; its driver is not loaded; the adapter failed or was "
                     "removed; the library is not the one for this adapter.",
         .mpLookAt = "Whether the kernel shows the adapter: each of its ports is a folder in /sys/class/fc_host. If it "
-                    "does and the library does not, look at agent.library in the configuration."},
-    ZTSStateRow{
-        .mpId = "no-library",
-        .mVerdict = ZTVD_NotCollecting,
-        .mpHolds =
-            [](const ZTSStatusFacts& acrFacts) {
-                return sIsKeeper(acrFacts, ZTKP_WaitingForLibrary) || sHasEndReason(acrFacts, "no-library");
-            },
-        .mpHeadline = "the adapters' library cannot be loaded",
-        .mpStatus = sStatusOfNoLibrary,
-        .mpAction = "sudo grep -n library /etc/tavik/tavik.toml;  journalctl -u tavik -n 50",
-        .mpSee = "tavik explain no-library",
-        .mpMeans = "The agent could not load the adapters' library, which all events come from. The sensor tries "
-                   "again, at the latest after a minute.",
-        .mpCauses = "The library is not installed; agent.library names a file that does not exist, lacks the entry "
-                    "point, or is of another version.",
-        .mpLookAt = "The agent's log has the loader's own words."},
+                    "does and the library does not, look at agent.library in the configuration.",
+        .mIsWithoutFc = true},
     ZTSStateRow{
         .mpId = "agent-down",
         .mVerdict = ZTVD_NotCollecting,

@@ -46,8 +46,10 @@ std::vector<std::string> listUnknown(const ZTSStatusFacts& acrFacts) {
         const ZTSLiveState& lrLive = *acrFacts.mLive;
         lUnknown.insert(lUnknown.end(), lrLive.mProblems.begin(), lrLive.mProblems.end());
         lAdd(!lrLive.mAgent.mIsRunning, "the sensor did not say whether its agent runs");
-        lAdd(!lrLive.mKinds, "the sensor did not say which kinds it listens to");
-        lAdd(!lrLive.mLosses, "the sensor did not say what was refused in the last 24 h");
+        // While there is no agent, or it is just starting, these cannot be known: the state says so.
+        const bool lIsSettled = lrLive.mKeeper.mState.value_or(ZTKP_Running) == ZTKP_Running;
+        lAdd(lIsSettled && !lrLive.mKinds, "the sensor did not say which kinds it listens to");
+        lAdd(lIsSettled && !lrLive.mLosses, "the sensor did not say what was refused in the last 24 h");
         lAdd(!lrLive.mCollector.mDisk, "the sensor did not say whether its disk has room");
     }
     return lUnknown;

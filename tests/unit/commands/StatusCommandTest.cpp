@@ -127,3 +127,19 @@ TEST_F(StatusCommand, AMarkWithoutASensorIs3) {
     EXPECT_EQ(lRun.mOutput, "");
     expectOneLine(lRun);
 }
+
+TEST_F(StatusCommand, CheckIsOneLineWithPerformanceDataAndAPluginsStatus) {
+    store();
+    {
+        const ZTCFakeSensor lSensor(controlPath(), ZTCFakeSensor::withState(makeLiveState()));
+        const ZTSRun lRun = run({"check"});
+        EXPECT_EQ(lRun.mStatus, 0);
+        EXPECT_EQ(lRun.mOutput, "TAVIK OK - COLLECTING; nothing lost | events=0 open=0 lost=0 held=0B;;;0;262144\n");
+        EXPECT_EQ(runJson({"check"})["result"], "OK");
+    }
+    const ZTSRun lRun = run({"check", "--since", "1h"});
+    EXPECT_EQ(lRun.mStatus, 2);
+    EXPECT_THAT(lRun.mOutput, StartsWith("TAVIK CRITICAL - NOT COLLECTING; no sensor is running |"));
+    EXPECT_EQ(run({"check", "--since", "nonsense"}).mStatus, 2);
+    EXPECT_EQ(run({"check", "--since", "nonsense"}).mOutput, "");
+}

@@ -55,10 +55,13 @@ static std::vector<std::pair<std::string, ZTSStatusFacts>> sFactsOfEachState() {
     lCases.emplace_back("collector-silent", sUnanswered(ZTAN_Silent));
     lCases.emplace_back("collector-refuses", sUnanswered(ZTAN_Refused));
     lCases.emplace_back("stopping", sFactsOf([](ZTCJson& arLive) { arLive["keeper"]["state"] = "stopping"; }));
+    lCases.emplace_back("no-library", sFactsOf([](ZTCJson& arLive) {
+                            arLive["keeper"]["state"] = "waiting-for-adapters";
+                            arLive["agent"]["running"] = false;
+                            arLive["agent"]["endReason"] = "no-library";
+                        }));
     lCases.emplace_back("no-adapters",
                         sFactsOf([](ZTCJson& arLive) { arLive["keeper"]["state"] = "waiting-for-adapters"; }));
-    lCases.emplace_back("no-library",
-                        sFactsOf([](ZTCJson& arLive) { arLive["keeper"]["state"] = "waiting-for-library"; }));
     lCases.emplace_back("agent-down", sFactsOf([](ZTCJson& arLive) { arLive["agent"]["running"] = false; }));
     lCases.emplace_back("starting", sFactsOf([](ZTCJson& arLive) { arLive["keeper"]["state"] = "starting"; }));
     lCases.emplace_back("disk-full", sFactsOf([](ZTCJson& arLive) { arLive["collector"]["disk"] = "full"; }));
