@@ -7,13 +7,11 @@
 #include <filesystem>
 #include <optional>
 #include <utility>
-#include <variant>
 
 #include "libkpm/common/include/AgentLink.h"
 #include "libkpm/linux/src/InstanceName.h"
 #include "libkpm/linux/src/Sysfs.h"
 
-static const char* const scPreparedGroup = "libkpm_linux";
 static constexpr std::size_t scMostDescription = 65536;
 static constexpr std::size_t scMostTypes = std::size_t{64} * 1024 * 1024;
 
@@ -67,7 +65,7 @@ ZTCSenseProbe::ZTCSenseProbe(const std::string& acrInstance, const std::string& 
 
 std::unique_ptr<ZTCSenseProbe> ZTCSenseProbe::open(const std::string& acrInstance, const std::string& acrSysfsRoot,
                                                    ZTCTraceFiles& arFiles, ZTSFeedProblem& arProblem) {
-    std::unique_ptr<ZTCSenseProbe> lpPrepared(new ZTCSenseProbe(acrInstance, scPreparedGroup, arFiles));
+    std::unique_ptr<ZTCSenseProbe> lpPrepared(new ZTCSenseProbe(acrInstance, gcPreparedSenseGroup, arFiles));
     if (readSmallFile(lpPrepared->mEventPath + "/format", scMostDescription)) {
         return lpPrepared->switchOn(arProblem) ? std::move(lpPrepared) : nullptr;
     }
@@ -89,22 +87,25 @@ ZTCSenseProbe::~ZTCSenseProbe() {
     }
 }
 
-bool ZTCSenseProbe::define(const std::string& acrSysfsRoot, ZTSFeedProblem& arProblem) {
+std::variant<std::string, ZTSTraceProblem> readSenseProbe(const std::string& acrSysfsRoot, const std::string& acrGroup,
+                                                          const std::string& acrArgument) {
     const std::optional<std::string> lKernel = readSmallFile(acrSysfsRoot + "/kernel/btf/vmlinux", scMostTypes);
     // Not there where the SCSI layer is part of the kernel itself.
     const std::string lModule =
         readSmallFile(acrSysfsRoot + "/kernel/btf/scsi_mod", scMostTypes).value_or(std::string());
     if (!lKernel) {
-        arProblem = {ZTFH_Broken, "this kernel does not describe its types (no /sys/kernel/btf/vmlinux)"};
-        return false;
+        return ZTSTraceProblem{"this kernel does not describe its types (no /sys/kernel/btf/vmlinux)"};
     }
     const auto lBytes = [](const std::string& acrText) {
         return ZTCByteSpan(reinterpret_cast<const std::uint8_t*>(acrText.data()), acrText.size());
     };
-    const ZTCBtf lBtf(lBytes(*lKernel), lBytes(lModule));
+    return makeSenseProbe(ZTCBtf(lBytes(*lKernel), lBytes(lModule)), acrGroup, acrArgument);
+}
+
+bool ZTCSenseProbe::define(const std::string& acrSysfsRoot, ZTSFeedProblem& arProblem) {
     int lError = 0;
     for (const char* const lpArgument : scFirstArguments) {
-        const std::variant<std::string, ZTSTraceProblem> lLine = makeSenseProbe(lBtf, mGroup, lpArgument);
+        const std::variant<std::string, ZTSTraceProblem> lLine = readSenseProbe(acrSysfsRoot, mGroup, lpArgument);
         if (const auto* lpProblem = std::get_if<ZTSTraceProblem>(&lLine)) {
             arProblem = {ZTFH_Broken, lpProblem->mText};
             return false;
@@ -151,7 +152,7 @@ void ZTCSenseProbe::watchHosts(const std::vector<std::uint32_t>& acrHosts) {
 }
 
 void removeLeftOverProbes(const std::string& acrTracefsRoot, ZTCTraceFiles& arFiles) {
-    const std::string lPrefix = std::string(scPreparedGroup) + "_";
+    const std::string lPrefix = std::string(gcPreparedSenseGroup) + "_";
     const std::vector<std::string> lNames =
         listDirectory(acrTracefsRoot + "/events").value_or(std::vector<std::string>());
     for (const std::string& lrName : lNames) {

@@ -1,16 +1,24 @@
 /// The probe for sense data in the library's trace instance: defined by the library and removed by it, or used as an
-/// administrator has defined it (group libkpm_linux). Nobody else's probes are touched.
+/// administrator has defined it. Nobody else's probes are touched.
 #ifndef LIBKPM_LINUX_SRC_SENSEPROBE_H
 #define LIBKPM_LINUX_SRC_SENSEPROBE_H
 
 #include <cstdint>
 #include <memory>
 #include <string>
+#include <variant>
 #include <vector>
 
 #include "libkpm/linux/src/FeedState.h"
 #include "libkpm/linux/src/SenseData.h"
 #include "libkpm/linux/src/TraceFiles.h"
+
+/// The group in which an administrator defines the probe for the library.
+inline constexpr const char* gcPreparedSenseGroup = "libkpm_linux";
+
+/// makeSenseProbe for the kernel that is described below this sysfs.
+std::variant<std::string, ZTSTraceProblem> readSenseProbe(const std::string& acrSysfsRoot, const std::string& acrGroup,
+                                                          const std::string& acrArgument);
 
 /// One thread at a time.
 class ZTCSenseProbe {

@@ -118,6 +118,11 @@ post_event() {
   [ -d /sys/module/fc_post ] || insmod /vm/fc_post.ko
   echo "$*" >/sys/module/fc_post/parameters/post
 }
+# name_host HOST NAME: the host's port name as sysfs shows it.
+name_host() {
+  [ -d /sys/module/fc_post ] || insmod /vm/fc_post.ko
+  echo "$*" >/sys/module/fc_post/parameters/port_name
+}
 
 # port_create CARD: an FC port over that card.
 port_create() {

@@ -3,6 +3,8 @@
  *   echo "HOST CODE TIMES HEXBYTES" > /sys/module/fc_post/parameters/post
  * HOST and TIMES are decimal, CODE and the event's data are hexadecimal: "0 5 1 01020300" on a little-endian machine is
  * an RSCN of the page 0x00030201.
+ *   echo "HOST NAME" > /sys/module/fc_post/parameters/port_name
+ * sets the host's port name, 16 hexadecimal digits, as a driver does when it has found it out.
  */
 #include <linux/kernel.h>
 #include <linux/module.h>
@@ -33,5 +35,22 @@ static int sPost(const char* apText, const struct kernel_param* acpParameter) {
 
 static const struct kernel_param_ops sPostOps = {.set = sPost};
 module_param_cb(post, &sPostOps, NULL, 0200);
+static int sSetName(const char* apText, const struct kernel_param* acpParameter) {
+    unsigned lHost;
+    unsigned long long lName;
+    struct Scsi_Host* lpHost;
+
+    if (sscanf(apText, "%u %llx", &lHost, &lName) != 2)
+        return -EINVAL;
+    lpHost = scsi_host_lookup(lHost);
+    if (!lpHost)
+        return -ENODEV;
+    fc_host_port_name(lpHost) = lName;
+    scsi_host_put(lpHost);
+    return 0;
+}
+
+static const struct kernel_param_ops sNameOps = {.set = sSetName};
+module_param_cb(port_name, &sNameOps, NULL, 0200);
 MODULE_LICENSE("GPL");
-MODULE_DESCRIPTION("Posts FC events of the transport class, for tests");
+MODULE_DESCRIPTION("Posts FC events of the transport class and names its hosts, for tests");
