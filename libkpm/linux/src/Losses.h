@@ -3,7 +3,6 @@
 #define LIBKPM_LINUX_SRC_LOSSES_H
 
 #include <array>
-#include <cstddef>
 #include <cstdint>
 
 #include "libkpm/common/include/Losses.h"
@@ -17,10 +16,9 @@ enum ZTELinuxLoss : std::uint8_t {
     ZTLO_MalformedRecord,   ///< a trace page or record that does not parse
     ZTLO_Failure            ///< reading failed otherwise, or memory ran out over an event
 };
-inline constexpr std::size_t gcLinuxLossCount = ZTLO_Failure + 1;
 
 /// One row a kind, in the order of the enumeration.
-inline constexpr std::array<ZTSLossKind, gcLinuxLossCount> gcLinuxLosses{
+inline constexpr std::array<ZTSLossKind, ZTLO_Failure + 1> gcLinuxLosses{
     {{"fc-socket-overruns", "times the FC event socket overran: events are lost, and the link states are read again"},
      {"fc-events-missing", "FC events are lost: their numbers were passed over; the link states are read again"},
      {"fc-messages-foreign", "FC messages are dropped: the kernel did not send them"},

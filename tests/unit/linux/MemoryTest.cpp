@@ -66,11 +66,17 @@ TEST_F(LinuxMemory, WithoutMemoryTheThreadLivesOnAndWhatHappenedToHostsIsFoundAf
     runShort(10);
     EXPECT_EQ(mpEngine->getNumberOfAdapters(), 1u);
     sIsShort = false;
-    waitUntil([&] { return mRecorder.count() >= 2; }, "the arrival and the link");
+    waitUntil([&] { return mpEngine->getNumberOfAdapters() == 2; }, "the host that has come");
     waitForLog("events are lost: they could not be read or handled");
     mKernel.sendDone({.mLun = 4, .mResult = 0x28});
     mKernel.sendFc({.mNumber = 2, .mCode = ZTLFC_Rscn, .mData = rscnData(2)});
-    waitUntil([&] { return mRecorder.count() >= 4; }, "the events after it");
+    const auto lHasCome = [&](const char* apText) {
+        const std::vector<std::string> lSoFar = mRecorder.events();
+        return std::find(lSoFar.begin(), lSoFar.end(), apText) != lSoFar.end();
+    };
+    waitUntil([&] { return lHasCome("0 queue-full 0 4") && lHasCome("0 rscn 6104000800000002"); },
+              "the events after it");
+    mpEngine->stop();
     const std::vector<std::string> lEvents = mRecorder.events();
     const auto lCount = [&](const char* apText) { return std::count(lEvents.begin(), lEvents.end(), apText); };
     EXPECT_EQ(lCount("0 arrival"), 1);
