@@ -31,6 +31,8 @@ bool __real__Z11ClibTryLocki(int);
 bool __wrap__Z11ClibTryLocki(int);
 bool __real__Z22OsTimedWaitConditionalR16ZTSOsConditionalR10ZTSOsMutexl(ZTSOsConditional&, ZTSOsMutex&, std::int64_t);
 bool __wrap__Z22OsTimedWaitConditionalR16ZTSOsConditionalR10ZTSOsMutexl(ZTSOsConditional&, ZTSOsMutex&, std::int64_t);
+int __real_clock_gettime(clockid_t, std::timespec*);
+int __wrap_clock_gettime(clockid_t, std::timespec*);
 void __real_free(void*);
 void __wrap_free(void*);
 
@@ -106,6 +108,14 @@ bool __wrap__Z22OsTimedWaitConditionalR16ZTSOsConditionalR10ZTSOsMutexl(ZTSOsCon
     return gReplaced.mTimedWait
                ? gReplaced.mTimedWait(aDeadline)
                : __real__Z22OsTimedWaitConditionalR16ZTSOsConditionalR10ZTSOsMutexl(arConditional, arMutex, aDeadline);
+}
+
+int __wrap_clock_gettime(clockid_t aClock, std::timespec* apTime) {
+    if (aClock == CLOCK_REALTIME && gReplaced.mRealTime) {
+        *apTime = gReplaced.mRealTime();
+        return 0;
+    }
+    return __real_clock_gettime(aClock, apTime);
 }
 
 void __wrap_free(void* apBlock) {

@@ -6,6 +6,7 @@
 
 #include <cstddef>
 #include <cstdint>
+#include <ctime>
 #include <functional>
 #include <string>
 #include <utility>
@@ -20,6 +21,7 @@ struct ZTSReplaced {
     std::function<void(int, char**)> mSystemMain;                          ///< in its place
     std::function<void(const char*, int)> mMkdir;                          ///< in place of ClibMkdir
     std::function<std::int64_t()> mMonotonicMilliseconds;                  ///< in its place
+    std::function<std::timespec()> mRealTime;                              ///< what CLOCK_REALTIME shows
     std::function<void(int)> mSleep;                                       ///< in place of ClibSleep
     std::function<void(const char*)> mBeforeOpen;                          ///< before ClibOpen
     std::function<void(const struct pollfd*, unsigned, int)> mBeforePoll;  ///< before ClibPoll
