@@ -1,7 +1,6 @@
 #include "common/include/Log.h"
 
 #include <gtest/gtest.h>
-#include <unistd.h>
 
 #include <cerrno>
 #include <cstdarg>

@@ -1,7 +1,5 @@
 #include <gtest/gtest.h>
 
-#include <memory>
-#include <string>
 #include <vector>
 
 #include "common/include/Pointer.h"

@@ -2,10 +2,7 @@
 
 #include <fcntl.h>
 #include <gtest/gtest.h>
-#include <poll.h>
-#include <pthread.h>
 #include <signal.h>
-#include <sys/ioctl.h>
 #include <sys/socket.h>
 #include <sys/stat.h>
 #include <sys/un.h>
@@ -18,9 +15,7 @@
 #include <thread>
 
 #include "common/include/Exception.h"
-#include "common/include/Memory.h"
 #include "os/common/include/ProcessEvents.h"
-#include "tests/support/Waiting.h"
 #include "tests/unit/os/NamedPipeTesting.h"
 
 using std::chrono::milliseconds;

@@ -1,18 +1,13 @@
 #include <gtest/gtest.h>
-#include <signal.h>
-#include <sys/resource.h>
 #include <sys/stat.h>
 #include <sys/wait.h>
 #include <unistd.h>
 
 #include <cerrno>
-#include <chrono>
 #include <cstring>
 #include <string>
 
 #include "common/include/Exception.h"
-#include "common/include/Log.h"
-#include "tests/unit/os/LogCapture.h"
 #include "tests/unit/system/ForkedProcess.h"
 #include "tests/unit/system/InstanceTesting.h"
 

@@ -1,7 +1,6 @@
 #include "system/include/SystemGlobals.h"
 
 #include <gtest/gtest.h>
-#include <limits.h>
 #include <signal.h>
 #include <stdlib.h>
 #include <sys/prctl.h>
@@ -14,8 +13,9 @@
 #include <vector>
 
 #include "common/include/Exception.h"
-#include "tests/unit/os/LogCapture.h"
+#include "tests/support/AgentLog.h"
 #include "tests/unit/system/ForkedProcess.h"
+#include "tests/unit/system/SystemMainTesting.h"
 #include "tests/unit/system/TestSystem.h"
 
 using Calls = std::vector<std::string>;
@@ -69,17 +69,6 @@ private:
     Calls mCalls;
 };
 
-static void sRunSystemMain(ZTCSystem* apSystem, std::vector<std::string> aArguments) {
-    aArguments.insert(aArguments.begin(), "program");
-    std::vector<char*> lArgv;
-    for (std::string& lrArgument : aArguments) {
-        lArgv.push_back(lrArgument.data());
-    }
-    lArgv.push_back(nullptr);
-    setSystemObject(apSystem);
-    SystemMain(static_cast<int>(aArguments.size()), lArgv.data());
-}
-
 /// Those that the kernel knows: one that was joined may still be there for a moment. A sanitizer's own comes with the
 /// first thread that is started, which sNumberOfThreadsToEndWith does.
 static unsigned sNumberOfThreads() {
@@ -95,27 +84,11 @@ static unsigned sNumberOfThreadsToEndWith() {
     return sNumberOfThreads();
 }
 
-/// The driver changes its process's signals, so each case runs it in a process of its own.
-class SystemMainTest : public testing::Test {
-protected:
-    SystemMainTest() : mPidFile(mDirectory.path("a.pid")), mLogFile(mDirectory.path("a.log")) {}
+namespace {
 
-    int runInChild(const ZTCForkedProcess::Function& acrFunction) {
-        ZTCForkedProcess lChild(
-            [&](ZTCForkedProcess& arSelf) {
-                setLogFilePath(mLogFile.c_str());
-                return acrFunction(arSelf);
-            },
-            mDirectory.path("child"));
-        const int lStatus = lChild.waitForExit();
-        EXPECT_TRUE(lStatus == 0) << readFile(mDirectory.path("child.err")) << readFile(mDirectory.path("child.out"));
-        return lStatus;
-    }
+using SystemMainTest = ZTCSystemMainFixture;
 
-    ZTCTemporaryDirectory mDirectory;
-    const std::string mPidFile;
-    const std::string mLogFile;
-};
+}  // namespace
 
 TEST(SystemGlobals, TheHeartbeatTimeoutIsTwoHundredAndFortySecondsUntilItIsSet) {
     unsigned lSeconds = 0;
@@ -137,7 +110,7 @@ TEST(SystemGlobals, TheSystemObjectIsTheOneThatWasSet) {
 
 TEST_F(SystemMainTest, WithoutASystemObjectMemoryRanOut) {
     runInChild([](ZTCForkedProcess&) {
-        EXPECT_THROW(sRunSystemMain(nullptr, {}), ZTCNoMemoryEx);
+        EXPECT_THROW(runSystemMain(nullptr, {}), ZTCNoMemoryEx);
         return testing::Test::HasFailure() ? 1 : 0;
     });
 }
@@ -168,7 +141,7 @@ TEST_F(SystemMainTest, TheOperationsAreCalledInTheirOrder) {
         lSystem.addComponent(NEW ZTCFunctionComponent(lSystem, "a thread", [&](ZTCFunctionComponent&, ZTCSystem&) {
             EXPECT_EQ(readFile(mPidFile), std::to_string(getpid()) + "\n");
         }));
-        sRunSystemMain(&lSystem, {});
+        runSystemMain(&lSystem, {});
         EXPECT_EQ(lSystem.calls(), sOrder());
         EXPECT_FALSE(exists(mPidFile));
         EXPECT_NO_THROW(waitUntil([&] { return sNumberOfThreads() <= lThreads; }, "the threads' end"));
@@ -179,7 +152,7 @@ TEST_F(SystemMainTest, TheOperationsAreCalledInTheirOrder) {
 TEST_F(SystemMainTest, WithoutTheDaemonNothingDaemonises) {
     runInChild([this](ZTCForkedProcess&) {
         ZTCRecordingSystem lSystem(mPidFile);
-        sRunSystemMain(&lSystem, {"-D", "false"});
+        runSystemMain(&lSystem, {"-D", "false"});
         Calls lExpected = sOrder();
         lExpected.erase(lExpected.begin() + 5);
         EXPECT_EQ(lSystem.calls(), lExpected);
@@ -206,7 +179,7 @@ TEST_F(SystemMainTest, AnExceptionOutOfAnyOperationGivesUpTheRecordAndTheThreads
                     lIsRunning = false;
                 }));
             try {
-                sRunSystemMain(&lSystem, {});
+                runSystemMain(&lSystem, {});
                 ADD_FAILURE() << "the exception was swallowed";
             } catch (const ZTCOpsException& acrException) {
                 EXPECT_EQ(acrException.getError(), 77u);
@@ -227,7 +200,7 @@ TEST_F(SystemMainTest, AnExceptionOutOfPreInitIsSaidLikeThatOfEveryOtherStep) {
         unlink(mLogFile.c_str());
         runInChild([&](ZTCForkedProcess&) {
             ZTCRecordingSystem lSystem(mPidFile, lpFailing);
-            EXPECT_THROW(sRunSystemMain(&lSystem, {}), ZTCOpsException);
+            EXPECT_THROW(runSystemMain(&lSystem, {}), ZTCOpsException);
             return testing::Test::HasFailure() ? 1 : 0;
         });
         EXPECT_EQ(readFile(mDirectory.path("child.err")), "test-system ends: told to fail\n");
@@ -247,7 +220,7 @@ public:
 TEST_F(SystemMainTest, AnExitConditionIsSaidOnStandardErrorAlone) {
     runInChild([&](ZTCForkedProcess&) {
         ZTCRefusedSystem lSystem(mPidFile);
-        EXPECT_THROW(sRunSystemMain(&lSystem, {"-D", "false"}), ZTCExitConditionEx);
+        EXPECT_THROW(runSystemMain(&lSystem, {"-D", "false"}), ZTCExitConditionEx);
         return testing::Test::HasFailure() ? 1 : 0;
     });
     EXPECT_EQ(readFile(mDirectory.path("child.err")), "test-system ends: no use to go on\n");
@@ -257,7 +230,7 @@ TEST_F(SystemMainTest, AnExitConditionIsSaidOnStandardErrorAlone) {
 TEST_F(SystemMainTest, AnErrorOfTheCommandLineCreatesNothing) {
     runInChild([this](ZTCForkedProcess&) {
         ZTCRecordingSystem lSystem(mPidFile);
-        EXPECT_THROW(sRunSystemMain(&lSystem, {"-h", "-b", "0"}), ZTCInvalidEx);
+        EXPECT_THROW(runSystemMain(&lSystem, {"-h", "-b", "0"}), ZTCInvalidEx);
         EXPECT_EQ(lSystem.calls(), (Calls{"preInit", "setCmdLineArgDescs", "processCommandLine"}));
         EXPECT_FALSE(exists(mPidFile));
         return testing::Test::HasFailure() ? 1 : 0;
@@ -277,7 +250,7 @@ TEST_F(SystemMainTest, ASecondStartSaysSoAndIsAnExitCondition) {
     runInChild([this](ZTCForkedProcess&) {
         ZTCRecordingSystem lSystem(mPidFile);
         try {
-            sRunSystemMain(&lSystem, {"-D", "false"});
+            runSystemMain(&lSystem, {"-D", "false"});
             ADD_FAILURE() << "two run at once";
         } catch (const ZTCExitConditionEx& acrException) {
             EXPECT_EQ(acrException.getError(), 19u);
@@ -307,97 +280,12 @@ TEST_F(SystemMainTest, ATermSignalStopsTheRunInOrder) {
                         arSelf.tellParent();
                         arSystem.timedWait(0, 3600);
                     }));
-                sRunSystemMain(&lSystem, {});
+                runSystemMain(&lSystem, {});
                 return lSystem.calls() == sOrder() && !exists(mPidFile) ? 0 : 1;
             },
             mDirectory.path("child"));
         lChild.waitForChild();
         lChild.sendSignal(lSignal);
         EXPECT_EQ(lChild.waitForExit(), 0);
-    }
-}
-
-TEST_F(SystemMainTest, ADaemonKeepsItsDirectoryAndLeavesItsStartersStreamsAlone) {
-    ASSERT_EQ(prctl(PR_SET_CHILD_SUBREAPER, 1), 0);
-    ZTCForkedProcess lChild(
-        [&](ZTCForkedProcess& arSelf) {
-            setLogFilePath(mLogFile.c_str());
-            if (chdir(mDirectory.path().c_str()) != 0) {
-                return 1;
-            }
-            ZTCTestSystem lSystem(mPidFile);
-            lSystem.addConditional();
-            lSystem.addComponent(
-                NEW ZTCFunctionComponent(lSystem, "a thread", [&](ZTCFunctionComponent&, ZTCSystem& arSystem) {
-                    std::cout << "not to be seen" << std::endl;
-                    arSelf.tellParent();
-                    arSystem.wait(0);
-                }));
-            sRunSystemMain(&lSystem, {});
-            return 0;
-        },
-        mDirectory.path("child"));
-    EXPECT_EQ(lChild.waitForExit(), 0);
-    lChild.waitForChild();
-    const std::string lPidText = readFile(mPidFile);
-    ASSERT_FALSE(lPidText.empty());
-    const pid_t lDaemon = std::stoi(lPidText);
-    EXPECT_NE(lDaemon, lChild.getPid());
-    EXPECT_EQ(getsid(lDaemon), lDaemon);
-
-    const std::string lProcess = "/proc/" + std::to_string(lDaemon);
-    EXPECT_EQ(std::filesystem::read_symlink(lProcess + "/cwd"), std::filesystem::canonical(mDirectory.path()));
-    for (const char* lpStream : {"/fd/0", "/fd/1", "/fd/2"}) {
-        EXPECT_EQ(std::filesystem::read_symlink(lProcess + lpStream), "/dev/null");
-    }
-    EXPECT_EQ(readFile(mDirectory.path("child.out")), "");
-    EXPECT_EQ(readFile(mDirectory.path("child.err")), "");
-
-    ASSERT_EQ(kill(lDaemon, SIGTERM), 0);
-    int lStatus = -1;
-    waitUntil([&] { return waitpid(lDaemon, &lStatus, WNOHANG) == lDaemon; }, "the daemon's end");
-    EXPECT_EQ(lStatus, 0);
-    EXPECT_FALSE(exists(mPidFile));
-}
-
-/// A system that gets a stop signal at the last moment before it daemonises.
-class ZTCSystemStoppedEarly : public ZTCTestSystem {
-public:
-    ZTCSystemStoppedEarly(const std::string& acrPidFilePath, int aSignal)
-        : ZTCTestSystem(acrPidFilePath), mSignal(aSignal) {}
-    void systemDaemonize(ZTCString aDirectory, ZTCString aInput, ZTCString aOutput, ZTCString aError) override {
-        kill(getpid(), mSignal);
-        ZTCTestSystem::systemDaemonize(aDirectory, aInput, aOutput, aError);
-    }
-
-private:
-    const int mSignal;
-};
-
-TEST_F(SystemMainTest, AStopSignalFromBeforeTheForkStopsTheDaemon) {
-    ASSERT_EQ(prctl(PR_SET_CHILD_SUBREAPER, 1), 0);
-    for (const int lSignal : {SIGTERM, SIGINT}) {
-        ZTCForkedProcess lChild(
-            [&](ZTCForkedProcess& arSelf) {
-                setLogFilePath(mLogFile.c_str());
-                ZTCSystemStoppedEarly lSystem(mPidFile, lSignal);
-                lSystem.addConditional();
-                lSystem.addComponent(
-                    NEW ZTCFunctionComponent(lSystem, "a thread", [&](ZTCFunctionComponent&, ZTCSystem& arSystem) {
-                        // A daemon that was not told goes on until the test ends.
-                        arSystem.wait(0);
-                        arSelf.tellParent();
-                    }));
-                alarm(static_cast<unsigned>(gcTestPatience.count()));
-                sRunSystemMain(&lSystem, {});
-                return 0;
-            },
-            mDirectory.path("child"));
-        EXPECT_EQ(lChild.waitForExit(), 0) << "the process that was started";
-        lChild.waitForChild();
-        int lStatus = -1;
-        waitUntil([&] { return waitpid(-1, &lStatus, WNOHANG) > 0; }, "the daemon's end");
-        EXPECT_EQ(lStatus, 0);
-        EXPECT_FALSE(exists(mPidFile));
     }
 }

@@ -1,12 +1,8 @@
 #include <gtest/gtest.h>
 
-#include <atomic>
-#include <chrono>
 #include <filesystem>
 #include <iostream>
-#include <stdexcept>
 #include <string>
-#include <thread>
 
 #include "common/include/Exception.h"
 #include "system/include/SystemGlobals.h"

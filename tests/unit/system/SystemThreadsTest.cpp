@@ -1,17 +1,12 @@
 #include <gtest/gtest.h>
 
 #include <atomic>
-#include <chrono>
-#include <filesystem>
-#include <iostream>
 #include <stdexcept>
 #include <string>
 #include <thread>
 
 #include "common/include/Exception.h"
-#include "system/include/SystemGlobals.h"
 #include "tests/unit/os/LogCapture.h"
-#include "tests/unit/system/ForkedProcess.h"
 #include "tests/unit/system/TestSystem.h"
 
 static void sRunThreads(ZTCSystem& arSystem) {

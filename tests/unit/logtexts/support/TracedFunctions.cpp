@@ -10,6 +10,7 @@ const std::vector<std::string>& tracedFunctions() {
         "Bell.cpp sReadDescriptor",
         "Bell.h ZTCBell::noteHeld",
         "Bell.h ZTCBell::noteRetrieval",
+        "Bell.h ZTCBell::ZTCBell",
         "CheckHeartbeat.cpp ZTCCheckHeartbeat::CheckStatus",
         "CheckHeartbeat.cpp ZTCCheckHeartbeat::getProcStatus",
         "CheckHeartbeat.cpp ZTCCheckHeartbeat::isOutOfRetries",
@@ -43,6 +44,7 @@ const std::vector<std::string>& tracedFunctions() {
         "KindStates.cpp sGetStateOfReport",
         "KindStates.cpp sGetStateOfStatus",
         "KindStates.cpp sSayNotShown",
+        "KindStates.h ZTCKindStates::ZTCKindStates",
         "SetHeartbeat.cpp ZTCSetHeartbeat::SetHeartbeat",
         "SetHeartbeat.h ZTCSetHeartbeat::ZTCSetHeartbeat",
         "StatusPageWriter.cpp ZTCStatusPageWriter::addBoards",
@@ -195,10 +197,8 @@ const std::vector<std::string>& tracedFunctions() {
 
 const std::vector<std::string>& accessorFunctions() {
     static const auto& srFunctions = *new std::vector<std::string>{
-        "Bell.h ZTCBell::ZTCBell",
         "Bell.h ZTCBell::getRetrievals",
         "Bell.h ZTCBell::ringIfDue",
-        "KindStates.h ZTCKindStates::ZTCKindStates",
         "StatusPageWriter.cpp ZTCStatusPageWriter::getRow",
         "StatusPageWriter.h ZTCStatusPageWriter::add",
         "StatusPageWriter.h ZTCStatusPageWriter::getMicroseconds",
