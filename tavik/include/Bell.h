@@ -1,6 +1,6 @@
 /// Asks the sensor for a retrieval: an inherited eventfd that is rung when much is held, and when events are refused.
-#ifndef TAVIK_BELL_H
-#define TAVIK_BELL_H
+#ifndef TAVIK_INCLUDE_BELL_H
+#define TAVIK_INCLUDE_BELL_H
 
 #include <atomic>
 #include <cstdint>
@@ -13,7 +13,10 @@
 class ZTCBell {
 public:
     /// aLimit: the bytes held from which on events are refused.
-    explicit ZTCBell(std::uint32_t aLimit) : mHalf(aLimit / 2) {}
+    explicit ZTCBell(std::uint32_t aLimit) : mHalf(aLimit / 2) {
+        ZT_ENTRY();
+        ZT_EXIT();
+    }
     ZTCBell(const ZTCBell&) = delete;
     ZTCBell& operator=(const ZTCBell&) = delete;
 

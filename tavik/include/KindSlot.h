@@ -1,6 +1,6 @@
 /// Numbers the pairs of one-bit category and one-bit subcategory, so that a table by pair is a plain array.
-#ifndef TAVIK_KINDSLOT_H
-#define TAVIK_KINDSLOT_H
+#ifndef TAVIK_INCLUDE_KINDSLOT_H
+#define TAVIK_INCLUDE_KINDSLOT_H
 
 #include <bit>
 

@@ -1,12 +1,13 @@
 /// What is known of each kind on each board: registered or not, and what the adapters' library reports. Shows it on the
 /// status page.
-#ifndef TAVIK_KINDSTATES_H
-#define TAVIK_KINDSTATES_H
+#ifndef TAVIK_INCLUDE_KINDSTATES_H
+#define TAVIK_INCLUDE_KINDSTATES_H
 
 #include <array>
 #include <cstdint>
 #include <vector>
 
+#include "common/include/Log.h"
 #include "common/include/Map.h"
 #include "common/include/Pointer.h"
 #include "common/include/ThreadAnnotations.h"
@@ -26,7 +27,10 @@
 class ZTCKindStates : public ZTCLibkpmReports {
 public:
     /// The page is not owned and outlives this.
-    explicit ZTCKindStates(ZTCStatusPageWriter& arPage) : mrPage(arPage) {}
+    explicit ZTCKindStates(ZTCStatusPageWriter& arPage) : mrPage(arPage) {
+        ZT_ENTRY();
+        ZT_EXIT();
+    }
 
     // ---- Main thread ----
 

@@ -1,6 +1,6 @@
 /// Writes the agent's status page (StatusPage.h), where one is wanted.
-#ifndef TAVIK_STATUSPAGEWRITER_H
-#define TAVIK_STATUSPAGEWRITER_H
+#ifndef TAVIK_INCLUDE_STATUSPAGEWRITER_H
+#define TAVIK_INCLUDE_STATUSPAGEWRITER_H
 
 #include <atomic>
 #include <cstdint>

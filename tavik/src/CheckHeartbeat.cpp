@@ -9,7 +9,7 @@
 
 namespace {
 
-constexpr ZTError gcHeartbeatFailedCode = ZT_SEGMENTED_ERRCODE(3, 12);
+constexpr ZTError scHeartbeatFailedCode = ZT_SEGMENTED_ERRCODE(3, 12);
 
 }  // namespace
 
@@ -22,7 +22,7 @@ void ZTCCheckHeartbeat::CheckStatus() {
     } catch (const ZTCClibStatFailedEx&) {
         ZT_LOG_WARN("Failed in stat on %s file", mFileName->get());
         if (isOutOfRetries()) {
-            ZT_THROW(ZTCHeartbeatFailedEx, "", gcHeartbeatFailedCode);
+            ZT_THROW(ZTCHeartbeatFailedEx, "", scHeartbeatFailedCode);
         }
         ZT_EXIT();
         return;
@@ -37,7 +37,7 @@ void ZTCCheckHeartbeat::CheckStatus() {
     } else if (isOutOfRetries()) {
         ZT_EXIT();
         ZT_LOG_WARN("Modfication time of the %s hasn't changed", mFileName->get());
-        throw ZTCHeartbeatFailedEx("", gcHeartbeatFailedCode);
+        throw ZTCHeartbeatFailedEx("", scHeartbeatFailedCode);
     }
     ZT_EXIT();
 }
@@ -46,7 +46,7 @@ void ZTCCheckHeartbeat::getProcStatus() {
     ZT_ENTRY();
     auto* lpSystem = dynamic_cast<ZTCSystem*>(mpSystemInterface);
     if (lpSystem == nullptr) {
-        ZT_THROW(ZTCClibGetProcStatusFailedEx, "The system interface is no system", gcHeartbeatFailedCode);
+        ZT_THROW(ZTCClibGetProcStatusFailedEx, "The system interface is no system", scHeartbeatFailedCode);
     }
     lpSystem->getProcStatus(ZTCString(*mFileName));
     ZT_EXIT();

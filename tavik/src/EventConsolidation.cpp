@@ -10,8 +10,8 @@
 
 namespace {
 
-constexpr unsigned int gcAllLuns = 0xFFFFFFFF;
-constexpr unsigned int gcBitsPerField = gcBitFieldSize * 8;
+constexpr unsigned int scAllLuns = 0xFFFFFFFF;
+constexpr unsigned int scBitsPerField = gcBitFieldSize * 8;
 
 bool sIsSameIdentity(const ZTSConsolidationKind& acrKind, const ZTSPrevIdentity& acrPrev,
                      const unsigned char* apPayload) {
@@ -57,9 +57,9 @@ void sSetBits(const ZTSConsolidationKind& acrKind, const unsigned char* apPayloa
     ZT_ENTRY();
     for (const ZTSBitFieldCopy* lpField = acrKind.mBitFields; lpField->mFieldOffset != 0; ++lpField) {
         const unsigned int lNumber = loadUnaligned<unsigned int>(apPayload + lpField->mPayloadOffset);
-        if (lpField->mHasAll && lNumber == gcAllLuns) {
+        if (lpField->mHasAll && lNumber == scAllLuns) {
             TavikSet_AllBitField(apRecord + lpField->mFieldOffset, gcBitFieldSize);
-        } else if (lNumber < gcBitsPerField) {
+        } else if (lNumber < scBitsPerField) {
             TavikSet_BitField(apRecord + lpField->mFieldOffset, lNumber);
         }
     }
@@ -71,7 +71,7 @@ void sFillRecord(const ZTSConsolidationKind& acrKind, const unsigned char* apPay
     TavikStore32(apRecord, EVENTDATA_VERSION);
     sCopyFields(acrKind.mRecordFields, apPayload, apRecord);
     for (const ZTSBitFieldCopy* lpField = acrKind.mBitFields; lpField->mFieldOffset != 0; ++lpField) {
-        TavikStore32(apRecord + lpField->mLengthOffset, gcBitsPerField);
+        TavikStore32(apRecord + lpField->mLengthOffset, scBitsPerField);
     }
     sSetBits(acrKind, apPayload, apRecord);
     ZT_EXIT();

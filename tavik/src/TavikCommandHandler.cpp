@@ -11,12 +11,12 @@
 
 namespace {
 
-constexpr unsigned int gcCommandReader = 0;
-constexpr unsigned int gcResponseWriter = 0;
+constexpr unsigned int scCommandReader = 0;
+constexpr unsigned int scResponseWriter = 0;
 
 void sReadCommand(ZTCTavikSystem* apSystem, ZTCPointer<ZTCBuffer>& arRequest) {
     ZT_ENTRY();
-    apSystem->getProtocolHelper()->receive(apSystem->getReader(gcCommandReader), arRequest, 0);
+    apSystem->getProtocolHelper()->receive(apSystem->getReader(scCommandReader), arRequest, 0);
     ZT_EXIT();
 }
 
@@ -30,7 +30,7 @@ void sProcessCommand(ZTCTavikSystem* apSystem, const ZTCPointer<ZTCBuffer>& acrR
 void sOutputResponse(ZTCTavikSystem* apSystem, const ZTCPointer<ZTCBuffer>& acrResponse) {
     ZT_ENTRY();
     try {
-        apSystem->getProtocolHelper()->send(apSystem->getWriter(gcResponseWriter), acrResponse, 0);
+        apSystem->getProtocolHelper()->send(apSystem->getWriter(scResponseWriter), acrResponse, 0);
     } catch (const ZTCClibWriteFailedEx&) {
         apSystem->getStatusPage().setEnd(ZTSE_SensorGone);
         ZT_EXIT();
@@ -79,7 +79,7 @@ void* CommandHandlerThreadProcedure(void* lpArgs) {
         while (!lCommandHandler->isSetForExit()) {
             ZT_LOG_INFO("Waiting for control availability...");
             try {
-                lpTavikSystem->waitForActivity(gcCommandReader, lCommandHandler->getWaitTime());
+                lpTavikSystem->waitForActivity(scCommandReader, lCommandHandler->getWaitTime());
             } catch (const ZTCTimeOutEx&) {
                 lpTavikSystem->showAdapters();
                 continue;

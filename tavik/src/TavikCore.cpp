@@ -223,7 +223,7 @@ struct ZTSDispatch {
     const char* mpText;  ///< too short an event; for the generic member the notice in front
 };
 
-constexpr ZTSDispatch gcDispatch[] = {
+constexpr ZTSDispatch scDispatch[] = {
     {1, 0x01, &gcPlogiKind, sConsolidatePlogiEvents, "Not enough data in ELS PLOGI Event %u %u"},
     {1, 0x02, &gcPrloKind, sConsolidatePrloEvents, "Not enough data in ELS PRLO Event %u %u"},
     {1, 0x04, &gcAdiscKind, sConsolidateAdiscEvents, "Not enough data in ELS ADISC Event %u %u"},
@@ -249,37 +249,37 @@ constexpr ZTSDispatch gcDispatch[] = {
 /// Every kind has its row, in the order of the table of kinds: under the pair it is delivered as, and with a member of
 /// its own where its events carry data that a record keeps. RSCNs do not come here.
 constexpr bool sHasEveryKindButRscn() {
-    const ZTSDispatch* lpDispatch = std::begin(gcDispatch);
+    const ZTSDispatch* lpDispatch = std::begin(scDispatch);
     for (const ZTSScopeEventKind& lrKind : gcScopeEventKinds) {
         if (lrKind.mDeliveredCategory == gcRscnCategory && lrKind.mDeliveredSubcategory == gcRscnSubcategory) {
             continue;
         }
         const bool lHasMember = lrKind.isScope() && lrKind.mDataSize != 0;
-        if (lpDispatch == std::end(gcDispatch) || lpDispatch->mCategory != lrKind.mDeliveredCategory ||
+        if (lpDispatch == std::end(scDispatch) || lpDispatch->mCategory != lrKind.mDeliveredCategory ||
             lpDispatch->mSubcategory != lrKind.mDeliveredSubcategory || (lpDispatch->mpKind != nullptr) != lHasMember ||
             (lpDispatch->mpMember != nullptr) != lHasMember) {
             return false;
         }
         ++lpDispatch;
     }
-    return lpDispatch == std::end(gcDispatch);
+    return lpDispatch == std::end(scDispatch);
 }
 static_assert(sHasEveryKindButRscn());
 
 /// The rows of the table by slot; the last slot is that of what has none.
-constexpr auto gcDispatchBySlot = [] {
+constexpr auto scDispatchBySlot = [] {
     std::array<const ZTSDispatch*, gcKindSlots + 1> lRows{};
-    for (const ZTSDispatch& lrDispatch : gcDispatch) {
+    for (const ZTSDispatch& lrDispatch : scDispatch) {
         lRows[getKindSlot(lrDispatch.mCategory, lrDispatch.mSubcategory)] = &lrDispatch;
     }
     return lRows;
 }();
-static_assert(gcDispatchBySlot[gcKindSlots] == nullptr);
+static_assert(scDispatchBySlot[gcKindSlots] == nullptr);
 
 const ZTSDispatch* sFindDispatch(unsigned char aCategory, unsigned char aSubcategory) {
     ZT_ENTRY();
     ZT_EXIT();
-    return gcDispatchBySlot[getKindSlot(aCategory, aSubcategory)];
+    return scDispatchBySlot[getKindSlot(aCategory, aSubcategory)];
 }
 
 /// Makes a kind that is never destroyed: callbacks may run while the process exits.
@@ -364,11 +364,11 @@ int sConsolidateEvents(const ZTCPointer<ZTCScopeEvent>& acrEvent, unsigned int a
 
 // ---- RSCN: a payload of affected-address pages, each consolidated on its own ----
 
-constexpr unsigned int gcRscnHeaderSize = 4;
-constexpr unsigned int gcRscnPageSize = 4;
-constexpr unsigned int gcRscnMinimumLength = gcRscnHeaderSize + gcRscnPageSize;
-constexpr unsigned int gcRscnFormatMask = 0x03000000;  // 0: a single port's address
-constexpr unsigned int gcRscnAddressMask = 0x00FFFFFF;
+constexpr unsigned int scRscnHeaderSize = 4;
+constexpr unsigned int scRscnPageSize = 4;
+constexpr unsigned int scRscnMinimumLength = scRscnHeaderSize + scRscnPageSize;
+constexpr unsigned int scRscnFormatMask = 0x03000000;  // 0: a single port's address
+constexpr unsigned int scRscnAddressMask = 0x00FFFFFF;
 
 /// False where the board has no record list any more: the page is not recorded then.
 bool sConsolidateRscnEvent(const ZTCPointer<ZTCScopeEvent>& acrEvent, unsigned int aBoardId, unsigned int aFcId) {
@@ -389,9 +389,9 @@ bool sConsolidateRscnEvent(const ZTCPointer<ZTCScopeEvent>& acrEvent, unsigned i
             unsigned char lRecord[sizeof(TavikRscn)];
             TavikStore32(lRecord + offsetof(TavikRscn, Version), EVENTDATA_VERSION);
             TavikStore32(lRecord + offsetof(TavikRscn, FcId), aFcId);
-            const bool lIsPortAddress = (aFcId & gcRscnFormatMask) == 0;
+            const bool lIsPortAddress = (aFcId & scRscnFormatMask) == 0;
             const ZTCTavikTarget* lpTarget =
-                lIsPortAddress ? gpTavikSystem->findFcTarget(aFcId & gcRscnAddressMask) : nullptr;
+                lIsPortAddress ? gpTavikSystem->findFcTarget(aFcId & scRscnAddressMask) : nullptr;
             ZTSRemotePortNames lNames;
             if (lpTarget != nullptr) {
                 lNames = {*lpTarget->getWwpn(), *lpTarget->getWwnn()};
@@ -410,8 +410,8 @@ bool sConsolidateRscnEvent(const ZTCPointer<ZTCScopeEvent>& acrEvent, unsigned i
 bool sProcessRscnEvent(unsigned int aBoardId, const void* apData, unsigned int aLength,
                        const ZTCPointer<ZTCScopeEvent>& acrEvent, ZTCEventOutcome& arOutcome) {
     ZT_ENTRY();
-    if (aLength < gcRscnMinimumLength) {
-        ZT_LOG_WARN("Not enough data in RSCN Event %u %u", gcRscnMinimumLength, aLength);
+    if (aLength < scRscnMinimumLength) {
+        ZT_LOG_WARN("Not enough data in RSCN Event %u %u", scRscnMinimumLength, aLength);
         arOutcome.refuse(ZTSR_TooShort);
         ZT_EXIT();
         return true;
@@ -427,13 +427,13 @@ bool sProcessRscnEvent(unsigned int aBoardId, const void* apData, unsigned int a
     }
     ZT_LOG_INFO("lPayloadLength = %hu", lPayloadLength);
     // The payload is as long as it says: the library delivers it whole, whatever length goes with it.
-    const auto lPageCount = std::max<std::int16_t>(static_cast<std::int16_t>(lPayloadLength / gcRscnPageSize - 1), 0);
+    const auto lPageCount = std::max<std::int16_t>(static_cast<std::int16_t>(lPayloadLength / scRscnPageSize - 1), 0);
     if (lPageCount == 0) {
         arOutcome.refuse(ZTSR_TooShort);
     } else {
         arOutcome.setEvents(static_cast<unsigned int>(lPageCount));
     }
-    const unsigned char* lpPage = lpPayload + gcRscnHeaderSize;
+    const unsigned char* lpPage = lpPayload + scRscnHeaderSize;
     bool lHasRecordList = true;
     for (std::int16_t lPage = 0; lPage < lPageCount && lHasRecordList; ++lPage) {
         unsigned int lWord;
@@ -442,7 +442,7 @@ bool sProcessRscnEvent(unsigned int aBoardId, const void* apData, unsigned int a
         if (lHasRecordList) {
             arOutcome.noteConsolidated();
         }
-        lpPage += gcRscnPageSize;
+        lpPage += scRscnPageSize;
     }
     ZT_EXIT();
     return lHasRecordList;

@@ -30,7 +30,7 @@ constexpr ZTSCatalogueEntry sEntry(const char* apMessage) {
     return {apMessage, sMake<TKind>, TKind::gcCategory, TKind::gcSubcategory};
 }
 
-constexpr std::array<ZTSCatalogueEntry, gcScopeEventKindCount> gcEntries{{
+constexpr std::array<ZTSCatalogueEntry, gcScopeEventKindCount> scEntries{{
     sEntry<ZTCElsPlogiScopeEvent>("Inserting ElsPlogi ScopeEvent into Events Catalogue"),
     sEntry<ZTCElsPrloScopeEvent>("Inserting ElsPrlo ScopeEvent into Events Catalogue"),
     sEntry<ZTCElsAdiscScopeEvent>("Inserting ElsAdisc ScopeEvent into Events Catalogue"),
@@ -55,8 +55,8 @@ constexpr std::array<ZTSCatalogueEntry, gcScopeEventKindCount> gcEntries{{
 
 constexpr bool sIsInOrderOfKinds() {
     for (std::size_t lKind = 0; lKind < gcScopeEventKindCount; ++lKind) {
-        if (gcEntries[lKind].mCategory != gcScopeEventKinds[lKind].mRegisteredCategory ||
-            gcEntries[lKind].mSubcategory != gcScopeEventKinds[lKind].mRegisteredSubcategory) {
+        if (scEntries[lKind].mCategory != gcScopeEventKinds[lKind].mRegisteredCategory ||
+            scEntries[lKind].mSubcategory != gcScopeEventKinds[lKind].mRegisteredSubcategory) {
             return false;
         }
     }
@@ -68,7 +68,7 @@ static_assert(sIsInOrderOfKinds());
 
 ZTCTavikEventCatalogue::ZTCTavikEventCatalogue() {
     ZT_ENTRY();
-    for (const ZTSCatalogueEntry& lrEntry : gcEntries) {
+    for (const ZTSCatalogueEntry& lrEntry : scEntries) {
         ZT_LOG_INFO("%s", lrEntry.mpMessage);
         insertIntoCatalogue(ZTCPointer<ZTCScopeEvent>(lrEntry.mpMake()));
     }

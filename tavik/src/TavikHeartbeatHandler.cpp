@@ -9,15 +9,15 @@
 
 namespace {
 
-constexpr unsigned int gcHeartbeatConditional = 0;
-constexpr unsigned int gcConditionals[] = {gcHeartbeatConditional};
-constexpr char gcThreadName[] = "TavikHeartbeatThread";
+constexpr unsigned int scHeartbeatConditional = 0;
+constexpr unsigned int scConditionals[] = {scHeartbeatConditional};
+constexpr char scThreadName[] = "TavikHeartbeatThread";
 
 }  // namespace
 
 ZTCTavikHeartbeatHandler::ZTCTavikHeartbeatHandler(ZTCSystemInterface* apSystem, unsigned int aTimeout)
-    : ZTCThreadComponent(&TavikHeartbeatThread, ZTCString(gcThreadName), apSystem),
-      ZTCConditionTimedWaitThreadComponent(&TavikHeartbeatThread, ZTCString(gcThreadName), apSystem, gcConditionals, 1,
+    : ZTCThreadComponent(&TavikHeartbeatThread, ZTCString(scThreadName), apSystem),
+      ZTCConditionTimedWaitThreadComponent(&TavikHeartbeatThread, ZTCString(scThreadName), apSystem, scConditionals, 1,
                                            aTimeout) {
     ZT_ENTRY();
     const ZTCPointer<ZTCString> lSensorFile(NEW ZTCString(apSystem->getInstallDir() + ZTCString(gcSensorPidFileName)));
@@ -43,7 +43,7 @@ void* TavikHeartbeatThread(void* lpArgs) {
         const unsigned int lWaitTime = lpHandler->getWaitTime();
         ZT_TRACE_MSG("Going to wait for %u seconds", lWaitTime);
         try {
-            lpTavikSystem->timedWait(gcHeartbeatConditional, lWaitTime);
+            lpTavikSystem->timedWait(scHeartbeatConditional, lWaitTime);
         } catch (const ZTCTimeOutEx&) {  // a period is over
         }
         if (lpHandler->isSetForExit()) {

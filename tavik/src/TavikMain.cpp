@@ -7,14 +7,14 @@
 
 namespace {
 
-constexpr char gcLogFile[] = "qrv-tvk.log";
+constexpr char scLogFile[] = "qrv-tvk.log";
 
 }  // namespace
 
 int main(int argc, char** argv) {
     ZT_ENTRY();
     ZT_LOG_NOTICE("Starting the Tavik");
-    setLogFilePath(gcLogFile);
+    setLogFilePath(scLogFile);
     try {
         {
             const ZTCString lName(gcTavikName);

@@ -19,14 +19,14 @@ std::atomic<bool> mDoScopeCollection(false);
 
 namespace {
 
-constexpr Size gcResponseCapacity = 1024;
+constexpr Size scResponseCapacity = 1024;
 /// More bytes than the key of a board takes in a response.
-constexpr Size gcInitiatorKeySize = 128;
+constexpr Size scInitiatorKeySize = 128;
 
 using ZTPCommandHandler = void (ZTCTavikProtocolHandler::*)(const ZTCPointer<ZTCBuffer>&, ZTCPointer<ZTCBuffer>&);
 
 /// By command code.
-constexpr ZTPCommandHandler gcCommandHandlers[] = {
+constexpr ZTPCommandHandler scCommandHandlers[] = {
     &ZTCTavikProtocolHandler::handleStartScopeCommand, &ZTCTavikProtocolHandler::handleGetScopeDataCommand,
     &ZTCTavikProtocolHandler::handleStopCommand,       &ZTCTavikProtocolHandler::handleRegisterTargetsCommand,
     &ZTCTavikProtocolHandler::handleShutDownCommand,   &ZTCTavikProtocolHandler::handleSetCollectionPeriodCommand,
@@ -43,7 +43,7 @@ struct ZTSBoardRegistration {
     bool mIsRequired;  ///< a failure fails the whole command
 };
 
-const ZTSBoardRegistration gcBoardRegistrations[] = {
+const ZTSBoardRegistration scBoardRegistrations[] = {
     {FC_REG_RSCN_EVENT, FC_REG_RSCN_EVENT, 1024, reinterpret_cast<KPM_EventCallback>(&ScopeCb_KpmRscn),
      "Failed to register RSCN for Initiator <%s, %s> - Error %u", "Registered RSCN for Initiator <%s, %s>", true},
     {FC_REG_TEMPERATURE_EVENT, FC_REG_TEMPERATURE_EVENT, 0, reinterpret_cast<KPM_EventCallback>(&ScopeCb_KpmTemp),
@@ -54,7 +54,7 @@ const ZTSBoardRegistration gcBoardRegistrations[] = {
 };
 
 /// The library hands the context of a board registration back unread.
-void* const gcpBoardContext = reinterpret_cast<void*>(std::uintptr_t{0xFFFF});
+void* const scpBoardContext = reinterpret_cast<void*>(std::uintptr_t{0xFFFF});
 
 enum ZTERegistrationOutcome : unsigned char {
     ZTRG_Registered,
@@ -73,10 +73,10 @@ struct ZTSRegistration {
 
 const ZTSBoardRegistration* sFindBoardRegistration(unsigned char aSubcategory) {
     ZT_ENTRY();
-    const auto* lpFound = std::find_if(std::begin(gcBoardRegistrations), std::end(gcBoardRegistrations),
+    const auto* lpFound = std::find_if(std::begin(scBoardRegistrations), std::end(scBoardRegistrations),
                                        [&](const auto& acrRow) { return acrRow.mSubcategory == aSubcategory; });
     ZT_EXIT();
-    return lpFound == std::end(gcBoardRegistrations) ? nullptr : lpFound;
+    return lpFound == std::end(scBoardRegistrations) ? nullptr : lpFound;
 }
 
 bool sIsAccepted(unsigned int aStatus) {
@@ -109,7 +109,7 @@ ZTSRegistration sRegisterForBoard(ZTCTavikSystem* apSystem, const ZTCTavikInitia
     if (lResult.mpBoard != nullptr) {
         const ZTSBoardRegistration& lcrRow = *lResult.mpBoard;
         lResult.mHandle = apSystem->getLibkpmAbs()->LIBKPM_KpmRegEvent(
-            acrInitiator.getBoardId(), lcrRow.mEventType, gcpBoardContext, lcrRow.mSize, lcrRow.mpCallback);
+            acrInitiator.getBoardId(), lcrRow.mEventType, scpBoardContext, lcrRow.mSize, lcrRow.mpCallback);
         apSystem->getKindStates().noteHandle(acrInitiator.getBoardId(), *acrEvent, lResult.mHandle,
                                              !lcrRow.mIsRequired);
         const ZTERegistrationOutcome lOutcomeOfFailure = lcrRow.mIsRequired ? ZTRG_Refused : ZTRG_Missing;
@@ -136,10 +136,10 @@ void ZTCTavikProtocolHandler::process(const ZTCPointer<ZTCBuffer>& acrRequest, Z
     unsigned char lType = 0;
     lStream >> lType;
     ZT_TRACE_MSG("Command to handle: %u", lType);
-    if (lType >= sizeof gcCommandHandlers / sizeof gcCommandHandlers[0]) {
+    if (lType >= sizeof scCommandHandlers / sizeof scCommandHandlers[0]) {
         ZT_NEVER_GET_HERE();
     }
-    (this->*gcCommandHandlers[lType])(acrRequest, arResponse);
+    (this->*scCommandHandlers[lType])(acrRequest, arResponse);
     ZT_EXIT();
 }
 
@@ -215,7 +215,7 @@ void ZTCTavikProtocolHandler::handleGetScopeDataCommand(const ZTCPointer<ZTCBuff
     lInStream >> lType;
     ZT_ASSERT(lType == ZTSTVKC_GetScopeData);
 
-    ZTCEncodableOutStream lOutStream(gcResponseCapacity);
+    ZTCEncodableOutStream lOutStream(scResponseCapacity);
     lOutStream << static_cast<unsigned char>(ZTRO_ScopeData) << mpTavikSystem->getNumRecordLists();
 
     ZTCTavikRecordsMap lFreshLists;
@@ -234,7 +234,7 @@ void ZTCTavikProtocolHandler::handleGetScopeDataCommand(const ZTCPointer<ZTCBuff
 
     // All of the room at once: growing step by step would copy the response again and again.
     for (const auto& lrEntry : lTakenLists) {
-        lRoom += gcInitiatorKeySize + lrEntry.second->size() * ZTCTavikRecord::gcMostBesideData;
+        lRoom += scInitiatorKeySize + lrEntry.second->size() * ZTCTavikRecord::gcMostBesideData;
     }
     lOutStream.reserve(lRoom);
 
@@ -369,7 +369,7 @@ void ZTCTavikProtocolHandler::handleShutDownCommand(const ZTCPointer<ZTCBuffer>&
 
 void ZTCTavikProtocolHandler::createSuccessResponse(ZTCPointer<ZTCBuffer>& arResponse) {
     ZT_ENTRY();
-    ZTCEncodableOutStream lStream(gcResponseCapacity);
+    ZTCEncodableOutStream lStream(scResponseCapacity);
     lStream << static_cast<unsigned char>(ZTRO_Success) << static_cast<int>(0);
     arResponse = lStream.getBuffer();
     ZT_EXIT();
@@ -379,7 +379,7 @@ void ZTCTavikProtocolHandler::createFailedResponse(ZTESensorAgentProtocolStatus 
                                                    ZTCPointer<ZTCBuffer>& arResponse) {
     ZT_ENTRY();
     ZT_TRACE_MSG("Creating Failed Response...");
-    ZTCEncodableOutStream lStream(gcResponseCapacity);
+    ZTCEncodableOutStream lStream(scResponseCapacity);
     lStream << static_cast<unsigned char>(ZTRO_Failed) << static_cast<unsigned short>(aStatus);
     arResponse = lStream.getBuffer();
     ZT_EXIT();

@@ -5,13 +5,13 @@
 
 namespace {
 
-constexpr char gcTimeSeparator[] = ".";
+constexpr char scTimeSeparator[] = ".";
 
 }  // namespace
 
 ZTCTavikRecord::ZTCTavikRecord(const ZTCPointer<ZTCScopeData>& acrData)
-    : mBeginTime(gcTimeSeparator),
-      mEndTime(gcTimeSeparator),
+    : mBeginTime(scTimeSeparator),
+      mEndTime(scTimeSeparator),
       mBeginTimeStamp(mBeginTime),
       mEndTimeStamp(mEndTime),
       mOccurences(1),
@@ -23,7 +23,7 @@ ZTCTavikRecord::ZTCTavikRecord(const ZTCPointer<ZTCScopeData>& acrData)
 void ZTCTavikRecord::incrementOccurrences() noexcept {
     ZT_ENTRY();
     ++mOccurences;
-    *mEndTimeStamp = ZTCDateTime(gcTimeSeparator);
+    *mEndTimeStamp = ZTCDateTime(scTimeSeparator);
     ZT_EXIT();
 }
 

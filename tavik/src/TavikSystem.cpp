@@ -27,10 +27,10 @@ char gRtDir[MAX_FILE_PATH] = "";
 
 namespace {
 
-constexpr char gcRuntimeDir[] = "/tmp";
+constexpr char scRuntimeDir[] = "/tmp";
 
 // Hexadecimal 0x777 is octal 3567: set-group-id and sticky; owner r-x, group rw-, others rwx. The umask applies.
-constexpr int gcRuntimeDirMode = 0x777;
+constexpr int scRuntimeDirMode = 0x777;
 
 /// Who changes the total holds the lock, so that nobody comes in between; its readers without the lock need no order.
 void sAddToTotal(std::atomic<std::uint32_t>& arTotal, unsigned int aBytes) noexcept {
@@ -43,7 +43,7 @@ void sCreateRtdir() {
     ZT_ENTRY();
     ZT_TRACE_MSG("Trying to create '%s'", gRtDir);
     try {
-        ClibMkdir(gRtDir, gcRuntimeDirMode);
+        ClibMkdir(gRtDir, scRuntimeDirMode);
     } catch (const ZTCExistsEx&) {
         ZT_LOG_WARN("'%s' already exists... continuing", gRtDir);
     }
@@ -52,7 +52,7 @@ void sCreateRtdir() {
 
 void sInitGlobals() {
     ZT_ENTRY();
-    ClibStrcpy(gRtDir, gcRuntimeDir);
+    ClibStrcpy(gRtDir, scRuntimeDir);
     setLogCode(gcDefaultLogCode);
     setHbTimeout(gcDefaultHbTimeout);
     sCreateRtdir();

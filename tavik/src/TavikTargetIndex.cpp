@@ -8,9 +8,9 @@
 
 namespace {
 
-constexpr std::size_t gcLeastSlots = 16;
-constexpr unsigned gcHashBits = 64;
-constexpr unsigned long gcHashFactor = 0x9e3779b97f4a7c15;
+constexpr std::size_t scLeastSlots = 16;
+constexpr unsigned scHashBits = 64;
+constexpr unsigned long scHashFactor = 0x9e3779b97f4a7c15;
 
 }  // namespace
 
@@ -22,11 +22,11 @@ void ZTCTavikTargetIndex::reserveOne() {
     }
     ZTCTavikTargetIndex lGrown;
     try {
-        lGrown.mSlots.resize(mSlots.empty() ? gcLeastSlots : 2 * mSlots.size());
+        lGrown.mSlots.resize(mSlots.empty() ? scLeastSlots : 2 * mSlots.size());
     } catch (const std::bad_alloc&) {
         ZT_THROW(ZTCNoMemoryEx, "Out of Memory", gcErrNoMemory);
     }
-    lGrown.mShift = gcHashBits - static_cast<unsigned>(std::countr_zero(lGrown.mSlots.size()));
+    lGrown.mShift = scHashBits - static_cast<unsigned>(std::countr_zero(lGrown.mSlots.size()));
     for (const ZTSRemotePortNames& lrNames : mSlots) {
         if (lrNames.mWwpn.getKey() != 0) {
             lGrown.insert(lrNames);
@@ -73,7 +73,7 @@ const ZTSRemotePortNames* ZTCTavikTargetIndex::find(unsigned long aKey) const no
 
 std::size_t ZTCTavikTargetIndex::getFirstSlot(unsigned long aKey) const noexcept {
     ZT_ENTRY();
-    const auto lSlot = static_cast<std::size_t>(aKey * gcHashFactor >> mShift);
+    const auto lSlot = static_cast<std::size_t>(aKey * scHashFactor >> mShift);
     ZT_EXIT();
     return lSlot;
 }

@@ -7,18 +7,16 @@
 #include <cerrno>
 #include <cstdio>
 
+#include "common/include/ThrowWith.h"
 #include "os/common/include/Clib.h"
 
 namespace {
 
 constexpr char scNewSuffix[] = ".new";
 constexpr ::mode_t scMode = S_IRUSR | S_IWUSR;
-constexpr std::size_t scTextSize = 512;
 
 [[noreturn]] void sThrowFailed(const char* apWhat, const char* apPath, int aErrno) {
-    char lText[scTextSize];
-    ClibSprintf(lText, sizeof lText, "%s '%s' failed: %s", apWhat, apPath, ZTCErrnoText(aErrno).get());
-    throw ZTCClibWriteFailedEx(lText);
+    throwWith<ZTCClibWriteFailedEx>("%s '%s' failed: %s", apWhat, apPath, ZTCErrnoText(aErrno).get());
 }
 
 }  // namespace
