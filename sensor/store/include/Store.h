@@ -23,10 +23,11 @@
 /// Settings of the store. The defaults are those of the configuration.
 struct ZTSStoreLimits {
     std::chrono::microseconds mEpisodeGap = std::chrono::seconds(60);
-    std::uint32_t mRecordsPerEnd = 100;                ///< raw records kept at each end of an episode
-    std::uint32_t mDays = 90;                          ///< stored days; 0: no limit by age
-    std::uint64_t mBytes = 2ULL * 1024 * 1024 * 1024;  ///< size of the database; 0: no limit by size
-    std::uint32_t mStepRows = 2000;                    ///< most rows that one step of retention deletes
+    std::uint32_t mRecordsPerEnd = 100;                                ///< raw records kept at each end of an episode
+    std::uint32_t mDays = 90;                                          ///< stored days; 0: no limit by age
+    std::uint64_t mBytes = 2ULL * 1024 * 1024 * 1024;                  ///< size of the database; 0: no limit by size
+    std::uint32_t mStepRows = 2000;                                    ///< most rows that one step of retention deletes
+    std::chrono::milliseconds mReportAfter = std::chrono::seconds(1);  ///< a longer operation is reported
 };
 
 /// What was taken in out of one frame.
@@ -76,7 +77,7 @@ private:
 
 class ZTCStore {
 public:
-    /// Reports a line for the log, such as an operation of over a second or a database that was set aside.
+    /// Reports a line for the log, such as an operation that took long or a database that was set aside.
     using Report = std::function<void(const std::string& acrLine)>;
 
     /// Opens `history.db` in the directory, which exists; creates or migrates it. A damaged database is renamed to

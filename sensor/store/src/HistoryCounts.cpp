@@ -1,3 +1,5 @@
+#include "sensor/store/src/HistoryImplementation.h"
+
 #include <algorithm>
 #include <limits>
 #include <map>
@@ -5,7 +7,6 @@
 
 #include "sensor/store/src/CountBook.h"
 #include "sensor/store/src/Counter.h"
-#include "sensor/store/src/HistoryImplementation.h"
 
 /// Rows that one read transaction looks at.
 static constexpr std::size_t scPageRows = 16384;

@@ -1,10 +1,11 @@
+#include "sensor/store/src/HistoryImplementation.h"
+
 #include <algorithm>
 #include <limits>
 
 #include "sensor/store/src/Counter.h"
 #include "sensor/store/src/EpisodeBody.h"
 #include "sensor/store/src/EpisodeBook.h"
-#include "sensor/store/src/HistoryImplementation.h"
 #include "sensor/store/src/ReceivedTime.h"
 #include "sensor/store/src/RecordWindow.h"
 

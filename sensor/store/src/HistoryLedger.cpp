@@ -1,9 +1,10 @@
+#include "sensor/store/src/HistoryImplementation.h"
+
 #include <algorithm>
 #include <limits>
 #include <map>
 
 #include "sensor/store/src/Counter.h"
-#include "sensor/store/src/HistoryImplementation.h"
 
 static std::int64_t sFrom(const std::optional<ZTCHistoryTime>& acrTime) {
     return acrTime ? toMicroseconds(*acrTime) : std::numeric_limits<std::int64_t>::min();

@@ -96,10 +96,11 @@ private:
         const auto lStart = std::chrono::steady_clock::now();
         const auto lReport = [&] {
             const auto lPassed = std::chrono::steady_clock::now() - lStart;
-            if (lPassed > std::chrono::seconds(1) && mReport) {
+            if (lPassed > mLimits.mReportAfter && mReport) {
                 char lText[128];
-                std::snprintf(lText, sizeof lText, "history: %s took %.1f s, more than 1 s", apName,
-                              std::chrono::duration<double>(lPassed).count());
+                std::snprintf(lText, sizeof lText, "history: %s took %.3f s, more than %.3f s", apName,
+                              std::chrono::duration<double>(lPassed).count(),
+                              std::chrono::duration<double>(mLimits.mReportAfter).count());
                 mReport(lText);
             }
         };

@@ -135,7 +135,7 @@ TEST_F(HistoryTest, RecordsAreChosenEachByItself) {
 }
 
 TEST_F(HistoryTest, AVisitorEndsAVisitWhenItReturnsFalse) {
-    for (const std::uint64_t lLimit : {0, 5}) {
+    for (const std::uint64_t lLimit : std::initializer_list<std::uint64_t>{0, 5}) {
         int lVisited = 0;
         ZTSHistoryFilter lFilter;
         lFilter.mLimit = lLimit;
