@@ -63,7 +63,7 @@ std::string formatNumber(std::uint64_t aNumber);
 /// "1 event", "12,345 events".
 std::string formatCount(std::uint64_t aNumber, const std::string& acrOne);
 
-/// "256 KiB", "1.5 GiB", "17 bytes".
+/// "256 KiB", "1.5 GiB", "17 B".
 std::string formatBytes(std::uint64_t aBytes);
 
 /// Lines of at most so many characters, broken at blanks; a longer word gets a line of its own. 0: one line.

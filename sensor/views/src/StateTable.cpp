@@ -103,8 +103,10 @@ static std::string sDescribeLeftPage(const ZTSStatusFacts& acrFacts) {
                : "Lost: the " + formatCount(lrPage.mHeld, "event") + " its agent held (from the page it left).";
 }
 
+/// A run that was not ended, or a page that was left behind: an orderly stop leaves neither.
 static bool sHasVanished(const ZTSStatusFacts& acrFacts) {
-    return acrFacts.mHistory && acrFacts.mHistory->mLastRun && acrFacts.mHistory->mLastRun->mIsOpen;
+    const bool lIsRunOpen = acrFacts.mHistory && acrFacts.mHistory->mLastRun && acrFacts.mHistory->mLastRun->mIsOpen;
+    return lIsRunOpen || acrFacts.mLeftPage;
 }
 
 static ZTCLines sStatusOfNoSensor(const ZTSStatusFacts& acrFacts) {
@@ -119,8 +121,10 @@ static ZTCLines sStatusOfNoSensor(const ZTSStatusFacts& acrFacts) {
 }
 
 static ZTCLines sStatusOfVanished(const ZTSStatusFacts& acrFacts) {
-    const ZTSRun& lrRun = *acrFacts.mHistory->mLastRun;
-    std::string lText = "It vanished about " + formatShortTime(lrRun.mTo, acrFacts.mNow) + " without an orderly stop.";
+    const bool lHasRun = acrFacts.mHistory && acrFacts.mHistory->mLastRun;
+    std::string lText = "It vanished";
+    lText += lHasRun ? " about " + formatShortTime(acrFacts.mHistory->mLastRun->mTo, acrFacts.mNow) : "";
+    lText += " without an orderly stop.";
     lText += acrFacts.mLeftPage ? " " + sDescribeLeftPage(acrFacts) : "";
     return {lText + " Unseen: all since."};
 }

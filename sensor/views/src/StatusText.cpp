@@ -12,6 +12,8 @@ static constexpr std::size_t scTextColumn = scLabelWidth + 2;
 static constexpr std::size_t scRightMargin = 3;
 /// Adapters that get a line each; of more only the number is shown.
 static constexpr std::size_t scMostLinks = 4;
+/// From this width of a line on there is room for whole WWPNs.
+static constexpr std::size_t scWholeWwpnWidth = 97;
 /// Without an event for this long it counts as quiet.
 static constexpr std::chrono::minutes scQuietSpan{1};
 
@@ -116,9 +118,10 @@ private:
         std::vector<std::array<std::string, 4>> lRows;
         for (std::size_t i = 0; i < lShown; ++i) {
             const ZTSInitiator& lrInitiator = lrKinds[i].mInitiator;
-            lRows.push_back({lrInitiator.mHost.empty() ? "-" : lrInitiator.mHost,
-                             lrInitiator.mWwpn ? abbreviateWwn(*lrInitiator.mWwpn) : "-", findPortState(lrInitiator),
-                             countKinds(lrKinds[i])});
+            const std::string lWwpn = !lrInitiator.mWwpn              ? "-"
+                                      : mLineWidth < scWholeWwpnWidth ? abbreviateWwn(*lrInitiator.mWwpn)
+                                                                      : lrInitiator.mWwpn->toText();
+            lRows.push_back({lrInitiator.mHost, lWwpn, findPortState(lrInitiator), countKinds(lrKinds[i])});
         }
         std::array<std::size_t, 3> lWidths{};
         for (const auto& lrRow : lRows) {
@@ -129,6 +132,9 @@ private:
         for (std::size_t i = 0; i < lRows.size(); ++i) {
             std::string lLine;
             for (std::size_t j = 0; j < lWidths.size(); ++j) {
+                if (lWidths[j] == 0) {
+                    continue;
+                }
                 lLine += lRows[i][j] + std::string(lWidths[j] - countCharacters(lRows[i][j]) + 2, ' ');
             }
             add(i == 0 ? "links" : "", lLine + lRows[i][3]);

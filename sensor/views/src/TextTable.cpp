@@ -90,7 +90,7 @@ std::string formatCount(std::uint64_t aNumber, const std::string& acrOne) {
 }
 
 std::string formatBytes(std::uint64_t aBytes) {
-    static constexpr std::array<const char*, 5> scUnits{" bytes", " KiB", " MiB", " GiB", " TiB"};
+    static constexpr std::array<const char*, 5> scUnits{" B", " KiB", " MiB", " GiB", " TiB"};
     auto lValue = static_cast<double>(aBytes);
     std::size_t lUnit = 0;
     for (; lValue >= 1024 && lUnit + 1 < scUnits.size(); ++lUnit) {

@@ -101,6 +101,29 @@ TEST_F(StatusText, AnAgentThatOutlivedItsSensorStillHoldsItsEvents) {
     EXPECT_THAT(format(lFacts), HasSubstr("Its agent runs on\n        and holds 1,204 events. Unseen: all since.\n"));
 }
 
+TEST_F(StatusText, APageThatWasLeftTellsOfASensorThatVanishedWhateverTheHistorySays) {
+    ZTSStatusFacts lFacts = sVanished();
+    lFacts.mHistory->mLastRun->mIsOpen = false;
+    EXPECT_THAT(format(lFacts), HasSubstr("status: It vanished about 09:41:22 without an orderly stop. Lost:"));
+    lFacts.mHistory.reset();
+    EXPECT_THAT(format(lFacts), HasSubstr("status: It vanished without an orderly stop. Lost: the 1,204 events"));
+}
+
+TEST_F(StatusText, AWideTerminalHasRoomForWholeWwpns) {
+    EXPECT_THAT(
+        format(makeHealthyFacts(), 100),
+        HasSubstr("\n links: host7  10:00:00:00:c9:00:00:01  Online  listening to 6 kinds, 14 have no source\n"));
+    EXPECT_THAT(format(makeHealthyFacts(), 99), HasSubstr("\n links: host7  10:..:01  Online"));
+}
+
+TEST_F(StatusText, AdaptersWithoutAHostHaveNoEmptyColumn) {
+    nlohmann::json lLive = makeHealthyJson();
+    for (nlohmann::json& lrKinds : lLive["kinds"]) {
+        lrKinds["initiator"]["host"] = nullptr;
+    }
+    EXPECT_THAT(format(makeFacts(lLive)), HasSubstr("\n links: 10:..:01  Online  listening to 6 kinds"));
+}
+
 TEST_F(StatusText, WithoutAHistoryTheReasonIsNamed) {
     ZTSStatusFacts lFacts = sVanished();
     lFacts.mHistory.reset();

@@ -82,7 +82,7 @@ TEST(TextTable, NumbersAndSizesAreForPeople) {
     EXPECT_EQ(formatNumber(18446744073709551615ULL), "18,446,744,073,709,551,615");
     EXPECT_EQ(formatCount(1, "event"), "1 event");
     EXPECT_EQ(formatCount(1204, "event"), "1,204 events");
-    EXPECT_EQ(formatBytes(17), "17 bytes");
+    EXPECT_EQ(formatBytes(17), "17 B");
     EXPECT_EQ(formatBytes(262144), "256 KiB");
     EXPECT_EQ(formatBytes(1610612736), "1.5 GiB");
 }
