@@ -35,7 +35,8 @@ struct ZTSMetricFacts {
     std::string mVersion;
 };
 
-/// Reads what the history holds of the facts. Throws what ZTCHistory throws. @param aStatus  as gathered for `status`
+/// Reads what the history holds of the facts. Throws what ZTCHistory
+/// throws. @param aStatus  as gathered for `status`
 ZTSMetricFacts readMetricFacts(const ZTCHistory& acrHistory, ZTSStatusFacts aStatus,
                                const std::string& acrDatabasePath);
 

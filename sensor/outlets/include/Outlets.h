@@ -13,6 +13,7 @@
 #include <string>
 #include <thread>
 
+#include "sensor/metrics/include/SeriesPorts.h"
 #include "sensor/outlets/include/NdjsonFile.h"
 #include "sensor/settings/include/Settings.h"
 #include "sensor/store/include/History.h"
@@ -26,7 +27,7 @@ struct ZTSOutletsSetup {
     std::string mStateDirectory;
     std::string mHost;
     std::string mVersion;
-    /// Stores a value in the history, soon; called on the outlets' thread.
+    /// Stores a value in the history, soon; called on any thread.
     std::function<void(const std::string& acrName, const std::string& acrValue)> mSetValue;
     /// A line for people; called on the outlets' thread.
     std::function<void(const std::string& acrLine)> mReport;
@@ -66,6 +67,7 @@ private:
     /// Reports a problem of one outlet when it is new, and its end.
     void report(std::string& arLast, const std::string& acrProblem, const char* apOutlet);
     std::string readLive() const;
+    void giveSeries(ZTSMetricFacts& arFacts);
 
     const ZTSOutletsSetup mSetup;
 
@@ -89,6 +91,9 @@ private:
     std::optional<ZTSSettings> mNewSettings;
     std::string mLive = "{}";
     std::map<std::string, std::string> mNames;  ///< the administrator's, for the server's thread
+    std::size_t mMostSeries = 0;
+    ZTCSeriesPorts mSeriesPorts;  ///< of the database with this id
+    std::string mSeriesStoreId;
     unsigned mPort = 0;
 
     std::unique_ptr<ZTCApi> mpApi;           ///< of the server's thread; outlives the server

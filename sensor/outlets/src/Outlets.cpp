@@ -27,6 +27,7 @@ ZTCOutlets::ZTCOutlets(ZTSOutletsSetup aSetup, const ZTSSettings& acrSettings)
     lSources.mHost = mSetup.mHost;
     lSources.mVersion = mSetup.mVersion;
     lSources.mReadLive = [this] { return nlohmann::json::parse(readLive(), nullptr, false); };
+    lSources.mGiveSeries = [this](ZTSMetricFacts& arFacts) { giveSeries(arFacts); };
     lSources.mAddNames = [this](ZTCNameBook& arNames) {
         const std::lock_guard lLock(mMutex);
         for (const auto& [lWwn, lName] : mNames) {
@@ -114,6 +115,7 @@ void ZTCOutlets::applySettings() {
         lNew.swap(mNewSettings);
         if (lNew) {
             mNames = lNew->mNames;
+            mMostSeries = lNew->mMetricsRemotePorts;
         }
     }
     if (!lNew) {
@@ -163,6 +165,20 @@ void ZTCOutlets::openHistory() {
         mNdjsonSeq.reset();
         mStreamSeq.reset();
     }
+}
+
+/// A port that was shown with a series of its own must never be counted among the others later: who asks first decides,
+/// for all.
+void ZTCOutlets::giveSeries(ZTSMetricFacts& arFacts) {
+    const std::lock_guard lLock(mMutex);
+    if (mSeriesStoreId != arFacts.mStatus.mHistory->mStoreId) {
+        mSeriesStoreId = arFacts.mStatus.mHistory->mStoreId;
+        mSeriesPorts = arFacts.mSeriesPorts;
+    }
+    if (mSeriesPorts.extend(arFacts.mTotals, mMostSeries)) {
+        mSetup.mSetValue(gcSeriesPortsValue, mSeriesPorts.toText());
+    }
+    arFacts.mSeriesPorts = mSeriesPorts;
 }
 
 void ZTCOutlets::feed() {
@@ -250,13 +266,8 @@ void ZTCOutlets::feedNdjson() {
     }
 }
 
-/// Gives series to ports that are new, and writes the file where one is wanted.
 void ZTCOutlets::writeMetrics() {
     mNextMetrics = steady_clock::now() + scMetricsPeriod;
-    ZTCSeriesPorts lPorts(mpHistory->getValue(gcSeriesPortsValue));
-    if (lPorts.extend(mpHistory->readTotals(), mSettings.mMetricsRemotePorts)) {
-        mSetup.mSetValue(gcSeriesPortsValue, lPorts.toText());
-    }
     if (mSettings.mMetricsTextfile.empty()) {
         return;
     }

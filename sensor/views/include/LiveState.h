@@ -57,7 +57,7 @@
 #include "sensor/store/include/Episode.h"
 #include "sensor/store/include/HistoryTime.h"
 
-enum ZTEKeeperState : std::uint8_t {
+enum ZTELiveKeeperState : std::uint8_t {
     ZTKP_Starting,
     ZTKP_Running,
     ZTKP_WaitingForAdapters,
@@ -67,7 +67,7 @@ enum ZTEKeeperState : std::uint8_t {
 };
 
 /// The text in JSON: "starting", "running", and so on.
-const char* getKeeperStateName(ZTEKeeperState aState);
+const char* getLiveKeeperStateName(ZTELiveKeeperState aState);
 
 enum ZTEDiskState : std::uint8_t { ZTDK_Ok, ZTDK_Full, ZTDK_ReadOnly, ZTDK_Count };
 
@@ -76,7 +76,7 @@ const char* getDiskStateName(ZTEDiskState aState);
 
 struct ZTSLiveKeeper {
     std::optional<std::uint64_t> mPid;
-    std::optional<ZTEKeeperState> mState;
+    std::optional<ZTELiveKeeperState> mState;
     std::optional<ZTCHistoryTime> mSince;
     std::optional<ZTCHistoryTime> mNextStart;
 };

@@ -13,7 +13,7 @@ static constexpr std::array<const char*, ZTKP_Count> scKeeperStates{"starting", 
                                                                     "waiting-to-restart", "stopping"};
 static constexpr std::array<const char*, ZTDK_Count> scDiskStates{"ok", "full", "read-only"};
 
-const char* getKeeperStateName(ZTEKeeperState aState) {
+const char* getLiveKeeperStateName(ZTELiveKeeperState aState) {
     return scKeeperStates.at(aState);
 }
 

@@ -28,7 +28,7 @@ int getVerdictExit(ZTEVerdict aVerdict) {
 
 // ---- how the states are told ----
 
-static bool sIsKeeper(const ZTSStatusFacts& acrFacts, ZTEKeeperState aState) {
+static bool sIsKeeper(const ZTSStatusFacts& acrFacts, ZTELiveKeeperState aState) {
     return acrFacts.mLive && acrFacts.mLive->mKeeper.mState == aState;
 }
 

@@ -59,7 +59,7 @@ static ZTCJson sTroubles(const std::vector<ZTSTroubleText>& acrTroubles) {
 
 static ZTCJson sKeeper(const ZTSLiveKeeper& acrKeeper) {
     return {{"pid", sValue(acrKeeper.mPid)},
-            {"state", acrKeeper.mState ? ZTCJson(getKeeperStateName(*acrKeeper.mState)) : ZTCJson(nullptr)},
+            {"state", acrKeeper.mState ? ZTCJson(getLiveKeeperStateName(*acrKeeper.mState)) : ZTCJson(nullptr)},
             {"since", sTime(acrKeeper.mSince)},
             {"nextStart", sTime(acrKeeper.mNextStart)}};
 }

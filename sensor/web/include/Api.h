@@ -11,6 +11,9 @@
 #include "sensor/views/include/NameBook.h"
 #include "sensor/web/include/WebServer.h"
 
+struct ZTSMetricFacts;
+struct ZTSStatusFacts;
+
 /// Episodes in one answer where no limit is given, and at most: an answer is made whole in memory.
 inline constexpr std::uint64_t gcDefaultAnswerRows = 1000;
 inline constexpr std::uint64_t gcMostAnswerRows = 20000;
@@ -20,7 +23,10 @@ struct ZTSApiSources {
     std::string mStateDirectory;  ///< holds the history
     std::string mHost;            ///< this host's name
     std::string mVersion;
-    std::function<nlohmann::json()> mReadLive;    ///< the running sensor's live state; called on the server's thread
+    std::function<nlohmann::json()> mReadLive;  ///< the running sensor's live state; called on the server's thread
+    /// Gives series of their own to ports that are new in the facts, and fills in all that have one. Called by any of
+    /// those who ask for metrics.
+    std::function<void(ZTSMetricFacts&)> mGiveSeries;
     std::function<void(ZTCNameBook&)> mAddNames;  ///< puts the administrator's names into a book
 };
 
@@ -49,7 +55,7 @@ private:
     nlohmann::ordered_json makePorts(const ZTSWebRequest& acrRequest);
     nlohmann::ordered_json makeExplanation(const ZTSWebRequest& acrRequest);
     nlohmann::ordered_json makeTimeline(const ZTSWebRequest& acrRequest);
-    struct ZTSStatusFacts gatherFacts();
+    ZTSStatusFacts gatherFacts();
 
     const ZTSApiSources mSources;
     std::unique_ptr<ZTCHistory> mpHistory;

@@ -45,7 +45,7 @@ struct ZTSWebLimits {
 };
 
 struct ZTSWebOptions {
-    std::string mListen;              ///< "ADDRESS:PORT", "[ADDRESS]:PORT" or "unix:PATH"; port 0: any
+    std::string mListen;              ///< "ADDRESS:PORT", "[ADDRESS]:PORT", "localhost:PORT", "unix:PATH"; port 0: any
     std::vector<std::string> mHosts;  ///< Host names accepted beside localhost, 127.0.0.1 and [::1]
     ZTSWebLimits mLimits{};
 };

@@ -143,6 +143,7 @@ ZTSWebResponse ZTCApi::answerMetrics() {
     ZTSMetricFacts lFacts;
     if (mpHistory != nullptr) {
         lFacts = readMetricFacts(*mpHistory, std::move(lStatus), mSources.mStateDirectory + scDatabase);
+        mSources.mGiveSeries(lFacts);
     } else {
         lFacts.mStatus = std::move(lStatus);
     }

@@ -96,6 +96,7 @@ ZTSListenSocket openListenSocket(const std::string& acrListen) {
         const auto [lpStop, lError] = std::from_chars(acrListen.data() + lColon + 1, lpEnd, lPort);
         const bool lIsPort = lError == std::errc() && lpStop == lpEnd && lPort <= 65535;
         std::string lHost = acrListen.substr(0, lColon);
+        lHost = lHost == "localhost" ? "127.0.0.1" : lHost;
         sockaddr_in lFour{};
         lFour.sin_family = AF_INET;
         lFour.sin_port = htons(static_cast<std::uint16_t>(lPort));
@@ -110,6 +111,7 @@ ZTSListenSocket openListenSocket(const std::string& acrListen) {
             return sOpenAddress(AF_INET6, lSix, acrListen);
         }
     }
-    throw ZTCBadInputEx("http.listen \"" + acrListen +
-                        "\" is none of ADDRESS:PORT, [ADDRESS]:PORT and unix:PATH; a port is 0 to 65535");
+    throw ZTCBadInputEx(
+        "http.listen \"" + acrListen +
+        "\" is none of ADDRESS:PORT, [ADDRESS]:PORT, localhost:PORT and unix:PATH; a port is 0 to 65535");
 }

@@ -12,9 +12,9 @@ struct ZTSListenSocket {
     std::string mUnixPath;  ///< to be removed at the end; empty: an address
 };
 
-/// Binds "ADDRESS:PORT", "[ADDRESS]:PORT" or "unix:PATH" and listens, without blocking. A Unix socket is 0660; one that
-/// was left behind, and that nobody listens on, is replaced. Throws ZTCBadInputEx for a text that is no such address,
-/// ZTCSystemCallEx where the system refuses it.
+/// Binds "ADDRESS:PORT", "[ADDRESS]:PORT", "localhost:PORT" or "unix:PATH" and listens, without blocking. A Unix socket
+/// is 0660; one that was left behind, and that nobody listens on, is replaced. Throws ZTCBadInputEx for a text that is
+/// no such address, ZTCSystemCallEx where the system refuses it.
 ZTSListenSocket openListenSocket(const std::string& acrListen);
 
 #endif

@@ -137,6 +137,21 @@ TEST_F(Outlets, TheMetricsFileIsWrittenAndNewPortsAreGivenTheirSeries) {
     EXPECT_EQ(value(gcSeriesPortsValue), makeName(gcPortA).toText());
 }
 
+TEST_F(Outlets, APortThatWasShownOnItsOwnIsNeverCountedAmongTheOthersLater) {
+    ZTSSettings lSettings = settings();
+    lSettings.mHttpListen = "127.0.0.1:0";
+    lSettings.mMetricsRemotePorts = 1;
+    take({{.mKind = gcQueueFull, .mData = makeBusyData(gcPortB, {1}), .mPortName = {}}});
+    ZTCOutlets& lrOutlets = start(lSettings);
+    waitUntil([&] { return lrOutlets.getPort() != 0; }, "the server");
+    const std::string lOwn = "remote_port=\"" + makeName(gcPortB).toText() + "\"} ";
+    EXPECT_THAT(ZTCHttpClient::get(lrOutlets.getPort(), "/metrics"), HasSubstr(lOwn + "1\n"));
+    // A port whose name is smaller comes later.
+    take({{.mKind = gcQueueFull, .mData = makeBusyData(gcPortA, {1}), .mOccurrences = 5, .mPortName = {}}});
+    EXPECT_THAT(ZTCHttpClient::get(lrOutlets.getPort(), "/metrics"),
+                AllOf(HasSubstr(lOwn + "1\n"), HasSubstr("remote_port=\"other\"} 5\n")));
+}
+
 TEST_F(Outlets, AStreamGetsChangesThatComeBehindItsBeginning) {
     ZTSSettings lSettings = settings();
     lSettings.mHttpListen = "127.0.0.1:0";

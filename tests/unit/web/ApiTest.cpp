@@ -5,7 +5,7 @@
 
 #include <nlohmann/json.hpp>
 
-#include "sensor/metrics/include/SeriesPorts.h"
+#include "sensor/metrics/include/Metrics.h"
 #include "tests/unit/store/StoreFixture.h"
 
 using testing::AllOf;
@@ -22,6 +22,10 @@ protected:
             lSources.mHost = "db07";
             lSources.mVersion = "9.8.7";
             lSources.mReadLive = [this] { return mLive; };
+            lSources.mGiveSeries = [this](ZTSMetricFacts& arFacts) {
+                mSeriesPorts.extend(arFacts.mTotals, mMostSeries);
+                arFacts.mSeriesPorts = mSeriesPorts;
+            };
             lSources.mAddNames = [](ZTCNameBook& arNames) { arNames.addName(makeName(gcPortA), "array7 ctrl-A"); };
             mpApi = std::make_unique<ZTCApi>(lSources);
         }
@@ -47,6 +51,8 @@ protected:
     }
 
     nlohmann::json mLive = {{"schema", "tavik.live/1"}, {"agent", {{"running", true}}}};
+    std::size_t mMostSeries = 1;
+    ZTCSeriesPorts mSeriesPorts;
     std::unique_ptr<ZTCApi> mpApi;
 };
 
@@ -122,7 +128,6 @@ TEST_F(Api, WithoutAHistoryStatusAndMetricsStillAnswerAndTheRestGets503) {
 
 TEST_F(Api, MetricsCountWhatTheHistoryHolds) {
     fill();
-    inTransaction([this] { store().setValue(gcSeriesPortsValue, makeName(gcPortA).toText()); });
     const ZTSWebResponse lResponse = ask("/metrics");
     EXPECT_EQ(lResponse.mType, "text/plain; version=0.0.4; charset=utf-8");
     EXPECT_THAT(lResponse.mBody,

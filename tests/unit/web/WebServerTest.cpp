@@ -230,6 +230,11 @@ TEST_F(WebServer, EndingItEndsOpenStreamsAndIdleConnections) {
 
 // ---- where it listens ----
 
+TEST_F(WebServer, LocalhostIsTheLoopback) {
+    const unsigned lPort = start({.mListen = "localhost:0", .mHosts = {}}).getPort();
+    EXPECT_THAT(ZTCHttpClient::get(lPort, "/path"), EndsWith("/path"));
+}
+
 TEST_F(WebServer, AUnixSocketIsForItsGroupAndTakesAnyHostName) {
     const ZTCTemporaryDirectory lDirectory;
     const std::string lPath = lDirectory.path("http");
