@@ -12,8 +12,6 @@
 
 namespace {
 
-constexpr unsigned scUnlimited = 100000;
-
 void sNothing(ZTCFaultStage&) {}
 
 void sStart(ZTCFaultStage& arStage) {
@@ -264,22 +262,41 @@ std::vector<ZTSFaultPhase> faultPhases() {
         ZTCAgentProcess::registerTargetsRequest({{makeWwn(gcRemoteNode), makeWwn(gcRemotePort), 0x010203},
                                                  {makeWwn(gcOtherNode), makeWwn(gcOtherPort), 0x010204}});
     std::vector<ZTSFaultPhase> lPhases = {
-        {"start", false, false, true, scUnlimited, sNothing, sStarting(&sPlain)},
-        {"start as a daemon", false, false, true, scUnlimited, sNothing, sStarting(&sAsDaemon)},
-        {"start without standard streams", false, false, false, scUnlimited, sTakeStandardStreams, sStarting(&sPlain)},
-        {"a second start", false, false, false, scUnlimited, sNothing, sRunningBeside("-S")},
-        {"option -s", false, false, false, scUnlimited, sNothing, sRunningBeside("-s")},
-        {"command start", false, false, true, scUnlimited, sStart,
-         sCommanding(ZTCAgentProcess::startScopeRequest(4096), gcSuccessHex)},
-        {"command start, again", true, false, false, scUnlimited, sStartCollecting,
-         sCommanding(ZTCAgentProcess::startScopeRequest(4096), gcSuccessHex)},
-        {"command register-targets", false, false, true, scUnlimited, sStart, sCommanding(lTargets, gcSuccessHex)},
-        {"command stop", true, false, false, scUnlimited, sStartCollecting,
-         sCommanding(bytesOf(gcStopScopeHex), gcSuccessHex)},
-        {"command set-collection-period", true, false, false, scUnlimited, sStart,
-         sCommanding(bytesOf("0500000001"), gcSuccessHex)},
-        {"broken frames", true, false, true, scUnlimited, sStart, sBreakFrames},
-        {"retrieval", true, false, true, scUnlimited, sStartCollecting, sRetrieve},
+        {.mName = "start", .mIsInQuickRun = true, .mPrepare = sNothing, .mRun = sStarting(&sPlain)},
+        {.mName = "start as a daemon", .mIsInQuickRun = true, .mPrepare = sNothing, .mRun = sStarting(&sAsDaemon)},
+        {.mName = "start without standard streams", .mPrepare = sTakeStandardStreams, .mRun = sStarting(&sPlain)},
+        {.mName = "a second start", .mPrepare = sNothing, .mRun = sRunningBeside("-S")},
+        {.mName = "option -s", .mPrepare = sNothing, .mRun = sRunningBeside("-s")},
+        {.mName = "command start",
+         .mIsInQuickRun = true,
+         .mPrepare = sStart,
+         .mRun = sCommanding(ZTCAgentProcess::startScopeRequest(4096), gcSuccessHex)},
+        {.mName = "command start, again",
+         .mKeepsAgent = true,
+         .mPrepare = sStartCollecting,
+         .mRun = sCommanding(ZTCAgentProcess::startScopeRequest(4096), gcSuccessHex)},
+        {.mName = "command register-targets",
+         .mIsInQuickRun = true,
+         .mPrepare = sStart,
+         .mRun = sCommanding(lTargets, gcSuccessHex)},
+        {.mName = "command stop",
+         .mKeepsAgent = true,
+         .mPrepare = sStartCollecting,
+         .mRun = sCommanding(bytesOf(gcStopScopeHex), gcSuccessHex)},
+        {.mName = "command set-collection-period",
+         .mKeepsAgent = true,
+         .mPrepare = sStart,
+         .mRun = sCommanding(bytesOf("0500000001"), gcSuccessHex)},
+        {.mName = "broken frames",
+         .mKeepsAgent = true,
+         .mIsInQuickRun = true,
+         .mPrepare = sStart,
+         .mRun = sBreakFrames},
+        {.mName = "retrieval",
+         .mKeepsAgent = true,
+         .mIsInQuickRun = true,
+         .mPrepare = sStartCollecting,
+         .mRun = sRetrieve},
     };
     const std::map<std::string, ZTSLibraryEvent> lEvents = {
         {"generic", ZTSLibraryEvent::bare(0, 2, 0x01)},
@@ -288,21 +305,39 @@ std::vector<ZTSFaultPhase> faultPhases() {
         {"RSCN", ZTSLibraryEvent::rscn(0, rscnPayload({0x00010203}))},
     };
     for (const auto& [lName, lEvent] : lEvents) {
-        lPhases.push_back({"event: " + lName, true, true, false, scUnlimited, sStartCollecting, sDelivering(lEvent)});
+        lPhases.push_back({.mName = "event: " + lName,
+                           .mKeepsAgent = true,
+                           .mAlwaysGoesOn = true,
+                           .mPrepare = sStartCollecting,
+                           .mRun = sDelivering(lEvent)});
     }
     for (const ZTSDataKind& lcrKind : dataKinds()) {
         const ZTSLibraryEvent lEvent =
             ZTSLibraryEvent::scope(0, lcrKind.mCategory, lcrKind.mSubcategory, lcrKind.mData);
         const bool lIsInQuickRun = lcrKind.mCategory == 1 && lcrKind.mSubcategory == 0x08;
-        lPhases.push_back({std::string("event: ") + lcrKind.mpName, true, true, lIsInQuickRun, scUnlimited,
-                           sStartCollecting, sDelivering(lEvent)});
-        lPhases.push_back({std::string("event, first: ") + lcrKind.mpName, false, true, lIsInQuickRun, scUnlimited,
-                           sStartCollecting, sDelivering(lEvent, true)});
+        lPhases.push_back({.mName = std::string("event: ") + lcrKind.mpName,
+                           .mKeepsAgent = true,
+                           .mAlwaysGoesOn = true,
+                           .mIsInQuickRun = lIsInQuickRun,
+                           .mPrepare = sStartCollecting,
+                           .mRun = sDelivering(lEvent)});
+        lPhases.push_back({.mName = std::string("event, first: ") + lcrKind.mpName,
+                           .mAlwaysGoesOn = true,
+                           .mIsInQuickRun = lIsInQuickRun,
+                           .mPrepare = sStartCollecting,
+                           .mRun = sDelivering(lEvent, true)});
     }
-    lPhases.push_back({"heartbeat", true, false, false, 12, sStartWithSilentSensor, sBeat});
-    lPhases.push_back({"log reopening", true, false, true, scUnlimited, sStart, sReopenLog});
-    lPhases.push_back({"log rotation", false, false, true, scUnlimited, sStart, sRotateLog});
-    lPhases.push_back({"end by SIGTERM", false, false, true, scUnlimited, sStartCollecting, sEndBySignal});
-    lPhases.push_back({"end by shut-down", false, false, true, scUnlimited, sStartCollecting, sEndByCommand});
+    lPhases.push_back({.mName = "heartbeat",
+                       .mKeepsAgent = true,
+                       .mMostFailures = 12,
+                       .mPrepare = sStartWithSilentSensor,
+                       .mRun = sBeat});
+    lPhases.push_back(
+        {.mName = "log reopening", .mKeepsAgent = true, .mIsInQuickRun = true, .mPrepare = sStart, .mRun = sReopenLog});
+    lPhases.push_back({.mName = "log rotation", .mIsInQuickRun = true, .mPrepare = sStart, .mRun = sRotateLog});
+    lPhases.push_back(
+        {.mName = "end by SIGTERM", .mIsInQuickRun = true, .mPrepare = sStartCollecting, .mRun = sEndBySignal});
+    lPhases.push_back(
+        {.mName = "end by shut-down", .mIsInQuickRun = true, .mPrepare = sStartCollecting, .mRun = sEndByCommand});
     return lPhases;
 }

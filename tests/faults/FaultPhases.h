@@ -10,10 +10,10 @@
 
 struct ZTSFaultPhase {
     std::string mName;
-    bool mKeepsAgent;    ///< an agent that went on serves for the next failure too
-    bool mAlwaysGoesOn;  ///< no failure in here may end the agent
-    bool mIsInQuickRun;
-    unsigned mMostFailures;  ///< n goes no further
+    bool mKeepsAgent = false;    ///< an agent that went on serves for the next failure too
+    bool mAlwaysGoesOn = false;  ///< no failure in here may end the agent
+    bool mIsInQuickRun = false;
+    unsigned mMostFailures = 100000;  ///< n goes no further; by default further than any phase
     /// Makes the agent ready; leaves it not started where the phase is its start.
     std::function<void(ZTCFaultStage&)> mPrepare;
     /// Arms, acts, disarms, checks. Throws ZTCFinding, or another exception where the agent does not answer: it has to

@@ -147,7 +147,7 @@ TEST(CommandLine, DebugLevelsMayBeDecimalOrHexadecimal) {
         ZTCAgentProcess lAgent;
         lAgent.start({"-D", "false", "-d", lpLevel, "-l", lAgent.agentLogPath()});
         lAgent.pipes().open();
-        EXPECT_EQ(lAgent.request("0500000000"), gcInvalidHex);
+        EXPECT_TRUE(lAgent.ping());
         EXPECT_TRUE(lAgent.log().has("Creating Failed Response...", "-T-"));
     }
 }
@@ -157,7 +157,7 @@ TEST(CommandLine, ADebugLevelIsAMaskOfLevels) {
     ZTCAgentProcess lAgent;
     lAgent.start({"-D", "false", "-d", "168", "-l", lAgent.agentLogPath()});
     lAgent.pipes().open();
-    EXPECT_EQ(lAgent.request("02"), gcSuccessHex);
+    EXPECT_EQ(lAgent.request(gcStopScopeHex), gcSuccessHex);
     EXPECT_EQ(lAgent.stop(), 0);
     const auto lLines = lAgent.log().lines();
     EXPECT_FALSE(lLines.empty());
@@ -180,7 +180,7 @@ TEST(CommandLine, TheDefaultLevelsAreHaltToNotice) {
     ZTCAgentProcess lAgent;
     lAgent.start({"-D", "false"});
     lAgent.pipes().open();
-    EXPECT_EQ(lAgent.request("02"), gcSuccessHex);
+    EXPECT_EQ(lAgent.request(gcStopScopeHex), gcSuccessHex);
     EXPECT_EQ(lAgent.stop(), 0);
     EXPECT_TRUE(lAgent.defaultLog().has("Starting the Tavik", "-N-"));
     EXPECT_TRUE(lAgent.defaultLog().has("Stopping Scope Data Collection.", "-N-"));
@@ -195,13 +195,13 @@ TEST(CommandLine, TheHeartbeatTimeoutReachesTheHeartbeatHandler) {
     lAgent.start(lAgent.defaultArguments({"-b", "77"}));
     lAgent.pipes().open();
     lAgent.log().waitFor("Creating the Heartbeat Handler Thread object...Timeout = 77");
-    EXPECT_EQ(lAgent.request("0500000000"), gcInvalidHex);
+    EXPECT_TRUE(lAgent.ping());
 }
 
 TEST(CommandLine, OptionsMayStandInAnyOrder) {
     ZTCAgentProcess lAgent;
     lAgent.start({"-b", "9", "-l", lAgent.agentLogPath(), "-S", "-d", "255", "-D", "false"});
     lAgent.pipes().open();
-    EXPECT_EQ(lAgent.request("0500000000"), gcInvalidHex);
+    EXPECT_TRUE(lAgent.ping());
     EXPECT_TRUE(lAgent.log().has("Creating the Heartbeat Handler Thread object...Timeout = 9"));
 }

@@ -61,7 +61,7 @@ TEST(Lifecycle, ATrailingSlashLeadsToTheSameFiles) {
     ZTCAgentProcess lAgent;
     lAgent.setEnvironment("ZT_QRV_SENSOR_DIR", lAgent.sensorDirectory() + "/");
     lAgent.startAndConnect();
-    EXPECT_EQ(lAgent.request("0500000000"), gcInvalidHex);
+    EXPECT_TRUE(lAgent.ping());
     EXPECT_TRUE(exists(lAgent.pidFilePath()));
     EXPECT_EQ(lAgent.stop(), 0);
     sExpectNothingLeft(lAgent);
@@ -80,7 +80,7 @@ TEST(Lifecycle, AnInstallDirectoryThatDoesNotExistEndsTheRunWithAClearError) {
 TEST(Lifecycle, StartAndStopGoThroughTheirStepsInOrder) {
     ZTCAgentProcess lAgent;
     lAgent.startAndConnect();
-    EXPECT_EQ(lAgent.request("0500000000"), gcInvalidHex);
+    EXPECT_TRUE(lAgent.ping());
     EXPECT_EQ(lAgent.stop(), 0);
 
     // Before the command line is applied only the default levels are logged, to the default file.
@@ -174,7 +174,7 @@ TEST(Lifecycle, TheNextStartTakesOverWhatAKilledAgentLeft) {
     EXPECT_TRUE(exists(lAgent.pidFilePath()));
     lAgent.pipes().close();
     lAgent.startAndConnect();
-    EXPECT_EQ(lAgent.request("0500000000"), gcInvalidHex);
+    EXPECT_TRUE(lAgent.ping());
     EXPECT_EQ(lAgent.stop(), 0);
     sExpectNothingLeft(lAgent);
 }
@@ -248,7 +248,7 @@ TEST(Lifecycle, AStartByHandOnAHostWithoutAdaptersSaysOnStandardErrorWhyItEnded)
 TEST(Lifecycle, AnOrdinaryEndSaysNothingOnStandardError) {
     ZTCAgentProcess lAgent;
     lAgent.startAndConnectQuietly();
-    EXPECT_EQ(lAgent.request("04"), gcSuccessHex);
+    EXPECT_EQ(lAgent.request(gcShutDownHex), gcSuccessHex);
     EXPECT_EQ(lAgent.waitForExit(), 0);
     EXPECT_EQ(lAgent.process().standardError(), "");
 }
@@ -265,7 +265,7 @@ TEST(Lifecycle, ADirectoryInAFifosPlaceIsRefused) {
 TEST(Lifecycle, NoDescriptorOfTheAgentIsInheritedByAnything) {
     ZTCAgentProcess lAgent;
     lAgent.startAndConnect();
-    EXPECT_EQ(lAgent.request("0500000000"), gcInvalidHex);
+    EXPECT_TRUE(lAgent.ping());
     const std::string lBase = "/proc/" + std::to_string(lAgent.process().getPid());
     int lSeen = 0;
     for (const auto& lcrEntry : std::filesystem::directory_iterator(lBase + "/fd")) {
@@ -286,13 +286,13 @@ TEST(Lifecycle, NoDescriptorOfTheAgentIsInheritedByAnything) {
 TEST(Lifecycle, AHangupReopensTheLog) {
     ZTCAgentProcess lAgent;
     lAgent.startAndConnect();
-    EXPECT_EQ(lAgent.request("02"), gcSuccessHex);
+    EXPECT_EQ(lAgent.request(gcStopScopeHex), gcSuccessHex);
     const std::string lMoved = lAgent.agentLogPath() + ".moved";
     std::filesystem::rename(lAgent.agentLogPath(), lMoved);
     lAgent.process().sendSignal(SIGHUP);
     waitUntil([&] { return exists(lAgent.agentLogPath()); }, "the log to be reopened");
     const std::string lOld = readFile(lMoved);
-    EXPECT_EQ(lAgent.request("0500000007"), gcSuccessHex);
+    EXPECT_EQ(lAgent.request(periodHex(7)), gcSuccessHex);
     EXPECT_TRUE(lAgent.log().has("The limit set is 262144"));
     EXPECT_EQ(readFile(lMoved), lOld);
     EXPECT_EQ(lAgent.stop(), 0);
@@ -313,7 +313,7 @@ TEST(Lifecycle, AStopIsPromptWhateverTheHeartbeatPeriod) {
     ZTCAgentProcess lAgent;
     lAgent.start(lAgent.defaultArguments({"-b", "4294967295"}));
     lAgent.pipes().open();
-    EXPECT_EQ(lAgent.request("0500000000"), gcInvalidHex);
+    EXPECT_TRUE(lAgent.ping());
     EXPECT_EQ(lAgent.log().count("Creating the Heartbeat Handler Thread object...Timeout = 4294967295", "-N-"), 1u);
     EXPECT_EQ(lAgent.stop(), 0);
 }

@@ -220,7 +220,7 @@ bool ZTCLinuxEngine::isPortOf(std::uint32_t aBoard, const HBA_wwn& acrPort) cons
 }
 
 std::optional<std::size_t> ZTCLinuxEngine::findKind(std::uint32_t aCategory, std::uint32_t aSubcategory) const {
-    return findLinuxKind(aCategory, aSubcategory);
+    return findRegisteredKindIndex(aCategory, aSubcategory);
 }
 
 ZTEFeedState ZTCLinuxEngine::getSourceState(std::size_t aKind) const {

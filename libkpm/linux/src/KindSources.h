@@ -5,7 +5,6 @@
 #include <array>
 #include <cstddef>
 #include <cstdint>
-#include <optional>
 #include <string_view>
 
 #include "libkpm/include/ScopeEventKinds.h"
@@ -42,31 +41,12 @@ constexpr ZTELinuxSource getLinuxSource(std::size_t aKind) {
     return ZTLSO_None;
 }
 
-constexpr std::size_t getLinuxKind(std::string_view aName) {
-    std::size_t lKind = 0;
-    while (gcScopeEventKinds[lKind].mpName != aName) {
-        ++lKind;
-    }
-    return lKind;
-}
-
-inline constexpr std::size_t gcLinuxRscn = getLinuxKind("rscn");
-inline constexpr std::size_t gcLinuxQueueFull = getLinuxKind("queue-full");
-inline constexpr std::size_t gcLinuxDeviceBusy = getLinuxKind("device-busy");
-inline constexpr std::size_t gcLinuxCheckCondition = getLinuxKind("check-condition");
-inline constexpr std::size_t gcLinuxQueueDepth = getLinuxKind("queue-depth");
-inline constexpr std::size_t gcLinuxLink = getLinuxKind("link");
-inline constexpr std::size_t gcLinuxAdapterArrival = getLinuxKind("adapter-arrival");
-
-/// The kind that is registered under this pair.
-constexpr std::optional<std::size_t> findLinuxKind(std::uint32_t aCategory, std::uint32_t aSubcategory) {
-    for (std::size_t lKind = 0; lKind < gcLinuxKindCount; ++lKind) {
-        if (gcScopeEventKinds[lKind].mRegisteredCategory == aCategory &&
-            gcScopeEventKinds[lKind].mRegisteredSubcategory == aSubcategory) {
-            return lKind;
-        }
-    }
-    return std::nullopt;
-}
+inline constexpr std::size_t gcLinuxRscn = findKindIndex("rscn").value();
+inline constexpr std::size_t gcLinuxQueueFull = findKindIndex("queue-full").value();
+inline constexpr std::size_t gcLinuxDeviceBusy = findKindIndex("device-busy").value();
+inline constexpr std::size_t gcLinuxCheckCondition = findKindIndex("check-condition").value();
+inline constexpr std::size_t gcLinuxQueueDepth = findKindIndex("queue-depth").value();
+inline constexpr std::size_t gcLinuxLink = findKindIndex("link").value();
+inline constexpr std::size_t gcLinuxAdapterArrival = findKindIndex("adapter-arrival").value();
 
 #endif

@@ -24,14 +24,14 @@ TEST(KindSources, ThirteenKindsHaveNoSource) {
     EXPECT_EQ(lNone, 13u);
 }
 
-TEST(KindSources, KindsAreFoundByTheirRegistration) {
-    EXPECT_EQ(findLinuxKind(4, 1), gcLinuxQueueFull);
-    EXPECT_EQ(findLinuxKind(4, 2), gcLinuxDeviceBusy);
-    EXPECT_EQ(findLinuxKind(4, 4), gcLinuxCheckCondition);
-    EXPECT_EQ(findLinuxKind(4, 0x40), gcLinuxQueueDepth);
-    EXPECT_EQ(findLinuxKind(16, 1), gcLinuxAdapterArrival);
-    EXPECT_EQ(findLinuxKind(0, 1), gcLinuxLink);
-    EXPECT_EQ(findLinuxKind(0, 2), gcLinuxRscn);
-    EXPECT_FALSE(findLinuxKind(1, 0x20).has_value());
-    EXPECT_FALSE(findLinuxKind(0x104, 1).has_value());
+TEST(KindSources, ItsKindsAreThoseOfTheirRegistrations) {
+    EXPECT_EQ(findRegisteredKindIndex(4, 1), gcLinuxQueueFull);
+    EXPECT_EQ(findRegisteredKindIndex(4, 2), gcLinuxDeviceBusy);
+    EXPECT_EQ(findRegisteredKindIndex(4, 4), gcLinuxCheckCondition);
+    EXPECT_EQ(findRegisteredKindIndex(4, 0x40), gcLinuxQueueDepth);
+    EXPECT_EQ(findRegisteredKindIndex(16, 1), gcLinuxAdapterArrival);
+    EXPECT_EQ(findRegisteredKindIndex(0, 1), gcLinuxLink);
+    EXPECT_EQ(findRegisteredKindIndex(0, 2), gcLinuxRscn);
+    EXPECT_FALSE(findRegisteredKindIndex(1, 0x20).has_value());
+    EXPECT_FALSE(findRegisteredKindIndex(0x104, 1).has_value());
 }
