@@ -139,7 +139,7 @@ static_assert(sizeof(TavikConsTargetReset) == sizeof(TavikConsLunReset));
 
 /// The rule of the kind of this name, whose records begin with a `Record`.
 template <class Record>
-static consteval ZTSKindRule sRule(std::string_view aName, std::span<const ZTSFieldRule> aFields) {
+static constexpr ZTSKindRule sRule(std::string_view aName, std::span<const ZTSFieldRule> aFields) {
     const ZTSScopeEventKind& lrKind = gcScopeEventKinds[findKindIndex(aName).value()];
     if (lrKind.mRecordSize != sizeof(Record)) {
         throw "the record is not as long as the table of kinds says";
@@ -149,7 +149,7 @@ static consteval ZTSKindRule sRule(std::string_view aName, std::span<const ZTSFi
 
 /// The rule of a kind whose further events append an `Entry` each.
 template <class Record, class Entry>
-static consteval ZTSKindRule sAppendingRule(std::string_view aName, std::span<const ZTSFieldRule> aFields,
+static constexpr ZTSKindRule sAppendingRule(std::string_view aName, std::span<const ZTSFieldRule> aFields,
                                             const char* apEntriesName, std::size_t aEntriesOffset,
                                             std::span<const ZTSFieldRule> aEntryFields) {
     ZTSKindRule lRule = sRule<Record>(aName, aFields);
