@@ -11,7 +11,7 @@
 inline std::int64_t toMicroseconds(const ZTSReceivedTime& acrTime) {
     constexpr std::uint64_t scLastSecond = 253402300799;
     return static_cast<std::int64_t>(std::min(acrTime.mEpochSeconds, scLastSecond) * 1'000'000 +
-                                     acrTime.mMilliseconds * 1000U + acrTime.mMicroseconds);
+                                     acrTime.mMilliseconds * std::uint64_t{1000} + acrTime.mMicroseconds);
 }
 
 #endif
