@@ -17,7 +17,7 @@ static constexpr std::array<ZTECheckResult, ZTVD_Count> scResults{ZTCR_Critical,
                                                                   ZTCR_Warning, ZTCR_Ok};
 
 const char* getCheckWord(ZTECheckResult aResult) {
-    return scWords.at(aResult);
+    return scWords.at(static_cast<std::size_t>(aResult));
 }
 
 /// Adds what the SAN's troubles make of the result, where the sensor judges it.

@@ -201,8 +201,8 @@ static std::vector<ZTSKindGroup> sGroupKinds(const ZTSStatusFacts& acrFacts, boo
             const std::string lWords = lFound == lrKinds.mWords.end() ? "" : lFound->second;
             const std::string lName = lKind + (aIsWithWords && !lWords.empty() ? " (" + lWords + ")" : "");
             const std::string lKey = aIsWithWords ? "" : lWords;
-            const auto lIsGroup = [&](const ZTSKindGroup& acrGroup) {
-                return acrGroup.mState == lState && acrGroup.mWords == lKey;
+            const auto lIsGroup = [&lKey, &lrState = lState](const ZTSKindGroup& acrGroup) {
+                return acrGroup.mState == lrState && acrGroup.mWords == lKey;
             };
             auto lGroup = std::find_if(lGroups.begin(), lGroups.end(), lIsGroup);
             if (lGroup == lGroups.end()) {
