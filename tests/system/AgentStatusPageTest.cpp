@@ -11,6 +11,7 @@
 #include "libkpm/include/ScopeEventKinds.h"
 #include "sensor/client/include/StatusPageReader.h"
 #include "tests/support/AgentProcess.h"
+#include "tests/support/TemporaryDirectory.h"
 #include "tests/support/Waiting.h"
 #include "tests/system/AdapterEvents.h"
 
@@ -166,6 +167,43 @@ TEST_F(AgentStatusPage, ShowsTheStatesThatRegistrationsAndReportsGive) {
     ASSERT_EQ(1u, page().mLosses.size());
     EXPECT_EQ("messages", page().mLosses[0].mName);
     EXPECT_EQ(5u, page().mLosses[0].mTotal);
+}
+
+TEST_F(AgentStatusPage, ShowsTheStatesAndLossesOfASimulatedLibrary) {
+    ZTCAgentProcess lAgent;
+    prepare(lAgent);
+    const std::string lScenario = lAgent.workingDirectory() + "/states.kpm";
+    writeFile(lScenario,
+              "adapter hba0 wwpn=30:00:00:00:00:01:00:00 wwnn=30:00:00:00:00:01:00:80\n"
+              "state temperature no-source reason=\"no sensor\"\n"
+              "state rscn no-rights reason=\"needs CAP_NET_ADMIN\"\n"
+              "state check-condition no-rights reason=\"needs CAP_SYS_ADMIN\"\n"
+              "state link failed reason=\"no light\"\n"
+              "state queue-full failed at=0 reason=broken\n"
+              "loss \"trace events\" count=7 at=0 every=1 times=3\n");
+    lAgent.setEnvironment("ZT_LIBKPM_PATH", TAVIK_SIM_LIBRARY);
+    lAgent.setEnvironment("KPM_SIM_SCENARIO", lScenario);
+    lAgent.startAndConnectQuietly();
+    lAgent.startScope();
+    waitUntil([&] { return !page().mLosses.empty() && page().mLosses[0].mTotal == 21; }, "the last loss");
+    const ZTSStatusSnapshot lPage = page();
+    EXPECT_EQ("trace events", lPage.mLosses[0].mName);
+    struct Row {
+        const char* mpKind;
+        ZTEStatusState mState;
+        const char* mpReason;
+    };
+    for (const Row& lcrRow :
+         {Row{.mpKind = "temperature", .mState = ZTSS_NoSource, .mpReason = "no sensor"},
+          Row{.mpKind = "rscn", .mState = ZTSS_NoRights, .mpReason = "needs CAP_NET_ADMIN"},
+          Row{.mpKind = "check-condition", .mState = ZTSS_NoRights, .mpReason = "needs CAP_SYS_ADMIN"},
+          Row{.mpKind = "link", .mState = ZTSS_Failed, .mpReason = "no light"},
+          Row{.mpKind = "queue-full", .mState = ZTSS_Failed, .mpReason = "broken"},
+          Row{.mpKind = "plogi", .mState = ZTSS_Listening, .mpReason = ""}}) {
+        SCOPED_TRACE(lcrRow.mpKind);
+        EXPECT_EQ(lcrRow.mState, row(lPage, 0, lcrRow.mpKind).mState);
+        EXPECT_EQ(lcrRow.mpReason, row(lPage, 0, lcrRow.mpKind).mStateReason);
+    }
 }
 
 TEST_F(AgentStatusPage, SaysWhyTheAgentEnded) {
