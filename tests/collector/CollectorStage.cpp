@@ -34,7 +34,7 @@ ZTCCollectorStage::ZTCCollectorStage(const std::string& acrSettings)
     std::filesystem::create_directories(mAgentDirectory);
     std::filesystem::create_directories(mStateDirectory);
     std::filesystem::create_directories(mDirectory.path("sys"));
-    mEnvironment.emplace_back("TAVIK_SYSFS", mDirectory.path("sys"));
+    mEnvironment.emplace_back("TAVIK_SYSFS_ROOT", mDirectory.path("sys"));
     writeSettings(acrSettings);
     mControl = makeUnixSocket(SOCK_NONBLOCK);
     const sockaddr_un lAddress = makeUnixAddress(mDirectory.path("run/control"));

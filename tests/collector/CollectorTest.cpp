@@ -242,3 +242,17 @@ TEST_F(CollectorDiskTest, WhenItIsFullTheAgentKeepsItsRecordsAndAllIsDeliveredWh
     mStage.expectSound();
     EXPECT_TRUE(mStage.history()->readGaps().empty());
 }
+
+TEST_F(CollectorDiskTest, AReadOnlyDiskIsLikeAFullOne) {
+    mFileSystem.makeReadOnly();
+    mStage.killCollector();
+    mAgent->happen(20);
+    mStage.startCollector();
+    waitForDisk("read-only");
+    EXPECT_EQ(mAgent->getHandedOver(), 10U);
+    mFileSystem.makeWritable();
+    waitUntilStored(30);
+    finish();
+    mStage.expectSound();
+    EXPECT_TRUE(mStage.history()->readGaps().empty());
+}

@@ -45,7 +45,7 @@ void ZTCSensorProcess::start() {
     lSetup.mArguments = {"--config", mDirectory.path("tavik.toml")};
     lSetup.mEnvironment = {{"PATH", "/usr/bin:/bin"},
                            {"KPM_SIM_SOCKET", mDirectory.path("sim.sock")},
-                           {"TAVIK_SYSFS", mDirectory.path("sys")}};
+                           {"TAVIK_SYSFS_ROOT", mDirectory.path("sys")}};
     lSetup.mWorkingDirectory = mDirectory.path();
     lSetup.mOutputPrefix = mDirectory.path("sensor");
     mProcess = std::make_unique<ZTCChildProcess>(lSetup);

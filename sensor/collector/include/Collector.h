@@ -24,7 +24,7 @@
 #include "sensor/topology/include/TopologyScan.h"
 
 /// Environment variable with another root than "/sys", for tests.
-inline constexpr const char* gcSysfsVariable = "TAVIK_SYSFS";
+inline constexpr const char* gcSysfsVariable = "TAVIK_SYSFS_ROOT";
 
 class ZTCCollector {
 public:
