@@ -16,13 +16,13 @@
 #include <functional>
 #include <memory>
 #include <mutex>
-#include <optional>
 #include <string>
 #include <thread>
 #include <variant>
 #include <vector>
 
 #include "sensor/collector/include/HistorySink.h"
+#include "sensor/collector/include/HistoryWriter.h"
 #include "sensor/store/include/Store.h"
 #include "sensor/topology/include/Topology.h"
 
@@ -130,13 +130,6 @@ private:
     void store(ZTSPortsJob& arJob);
     void store(ZTSMarkJob& arJob);
     void store(ZTSValueJob& arJob);
-    void storePage(const ZTCPagePointer& acrPage);
-    void closeEpisodes();
-    void noteSeen(const std::string& acrGeneration);
-    void countStart(const std::string& acrGeneration);
-    void noteEnded(const std::string& acrGeneration);
-    void setAside(const ZTSFrameJob& acrJob, const std::string& acrReason);
-    std::optional<ZTSRemotePort> resolve(const ZTSFcName& acrInitiator, std::uint32_t aFcId) const;
 
     bool pause(std::chrono::milliseconds aTime);
     void setProblem(const std::string& acrProblem);
@@ -150,8 +143,8 @@ private:
 
     // ---- of the worker's thread ----
     std::unique_ptr<ZTCStore> mpStore;
+    std::unique_ptr<ZTCHistoryWriter> mpWriter;  ///< on the store
     std::string mLastProblem;
-    ZTCPagePointer mpPage;  ///< of the running agent, as last stored
     std::chrono::steady_clock::time_point mLastCheckpoint{};
     std::chrono::steady_clock::time_point mLastUpkeep{};
     bool mHasMoreToRetire = false;
@@ -162,7 +155,6 @@ private:
     mutable std::mutex mMutex;
     std::condition_variable mWake;
     std::deque<ZTCJob> mQueue;
-    std::shared_ptr<const ZTSTopology> mpPorts;
     ZTSStoreLimits mLimits;
     bool mHasNewLimits = false;
     bool mIsStopping = false;   ///< end at once

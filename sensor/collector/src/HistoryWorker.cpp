@@ -6,12 +6,6 @@
 
 #include <algorithm>
 #include <cerrno>
-#include <cstdio>
-#include <sstream>
-
-#include "sensor/collector/include/PageCounts.h"
-#include "sensor/collector/include/SpoolRecovery.h"
-#include "sensor/metrics/include/Metrics.h"
 
 using std::chrono::milliseconds;
 using std::chrono::seconds;
@@ -24,13 +18,6 @@ static constexpr seconds scLongestUnsynced{1};
 static constexpr seconds scRetryPause{1};
 static constexpr seconds scUpkeepPeriod{60};
 static constexpr seconds scCheckpointPeriod{1};
-
-/// Name of the store's value with the generations that were seen running and not yet ended, a blank behind each.
-static constexpr const char* scRunningValue = "collector.generations";
-/// The same with the time when a frame was last taken in: microseconds since the epoch.
-static constexpr const char* scLastTakenValue = "collector.lastTaken";
-/// The same with the generation of the last agent whose start was counted.
-static constexpr const char* scCountedValue = "collector.countedGeneration";
 
 ZTCHistoryWorker::ZTCHistoryWorker(ZTCSpool& arSpool, std::string aStateDirectory, const ZTSStoreLimits& acrLimits,
                                    Report aReport)
@@ -174,8 +161,7 @@ bool ZTCHistoryWorker::openStore() {
                 mHasNewLimits = false;
             }
             mpStore = std::make_unique<ZTCStore>(mDirectory, lLimits, mReport);
-            mpStore->setAddressResolver(
-                [this](const ZTSFcName& acrInitiator, std::uint32_t aFcId) { return resolve(acrInitiator, aFcId); });
+            mpWriter = std::make_unique<ZTCHistoryWriter>(*mpStore, mrSpool, mReport);
             beginRun();
             break;
         } catch (const ZTCStoreNewerEx& lrEx) {
@@ -186,6 +172,7 @@ bool ZTCHistoryWorker::openStore() {
             ring();
             return false;
         } catch (const ZTCStoreEx& lrEx) {
+            mpWriter.reset();
             mpStore.reset();
             setProblem(lrEx.what());
         }
@@ -205,26 +192,6 @@ void ZTCHistoryWorker::beginRun() {
     mState.mIsOpen = true;
     mState.mStoreId = mpStore->getStoreId();
     mState.mLastFrame = mpStore->getLastFrame();
-}
-
-/// The remote port that has the address now, seen from the initiator. Well-known addresses have none.
-std::optional<ZTSRemotePort> ZTCHistoryWorker::resolve(const ZTSFcName& acrInitiator, std::uint32_t aFcId) const {
-    std::shared_ptr<const ZTSTopology> lpPorts;
-    {
-        const std::lock_guard lLock(mMutex);
-        lpPorts = mpPorts;
-    }
-    if (lpPorts == nullptr) {
-        return std::nullopt;
-    }
-    const auto lpHost = std::ranges::find(lpPorts->mInitiators, acrInitiator, &ZTSTopologyInitiator::mWwpn);
-    for (const ZTSTopologyRemotePort& lrPort : lpPorts->mRemotePorts) {
-        if (lpHost != lpPorts->mInitiators.end() && lrPort.mHost == lpHost->mHost && lrPort.mFcId == aFcId &&
-            lrPort.mWwpn) {
-            return ZTSRemotePort{.mWwpn = *lrPort.mWwpn, .mWwnn = lrPort.mWwnn, .mFcId = aFcId};
-        }
-    }
-    return std::nullopt;
 }
 
 /// Adds what waits to the batch; waits for something where the batch is empty. False: the thread is to end.
@@ -253,6 +220,7 @@ void ZTCHistoryWorker::run() {
         if (lIsFinished) {
             closeRun();
         }
+        mpWriter.reset();
         mpStore.reset();
         const std::lock_guard lLock(mMutex);
         mIsDone = lIsFinished;
@@ -377,7 +345,7 @@ void ZTCHistoryWorker::upkeep() {
     mLastUpkeep = lNow;
     ZTCStoreTransaction lTransaction = mpStore->begin();
     mpStore->noteRunning(getHistoryTime());
-    closeEpisodes();
+    mpWriter->closeEpisodes();
     lTransaction.commit();
     mHasMoreToRetire = mpStore->retireStep(getHistoryTime(), lNow);
 }
@@ -393,146 +361,35 @@ void ZTCHistoryWorker::closeRun() {
     }
 }
 
-// ---- what is stored; each within a transaction ----
-
-void ZTCHistoryWorker::closeEpisodes() {
-    mpStore->closeEpisodes(getHistoryTime(), [this](const ZTSInitiator& acrInitiator, ZTCKindKey aKind) {
-        return mpPage == nullptr || holdsNothing(*mpPage, acrInitiator, aKind);
-    });
-}
-
-void ZTCHistoryWorker::storePage(const ZTCPagePointer& acrPage) {
-    const std::vector<ZTSPageCounts> lCounts = toPageCounts(*acrPage);
-    mpStore->noteLedger(acrPage->mStartId, lCounts);
-    mpPage = acrPage;
-}
-
-void ZTCHistoryWorker::setAside(const ZTSFrameJob& acrJob, const std::string& acrReason) {
-    const std::string lPath = mrSpool.pathOf(acrJob.mEntry.mName);
-    mReport(acrReason + ": it is set aside as " + lPath + ".unreadable, and a gap is written");
-    rename(lPath.c_str(), (lPath + ".unreadable").c_str());
-    ZTSGap lGap;
-    lGap.mFrom = lGap.mTo = getHistoryTime();
-    lGap.mReason = "a spooled response cannot be read: " + acrJob.mEntry.mName.toText();
-    lGap.mGeneration = acrJob.mEntry.mName.mGeneration;
-    mpStore->noteGap(lGap);
-}
+// ---- each within the batch's transaction ----
 
 void ZTCHistoryWorker::store(ZTSFrameJob& arJob) {
-    const ZTSSpoolName& lrName = arJob.mEntry.mName;
-    if (!mpStore->hasFrame(lrName.mNumber)) {
-        std::vector<std::uint8_t> lBytes;
-        try {
-            lBytes = mrSpool.read(lrName);
-        } catch (const ZTCSpoolTroubleEx& lrEx) {
-            setAside(arJob, lrEx.what());
-            return;
-        }
-        const ZTSSpooledBody lBody = readSpooledBody(lBytes);
-        const ZTSTakenIn lTaken = mpStore->takeIn(lrName.mNumber, lrName.mGeneration, lBody.mBody,
-                                                  lrName.mState == ZTSPS_Torn || !lBody.isWhole(), getHistoryTime());
-        if (!lTaken.mProblem.empty()) {
-            mReport(mrSpool.pathOf(lrName) + ": " + lTaken.mProblem + "; its " + std::to_string(lTaken.mRecords) +
-                    " whole records are stored");
-        }
-        mpStore->setValue(scLastTakenValue, std::to_string(toMicroseconds(getHistoryTime())));
+    if (const std::optional<std::uint64_t> lRecords = mpWriter->takeIn(arJob.mEntry, arJob.mpPage)) {
         ++mBatchFrames;
-        mBatchRecords += lTaken.mRecords;
-    }
-    if (arJob.mpPage != nullptr) {
-        storePage(arJob.mpPage);
+        mBatchRecords += *lRecords;
     }
 }
 
 void ZTCHistoryWorker::store(ZTSPageJob& arJob) {
-    noteSeen(arJob.mpPage->mStartId);
-    countStart(arJob.mpPage->mStartId);
-    storePage(arJob.mpPage);
-    const std::vector<ZTSKindStateNow> lStates = toKindStates(*arJob.mpPage);
-    mpStore->noteCoverage(getHistoryTime(), lStates);
-    closeEpisodes();
+    mpWriter->notePage(arJob.mpPage);
 }
 
 void ZTCHistoryWorker::store(ZTSEndedAgent& arAgent) {
-    if (arAgent.mpPage != nullptr) {
-        storePage(arAgent.mpPage);
-    }
-    if (mpStore->endAgent(arAgent.mGeneration, arAgent.mFrom, arAgent.mTo, arAgent.mIsVanished, arAgent.mReason)) {
-        mReport("a gap is in the history: " + arAgent.mReason);
-    }
-    if (mpPage != nullptr && mpPage->mStartId == arAgent.mGeneration) {
-        mpPage = nullptr;
-        mpStore->noteCoverage(arAgent.mTo, {});
-    }
-    noteEnded(arAgent.mGeneration);
-    closeEpisodes();
-}
-
-void ZTCHistoryWorker::noteSeen(const std::string& acrGeneration) {
-    const std::string lRunning = mpStore->getValue(scRunningValue);
-    if (lRunning.find(acrGeneration + " ") == std::string::npos) {
-        mpStore->setValue(scRunningValue, lRunning + acrGeneration + " ");
-    }
-}
-
-/// Counts the agents that were started, each once: a collector that is new meets the running one again.
-void ZTCHistoryWorker::countStart(const std::string& acrGeneration) {
-    if (mpStore->getValue(scCountedValue) == acrGeneration) {
-        return;
-    }
-    std::uint64_t lRestarts = 0;
-    std::istringstream(mpStore->getValue(gcAgentRestartsValue)) >> lRestarts;
-    lRestarts += mpStore->getValue(scCountedValue).empty() ? 0 : 1;  // the first start of all is no restart
-    mpStore->setValue(gcAgentRestartsValue, std::to_string(lRestarts));
-    mpStore->setValue(scCountedValue, acrGeneration);
-}
-
-void ZTCHistoryWorker::noteEnded(const std::string& acrGeneration) {
-    std::string lRunning = mpStore->getValue(scRunningValue);
-    const std::size_t lAt = lRunning.find(acrGeneration + " ");
-    if (lAt != std::string::npos) {
-        mpStore->setValue(scRunningValue, lRunning.erase(lAt, acrGeneration.size() + 1));
-    }
+    mpWriter->endAgent(arAgent);
 }
 
 void ZTCHistoryWorker::store(ZTSForgottenJob& arJob) {
-    std::istringstream lRunning(mpStore->getValue(scRunningValue));
-    std::int64_t lLastTaken = 0;
-    std::istringstream(mpStore->getValue(scLastTakenValue)) >> lLastTaken;
-    const ZTCHistoryTime lFrom = lLastTaken == 0 ? getHistoryTime() : fromMicroseconds(lLastTaken);
-    std::string lGeneration;
-    while (lRunning >> lGeneration) {
-        if (lGeneration != arJob.mRunningGeneration) {
-            ZTSEndedAgent lAgent;
-            lAgent.mGeneration = lGeneration;
-            lAgent.mTo = getHistoryTime();
-            lAgent.mFrom = lFrom;
-            lAgent.mIsVanished = true;
-            lAgent.mReason = "the agent vanished without a trace: the host went down, or its directory was removed";
-            store(lAgent);
-        }
-    }
+    mpWriter->endForgottenAgents(arJob.mRunningGeneration);
 }
 
 void ZTCHistoryWorker::store(ZTSPortsJob& arJob) {
-    for (const ZTSTopologyInitiator& lrPort : arJob.mpPorts->mInitiators) {
-        if (lrPort.mWwpn) {
-            mpStore->noteInitiator({.mWwpn = lrPort.mWwpn, .mWwnn = lrPort.mWwnn, .mHost = lrPort.mHost});
-        }
-    }
-    for (const ZTSTopologyRemotePort& lrPort : arJob.mpPorts->mRemotePorts) {
-        if (lrPort.mWwpn) {
-            mpStore->noteRemotePort({.mWwpn = *lrPort.mWwpn, .mWwnn = lrPort.mWwnn, .mFcId = lrPort.mFcId});
-        }
-    }
-    const std::lock_guard lLock(mMutex);
-    mpPorts = arJob.mpPorts;
-}
-
-void ZTCHistoryWorker::store(ZTSValueJob& arJob) {
-    mpStore->setValue(arJob.mName, arJob.mValue);
+    mpWriter->notePorts(arJob.mpPorts);
 }
 
 void ZTCHistoryWorker::store(ZTSMarkJob& arJob) {
     mpStore->setMark(arJob.mMark.mName, arJob.mMark.mTime);
+}
+
+void ZTCHistoryWorker::store(ZTSValueJob& arJob) {
+    mpStore->setValue(arJob.mName, arJob.mValue);
 }

@@ -1,0 +1,53 @@
+/// What the collector stores, step by step. Each function is one thing that has happened, and needs a transaction of
+/// the store around it; each may be done again after a transaction that failed. One thread.
+#ifndef SENSOR_COLLECTOR_INCLUDE_HISTORYWRITER_H
+#define SENSOR_COLLECTOR_INCLUDE_HISTORYWRITER_H
+
+#include <functional>
+#include <memory>
+#include <optional>
+#include <string>
+
+#include "sensor/collector/include/HistorySink.h"
+#include "sensor/store/include/Store.h"
+#include "sensor/topology/include/Topology.h"
+
+class ZTCHistoryWriter {
+public:
+    using Report = std::function<void(const std::string& acrLine)>;
+
+    /// Sets the store's address resolver. @param arStore, acrSpool  outlive this object
+    ZTCHistoryWriter(ZTCStore& arStore, const ZTCSpool& acrSpool, Report aReport);
+    ~ZTCHistoryWriter();
+    ZTCHistoryWriter(const ZTCHistoryWriter&) = delete;
+    ZTCHistoryWriter& operator=(const ZTCHistoryWriter&) = delete;
+
+    /// Takes a file of the spool in, unless the database has it, and the page. The file stays. One that cannot be read
+    /// is set aside, with a gap. Returns the records that were taken in; nothing where none could be.
+    std::optional<std::uint64_t> takeIn(const ZTSSpoolEntry& acrEntry, const ZTCPagePointer& acrPage);
+    /// A look at the running agent's page.
+    void notePage(const ZTCPagePointer& acrPage);
+    /// Of an agent whose files are all taken in.
+    void endAgent(const ZTSEndedAgent& acrAgent);
+    /// Agents that were seen running, of which nobody has heard since.
+    void endForgottenAgents(const std::string& acrRunningGeneration);
+    void notePorts(std::shared_ptr<const ZTSTopology> apPorts);
+    /// Those that are over, by the last page.
+    void closeEpisodes();
+
+private:
+    void storePage(const ZTCPagePointer& acrPage);
+    void noteSeen(const std::string& acrGeneration);
+    void countStart(const std::string& acrGeneration);
+    void noteEnded(const std::string& acrGeneration);
+    void setAside(const ZTSSpoolName& acrName, const std::string& acrReason);
+    std::optional<ZTSRemotePort> resolve(const ZTSFcName& acrInitiator, std::uint32_t aFcId) const;
+
+    ZTCStore& mrStore;
+    const ZTCSpool& mrSpool;
+    const Report mReport;
+    ZTCPagePointer mpPage;  ///< of the running agent, as last stored
+    std::shared_ptr<const ZTSTopology> mpPorts;
+};
+
+#endif
