@@ -15,6 +15,8 @@
 #include "sensor/collector/include/ControlRequest.h"
 #include "sensor/collector/include/ControlServer.h"
 #include "sensor/collector/include/HistoryWorker.h"
+#include "sensor/collector/include/KeeperPort.h"
+#include "sensor/collector/include/Leftovers.h"
 #include "sensor/collector/include/LiveStateJson.h"
 #include "sensor/collector/include/LossWindow.h"
 #include "sensor/collector/include/Spool.h"
@@ -52,22 +54,15 @@ private:
     int getPollTime(ZTCTime aNow) const;
     bool isOver(ZTCTime aNow);
 
-    void receiveFromKeeper(ZTCTime aNow);
     void handle(ZTSLinkMessage aMessage, ZTCTime aNow);
     void noteAgentStarted(ZTSLinkMessage aMessage);
     void noteAgentEnded(const ZTSLinkMessage& acrMessage, ZTCTime aNow);
     void reload(const ZTSLinkMessage& acrMessage, ZTCTime aNow);
-    void send(ZTELinkMessageType aType, std::uint64_t aStart, const std::string& acrText = {});
-    void sendLook(ZTCTime aNow);
-    void flushToKeeper();
 
     void openSpool(ZTCTime aNow);
     void beginNextSession(ZTCTime aNow);
     void runSession(ZTCTime aNow);
-    void sweep();
-    void sweepParts();
-    void sweepPages();
-    ZTCPagePointer findPage(const std::string& acrGeneration) const;
+    void sweep(ZTCTime aNow);
     void scanPorts(ZTCTime aNow);
     void noteHistory();
     void tellState();
@@ -81,14 +76,16 @@ private:
     const std::string mAgentDirectory;
     const std::string mSysfsRoot;
     const ZTCHistoryTime mSince;
+    ZTCKeeperPort mKeeper;
     ZTCSpool mSpool;
     ZTCHistoryWorker mHistory;
+    ZTCLeftovers mLeftovers;
     ZTCControlServer mControl;
-    ZTCOutlets mOutlets;
+    std::unique_ptr<ZTCOutlets> mpOutlets;  ///< once the database is open
 
-    bool mIsKeeperGone = false;
     bool mIsReady = false;  ///< the database is open, and what was found in the spool is handed to it
-    bool mIsSwept = false;
+    bool mIsSwept = false;  ///< once at least
+    ZTCTime mNextSweep{};
     ZTCTime mNextSpoolTry{};
     std::string mSpoolProblem;
     int mSpoolErrno = 0;
@@ -102,10 +99,7 @@ private:
     std::optional<ZTSLinkMessage> mKeeperState;
     std::optional<ZTCTime> mFinishBy;
 
-    std::deque<ZTSLinkMessage> mOutgoing;
-    ZTCTime mLastLook{};
     ZTCTime mLastLive{};
-    std::string mToldState;
 
     ZTCTime mNextScan{};
     ZTCPatientReader mPortReader;

@@ -7,11 +7,8 @@
 #include <array>
 #include <cerrno>
 #include <cstdlib>
-#include <filesystem>
 
-#include "sensor/client/include/SensorPidFile.h"
 #include "sensor/collector/include/CollectorLog.h"
-#include "sensor/collector/include/SpoolRecovery.h"
 
 using std::chrono::milliseconds;
 using std::chrono::seconds;
@@ -58,18 +55,13 @@ ZTCCollector::ZTCCollector(ZTSInheritance aInheritance, const ZTSSettings& acrSe
       mAgentDirectory(mInheritance.mDirectory + "/agent"),
       mSysfsRoot(sSysfsRoot()),
       mSince(getHistoryTime()),
+      mKeeper(std::move(mInheritance.mLink)),
       mSpool(mInheritance.mState + "/spool"),
       mHistory(mSpool, mInheritance.mState, sStoreLimits(acrSettings),
                [](const std::string& acrLine) { logLine(acrLine); }),
+      mLeftovers(mAgentDirectory, mSpool, mHistory, [](const std::string& acrLine) { logLine(acrLine); }),
       mControl(std::move(mInheritance.mControl),
                [this](std::uint64_t aTicket, const std::string& acrRequest) { return serve(aTicket, acrRequest); }),
-      mOutlets({.mStateDirectory = mInheritance.mState,
-                .mHost = sHostName(),
-                .mVersion = TAVIK_VERSION,
-                .mSetValue = [this](const std::string& acrName,
-                                    const std::string& acrValue) { mHistory.setValue(acrName, acrValue); },
-                .mReport = [](const std::string& acrLine) { logLine(acrLine); }},
-               acrSettings),
       mpPorts(std::make_shared<ZTSTopology>()),
       mLosses(mSince) {}
 
@@ -86,18 +78,18 @@ int ZTCCollector::run() {
         logLine(lFatal);
         return 2;
     }
-    if (mIsKeeperGone) {
+    if (mKeeper.isGone()) {
         logLine("the keeper is gone: ending");
         turn(std::chrono::steady_clock::now());
     }
     if (!mHistory.finish(scHistoryPatience)) {
         logLine("not everything could be stored in time: it stays in " + mSpool.getFolder() + " for the next start");
     }
-    return mIsKeeperGone ? 1 : 0;
+    return mKeeper.isGone() ? 1 : 0;
 }
 
 bool ZTCCollector::isOver(ZTCTime aNow) {
-    if (mIsKeeperGone || !mHistory.getState().mFatal.empty()) {
+    if (mKeeper.isGone() || !mHistory.getState().mFatal.empty()) {
         return true;
     }
     if (!mFinishBy) {
@@ -107,12 +99,15 @@ bool ZTCCollector::isOver(ZTCTime aNow) {
         logLine("the agent has not ended in time: ending without it");
         return true;
     }
-    return mpSession == nullptr && mWaiting.empty() && mOutgoing.empty();
+    return mpSession == nullptr && mWaiting.empty() && mKeeper.isFlushed();
 }
 
 /// All that is due.
 void ZTCCollector::turn(ZTCTime aNow) {
-    receiveFromKeeper(aNow);
+    for (const std::string& lrLine :
+         mKeeper.receive([&](ZTSLinkMessage aMessage) { handle(std::move(aMessage), aNow); })) {
+        logLine(lrLine);
+    }
     noteHistory();
     if (!mIsReady) {
         openSpool(aNow);
@@ -123,19 +118,19 @@ void ZTCCollector::turn(ZTCTime aNow) {
             beginNextSession(aNow);
             runSession(aNow);
         } while (mpSession == nullptr && !mWaiting.empty());
-        sweep();
+        sweep(aNow);
     }
     mControl.serve(aNow);
     tellState();
     feedOutlets(aNow);
-    if (aNow - mLastLook >= gcLookPeriod) {
-        sendLook(aNow);
+    if (aNow >= mKeeper.getNextLook()) {
+        mKeeper.sendLook(aNow);
     }
-    flushToKeeper();
+    mKeeper.flush();
 }
 
 int ZTCCollector::getPollTime(ZTCTime aNow) const {
-    ZTCTime lNext = mLastLook + gcLookPeriod;
+    ZTCTime lNext = mKeeper.getNextLook();
     if (mIsReady) {
         lNext = std::min(lNext, mNextScan);
     } else if (mNextSpoolTry > aNow) {
@@ -154,8 +149,7 @@ int ZTCCollector::getPollTime(ZTCTime aNow) const {
 
 void ZTCCollector::poll(ZTCTime aNow) {
     mFds.clear();
-    const short lLinkEvents = mOutgoing.empty() ? POLLIN : POLLIN | POLLOUT;
-    mFds.push_back({.fd = mInheritance.mLink.getDescriptor(), .events = lLinkEvents, .revents = 0});
+    mFds.push_back({.fd = mKeeper.getDescriptor(), .events = mKeeper.getEvents(), .revents = 0});
     mFds.push_back({.fd = mHistory.getBell(), .events = POLLIN, .revents = 0});
     mFds.push_back({.fd = mpSession != nullptr ? mpSession->getResponseFifo() : -1, .events = POLLIN, .revents = 0});
     mFds.push_back({.fd = mpSession != nullptr ? mpSession->getBell() : -1, .events = POLLIN, .revents = 0});
@@ -182,22 +176,6 @@ void ZTCCollector::poll(ZTCTime aNow) {
 }
 
 // ---- the keeper ----
-
-void ZTCCollector::receiveFromKeeper(ZTCTime aNow) {
-    while (!mIsKeeperGone) {
-        ZTSLinkMessage lMessage;
-        try {
-            const ZTELinkResult lResult = mInheritance.mLink.receive(lMessage);
-            if (lResult != ZTLR_Done) {
-                mIsKeeperGone = lResult == ZTLR_PeerGone;
-                return;
-            }
-            handle(std::move(lMessage), aNow);
-        } catch (const ZTCClientEx& lrEx) {
-            logLine(std::string("a message of the keeper is passed over: ") + lrEx.what());
-        }
-    }
-}
 
 void ZTCCollector::handle(ZTSLinkMessage aMessage, ZTCTime aNow) {
     switch (aMessage.mType) {
@@ -269,40 +247,13 @@ void ZTCCollector::reload(const ZTSLinkMessage& acrMessage, ZTCTime aNow) {
     }
     mSettings = lReading.mSettings;
     mHistory.setLimits(sStoreLimits(mSettings));
-    mOutlets.setSettings(mSettings);
+    if (mpOutlets != nullptr) {
+        mpOutlets->setSettings(mSettings);
+    }
     if (mpSession != nullptr) {
         mpSession->setSettings(sSessionSettings(mSettings), aNow);
     }
     mNextScan = aNow;
-}
-
-void ZTCCollector::send(ZTELinkMessageType aType, std::uint64_t aStart, const std::string& acrText) {
-    ZTSLinkMessage lMessage;
-    lMessage.mType = aType;
-    lMessage.mStart = aStart;
-    lMessage.mText = acrText;
-    mOutgoing.push_back(std::move(lMessage));
-}
-
-void ZTCCollector::sendLook(ZTCTime aNow) {
-    mLastLook = aNow;
-    const auto lIsLook = [](const ZTSLinkMessage& acrMessage) { return acrMessage.mType == ZTLM_Look; };
-    if (std::ranges::none_of(mOutgoing, lIsLook)) {
-        send(ZTLM_Look, 0);
-    }
-}
-
-void ZTCCollector::flushToKeeper() {
-    while (!mOutgoing.empty()) {
-        const ZTELinkResult lResult = mInheritance.mLink.send(mOutgoing.front());
-        if (lResult == ZTLR_PeerGone) {
-            mIsKeeperGone = true;
-        }
-        if (lResult != ZTLR_Done) {
-            return;
-        }
-        mOutgoing.pop_front();
-    }
 }
 
 void ZTCCollector::tellState() {
@@ -318,18 +269,30 @@ void ZTCCollector::tellState() {
     } else if (mpSession != nullptr) {
         lText = "waiting for the agent";
     }
-    if (lText != mToldState) {
-        mToldState = lText;
-        send(ZTLM_Text, 0, lText);
-    }
+    mKeeper.sendText(lText);
 }
 
 /// What the outlets show is at most a second older than the last thing that happened.
 void ZTCCollector::feedOutlets(ZTCTime aNow) {
+    if (!mHistory.getState().mIsOpen) {
+        return;
+    }
+    if (mpOutlets == nullptr) {
+        // Not before: a reader that opens the database while the disk is read-only makes it read-only for the writer in
+        // the same process, too.
+        mpOutlets = std::make_unique<ZTCOutlets>(
+            ZTSOutletsSetup{.mStateDirectory = mInheritance.mState,
+                            .mHost = sHostName(),
+                            .mVersion = TAVIK_VERSION,
+                            .mSetValue = [this](const std::string& acrName,
+                                                const std::string& acrValue) { mHistory.setValue(acrName, acrValue); },
+                            .mReport = [](const std::string& acrLine) { logLine(acrLine); }},
+            mSettings);
+    }
     if (aNow - mLastLive >= scLivePause) {
         mLastLive = aNow;
-        mOutlets.setLive(describeState());
-        mOutlets.wake();
+        mpOutlets->setLive(describeState());
+        mpOutlets->wake();
     }
 }
 
@@ -340,14 +303,7 @@ void ZTCCollector::openSpool(ZTCTime aNow) {
         return;  // the history rings when it is open
     }
     try {
-        mSpool.open();
-        const std::vector<ZTSSpoolEntry> lEntries = mSpool.list();
-        const ZTSSpoolPlan lPlan = planSpoolRecovery(lEntries, "");
-        mSpool.raiseNumber(lPlan.mNextNumber);
-        mSpool.raiseNumber(mHistory.getState().mLastFrame + 1);
-        for (const ZTSSpoolEntry& lrEntry : lPlan.mWaiting) {
-            mHistory.takeIn(lrEntry, findPage(lrEntry.mName.mGeneration));
-        }
+        mLeftovers.takeInWaiting(mHistory.getState().mLastFrame);
         mIsReady = true;
         mSpoolProblem.clear();
     } catch (const ZTCSpoolTroubleEx& lrEx) {
@@ -395,89 +351,43 @@ void ZTCCollector::runSession(ZTCTime aNow) {
     }
     mLastAsked = mpSession->getLastAsked() ? mpSession->getLastAsked() : mLastAsked;
     if (lEvents.mIsStartAnswered) {
-        send(ZTLM_StartAnswered, mpSession->getStart());
+        mKeeper.send(ZTLM_StartAnswered, mpSession->getStart());
     }
     if (lEvents.mIsSilent) {
-        send(ZTLM_Silent, mpSession->getStart());
+        mKeeper.send(ZTLM_Silent, mpSession->getStart());
     }
     if (lEvents.mLooks != 0 || lEvents.mFrames != 0) {
-        sendLook(aNow);
+        mKeeper.sendLook(aNow);
     }
     if (mpSession->isDrained()) {
-        send(ZTLM_Drained, mpSession->getStart());
+        mKeeper.send(ZTLM_Drained, mpSession->getStart());
         mpSession.reset();
     }
 }
 
-/// Once, when it is known which agent runs: what agents of earlier keepers have left.
-void ZTCCollector::sweep() {
+/// When it is known which agent runs, and none waits to be emptied: what agents of earlier keepers have left. Looked
+/// for again from time to time, since one of them may still have been running.
+void ZTCCollector::sweep(ZTCTime aNow) {
     const bool lIsSessionKnown = mpSession == nullptr || !mpSession->getGeneration().empty();
-    if (mIsSwept || !mKeeperState || !mWaiting.empty() || !lIsSessionKnown) {
+    if (aNow < mNextSweep || !mKeeperState || !mWaiting.empty() || !lIsSessionKnown) {
         return;
     }
+    mNextSweep = aNow + scScanPeriod;
     try {
         if (mpSession == nullptr) {
-            sweepParts();
+            mLeftovers.tearParts();
         }
-        sweepPages();
-        mHistory.endForgottenAgents(mpSession != nullptr ? mpSession->getGeneration() : "");
+        mLeftovers.endPages(mpSession != nullptr ? mpSession->getPagePath() : "");
+        if (!mIsSwept) {
+            mHistory.endForgottenAgents(mpSession != nullptr ? mpSession->getGeneration() : "");
+        }
         mIsSwept = true;
+        mSpoolProblem.clear();
     } catch (const ZTCSpoolTroubleEx& lrEx) {
         mSpoolProblem = lrEx.what();
         mSpoolErrno = lrEx.getErrno();
-    }
-}
-
-void ZTCCollector::sweepParts() {
-    const std::vector<ZTSSpoolEntry> lEntries = mSpool.list();
-    for (const ZTSSpoolEntry& lrEntry : planSpoolRecovery(lEntries, "").mTear) {
-        ZTSSpoolPart lPart = mSpool.openPart(lrEntry.mName);
-        const ZTSSpoolName lName = mSpool.tear(lPart);
-        if (lName.mState == ZTSPS_Torn) {
-            mHistory.takeIn({lName, lrEntry.mSize}, findPage(lName.mGeneration));
-        }
-    }
-    mSpoolProblem.clear();
-}
-
-/// The pages of agents that run or have ended, by path.
-static std::vector<std::string> sListPages(const std::string& acrDirectory) {
-    std::vector<std::string> lPaths;
-    std::error_code lError;
-    for (std::filesystem::directory_iterator lEntry(acrDirectory, lError), lEnd; !lError && lEntry != lEnd;
-         lEntry.increment(lError)) {
-        if (lEntry->path().filename().string().starts_with("page.")) {
-            lPaths.push_back(lEntry->path());
-        }
-    }
-    std::ranges::sort(lPaths);
-    return lPaths;
-}
-
-ZTCPagePointer ZTCCollector::findPage(const std::string& acrGeneration) const {
-    for (const std::string& lrPath : sListPages(mAgentDirectory)) {
-        ZTCStatusPageReader lReader;
-        auto lpPage = std::make_shared<ZTSStatusSnapshot>();
-        if (lReader.open(lrPath) && lReader.read(*lpPage) && lpPage->mStartId == acrGeneration) {
-            return lpPage;
-        }
-    }
-    return nullptr;
-}
-
-void ZTCCollector::sweepPages() {
-    for (const std::string& lPath : sListPages(mAgentDirectory)) {
-        if (mpSession != nullptr && lPath == mpSession->getPagePath()) {
-            continue;
-        }
-        ZTCStatusPageReader lReader;
-        auto lpPage = std::make_shared<ZTSStatusSnapshot>();
-        if (!lReader.open(lPath) || !lReader.read(*lpPage)) {
-            logLine(lReader.getReason() + ": removed");
-            unlink(lPath.c_str());
-        } else if (!isProcessAlive(lpPage->mPid)) {
-            mHistory.endAgent(describeEndedAgent(lpPage, lPath));
-        }
+    } catch (const ZTCClientEx& lrEx) {
+        logLine(lrEx.what());
     }
 }
 

@@ -1,0 +1,77 @@
+#include "sensor/collector/include/Leftovers.h"
+
+#include <unistd.h>
+
+#include <algorithm>
+#include <filesystem>
+
+#include "sensor/client/include/AgentState.h"
+#include "sensor/collector/include/AgentSession.h"
+#include "sensor/collector/include/SpoolRecovery.h"
+
+std::vector<std::string> ZTCLeftovers::listPages() const {
+    std::vector<std::string> lPaths;
+    std::error_code lError;
+    for (std::filesystem::directory_iterator lEntry(mAgentDirectory, lError), lEnd; !lError && lEntry != lEnd;
+         lEntry.increment(lError)) {
+        if (lEntry->path().filename().string().starts_with("page.")) {
+            lPaths.push_back(lEntry->path());
+        }
+    }
+    std::ranges::sort(lPaths);
+    return lPaths;
+}
+
+ZTCPagePointer ZTCLeftovers::findPage(const std::string& acrGeneration) const {
+    for (const std::string& lrPath : listPages()) {
+        ZTCStatusPageReader lReader;
+        auto lpPage = std::make_shared<ZTSStatusSnapshot>();
+        if (lReader.open(lrPath) && lReader.read(*lpPage) && lpPage->mStartId == acrGeneration) {
+            return lpPage;
+        }
+    }
+    return nullptr;
+}
+
+void ZTCLeftovers::takeInWaiting(std::uint64_t aLastNumber) {
+    mrSpool.open();
+    const std::vector<ZTSSpoolEntry> lEntries = mrSpool.list();
+    const ZTSSpoolPlan lPlan = planSpoolRecovery(lEntries, "");
+    mrSpool.raiseNumber(lPlan.mNextNumber);
+    mrSpool.raiseNumber(aLastNumber + 1);
+    for (const ZTSSpoolEntry& lrEntry : lPlan.mWaiting) {
+        mrHistory.takeIn(lrEntry, findPage(lrEntry.mName.mGeneration));
+    }
+}
+
+void ZTCLeftovers::tearParts() {
+    const std::vector<ZTSSpoolEntry> lEntries = mrSpool.list();
+    for (const ZTSSpoolEntry& lrEntry : planSpoolRecovery(lEntries, "").mTear) {
+        ZTSSpoolPart lPart = mrSpool.openPart(lrEntry.mName);
+        const ZTSSpoolName lName = mrSpool.tear(lPart);
+        if (lName.mState == ZTSPS_Torn) {
+            mrHistory.takeIn({lName, lrEntry.mSize}, findPage(lName.mGeneration));
+        }
+    }
+}
+
+void ZTCLeftovers::endPages(const std::string& acrCurrent) {
+    for (const std::string& lrPath : listPages()) {
+        if (lrPath == acrCurrent) {
+            continue;
+        }
+        ZTCStatusPageReader lReader;
+        auto lpPage = std::make_shared<ZTSStatusSnapshot>();
+        if (!lReader.open(lrPath) || !lReader.read(*lpPage)) {
+            mReport(lReader.getReason() + ": removed");
+            unlink(lrPath.c_str());
+            continue;
+        }
+        // An agent that another keeper has started may still run. A process number alone does not tell: it may belong
+        // to another program by now.
+        const ZTSAgentState lAgent = lookAtAgent(mAgentDirectory);
+        if (lAgent.mPresence == ZTAP_None || lAgent.mPid != static_cast<long>(lpPage->mPid)) {
+            mrHistory.endAgent(describeEndedAgent(lpPage, lrPath));
+        }
+    }
+}
