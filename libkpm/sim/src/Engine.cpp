@@ -7,36 +7,10 @@
 #include <string>
 #include <utility>
 
-#include "libkpm/common/include/Callbacks.h"
 #include "libkpm/common/include/LibraryThread.h"
 #include "libkpm/common/include/PortName.h"
+#include "libkpm/sim/src/Lending.h"
 #include "libkpm/sim/src/Report.h"
-
-/// Memory that lives for one callback: what a callback is given stands at the end of its block, at an odd address
-/// unless the scenario wants it aligned, and is overwritten before it is freed. An agent that keeps a pointer, reads
-/// too far or expects alignment is found out.
-class ZTCSimLoan {
-public:
-    ZTCSimLoan(const void* apBytes, std::size_t aSize, bool aIsOdd)
-        : mSize(aSize), mOffset(aIsOdd ? 1 : 0), mpBlock(new unsigned char[mOffset + aSize]) {
-        if (aSize != 0) {
-            std::memcpy(get(), apBytes, aSize);
-        }
-    }
-    ~ZTCSimLoan() {
-        std::memset(mpBlock.get(), 0xDD, mOffset + mSize);
-        __asm__ __volatile__("" : : "r"(mpBlock.get()) : "memory");
-    }
-    ZTCSimLoan(const ZTCSimLoan&) = delete;
-    ZTCSimLoan& operator=(const ZTCSimLoan&) = delete;
-
-    void* get() const { return mpBlock.get() + mOffset; }
-
-private:
-    std::size_t mSize;
-    std::size_t mOffset;
-    std::unique_ptr<unsigned char[]> mpBlock;
-};
 
 ZTCSimEngine::ZTCSimEngine(ZTSSimScenario aScenario)
     : ZTCRegistrationDesk(gcScopeEventKindCount),
@@ -247,21 +221,6 @@ std::uint64_t ZTCSimEngine::deliverToBoards(const ZTSSimEvent& acrEvent, std::ui
     return lDelivered;
 }
 
-void ZTCSimEngine::lendToScope(const ZTSLibraryRegistration& acrRegistration, const ZTSSimDelivery& acrDelivery) const {
-    const bool lIsOdd = mScenario.mHasOddAddresses;
-    const ZTCSimLoan lData(acrDelivery.mData.data(), acrDelivery.mData.size(), lIsOdd);
-    ZT_event_payload lPayload{};
-    lPayload.zt_payload_data = acrDelivery.mIsDataNull ? nullptr : lData.get();
-    const ZTCSimLoan lLentPayload(&lPayload, sizeof lPayload, lIsOdd);
-    ZT_event lEvent{};
-    lEvent.zt_evt_version = ZT_EVENT_VERSION;
-    lEvent.zt_evt_size = acrDelivery.mEventSize;
-    lEvent.zt_evt_payload = acrDelivery.mIsPayloadNull ? nullptr : lLentPayload.get();
-    const ZTCSimLoan lLentEvent(&lEvent, sizeof lEvent, lIsOdd);
-    callScope(acrRegistration, acrDelivery.mToldBoard, acrDelivery.mLocal, acrDelivery.mCategory,
-              acrDelivery.mSubcategory, static_cast<ZT_event*>(lLentEvent.get()));
-}
-
 bool ZTCSimEngine::deliver(const ZTSSimDelivery& acrDelivery) {
     const std::optional<ZTSLibraryRegistration> lRegistration =
         getRegistry().find(acrDelivery.mBoard, acrDelivery.mKind);
@@ -269,28 +228,7 @@ bool ZTCSimEngine::deliver(const ZTSSimDelivery& acrDelivery) {
         mDropped.fetch_add(1, std::memory_order_relaxed);
         return false;
     }
-    const std::vector<std::uint8_t>& lrData = acrDelivery.mData;
-    switch (getSimKind(acrDelivery.mKind).mDelivery) {
-        case ZTSD_Scope:
-            lendToScope(*lRegistration, acrDelivery);
-            break;
-        case ZTSD_Link: {
-            const ZTCSimLoan lInfo(lrData.data(), lrData.size(), mScenario.mHasOddAddresses);
-            callLink(*lRegistration, acrDelivery.mToldBoard, lInfo.get());
-            break;
-        }
-        case ZTSD_Rscn: {
-            const ZTCSimLoan lPayload(lrData.data(), lrData.size(), mScenario.mHasOddAddresses);
-            callRscn(*lRegistration, acrDelivery.mToldBoard, lPayload.get(), acrDelivery.mLength);
-            break;
-        }
-        case ZTSD_Temperature: {
-            unsigned lValues[2];
-            std::memcpy(lValues, lrData.data(), sizeof lValues);
-            callTemperature(*lRegistration, acrDelivery.mToldBoard, lValues[0], lValues[1]);
-            break;
-        }
-    }
+    lendSimDelivery(*lRegistration, acrDelivery, mScenario.mHasOddAddresses);
     mPages.fetch_add(countSimPages(acrDelivery), std::memory_order_relaxed);
     // Release, with the acquire in getStatus(): who reads the count sees what the callback did.
     mDeliveredByKind[acrDelivery.mKind].fetch_add(1, std::memory_order_release);
@@ -395,42 +333,12 @@ std::optional<std::size_t> ZTCSimEngine::findKind(std::uint32_t aCategory, std::
     return findRegisteredKindIndex(aCategory, aSubcategory);
 }
 
-/// How the registration of a kind is answered that is in this state.
-static ZTSSimAnswer sAnswerState(std::size_t aKind, std::uint32_t aState) {
-    ZTSSimAnswer lAnswer;
-    if (aState == KPM_STATE_NO_SOURCE) {
-        lAnswer.mStatus = KPM_STATUS_NO_SOURCE;
-        // The agent starts without temperatures, but not without a handle for the others.
-        if (getSimKind(aKind).mDelivery == ZTSD_Temperature) {
-            lAnswer.mHandle = 0;
-        }
-    } else if (aState == KPM_STATE_NO_RIGHTS) {
-        lAnswer.mStatus = KPM_STATUS_NO_RIGHTS;
-    }
-    return lAnswer;
-}
-
-/// What a registration that answers with a handle alone says through its report.
-static ZTSSimSource sDescribe(const ZTSSimAnswer& acrAnswer) {
-    switch (acrAnswer.mStatus) {
-        case KPM_STATUS_SUCCESS:
-        case KPM_STATUS_INFO_5:
-            return acrAnswer.mHandle == 0u ? ZTSSimSource{KPM_STATE_FAILED, "no handle is given"} : ZTSSimSource{};
-        case KPM_STATUS_NO_SOURCE:
-            return {KPM_STATE_NO_SOURCE, ""};
-        case KPM_STATUS_NO_RIGHTS:
-            return {KPM_STATE_NO_RIGHTS, ""};
-        default:
-            return {KPM_STATE_FAILED, "refused with status " + std::to_string(acrAnswer.mStatus)};
-    }
-}
-
 ZTSRegistrationAnswer ZTCSimEngine::answerRegistration(std::uint32_t aBoard, std::size_t aKind) {
     const std::optional<ZTSSimAnswer> lScripted = findAnswer(ZTSO_Register, aKind, aBoard);
     const ZTSSimSource lSource = mSources.get(aBoard, aKind);
-    const ZTSSimAnswer lAnswer = lScripted.value_or(sAnswerState(aKind, lSource.mState));
+    const ZTSSimAnswer lAnswer = lScripted.value_or(answerSimSource(aKind, lSource.mState));
     if (!gcScopeEventKinds[aKind].isScope()) {
-        reportSimSource(aBoard, aKind, lScripted ? sDescribe(*lScripted) : lSource);
+        reportSimSource(aBoard, aKind, lScripted ? describeSimAnswer(*lScripted) : lSource);
     }
     const bool lHasSource = lAnswer.mStatus != KPM_STATUS_NO_SOURCE && lAnswer.mHandle != 0u;
     return {lAnswer.mStatus, lAnswer.mHandle, lHasSource};

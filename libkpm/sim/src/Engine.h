@@ -89,7 +89,6 @@ private:
     std::uint64_t play(const Share& acrShare);
     std::uint64_t deliverToBoards(const ZTSSimEvent& acrEvent, std::uint64_t aOccurrence);
     bool deliver(const ZTSSimDelivery& acrDelivery);
-    void lendToScope(const ZTSLibraryRegistration& acrRegistration, const ZTSSimDelivery& acrDelivery) const;
     std::optional<ZTSSimAnswer> findAnswer(ZTESimOperation aOperation, std::optional<std::size_t> aKind,
                                            std::uint32_t aBoard);
 

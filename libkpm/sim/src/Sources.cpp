@@ -59,3 +59,31 @@ void ZTCSimSources::lose(const ZTSSimLoss& acrLine) {
     lrTotal += acrLine.mCount;
     reportLibraryLoss(acrLine.mName.c_str(), lrTotal);
 }
+
+ZTSSimAnswer answerSimSource(std::size_t aKind, std::uint32_t aState) {
+    ZTSSimAnswer lAnswer;
+    if (aState == KPM_STATE_NO_SOURCE) {
+        lAnswer.mStatus = KPM_STATUS_NO_SOURCE;
+        // The agent starts without temperatures, but not without a handle for the others.
+        if (getSimKind(aKind).mDelivery == ZTSD_Temperature) {
+            lAnswer.mHandle = 0;
+        }
+    } else if (aState == KPM_STATE_NO_RIGHTS) {
+        lAnswer.mStatus = KPM_STATUS_NO_RIGHTS;
+    }
+    return lAnswer;
+}
+
+ZTSSimSource describeSimAnswer(const ZTSSimAnswer& acrAnswer) {
+    switch (acrAnswer.mStatus) {
+        case KPM_STATUS_SUCCESS:
+        case KPM_STATUS_INFO_5:
+            return acrAnswer.mHandle == 0u ? ZTSSimSource{KPM_STATE_FAILED, "no handle is given"} : ZTSSimSource{};
+        case KPM_STATUS_NO_SOURCE:
+            return {KPM_STATE_NO_SOURCE, ""};
+        case KPM_STATUS_NO_RIGHTS:
+            return {KPM_STATE_NO_RIGHTS, ""};
+        default:
+            return {KPM_STATE_FAILED, "refused with status " + std::to_string(acrAnswer.mStatus)};
+    }
+}
