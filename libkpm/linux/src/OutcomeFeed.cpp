@@ -223,6 +223,7 @@ void ZTCLinuxOutcomeFeed::readRecord(ZTCByteSpan aRecord, std::uint64_t aTime) {
     } else if (mpProbe != nullptr && lOutcome->mStatus == ZTLSS_CheckCondition) {
         // What the trace itself says, where it says it, does not count while the probe is in use.
         lOutcome->mSenseKey = lOutcome->mAsc = lOutcome->mAscq = gcUnknownSense;
+        readCommandTags(aRecord, lrLayout, *lOutcome);
         mMatcher.addOutcome(*lOutcome, aTime, ZTCSenseMatcher::Clock::now());
     } else {
         handle(*lOutcome);

@@ -30,10 +30,6 @@ std::optional<ZTSScsiOutcome> parseScsiOutcome(ZTCByteSpan aRecord, const ZTSScs
     lOutcome.mLun = lRead(acrLayout.mLun);
     lOutcome.mStatus = static_cast<std::uint8_t>(lRead(acrLayout.mResult));
     lOutcome.mOpcode = static_cast<std::uint8_t>(lRead(acrLayout.mOpcode));
-    if (acrLayout.mDriverTag.mSize != 0 && acrLayout.mSchedulerTag.mSize != 0) {
-        lOutcome.mDriverTag = lRead(acrLayout.mDriverTag);
-        lOutcome.mSchedulerTag = lRead(acrLayout.mSchedulerTag);
-    }
     if (acrLayout.hasSense()) {
         lOutcome.mSenseKey = lRead(acrLayout.mSenseKey);
         lOutcome.mAsc = lRead(acrLayout.mAsc);
@@ -43,6 +39,16 @@ std::optional<ZTSScsiOutcome> parseScsiOutcome(ZTCByteSpan aRecord, const ZTSScs
         return std::nullopt;
     }
     return lOutcome;
+}
+
+void readCommandTags(ZTCByteSpan aRecord, const ZTSScsiDoneLayout& acrLayout, ZTSCommandName& arCommand,
+                     std::endian aOrder) {
+    const std::optional<std::uint64_t> lDriver = sLoad(aRecord, acrLayout.mDriverTag, aOrder);
+    const std::optional<std::uint64_t> lScheduler = sLoad(aRecord, acrLayout.mSchedulerTag, aOrder);
+    if (lDriver && lScheduler) {
+        arCommand.mDriverTag = static_cast<std::uint32_t>(*lDriver);
+        arCommand.mSchedulerTag = static_cast<std::uint32_t>(*lScheduler);
+    }
 }
 
 std::string makeHostFilter(const std::string& acrField, const std::vector<std::uint32_t>& acrHosts) {

@@ -18,7 +18,8 @@ enum ZTELinuxScsiStatus : std::uint8_t { ZTLSS_CheckCondition = 0x02, ZTLSS_Busy
 /// What a sense value is that the kernel does not tell.
 inline constexpr std::uint32_t gcUnknownSense = 0xFFFFFFFFu;
 
-/// What names a command among those that are under way. Tags that the kernel does not tell are 0.
+/// What names a command among those that are under way. Tags that the kernel does not tell, or that were not read, are
+/// 0.
 struct ZTSCommandName {
     std::uint32_t mHost = 0;
     std::uint32_t mChannel = 0;
@@ -42,9 +43,13 @@ struct ZTSScsiOutcome : ZTSCommandName {
 std::optional<std::uint32_t> getTraceRecordId(ZTCByteSpan aRecord, const ZTSScsiDoneLayout& acrLayout,
                                               std::endian aOrder = std::endian::native);
 
-/// Nothing where the record is shorter than its fields.
+/// Without the tags, which few need. Nothing where the record is shorter than its fields.
 std::optional<ZTSScsiOutcome> parseScsiOutcome(ZTCByteSpan aRecord, const ZTSScsiDoneLayout& acrLayout,
                                                std::endian aOrder = std::endian::native);
+
+/// Reads the command's tags. Where the record does not have both, they stay as they are.
+void readCommandTags(ZTCByteSpan aRecord, const ZTSScsiDoneLayout& acrLayout, ZTSCommandName& arCommand,
+                     std::endian aOrder = std::endian::native);
 
 /// The filter that the kernel is given for finished commands: those of these hosts (in ascending order) whose status
 /// has a bit of one of the three above. A few others pass, which the library drops. Runs of hosts are written as

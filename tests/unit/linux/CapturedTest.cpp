@@ -7,8 +7,10 @@
 #include <string>
 #include <vector>
 
+#include "libkpm/linux/src/Btf.h"
 #include "libkpm/linux/src/FcMessage.h"
 #include "libkpm/linux/src/ScsiOutcome.h"
+#include "libkpm/linux/src/SenseData.h"
 #include "libkpm/linux/src/Sysfs.h"
 #include "libkpm/linux/src/TraceFormat.h"
 #include "libkpm/linux/src/TracePage.h"
@@ -204,6 +206,19 @@ TEST_P(Captured, HostsAndRemotePortsAreFoundInSysfs) {
     ZTCLinuxRemotePorts lPorts(lSysfs);
     EXPECT_TRUE(isSameName(lPorts.find(0, 0, 0), lHosts[1].mPortName)) << "the target behind host 1";
     EXPECT_TRUE(isZeroName(lPorts.find(1, 0, 0))) << "host 1 sees no target";
+}
+
+TEST_P(Captured, TheProbeForSenseDataHasTheOffsetsOfTheKernel) {
+    const ZTCBytes lKernel = bytes("btf/vmlinux");
+    const ZTCBytes lModule = bytes("btf/scsi_mod");
+    const auto lLine = makeSenseProbe(ZTCBtf(lKernel, lModule), "group", "$arg1");
+    ASSERT_TRUE(std::holds_alternative<std::string>(lLine)) << std::get<ZTSTraceProblem>(lLine).mText;
+    const std::string lTags = hasSense() ? "driver_tag=-216($arg1):s32 scheduler_tag=-212($arg1):s32"
+                                         : "driver_tag=-240($arg1):s32 scheduler_tag=-236($arg1):s32";
+    EXPECT_EQ(std::get<std::string>(lLine),
+              "p:group/check_sense scsi_check_sense host=+404(+0(+0($arg1))):u32 channel=+148(+0($arg1)):u32 "
+              "id=+144(+0($arg1)):u32 lun=+152(+0($arg1)):u64 result=+288($arg1):u32 opcode=+164($arg1):x8 " +
+                  lTags + " sense=+0(+248($arg1)):x8[20]");
 }
 
 INSTANTIATE_TEST_SUITE_P(Kernels, Captured, testing::Values("6.1", "6.12"), [](const auto& acrInfo) {

@@ -113,3 +113,16 @@ TEST(ScsiOutcome, AFilterOfExactlyTheKernelsLimitLeavesTheHostsOutAndOneByteLess
     // The numbers are counted right: a few bytes less, and the size is as asked for.
     EXPECT_EQ(makeScsiFilter(sHostsFor(4090)).size(), 4090u);
 }
+
+TEST(ScsiOutcome, TagsAreReadBothOrNotAtAll) {
+    for (const std::endian lOrder : {std::endian::little, std::endian::big}) {
+        const ZTCBytes lRecord = ZTSDoneRecord{.mDriverTag = 0xFFFFFFFF, .mSchedulerTag = 12, .mOrder = lOrder}.make();
+        ZTSCommandName lCommand;
+        readCommandTags(lRecord, sLayout(), lCommand, lOrder);
+        EXPECT_EQ(lCommand.mDriverTag, 0xFFFFFFFFu);
+        EXPECT_EQ(lCommand.mSchedulerTag, 12u);
+        ZTSCommandName lShort;
+        readCommandTags(ZTCByteSpan(lRecord).first(43), sLayout(), lShort, lOrder);
+        EXPECT_EQ(lShort, ZTSCommandName{});
+    }
+}
