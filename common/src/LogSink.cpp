@@ -42,8 +42,8 @@ std::int64_t sStamp(ZTCLogLine& arLine) noexcept {
     }
     const ZTCDateTime lNow;
     storeLogStamp(arLine.getData(), lNow);
-    const std::uint64_t lMicroSeconds =
-        lNow.getSecondsSinceEpoch() * 1000000 + lNow.getMilliSeconds() * 1000u + lNow.getMicroSeconds();
+    const std::uint64_t lMilliSeconds = lNow.getSecondsSinceEpoch() * 1000 + lNow.getMilliSeconds();
+    const std::uint64_t lMicroSeconds = lMilliSeconds * 1000 + lNow.getMicroSeconds();
     return static_cast<std::int64_t>(lMicroSeconds * 1000);
 }
 
