@@ -357,6 +357,27 @@ check_killed() { # what a killed agent leaves in tracefs, the next one removes
   expect "the next one delivers" 1 "$(total check-condition)"
 }
 
+check_killed_in_a_storm() { # nothing is left of an agent that is killed in a storm, once the next one has been there
+  local lStorm
+  stop_agent
+  export KPM_LINUX_PROBE=1
+  start_agent
+  repeated 2 $(sg_of 1) 400 $gPastEnd &
+  lStorm=$!
+  usleep 300000
+  kill -9 $gAgent
+  wait $gAgent 2>/dev/null
+  wait $lStorm
+  start_agent
+  expect_text "instances and probes of the next one" "1 1" "$(instances) $(grep -c scsi_check_sense $gTracing/kprobe_events)"
+  past_end 0
+  expect "the next one delivers" 1 "$(total check-condition)"
+  stop_agent
+  unset KPM_LINUX_PROBE
+  expect_text "instances and probes after it" "0 0" "$(instances) $(grep -c scsi_check_sense $gTracing/kprobe_events)"
+  start_agent
+}
+
 check_terminated() { # an agent that a signal ends leaves its trace instance switched off, and the next one removes it
   local lFirst
   lFirst=$gTracing/instances/$(ls $gTracing/instances)
