@@ -12,6 +12,7 @@
 #include "sensor/views/include/FilterText.h"
 #include "sensor/views/include/StatusView.h"
 #include "sensor/views/include/Timeline.h"
+#include "sensor/web/src/PageFiles.h"
 
 using ZTCJson = nlohmann::ordered_json;
 
@@ -104,6 +105,9 @@ ZTSWebResponse ZTCApi::answer(const ZTSWebRequest& acrRequest) {
 
 ZTSWebResponse ZTCApi::answerKnown(const ZTSWebRequest& acrRequest) {
     const std::string& lrPath = acrRequest.mPath;
+    if (const ZTSPageFile* const lpFile = findPageFile(lrPath)) {
+        return {.mType = lpFile->mpType, .mBody = std::string(lpFile->mContent), .mCacheControl = "no-cache"};
+    }
     if (lrPath == "/healthz") {
         return answerHealth();
     }

@@ -136,6 +136,19 @@ TEST_F(Api, MetricsCountWhatTheHistoryHolds) {
                       HasSubstr("tavik_agent_up 1\n")));
 }
 
+TEST_F(Api, ThePageAndAllThatItLoadsComeFromThisServer) {
+    const ZTSWebResponse lPage = ask("/");
+    EXPECT_EQ(lPage.mType, "text/html; charset=utf-8");
+    EXPECT_EQ(lPage.mBody.find("http:"), std::string::npos);
+    EXPECT_EQ(lPage.mBody.find("https:"), std::string::npos);
+    for (const char* lpPath : {"/style.css", "/app.js", "/api.js", "/chart.js", "/format.js", "/timeline.js"}) {
+        const ZTSWebResponse lFile = ask(lpPath);
+        EXPECT_EQ(lFile.mStatus, 200U) << lpPath;
+        EXPECT_EQ(lFile.mBody.find("https:"), std::string::npos) << lpPath;
+        EXPECT_EQ(lFile.mBody.find("eval("), std::string::npos) << lpPath;
+    }
+}
+
 // ---- the timeline ----
 
 TEST_F(Api, TheTimelineCountsEachMinuteInItsColumnExactly) {
