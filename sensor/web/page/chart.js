@@ -181,7 +181,8 @@ export function draw(canvas, model, cursor, selection) {
     for (const [column, cell] of row.cells) {
       const family = familyOf(gravest(cell.kinds.keys()));
       const x = labelWidth + column * columnWidth;
-      const cellWidth = Math.max(3, columnWidth - 0.5);
+      // Counts are kept by the minute: where columns are narrower, a cell is as wide as its minute.
+      const cellWidth = Math.max(3, columnWidth - 0.5, 60000 / perPixel - 0.5);
       context.globalAlpha = 0.4 + 0.6 * Math.log10(1 + cell.count) / Math.log10(1 + most);
       context.fillStyle = isDark ? family.dark : family.light;
       context.fillRect(x, y + 2, cellWidth, rowHeight - 4);
