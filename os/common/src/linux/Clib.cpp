@@ -20,7 +20,6 @@
 
 namespace {
 
-constexpr std::size_t scMaxText = 512;
 constexpr int scFirstOwnDescriptor = 3;
 
 /// Throws the exception with "DOING 'PATH' failed: REASON".
