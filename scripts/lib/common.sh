@@ -16,6 +16,7 @@ gCoveragePackages=(gcovr python3)
 gStylePackages=(clang-format clang-tidy)
 gPackagePackages=(dpkg-dev debhelper lintian fakeroot lowdown git)
 gVmPackages=(make qemu-system-x86 busybox-static kmod cpio xz-utils iproute2 jq sg3-utils)
+gFleetPackages=(prometheus prometheus-alertmanager rsyslog curl python3 python3-yaml)
 
 say() { printf '\n== %s\n' "$*"; }
 fail() {
