@@ -14,7 +14,7 @@ gBenchPackages=(libbenchmark-dev prometheus-cpp-dev libspdlog-dev python3)
 gClangPackages=(clang libclang-rt-14-dev llvm)
 gCoveragePackages=(gcovr python3)
 gStylePackages=(clang-format clang-tidy)
-gPackagePackages=(dpkg-dev debhelper lintian fakeroot lowdown git)
+gPackagePackages=(dpkg-dev debhelper lintian fakeroot lowdown git systemd)
 gVmPackages=(make qemu-system-x86 busybox-static kmod cpio xz-utils iproute2 jq sg3-utils)
 gFleetPackages=(prometheus prometheus-alertmanager rsyslog curl python3 python3-yaml)
 
