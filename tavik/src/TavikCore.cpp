@@ -248,7 +248,7 @@ constexpr ZTSDispatch scDispatch[] = {
 
 /// Every kind has its row, in the order of the table of kinds: under the pair it is delivered as, and with a member of
 /// its own where its events carry data that a record keeps. RSCNs do not come here.
-constexpr bool sHasEveryKindButRscn() {
+[[maybe_unused]] constexpr bool sHasEveryKindButRscn() {
     const ZTSDispatch* lpDispatch = std::begin(scDispatch);
     for (const ZTSScopeEventKind& lrKind : gcScopeEventKinds) {
         if (lrKind.mDeliveredCategory == gcRscnCategory && lrKind.mDeliveredSubcategory == gcRscnSubcategory) {
@@ -264,7 +264,9 @@ constexpr bool sHasEveryKindButRscn() {
     }
     return lpDispatch == std::end(scDispatch);
 }
+#ifndef __SANITIZE_ADDRESS__  // with it g++ compares an address with null only when the program runs
 static_assert(sHasEveryKindButRscn());
+#endif
 
 /// The rows of the table by slot; the last slot is that of what has none.
 constexpr auto scDispatchBySlot = [] {
