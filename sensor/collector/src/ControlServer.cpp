@@ -26,8 +26,8 @@ void ZTCControlServer::addTo(std::vector<pollfd>& arFds) const {
     }
     for (const ZTSClient& lrClient : mClients) {
         // A client whose request is being worked on is not read from: its next request waits in its socket.
-        const short lEvents = !lrClient.mOutput.empty() ? POLLOUT : lrClient.mTicket == 0 ? POLLIN : 0;
-        arFds.push_back({.fd = lrClient.mSocket.get(), .events = lEvents, .revents = 0});
+        const int lEvents = !lrClient.mOutput.empty() ? POLLOUT : lrClient.mTicket == 0 ? POLLIN : 0;
+        arFds.push_back({.fd = lrClient.mSocket.get(), .events = static_cast<short>(lEvents), .revents = 0});
     }
 }
 

@@ -125,7 +125,7 @@ ZTSSpoolName ZTCSpool::settle(ZTSSpoolPart& arPart, ZTESpoolState aState) {
     // Truncating to the size that it has gives the room behind it back. Where that fails, the room is given back when
     // the file is removed.
     [[maybe_unused]] const int lResult = ftruncate(arPart.mFile.get(), static_cast<off_t>(arPart.mSize));
-    const ZTSSpoolName lName = arPart.mName.withState(aState);
+    ZTSSpoolName lName = arPart.mName.withState(aState);
     sRename(pathOf(arPart.mName), pathOf(lName));
     arPart.mFile.reset();
     return lName;

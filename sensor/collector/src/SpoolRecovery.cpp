@@ -14,16 +14,14 @@ ZTSSpoolPlan planSpoolRecovery(std::span<const ZTSSpoolEntry> aEntries, const st
         }
         if (lrEntry.mName.mState != ZTSPS_Part) {
             lPlan.mWaiting.push_back(lrEntry);
-        } else if (lrEntry.mName.mGeneration != acrGeneration) {
+        } else if (lrEntry.mName.mGeneration != acrGeneration || (lPlan.mResume && lPlan.mResume->mSize != 0)) {
             lPlan.mTear.push_back(lrEntry);
-        } else if (!lPlan.mResume) {
-            lPlan.mResume = lrEntry;
-        } else if (lPlan.mResume->mSize == 0) {
-            // Only one answer can be on its way. The one that has begun is that one.
-            lPlan.mTear.push_back(*lPlan.mResume);
-            lPlan.mResume = lrEntry;
         } else {
-            lPlan.mTear.push_back(lrEntry);
+            // Only one answer can be on its way. The one that has begun is that one.
+            if (lPlan.mResume) {
+                lPlan.mTear.push_back(*lPlan.mResume);
+            }
+            lPlan.mResume = lrEntry;
         }
     }
     std::ranges::stable_sort(lPlan.mWaiting, {}, [](const ZTSSpoolEntry& acrEntry) { return acrEntry.mName.mNumber; });

@@ -36,7 +36,7 @@ static bool sIsProgram(const std::string& acrPath) {
 static std::string sFindIn(const std::vector<std::string>& acrFolders, const std::string& acrName) {
     std::string lPlaces;
     for (const std::string& lcrFolder : acrFolders) {
-        const std::string lPath = lcrFolder + "/" + acrName;
+        std::string lPath = lcrFolder + "/" + acrName;
         if (sIsProgram(lPath)) {
             return lPath;
         }

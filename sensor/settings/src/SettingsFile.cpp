@@ -37,9 +37,10 @@ static std::string sReadContent(const ZTCFileDescriptor& acrFile, std::string& a
 }
 
 ZTSSettingsReading readSettings(const std::string& acrOption) {
-    const char* lpVariable = std::getenv(gcSettingsFileVariable);
-    const bool lIsNamed = !acrOption.empty() || (lpVariable != nullptr && *lpVariable != '\0');
-    const std::string lPath = !acrOption.empty() ? acrOption : lIsNamed ? lpVariable : gcDefaultSettingsFile;
+    const char* const lpVariable = std::getenv(gcSettingsFileVariable);
+    const std::string lNamed = !acrOption.empty() ? acrOption : lpVariable != nullptr ? lpVariable : "";
+    const bool lIsNamed = !lNamed.empty();
+    const std::string lPath = lIsNamed ? lNamed : gcDefaultSettingsFile;
 
     // Without waiting: a FIFO in the file's place must not stop a reload.
     const ZTCFileDescriptor lFile = ZTCFileDescriptor::open(lPath.c_str(), O_RDONLY | O_NONBLOCK | O_NOCTTY);
