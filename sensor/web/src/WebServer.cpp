@@ -201,7 +201,7 @@ private:
             return 0;
         }
         const std::size_t lCount = std::min(aSize, lrStream.mPending.size());
-        std::memcpy(apPlace, lrStream.mPending.data(), lCount);
+        std::copy_n(lrStream.mPending.data(), lCount, apPlace);
         lrStream.mPending.erase(0, lCount);
         return static_cast<ssize_t>(lCount);
     }
