@@ -131,7 +131,7 @@ static void sPlay(const ZTSSimScenario& acrScenario) {
     ZT_FUZZ_REQUIRE(lEngine.getStatus().mDelivered == lDelivered, std::to_string(lDelivered));
 }
 
-/// The lines that deliver are injected lines as well.
+/// The lines that deliver or report are injected lines as well.
 static void sCheckLines(std::string_view aText, const ZTSSimScenario& acrScenario) {
     std::size_t lEventLines = 0;
     while (!aText.empty()) {
@@ -144,7 +144,8 @@ static void sCheckLines(std::string_view aText, const ZTSSimScenario& acrScenari
         }
         aText.remove_prefix(std::min(lEnd + 1, aText.size()));
     }
-    ZT_FUZZ_REQUIRE(lEventLines == acrScenario.mEvents.size() + acrScenario.mStorms.size(),
+    ZT_FUZZ_REQUIRE(lEventLines == acrScenario.mEvents.size() + acrScenario.mStorms.size() +
+                                       acrScenario.mStates.size() + acrScenario.mLosses.size(),
                     std::to_string(lEventLines));
 }
 

@@ -79,13 +79,19 @@ export function timeAt(canvas, model, x) {
   return new Date(model.from + Math.min(1, Math.max(0, part)) * (model.to - model.from));
 }
 
+/** The time that a cell is about, [from, to]: counts are kept by the minute, and a minute begins within its column. */
+export function spanOf(model, column) {
+  const from = model.from + column * model.width;
+  return [from, from + model.width + (model.width < 60000 ? 60000 : 0)];
+}
+
 /** One plain sentence about a cell. */
 export function describeCell(model, place) {
   const row = model.rows[place.row];
   const cell = row.cells.get(place.column);
-  const from = model.from + place.column * model.width;
-  const span = `${time(from)} to ${time(from + model.width, false)}`;
-  const blind = model.blind.find((stretch) => stretch.from < from + model.width && stretch.to > from);
+  const [from, to] = spanOf(model, place.column);
+  const span = `${time(from)} to ${time(to, false)}`;
+  const blind = model.blind.find((stretch) => stretch.from < to && stretch.to > from);
   if (!cell) {
     return `${row.label}, ${span}: ${blind ? `nothing is known, ${blind.why}` : "nothing happened"}.`;
   }

@@ -112,8 +112,7 @@ function showCursor() {
 
 async function open(place) {
   const row = model.rows[place.row];
-  const from = new Date(model.from + place.column * model.width);
-  const to = new Date(from.getTime() + model.width);
+  const [from, to] = chart.spanOf(model, place.column).map((at) => new Date(at));
   const filter = { since: from.toISOString(), until: to.toISOString() };
   const owner = row.port === null ? ["initiator", row.initiator.wwpn] : ["port", row.port.wwpn];
   filter[owner[0]] = owner[1] ?? "";
