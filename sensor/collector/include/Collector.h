@@ -5,28 +5,23 @@
 
 #include <poll.h>
 
-#include <deque>
 #include <memory>
 #include <optional>
 #include <string>
 #include <vector>
 
-#include "sensor/collector/include/AgentSession.h"
+#include "sensor/collector/include/AgentQueue.h"
 #include "sensor/collector/include/ControlRequest.h"
 #include "sensor/collector/include/ControlServer.h"
 #include "sensor/collector/include/HistoryWorker.h"
 #include "sensor/collector/include/KeeperPort.h"
 #include "sensor/collector/include/Leftovers.h"
 #include "sensor/collector/include/LiveStateJson.h"
-#include "sensor/collector/include/LossWindow.h"
+#include "sensor/collector/include/PortWatch.h"
 #include "sensor/collector/include/Spool.h"
 #include "sensor/link/include/Inheritance.h"
 #include "sensor/outlets/include/Outlets.h"
 #include "sensor/settings/include/Settings.h"
-#include "sensor/topology/include/TopologyScan.h"
-
-/// Environment variable with another root than "/sys", for tests.
-inline constexpr const char* gcSysfsVariable = "TAVIK_SYSFS_ROOT";
 
 class ZTCCollector {
 public:
@@ -43,27 +38,16 @@ public:
     int run();
 
 private:
-    /// An agent that waits until the one before it is drained.
-    struct ZTSWaitingAgent {
-        ZTSAgentStart mStart;
-        std::optional<int> mWaitStatus;  ///< it has ended
-    };
-
     void turn(ZTCTime aNow);
     void poll(ZTCTime aNow);
     int getPollTime(ZTCTime aNow) const;
     bool isOver(ZTCTime aNow);
 
     void handle(ZTSLinkMessage aMessage, ZTCTime aNow);
-    void noteAgentStarted(ZTSLinkMessage aMessage);
-    void noteAgentEnded(const ZTSLinkMessage& acrMessage, ZTCTime aNow);
     void reload(const ZTSLinkMessage& acrMessage, ZTCTime aNow);
 
     void openSpool(ZTCTime aNow);
-    void beginNextSession(ZTCTime aNow);
-    void runSession(ZTCTime aNow);
     void sweep(ZTCTime aNow);
-    void scanPorts(ZTCTime aNow);
     void noteHistory();
     void tellState();
     void feedOutlets(ZTCTime aNow);
@@ -73,13 +57,13 @@ private:
 
     ZTSInheritance mInheritance;
     ZTSSettings mSettings;
-    const std::string mAgentDirectory;
-    const std::string mSysfsRoot;
     const ZTCHistoryTime mSince;
     ZTCKeeperPort mKeeper;
     ZTCSpool mSpool;
     ZTCHistoryWorker mHistory;
     ZTCLeftovers mLeftovers;
+    ZTCAgentQueue mAgents;
+    ZTCPortWatch mPorts;
     ZTCControlServer mControl;
     std::unique_ptr<ZTCOutlets> mpOutlets;  ///< once the database is open
 
@@ -90,23 +74,10 @@ private:
     std::string mSpoolProblem;
     int mSpoolErrno = 0;
 
-    std::deque<ZTSWaitingAgent> mWaiting;
-    std::unique_ptr<ZTCAgentSession> mpSession;
-    bool mIsSessionDue = false;
-    ZTCPagePointer mpLastPage;
-    std::optional<ZTCHistoryTime> mLastAsked;
     std::uint64_t mRestarts = 0;
     std::optional<ZTSLinkMessage> mKeeperState;
     std::optional<ZTCTime> mFinishBy;
-
     ZTCTime mLastLive{};
-
-    ZTCTime mNextScan{};
-    ZTCPatientReader mPortReader;
-    std::shared_ptr<const ZTSTopology> mpPorts;
-    std::vector<ZTSTargetPort> mTargets;
-    std::string mTargetFileProblem;
-    ZTCLossWindow mLosses;
     std::vector<pollfd> mFds;
 };
 

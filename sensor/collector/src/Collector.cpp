@@ -1,12 +1,10 @@
 #include "sensor/collector/include/Collector.h"
 
-#include <fcntl.h>
 #include <unistd.h>
 
 #include <algorithm>
 #include <array>
 #include <cerrno>
-#include <cstdlib>
 
 #include "sensor/collector/include/CollectorLog.h"
 
@@ -14,21 +12,15 @@ using std::chrono::milliseconds;
 using std::chrono::seconds;
 
 static constexpr seconds scSpoolPause{1};
-/// Between two looks at the ports in sysfs and in the targets' file.
-static constexpr seconds scScanPeriod{10};
+/// Between two sweeps of what earlier keepers and agents have left.
+static constexpr seconds scSweepPeriod{10};
 /// Between two descriptions of the live state for the outlets.
 static constexpr seconds scLivePause{1};
-/// Of an orderly end: how long a full disk may hold up the agent's shut-down, when the agent is given up, and how long
-/// the history may take after that. Together less than gcFinishLimit.
-static constexpr seconds scStopPatience{8};
+/// Of an orderly end: when the agent is given up, and how long the history may take after that. Together less than
+/// gcFinishLimit.
 static constexpr seconds scFinishPatience{14};
 static constexpr seconds scHistoryPatience{4};
 static_assert(scFinishPatience + scHistoryPatience < gcFinishLimit);
-
-static std::string sSysfsRoot() {
-    const char* const lpRoot = std::getenv(gcSysfsVariable);
-    return lpRoot != nullptr && *lpRoot != '\0' ? lpRoot : "/sys";
-}
 
 static std::string sHostName() {
     std::array<char, 256> lName{};
@@ -52,18 +44,18 @@ static ZTSSessionSettings sSessionSettings(const ZTSSettings& acrSettings) {
 ZTCCollector::ZTCCollector(ZTSInheritance aInheritance, const ZTSSettings& acrSettings)
     : mInheritance(std::move(aInheritance)),
       mSettings(acrSettings),
-      mAgentDirectory(mInheritance.mDirectory + "/agent"),
-      mSysfsRoot(sSysfsRoot()),
       mSince(getHistoryTime()),
       mKeeper(std::move(mInheritance.mLink)),
       mSpool(mInheritance.mState + "/spool"),
       mHistory(mSpool, mInheritance.mState, sStoreLimits(acrSettings),
                [](const std::string& acrLine) { logLine(acrLine); }),
-      mLeftovers(mAgentDirectory, mSpool, mHistory, [](const std::string& acrLine) { logLine(acrLine); }),
+      mLeftovers(mInheritance.mDirectory + "/agent", mSpool, mHistory,
+                 [](const std::string& acrLine) { logLine(acrLine); }),
+      mAgents(mKeeper, mSpool, mHistory, mInheritance.mDirectory + "/agent", sSessionSettings(acrSettings),
+              [](const std::string& acrLine) { logLine(acrLine); }),
+      mPorts(mHistory, [](const std::string& acrLine) { logLine(acrLine); }),
       mControl(std::move(mInheritance.mControl),
-               [this](std::uint64_t aTicket, const std::string& acrRequest) { return serve(aTicket, acrRequest); }),
-      mpPorts(std::make_shared<ZTSTopology>()),
-      mLosses(mSince) {}
+               [this](std::uint64_t aTicket, const std::string& acrRequest) { return serve(aTicket, acrRequest); }) {}
 
 ZTCCollector::~ZTCCollector() = default;
 
@@ -95,11 +87,11 @@ bool ZTCCollector::isOver(ZTCTime aNow) {
     if (!mFinishBy) {
         return false;
     }
-    if (aNow >= *mFinishBy && (mpSession != nullptr || !mWaiting.empty())) {
+    if (aNow >= *mFinishBy && !mAgents.isEmpty()) {
         logLine("the agent has not ended in time: ending without it");
         return true;
     }
-    return mpSession == nullptr && mWaiting.empty() && mKeeper.isFlushed();
+    return mAgents.isEmpty() && mKeeper.isFlushed();
 }
 
 /// All that is due.
@@ -113,11 +105,10 @@ void ZTCCollector::turn(ZTCTime aNow) {
         openSpool(aNow);
     }
     if (mIsReady) {
-        scanPorts(aNow);
-        do {
-            beginNextSession(aNow);
-            runSession(aNow);
-        } while (mpSession == nullptr && !mWaiting.empty());
+        if (mPorts.scan(mSettings, aNow)) {
+            mAgents.setTargets(mPorts.getTargets(), aNow);
+        }
+        mAgents.run(aNow);
         sweep(aNow);
     }
     mControl.serve(aNow);
@@ -132,13 +123,11 @@ void ZTCCollector::turn(ZTCTime aNow) {
 int ZTCCollector::getPollTime(ZTCTime aNow) const {
     ZTCTime lNext = mKeeper.getNextLook();
     if (mIsReady) {
-        lNext = std::min(lNext, mNextScan);
+        lNext = std::min(lNext, mPorts.getNextScan());
     } else if (mNextSpoolTry > aNow) {
         lNext = std::min(lNext, mNextSpoolTry);
     }
-    if (mpSession != nullptr) {
-        lNext = std::min(lNext, mpSession->getNextStep());
-    }
+    lNext = std::min(lNext, mAgents.getNextStep().value_or(lNext));
     if (mFinishBy) {
         lNext = std::min(lNext, *mFinishBy);
     }
@@ -151,8 +140,8 @@ void ZTCCollector::poll(ZTCTime aNow) {
     mFds.clear();
     mFds.push_back({.fd = mKeeper.getDescriptor(), .events = mKeeper.getEvents(), .revents = 0});
     mFds.push_back({.fd = mHistory.getBell(), .events = POLLIN, .revents = 0});
-    mFds.push_back({.fd = mpSession != nullptr ? mpSession->getResponseFifo() : -1, .events = POLLIN, .revents = 0});
-    mFds.push_back({.fd = mpSession != nullptr ? mpSession->getBell() : -1, .events = POLLIN, .revents = 0});
+    mFds.push_back({.fd = mAgents.getResponseFifo(), .events = POLLIN, .revents = 0});
+    mFds.push_back({.fd = mAgents.getBell(), .events = POLLIN, .revents = 0});
     mControl.addTo(mFds);
     if (::poll(mFds.data(), static_cast<nfds_t>(mFds.size()), getPollTime(aNow)) <= 0) {
         return;
@@ -161,18 +150,8 @@ void ZTCCollector::poll(ZTCTime aNow) {
         std::uint64_t lCount = 0;
         [[maybe_unused]] const ssize_t lRead = read(mHistory.getBell(), &lCount, sizeof(lCount));
     }
-    if (mpSession == nullptr) {
-        return;
-    }
-    const ZTCTime lNow = std::chrono::steady_clock::now();
-    if (mFds[3].revents != 0) {
-        mpSession->noteBell(lNow);
-    }
-    if ((mFds[2].revents & POLLIN) != 0) {
-        mIsSessionDue = true;
-    } else if (mFds[2].revents != 0) {
-        mpSession->noteHangUp();
-    }
+    mAgents.noteResponseEvents(mFds[2].revents);
+    mAgents.noteBellEvents(mFds[3].revents, std::chrono::steady_clock::now());
 }
 
 // ---- the keeper ----
@@ -180,27 +159,24 @@ void ZTCCollector::poll(ZTCTime aNow) {
 void ZTCCollector::handle(ZTSLinkMessage aMessage, ZTCTime aNow) {
     switch (aMessage.mType) {
         case ZTLM_AgentStarted:
-            noteAgentStarted(std::move(aMessage));
+            mRestarts = std::max(mRestarts, aMessage.mRestarts);
+            mAgents.noteStarted(std::move(aMessage));
             break;
         case ZTLM_AgentEnded:
-            noteAgentEnded(aMessage, aNow);
+            mAgents.noteEnded(aMessage, aNow);
             break;
         case ZTLM_KeeperState:
             mRestarts = std::max(mRestarts, aMessage.mRestarts);
             mKeeperState = std::move(aMessage);
             break;
         case ZTLM_StopAgent:
-            if (mpSession != nullptr && mpSession->getStart() == aMessage.mStart) {
-                mpSession->requestStop(aNow, scStopPatience);
-            }
+            mAgents.stop(aMessage.mStart, aNow);
             break;
         case ZTLM_Finish:
             if (!mFinishBy) {
                 mFinishBy = aNow + scFinishPatience;
             }
-            if (mpSession != nullptr) {
-                mpSession->requestStop(aNow, scStopPatience);
-            }
+            mAgents.stopAll(aNow);
             break;
         case ZTLM_Reload:
             reload(aMessage, aNow);
@@ -208,34 +184,6 @@ void ZTCCollector::handle(ZTSLinkMessage aMessage, ZTCTime aNow) {
         default:
             logLine("the keeper has sent a message of type " + std::to_string(aMessage.mType) +
                     ", which a collector does not know");
-    }
-}
-
-void ZTCCollector::noteAgentStarted(ZTSLinkMessage aMessage) {
-    mRestarts = std::max(mRestarts, aMessage.mRestarts);
-    const auto lIsKnown = [&](const ZTSWaitingAgent& acrAgent) { return acrAgent.mStart.mStart == aMessage.mStart; };
-    if ((mpSession != nullptr && mpSession->getStart() == aMessage.mStart) || std::ranges::any_of(mWaiting, lIsKnown)) {
-        return;
-    }
-    // A large response then needs few turns of agent and collector. The FIFO works with its own size, too.
-    fcntl(aMessage.mResponseFifo.get(), F_SETPIPE_SZ, 1 << 20);
-    ZTSWaitingAgent lAgent;
-    lAgent.mStart.mStart = aMessage.mStart;
-    lAgent.mStart.mPid = aMessage.mPid;
-    lAgent.mStart.mPagePath = std::move(aMessage.mText);
-    lAgent.mStart.mResponseFifo = std::move(aMessage.mResponseFifo);
-    lAgent.mStart.mBell = std::move(aMessage.mBell);
-    mWaiting.push_back(std::move(lAgent));
-}
-
-void ZTCCollector::noteAgentEnded(const ZTSLinkMessage& acrMessage, ZTCTime aNow) {
-    if (mpSession != nullptr && mpSession->getStart() == acrMessage.mStart) {
-        mpSession->noteEnded(acrMessage.mWaitStatus, aNow);
-    }
-    for (ZTSWaitingAgent& lrAgent : mWaiting) {
-        if (lrAgent.mStart.mStart == acrMessage.mStart) {
-            lrAgent.mWaitStatus = acrMessage.mWaitStatus;
-        }
     }
 }
 
@@ -250,23 +198,22 @@ void ZTCCollector::reload(const ZTSLinkMessage& acrMessage, ZTCTime aNow) {
     if (mpOutlets != nullptr) {
         mpOutlets->setSettings(mSettings);
     }
-    if (mpSession != nullptr) {
-        mpSession->setSettings(sSessionSettings(mSettings), aNow);
-    }
-    mNextScan = aNow;
+    mAgents.setSettings(sSessionSettings(mSettings), aNow);
+    mPorts.hurry();
 }
 
 void ZTCCollector::tellState() {
     const ZTSHistoryState lHistory = mHistory.getState();
+    const ZTCAgentSession* const lpSession = mAgents.getSession();
     std::string lText = "no agent runs";
     if (!mSpoolProblem.empty() || !lHistory.mProblem.empty()) {
         lText = "not storing: " + (mSpoolProblem.empty() ? lHistory.mProblem : mSpoolProblem);
-    } else if (mpSession != nullptr && !mpSession->getDiskProblem().empty()) {
-        lText = "not asking: " + mpSession->getDiskProblem();
-    } else if (mpSession != nullptr && mpSession->isStarted() && mpSession->getPage() != nullptr) {
-        lText = "collecting from " + std::to_string(mpSession->getPage()->mBoards.size()) + " adapters, " +
-                std::to_string(mpSession->countTargets()) + " targets registered";
-    } else if (mpSession != nullptr) {
+    } else if (lpSession != nullptr && !lpSession->getDiskProblem().empty()) {
+        lText = "not asking: " + lpSession->getDiskProblem();
+    } else if (lpSession != nullptr && lpSession->isStarted() && lpSession->getPage() != nullptr) {
+        lText = "collecting from " + std::to_string(lpSession->getPage()->mBoards.size()) + " adapters, " +
+                std::to_string(lpSession->countTargets()) + " targets registered";
+    } else if (lpSession != nullptr) {
         lText = "waiting for the agent";
     }
     mKeeper.sendText(lText);
@@ -316,70 +263,22 @@ void ZTCCollector::openSpool(ZTCTime aNow) {
     }
 }
 
-void ZTCCollector::beginNextSession(ZTCTime aNow) {
-    if (mpSession != nullptr || mWaiting.empty()) {
-        return;
-    }
-    ZTSWaitingAgent lAgent = std::move(mWaiting.front());
-    mWaiting.pop_front();
-    mpSession = std::make_unique<ZTCAgentSession>(std::move(lAgent.mStart), mSpool, mHistory, mAgentDirectory,
-                                                  sSessionSettings(mSettings), aNow);
-    mpSession->offerTargets(mTargets, aNow);
-    if (lAgent.mWaitStatus) {
-        mpSession->noteEnded(*lAgent.mWaitStatus, aNow);
-    } else if (mFinishBy) {
-        mpSession->requestStop(aNow, scStopPatience);
-    }
-    mIsSessionDue = true;
-}
-
-void ZTCCollector::runSession(ZTCTime aNow) {
-    if (mpSession == nullptr || (!mIsSessionDue && aNow < mpSession->getNextStep())) {
-        return;
-    }
-    mIsSessionDue = false;
-    mpSession->step(aNow);
-    const ZTSSessionEvents lEvents = mpSession->takeEvents();
-    for (const std::string& lrLine : lEvents.mLines) {
-        logLine(lrLine);
-    }
-    if (mpSession->getPage() != nullptr) {
-        if (mpLastPage != mpSession->getPage()) {
-            mLosses.note(*mpSession->getPage(), getHistoryTime());
-        }
-        mpLastPage = mpSession->getPage();
-    }
-    mLastAsked = mpSession->getLastAsked() ? mpSession->getLastAsked() : mLastAsked;
-    if (lEvents.mIsStartAnswered) {
-        mKeeper.send(ZTLM_StartAnswered, mpSession->getStart());
-    }
-    if (lEvents.mIsSilent) {
-        mKeeper.send(ZTLM_Silent, mpSession->getStart());
-    }
-    if (lEvents.mLooks != 0 || lEvents.mFrames != 0) {
-        mKeeper.sendLook(aNow);
-    }
-    if (mpSession->isDrained()) {
-        mKeeper.send(ZTLM_Drained, mpSession->getStart());
-        mpSession.reset();
-    }
-}
-
 /// When it is known which agent runs, and none waits to be emptied: what agents of earlier keepers have left. Looked
 /// for again from time to time, since one of them may still have been running.
 void ZTCCollector::sweep(ZTCTime aNow) {
-    const bool lIsSessionKnown = mpSession == nullptr || !mpSession->getGeneration().empty();
-    if (aNow < mNextSweep || !mKeeperState || !mWaiting.empty() || !lIsSessionKnown) {
+    const ZTCAgentSession* const lpSession = mAgents.getSession();
+    const bool lIsSessionKnown = lpSession == nullptr || !lpSession->getGeneration().empty();
+    if (aNow < mNextSweep || !mKeeperState || mAgents.hasWaiting() || !lIsSessionKnown) {
         return;
     }
-    mNextSweep = aNow + scScanPeriod;
+    mNextSweep = aNow + scSweepPeriod;
     try {
-        if (mpSession == nullptr) {
+        if (lpSession == nullptr) {
             mLeftovers.tearParts();
         }
-        mLeftovers.endPages(mpSession != nullptr ? mpSession->getPagePath() : "");
+        mLeftovers.endPages(lpSession != nullptr ? lpSession->getPagePath() : "");
         if (!mIsSwept) {
-            mHistory.endForgottenAgents(mpSession != nullptr ? mpSession->getGeneration() : "");
+            mHistory.endForgottenAgents(lpSession != nullptr ? lpSession->getGeneration() : "");
         }
         mIsSwept = true;
         mSpoolProblem.clear();
@@ -388,31 +287,6 @@ void ZTCCollector::sweep(ZTCTime aNow) {
         mSpoolErrno = lrEx.getErrno();
     } catch (const ZTCClientEx& lrEx) {
         logLine(lrEx.what());
-    }
-}
-
-void ZTCCollector::scanPorts(ZTCTime aNow) {
-    if (aNow < mNextScan) {
-        return;
-    }
-    mNextScan = aNow + scScanPeriod;
-    auto lpPorts = std::make_shared<ZTSTopology>(::scanPorts(mSysfsRoot, mPortReader));
-    if (*lpPorts != *mpPorts) {
-        mpPorts = lpPorts;
-        mHistory.notePorts(lpPorts);
-    }
-    mTargets = mSettings.mTargetsSysfs ? toTargets(*lpPorts) : std::vector<ZTSTargetPort>();
-    try {
-        std::ranges::copy(readTargetFile(mSettings.mTargetsFile), std::back_inserter(mTargets));
-        mTargetFileProblem.clear();
-    } catch (const ZTCBadInputEx& lrEx) {
-        if (mTargetFileProblem != lrEx.what()) {
-            mTargetFileProblem = lrEx.what();
-            logLine(mTargetFileProblem + ": its targets are not registered");
-        }
-    }
-    if (mpSession != nullptr) {
-        mpSession->offerTargets(mTargets, aNow);
     }
 }
 
@@ -439,26 +313,27 @@ std::optional<std::string> ZTCCollector::serve(std::uint64_t aTicket, const std:
 }
 
 std::string ZTCCollector::describeState() {
+    const ZTCAgentSession* const lpSession = mAgents.getSession();
     ZTSLiveFacts lFacts;
     lFacts.mNow = getHistoryTime();
     lFacts.mKeeperPid = getppid();
     lFacts.mpKeeperState = mKeeperState ? &*mKeeperState : nullptr;
     lFacts.mCollectorPid = getpid();
     lFacts.mSince = mSince;
-    lFacts.mIsAgentRunning = mpSession != nullptr && !mpSession->hasEnded();
-    lFacts.mAgentPid = mpSession != nullptr ? mpSession->getPid() : 0;
+    lFacts.mIsAgentRunning = lpSession != nullptr && !lpSession->hasEnded();
+    lFacts.mAgentPid = lpSession != nullptr ? lpSession->getPid() : 0;
     lFacts.mRestarts = mRestarts;
-    lFacts.mpPage = mpSession != nullptr ? mpSession->readPageNow() : mpLastPage;
-    lFacts.mLastAsked = mLastAsked;
+    lFacts.mpPage = mAgents.readPage();
+    lFacts.mLastAsked = mAgents.getLastAsked();
     lFacts.mSpoolProblem = mSpoolProblem;
     int lErrno = mSpoolErrno;
-    if (mSpoolProblem.empty() && mpSession != nullptr) {
-        lFacts.mSpoolProblem = mpSession->getDiskProblem();
-        lErrno = mpSession->getDiskErrno();
+    if (mSpoolProblem.empty() && lpSession != nullptr) {
+        lFacts.mSpoolProblem = lpSession->getDiskProblem();
+        lErrno = lpSession->getDiskErrno();
     }
     lFacts.mIsSpoolReadOnly = !lFacts.mSpoolProblem.empty() && lErrno == EROFS;
     lFacts.mHistory = mHistory.getState();
-    lFacts.mLosses = mLosses.get(lFacts.mNow);
-    lFacts.mPorts = *mpPorts;
+    lFacts.mLosses = mAgents.getLosses(lFacts.mNow);
+    lFacts.mPorts = mPorts.getPorts();
     return toLiveStateJson(lFacts);
 }
