@@ -104,15 +104,21 @@ void ZTCSimControlSocket::listenOn(const sockaddr_un& acrAddress) {
     if (!mListener.isOpen()) {
         sRefuse(mPath, "socket", errno);
     }
-    // The socket's own mode becomes that of its file, so that there is no moment at which others may connect.
+    // The socket's own mode, less the umask, becomes that of its file. So there is no moment at which others may
+    // connect, and no mode is set by the path, where somebody may have put a link meanwhile.
     if (::fchmod(mListener.get(), 0600) != 0) {
         sRefuse(mPath, "fchmod", errno);
     }
     if (::bind(mListener.get(), reinterpret_cast<const sockaddr*>(&acrAddress), sizeof acrAddress) != 0) {
         sRefuse(mPath, "bind", errno);
     }
-    if (::chmod(mPath.c_str(), 0600) != 0 || ::lstat(mPath.c_str(), &mIdentity) != 0 ||
-        ::listen(mListener.get(), static_cast<int>(gcMaxClients)) != 0) {
+    if (::lstat(mPath.c_str(), &mIdentity) != 0) {
+        sRefuse(mPath, "lstat", errno);
+    }
+    if (!S_ISSOCK(mIdentity.st_mode)) {
+        sRefuse(mPath, "was replaced by something that is not a socket");
+    }
+    if (::listen(mListener.get(), static_cast<int>(gcMaxClients)) != 0) {
         const int lError = errno;
         ::unlink(mPath.c_str());
         sRefuse(mPath, "listen", lError);

@@ -174,9 +174,12 @@ static ZTESimExit sWait(const std::string& acrSocket, const ZTSSimWaitOptions& a
         std::string lStatus;
         try {
             if (!lClient) {
-                lClient.emplace(acrSocket);
+                lClient.emplace(acrSocket, lDeadline);
             }
             lStatus = lClient->ask("status");
+        } catch (const ZTCSimNoAnswer& lrException) {
+            std::cerr << "not reached within " << acrOptions.mTimeout << " s: " << lrException.what() << std::endl;
+            return ZTSE_Refused;
         } catch (const ZTCSimNobodyListens&) {
             lClient.reset();
             if (std::chrono::steady_clock::now() >= lDeadline) {

@@ -3,8 +3,10 @@
 #include <gtest/gtest.h>
 #include <sys/socket.h>
 #include <sys/stat.h>
+#include <unistd.h>
 
 #include <atomic>
+#include <functional>
 #include <memory>
 #include <stdexcept>
 #include <string>
@@ -20,6 +22,19 @@
 
 static std::string sEcho(std::string_view aLine) {
     return "ok <" + std::string(aLine) + ">";
+}
+
+/// Runs behind each call of bind(); empty: nothing.
+static std::function<void()> sAfterBind;
+
+extern "C" int sRealBind(int aSocket, const sockaddr* apAddress, socklen_t aSize) __asm__("__real_bind");
+extern "C" int sWrappedBind(int aSocket, const sockaddr* apAddress, socklen_t aSize) __asm__("__wrap_bind");
+int sWrappedBind(int aSocket, const sockaddr* apAddress, socklen_t aSize) {
+    const int lResult = sRealBind(aSocket, apAddress, aSize);
+    if (sAfterBind) {
+        sAfterBind();
+    }
+    return lResult;
 }
 
 /// The reason for which a socket is refused.
@@ -128,6 +143,24 @@ TEST(ControlSocket, LeavesWhatHasTakenItsPlace) {
         writeFile(lPath, "another's");
     }
     EXPECT_EQ(readFile(lPath), "another's");
+}
+
+TEST(ControlSocket, ALinkThatTakesItsPlaceWhileItIsMadeLeadsNowhere) {
+    const ZTCTemporaryDirectory lDirectory;
+    const std::string lPath = lDirectory.path("s");
+    const std::string lVictim = lDirectory.path("victim");
+    writeFile(lVictim, "another's");
+    ASSERT_EQ(::chmod(lVictim.c_str(), 0644), 0);
+    sAfterBind = [&] {
+        EXPECT_EQ(::unlink(lPath.c_str()), 0);
+        EXPECT_EQ(::symlink(lVictim.c_str(), lPath.c_str()), 0);
+    };
+    const std::string lRefusal = sRefusal(lPath);
+    sAfterBind = nullptr;
+    EXPECT_EQ(lRefusal, lPath + ": was replaced by something that is not a socket");
+    struct stat lStatus {};
+    ASSERT_EQ(::stat(lVictim.c_str(), &lStatus), 0);
+    EXPECT_EQ(lStatus.st_mode & 07777u, 0644u);
 }
 
 TEST(ControlSocket, TakesOverAStaleSocket) {

@@ -1,5 +1,6 @@
 // The tool kpm-sim as people run it.
 #include <gtest/gtest.h>
+#include <sys/socket.h>
 #include <sys/wait.h>
 
 #include <cstdio>
@@ -99,6 +100,22 @@ TEST_F(KpmSim, EndsWithOneWhenItWaitsInVain) {
     EXPECT_EQ(lResult.mOutput,
               "not reached within 0 s: ok delivered=0 dropped=0 pages=0 registered=0 adapters=2 schedule=waiting\n");
     EXPECT_EQ(lResult.mStatus, 1);
+}
+
+TEST_F(KpmSim, EndsWithOneWhenTheLibraryListensAndDoesNotAnswer) {
+    // The kernel connects clients to a socket that nobody accepts from.
+    const std::string lPath = mDirectory.path("silent");
+    const ZTCLibraryDescriptor lSilent(::socket(AF_UNIX, SOCK_STREAM | SOCK_CLOEXEC, 0));
+    const sockaddr_un lAddress = makeSimSocketAddress(lPath);
+    ASSERT_EQ(::bind(lSilent.get(), reinterpret_cast<const sockaddr*>(&lAddress), sizeof lAddress), 0);
+    ASSERT_EQ(::listen(lSilent.get(), 0), 0);
+    const ZTSToolResult lNoAnswer = sRun("--socket '" + lPath + "' wait --timeout 1");
+    EXPECT_EQ(lNoAnswer.mOutput, "not reached within 1 s: " + lPath + ": the library does not answer\n");
+    EXPECT_EQ(lNoAnswer.mStatus, 1);
+    // The connection of the first one still takes the only place.
+    const ZTSToolResult lNoPlace = sRun("--socket '" + lPath + "' wait --timeout 1");
+    EXPECT_EQ(lNoPlace.mOutput, "not reached within 1 s: " + lPath + ": the library accepts no connection\n");
+    EXPECT_EQ(lNoPlace.mStatus, 1);
 }
 
 TEST_F(KpmSim, EndsWithTwoForWrongUse) {
