@@ -15,7 +15,8 @@
 
 namespace {
 
-constexpr ::mode_t scPidFileMode = 0644;
+// Whoever can open the file can hold its lock, and so pass a process off as an agent that runs.
+constexpr ::mode_t scPidFileMode = 0600;
 
 // Who looks whether the lock is held takes it for a moment (see sLookUp): one refusal proves nothing.
 constexpr int scLockTries = 10;
@@ -157,6 +158,9 @@ bool ZTCProcessInstanceManager::isAnInstanceRunning() {
             if (lStatus.st_uid != ::geteuid()) {
                 // Left by another user's run: what stops this process by the file goes by the owner.
                 ClibTryGive(lFile.get(), ::geteuid());
+            }
+            if ((lStatus.st_mode & 07777 & ~scPidFileMode) != 0) {
+                ClibTrySetMode(lFile.get(), scPidFileMode);
             }
             ClibFtruncate(lFile.get(), 0);
             mDescriptor = lFile.release();

@@ -130,6 +130,9 @@ void ClibFtruncate(int aDescriptor, ::off_t aSize);
 /// Gives the file to the user; false where that is not allowed.
 bool ClibTryGive(int aDescriptor, ::uid_t aUser) noexcept;
 
+/// Sets the file's permissions; false where that is not allowed.
+bool ClibTrySetMode(int aDescriptor, ::mode_t aMode) noexcept;
+
 /// Waits. Returns the number of ready descriptors, 0 after the time-out, or -EINTR; a negative time-out never ends.
 /// Throws ZTCClibPollFailedEx.
 int ClibPoll(struct pollfd* apDescriptors, unsigned aNumberOfDescriptors, int aMilliseconds);

@@ -49,7 +49,7 @@ TEST_F(ProcessInstanceManager, TheFirstProcessWritesItsIdWhenItIsMarkedAsRunning
     struct stat lStatus {};
     ASSERT_EQ(lstat(mPath.c_str(), &lStatus), 0);
     umask(lMask);
-    EXPECT_EQ(lStatus.st_mode, static_cast<mode_t>(S_IFREG | 0644));
+    EXPECT_EQ(lStatus.st_mode, static_cast<mode_t>(S_IFREG | 0600)) << "others could hold its lock";
 
     lManager->markAsRunning();
     allowLogRotation(false);
@@ -107,6 +107,17 @@ TEST_F(ProcessInstanceManager, AStalePidFileIsEmptiedAndTakenOver) {
     lManager->markAsRunning();
     allowLogRotation(false);
     EXPECT_EQ(readFile(mPath), std::to_string(getpid()) + "\n");
+}
+
+TEST_F(ProcessInstanceManager, APidFileThatOthersMayOpenIsClosedToThemWhenItIsTakenOver) {
+    writeFile(mPath, "1234567\n");
+    ASSERT_EQ(chmod(mPath.c_str(), 0666), 0);
+    const ZTCPointer<ZTCProcessInstanceManager> lManager(newManager());
+    EXPECT_FALSE(lManager->isAnInstanceRunning());
+    struct stat lStatus {};
+    ASSERT_EQ(lstat(mPath.c_str(), &lStatus), 0);
+    EXPECT_EQ(lStatus.st_mode, static_cast<mode_t>(S_IFREG | 0600));
+    lManager->exitInstanceManagement();
 }
 
 TEST_F(ProcessInstanceManager, ASecondProcessIsToldWhoRunsAndChangesNothing) {

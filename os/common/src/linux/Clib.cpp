@@ -334,6 +334,10 @@ bool ClibTryGive(int aDescriptor, ::uid_t aUser) noexcept {
     return ::fchown(aDescriptor, aUser, static_cast<::gid_t>(-1)) == 0;
 }
 
+bool ClibTrySetMode(int aDescriptor, ::mode_t aMode) noexcept {
+    return ::fchmod(aDescriptor, aMode) == 0;
+}
+
 int ClibPoll(struct pollfd* apDescriptors, unsigned aNumberOfDescriptors, int aMilliseconds) {
     const int lReady = ::poll(apDescriptors, aNumberOfDescriptors, aMilliseconds);
     if (lReady >= 0) {
