@@ -25,6 +25,7 @@ struct ZTSTopologyInitiator {
     std::optional<std::string> mSymbolicName{};
     std::optional<std::string> mModel{};
     std::optional<std::uint32_t> mFcId{};  ///< absent while the link is down
+    std::optional<ZTSFcName> mFabric{};    ///< name of the fabric; many drivers show none while the link is down
 
     bool operator==(const ZTSTopologyInitiator&) const = default;
 };

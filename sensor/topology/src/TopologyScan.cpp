@@ -138,6 +138,7 @@ static void sFindInitiators(const std::string& acrSysfs, ZTSTopology& arTopology
         arWishes.addText(lPath + "port_state", lrPort.mState);
         arWishes.addText(lPath + "speed", lrPort.mSpeed);
         arWishes.addText(lPath + "symbolic_name", lrPort.mSymbolicName);
+        arWishes.addName(lPath + "fabric_name", lrPort.mFabric);
         arWishes.addText(lPath + "model", lrPort.mModel);
         arWishes.addFcId(lPath + "port_id", lrPort.mFcId);
     }

@@ -50,6 +50,7 @@ void ZTCFakeSysfs::addHost(unsigned aHost) const {
     const std::string lFolder = sHostPath(aHost) + "/fc_host/host" + std::to_string(aHost);
     write(lFolder + "/port_name", initiatorName(aHost));
     write(lFolder + "/node_name", sHex(0x2000000000000000 + aHost));
+    write(lFolder + "/fabric_name", sHex(gcFabric));
     write(lFolder + "/port_state", "Online");
     write(lFolder + "/speed", "16 Gbit");
     write(lFolder + "/symbolic_name", "port " + std::to_string(aHost));

@@ -8,6 +8,9 @@
 #include "sensor/topology/include/TopologyScan.h"
 #include "tests/support/TemporaryDirectory.h"
 
+/// The fabric of every host that is added.
+inline constexpr std::uint64_t gcFabric = 0x100000051e000001;
+
 class ZTCFakeSysfs {
 public:
     ZTSTopologyRoots roots() const;

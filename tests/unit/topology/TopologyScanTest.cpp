@@ -41,6 +41,8 @@ TEST(TopologyScan, LeadsFromAnInitiatorToTheMountOfItsDisk) {
     EXPECT_EQ(lrInitiator.mWwnn.value().toText(), "20:00:00:00:00:00:00:07");
     EXPECT_EQ(lrInitiator.mState, "Online");
     EXPECT_EQ(lrInitiator.mSpeed, "16 Gbit");
+    ASSERT_TRUE(lrInitiator.mFabric);
+    EXPECT_EQ(lrInitiator.mFabric->toText(), "10:00:00:05:1e:00:00:01");
     EXPECT_EQ(lrInitiator.mFcId, 0x010000U);
     EXPECT_EQ(lrInitiator.mModel, std::nullopt);
 
@@ -91,11 +93,13 @@ TEST(TopologyScan, NamesOfAllOnesAndAddressesOfZeroAreAbsent) {
     lTree.addHost(1);
     lTree.write("devices/pci0/host1/fc_host/host1/port_name", "0xffffffffffffffff");
     lTree.write("devices/pci0/host1/fc_host/host1/node_name", "0x0");
+    lTree.write("devices/pci0/host1/fc_host/host1/fabric_name", "0xffffffffffffffff");
     lTree.write("devices/pci0/host1/fc_host/host1/port_id", "0x000000");
     lTree.write("devices/pci0/host1/fc_host/host1/symbolic_name", "");
     const ZTSTopologyInitiator lPort = sScan(lTree).mInitiators.at(0);
     EXPECT_EQ(lPort.mWwpn, std::nullopt);
     EXPECT_EQ(lPort.mWwnn, std::nullopt);
+    EXPECT_EQ(lPort.mFabric, std::nullopt);
     EXPECT_EQ(lPort.mFcId, std::nullopt);
     EXPECT_EQ(lPort.mSymbolicName, std::nullopt);
 }
