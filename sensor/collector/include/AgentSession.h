@@ -128,6 +128,7 @@ private:
     ZTCHistorySink& mrHistory;
     ZTSSessionSettings mSettings;
     const ZTCTime mBegin;
+    const ZTCHistoryTime mBeginTime;  ///< the same for the history
     ZTCSpoolingConversation mTalk;
     ZTCAskSchedule mSchedule;
     ZTCTargetBook mTargets;

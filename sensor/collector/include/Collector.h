@@ -40,6 +40,7 @@ public:
 private:
     void turn(ZTCTime aNow);
     void poll(ZTCTime aNow);
+    bool hasWorked() const;
     int getPollTime(ZTCTime aNow) const;
     bool isOver(ZTCTime aNow);
 

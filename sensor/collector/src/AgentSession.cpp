@@ -30,6 +30,7 @@ ZTCAgentSession::ZTCAgentSession(ZTSAgentStart aStart, ZTCSpool& arSpool, ZTCHis
       mrHistory(arHistory),
       mSettings(acrSettings),
       mBegin(aNow),
+      mBeginTime(getHistoryTime()),
       mTalk(arSpool, std::move(aDirectory)),
       mSchedule(acrSettings.mPeriod, aNow),
       mNextStep(aNow) {}
@@ -366,11 +367,13 @@ void ZTCAgentSession::end() {
     lAgent.mGeneration = mTalk.getGeneration();
     lAgent.mPagePath = mStart.mPagePath;
     lAgent.mpPage = mpPage;
-    lAgent.mFrom = lAgent.mTo = getHistoryTime();
+    lAgent.mFrom = mLastAsked.value_or(mBeginTime);
+    lAgent.mTo = getHistoryTime();
     if (mpPage != nullptr) {
         lAgent = describeEndedAgent(mpPage, mStart.mPagePath);
     } else {
-        lAgent.mIsVanished = true;
+        // One that was never told to collect has lost nothing, and neither has one that was shut down in order.
+        lAgent.mIsVanished = mIsStarted && mStop != ZTSTP_Done;
         lAgent.mReason = "the agent ended and left no page";
     }
     if (WIFSIGNALED(mWaitStatus)) {

@@ -114,14 +114,20 @@ void ZTCCollector::turn(ZTCTime aNow) {
     mControl.serve(aNow);
     tellState();
     feedOutlets(aNow);
-    if (aNow >= mKeeper.getNextLook()) {
+    if (hasWorked() && aNow >= mKeeper.getNextLook()) {
         mKeeper.sendLook(aNow);
     }
     mKeeper.flush();
 }
 
+/// A collector whose history is not open yet has not worked: it may be about to find that it must not use it.
+bool ZTCCollector::hasWorked() const {
+    const ZTSHistoryState lHistory = mHistory.getState();
+    return lHistory.mIsOpen || !lHistory.mProblem.empty();
+}
+
 int ZTCCollector::getPollTime(ZTCTime aNow) const {
-    ZTCTime lNext = mKeeper.getNextLook();
+    ZTCTime lNext = hasWorked() ? mKeeper.getNextLook() : aNow + gcLookPeriod;
     if (mIsReady) {
         lNext = std::min(lNext, mPorts.getNextScan());
     } else if (mNextSpoolTry > aNow) {

@@ -153,6 +153,7 @@ void ZTCHistoryWorker::setProblem(const std::string& acrProblem) {
 /// False: the thread is to end.
 bool ZTCHistoryWorker::openStore() {
     while (true) {
+        std::string lProblem;
         try {
             ZTSStoreLimits lLimits;
             {
@@ -160,7 +161,11 @@ bool ZTCHistoryWorker::openStore() {
                 lLimits = mLimits;
                 mHasNewLimits = false;
             }
-            mpStore = std::make_unique<ZTCStore>(mDirectory, lLimits, mReport);
+            if (mpStore == nullptr) {
+                mpStore = std::make_unique<ZTCStore>(mDirectory, lLimits, mReport);
+            } else {
+                mpStore->reopen();  // sets a damaged database aside
+            }
             mpWriter = std::make_unique<ZTCHistoryWriter>(*mpStore, mrSpool, mReport);
             beginRun();
             break;
@@ -171,11 +176,15 @@ bool ZTCHistoryWorker::openStore() {
             }
             ring();
             return false;
+        } catch (const ZTCStoreDamagedEx& lrEx) {
+            mpWriter.reset();  // the store stays: it knows that its database is damaged
+            lProblem = lrEx.what();
         } catch (const ZTCStoreEx& lrEx) {
             mpWriter.reset();
             mpStore.reset();
-            setProblem(lrEx.what());
+            lProblem = lrEx.what();
         }
+        setProblem(lProblem);
         if (!pause(scRetryPause)) {
             return false;
         }

@@ -83,8 +83,9 @@ public:
     ZTCTime getNextTime() const;
     /// Everything has ended after handleStop().
     bool isDone() const { return mIsStopping && !mAgent && !mCollector; }
-    /// 0: in order. 1: a process had to be ended by force, or did not end in order.
-    int getExitStatus() const { return mHasForced ? 1 : 0; }
+    /// 0: in order. 1: a process had to be ended by force, or did not end in order. 2: the history or the settings
+    /// cannot be used.
+    int getExitStatus() const { return mIsRefused ? 2 : mHasForced ? 1 : 0; }
 
 private:
     void startAgent(ZTCTime aNow);
@@ -98,6 +99,7 @@ private:
     void lookAtAgent(ZTCTime aNow);
     void lookAtHost(ZTCTime aNow);
     void stopAgentForNew(ZTCTime aNow);
+    void stopRefused(ZTCTime aNow);
     void pressStop(ZTCTime aNow);
     void forgetDrained();
     ZTSLinkMessage describeState(ZTCTime aNow) const;
@@ -126,6 +128,7 @@ private:
     ZTCTime mStoppedAt{};
     ZTCTime mAloneAt{};  ///< from then on an agent without a collector gets SIGTERM in a stop
     bool mHasForced = false;
+    bool mIsRefused = false;  ///< the first collector cannot use the history or the settings
 
     bool mIsReady = false;
     ZTCTime mNextPulse{};

@@ -8,15 +8,16 @@
 #include "sensor/agentcommon/include/StatusPage.h"
 
 enum ZTEKeeperRule {
-    ZTKR_NothingToWatch,   ///< agent ended: no adapters, no library, or one without events
-    ZTKR_AgentWorked,      ///< agent ended after it had worked
-    ZTKR_AgentFailed,      ///< agent ended before it had worked
-    ZTKR_AgentReplaced,    ///< agent ended because the keeper wanted a new one
-    ZTKR_CollectorWorked,  ///< collector ended after it had worked
-    ZTKR_CollectorFailed,  ///< collector ended before it had worked
-    ZTKR_AgentStill,       ///< no heartbeat
-    ZTKR_AgentSilent,      ///< no answer
-    ZTKR_CollectorStill,   ///< no look
+    ZTKR_NothingToWatch,    ///< agent ended: no adapters, no library, or one without events
+    ZTKR_AgentWorked,       ///< agent ended after it had worked
+    ZTKR_AgentFailed,       ///< agent ended before it had worked
+    ZTKR_AgentReplaced,     ///< agent ended because the keeper wanted a new one
+    ZTKR_CollectorWorked,   ///< collector ended after it had worked
+    ZTKR_CollectorFailed,   ///< collector ended before it had worked
+    ZTKR_CollectorRefused,  ///< the first collector cannot use the history or the settings
+    ZTKR_AgentStill,        ///< no heartbeat
+    ZTKR_AgentSilent,       ///< no answer
+    ZTKR_CollectorStill,    ///< no look
     ZTKR_NewAdapter,
     ZTKR_Stranger,  ///< an agent that this keeper has not started
     ZTKR_Stop

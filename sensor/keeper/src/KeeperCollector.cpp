@@ -10,6 +10,8 @@ using std::chrono::seconds;
 
 /// A collector that migrates a large history needs its time before its first look.
 static constexpr seconds scFirstLookLimit{600};
+/// With it a collector says that another try changes nothing.
+static constexpr int scRefusedStatus = 2;
 /// For an agent that was shut down to end, before it gets SIGTERM.
 static constexpr seconds scAlonePause{5};
 
@@ -62,10 +64,13 @@ void ZTCKeeper::handleCollectorEnd(ZTCTime aNow, int aWaitStatus) {
     }
     const bool lHasWorked = mCollector->mHasWorked;
     const bool lIsInOrder = mCollector->mIsFinishing && WIFEXITED(aWaitStatus) && WEXITSTATUS(aWaitStatus) == 0;
+    const bool lIsRefused = WIFEXITED(aWaitStatus) && WEXITSTATUS(aWaitStatus) == scRefusedStatus;
     mCollector.reset();
     mAloneAt = aNow + scAlonePause;
     forgetDrained();
-    if (mIsStopping) {
+    if (lIsRefused && !mIsReady && !mIsRefused) {
+        stopRefused(aNow);
+    } else if (mIsStopping) {
         if (!lIsInOrder && aNow - mStoppedAt < gcStopLastCollector) {
             mrWorld.say("collector: ended during the stop: " + endText(aWaitStatus) + "; started once more");
             mCollectorStartAt = aNow + (lHasWorked ? seconds(0) : mCollectorBackOff.take());
@@ -84,6 +89,19 @@ void ZTCKeeper::handleCollectorEnd(ZTCTime aNow, int aWaitStatus) {
         mCollectorStartAt = aNow + lPause;
     }
     handleTime(aNow);
+}
+
+/// No agent has been told to collect: there is nothing to take in.
+void ZTCKeeper::stopRefused(ZTCTime aNow) {
+    mrWorld.say(
+        "collector: ended: status 2: the history or the settings cannot be used, see its line: this sensor ends");
+    mIsRefused = true;
+    mIsStopping = true;
+    mStoppedAt = aNow;
+    mAloneAt = aNow;
+    mAgentStartAt.reset();
+    mCollectorStartAt.reset();
+    mrWorld.notify("STOPPING=1");
 }
 
 void ZTCKeeper::handleBrokenLink(ZTCTime aNow, const std::string& acrWhy) {

@@ -39,7 +39,7 @@ static ZTEExitStatus sRun(const std::string& acrConfigOption, bool aIsCheck) {
     }
     const ZTCFileDescriptor lSignals = openSignals();
     ZTCHostWorld lWorld(lReading, acrConfigOption);
-    return runKeeper(lWorld, lSignals) == 0 ? ZTEX_Done : ZTEX_Failed;
+    return static_cast<ZTEExitStatus>(runKeeper(lWorld, lSignals));
 }
 
 int main(int aCount, char** appArguments) {
@@ -53,7 +53,8 @@ int main(int aCount, char** appArguments) {
     lApp.add_flag("--check", lIsCheck, "Report what is wrong with the configuration file, and start nothing");
     lApp.footer(
         "SIGTERM and SIGINT stop in order, SIGHUP reads the configuration file again.\n"
-        "Exit status: 0 done, 1 failed, or another sensor runs, 2 wrong use or a bad configuration file.");
+        "Exit status: 0 done, 1 failed, or another sensor runs, 2 wrong use, a bad configuration file, or a "
+        "history of a newer version.");
     try {
         lApp.parse(aCount, appArguments);
         return sRun(lConfigOption, lIsCheck);

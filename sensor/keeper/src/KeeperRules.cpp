@@ -21,6 +21,11 @@ std::span<const ZTSKeeperRule> keeperRules() {
          "start it at once; the back-off begins anew", seconds(0), seconds(0)},
         {ZTKR_CollectorFailed, "the collector ended before that", "start it after 1 s, then 2, 4 ... 60 s", seconds(1),
          seconds(60)},
+        {ZTKR_CollectorRefused,
+         "the collector ended with status 2 (a history of a newer version, say), and none of this sensor has worked",
+         "what it cannot use is in its last line: the sensor stops, with status 2; later in a sensor's life it is "
+         "started again as after any other end",
+         seconds(0), seconds(0)},
         {ZTKR_AgentStill, "the agent's pid file has not been touched for twice its heartbeat and 5 s",
          "the agent hangs: SIGTERM, after 15 s SIGKILL", seconds(5), seconds(15)},
         {ZTKR_AgentSilent, "the collector has asked, and for 60 s no byte of an answer has come",

@@ -105,8 +105,8 @@ bool ZTCStore::endAgent(const std::string& acrGeneration, ZTCHistoryTime aFrom, 
 }
 
 bool ZTCStore::hasEnded(const std::string& acrGeneration) const {
-    mpImplementation->loadAgain();
-    return mpImplementation->mpOpen->mLedger.hasEnded(acrGeneration);
+    return mpImplementation->look("hasEnded",
+                                  [&] { return mpImplementation->mpOpen->mLedger.hasEnded(acrGeneration); });
 }
 
 bool ZTCStore::noteGap(const ZTSGap& acrGap) {
@@ -148,9 +148,10 @@ void ZTCStore::setValue(const std::string& acrName, const std::string& acrValue)
 }
 
 std::string ZTCStore::getValue(const std::string& acrName) const {
-    mpImplementation->loadAgain();
-    ZTCStatement lFind(mpImplementation->mpOpen->mDatabase, "SELECT value FROM value WHERE name = ?");
-    return lFind.query(acrName).step() ? lFind.text(0) : std::string();
+    return mpImplementation->look("getValue", [&] {
+        ZTCStatement lFind(mpImplementation->mpOpen->mDatabase, "SELECT value FROM value WHERE name = ?");
+        return lFind.query(acrName).step() ? lFind.text(0) : std::string();
+    });
 }
 
 bool ZTCStore::retireStep(ZTCHistoryTime aNow, std::chrono::steady_clock::time_point aSteadyNow) {

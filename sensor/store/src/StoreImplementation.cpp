@@ -2,6 +2,7 @@
 
 #include <algorithm>
 
+#include "sensor/store/src/DamageCheck.h"
 #include "sensor/store/src/FrameTaker.h"
 #include "sensor/store/src/Schema.h"
 #include "sensor/store/src/StoreFile.h"
@@ -19,6 +20,7 @@ static ZTCDatabase sOpenDatabase(const std::string& acrPath) {
         throw ZTCStoreNoRoomEx(acrPath + ": it can be read but not written: a read-only file system, or no rights");
     }
     refuseNewerSchema(lDatabase, getSchemaSteps());
+    checkForDamage(lDatabase);
     // auto_vacuum has an effect only before the first page is written, which the change to WAL does.
     lDatabase.execute("PRAGMA auto_vacuum = INCREMENTAL");
     lDatabase.execute("PRAGMA journal_mode = WAL");
@@ -82,9 +84,8 @@ void ZTCStore::Implementation::open() {
 void ZTCStore::Implementation::reopen() {
     mpOpen.reset();
     mIsInTransaction = false;
-    if (mIsDamaged) {
+    if (std::exchange(mIsDamaged, false)) {
         const std::string lPlace = setDamagedFileAside(mPath);
-        mIsDamaged = false;
         if (mReport) {
             mReport("history: the damaged database is now " + lPlace + ", and a new one is begun");
         }
@@ -187,11 +188,12 @@ void ZTCStore::Implementation::checkpoint() {
 }
 
 bool ZTCStore::Implementation::hasFrame(std::uint64_t aNumber) {
-    loadAgain();
-    if (aNumber + scRememberedFrames <= mpOpen->mCounter.mLastFrame) {
-        return true;
-    }
-    const bool lIsThere = mpOpen->mFindFrame.query(aNumber).step();
-    mpOpen->mFindFrame.reset();
-    return lIsThere;
+    return look("hasFrame", [&] {
+        if (aNumber + scRememberedFrames <= mpOpen->mCounter.mLastFrame) {
+            return true;
+        }
+        const bool lIsThere = mpOpen->mFindFrame.query(aNumber).step();
+        mpOpen->mFindFrame.reset();
+        return lIsThere;
+    });
 }

@@ -65,6 +65,13 @@ public:
         return watch(apName, aCall);
     }
 
+    /// Runs a question, within the present transaction or without one.
+    template <typename Call>
+    auto look(const char* apName, Call aCall) {
+        loadAgain();
+        return watch(apName, aCall);
+    }
+
     void open();
     void reopen();
     void begin();

@@ -266,6 +266,25 @@ TEST_F(AgentSessionTest, AnOrderlyEndIsNoGapOfItself) {
     EXPECT_THAT(mSpool.list(), IsEmpty());
 }
 
+TEST_F(AgentSessionTest, AnAgentThatEndedBeforeItHadAPageHasLostNothing) {
+    startSession("agent/no-page");
+    mSession->noteEnded(1 << 8, now());
+    stepUntil([this] { return mSession->isDrained(); }, "the FIFO's end");
+    ASSERT_EQ(mHistory.mEnded.size(), 1U);
+    EXPECT_FALSE(mHistory.mEnded[0].mIsVanished);
+}
+
+TEST_F(AgentSessionTest, AnAgentThatWasKilledBeforeItHadAPageIsAGapFromItsStartOn) {
+    const ZTCHistoryTime lBefore = getHistoryTime();
+    startSession("agent/no-page");
+    mSession->noteEnded(scKilled, now());
+    stepUntil([this] { return mSession->isDrained(); }, "the FIFO's end");
+    ASSERT_EQ(mHistory.mEnded.size(), 1U);
+    EXPECT_TRUE(mHistory.mEnded[0].mIsVanished);
+    EXPECT_GE(mHistory.mEnded[0].mFrom, lBefore);
+    EXPECT_LT(mHistory.mEnded[0].mFrom, mHistory.mEnded[0].mTo);
+}
+
 TEST_F(AgentSessionTest, AnAgentWithoutAPageIsAskedEveryPeriod) {
     startAgent();
     startSession("agent/no-page");

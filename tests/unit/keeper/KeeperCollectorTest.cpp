@@ -28,6 +28,32 @@ TEST_F(Keeper, ACollectorThatNeverWorksIsStartedEverMoreSeldomUpToAMinute) {
     EXPECT_EQ(waitFor("start collector"), seconds(1)) << "the back-off has begun anew";
 }
 
+TEST_F(Keeper, AFirstCollectorThatRefusesTheHistoryEndsTheSensorWithItsStatus) {
+    mDoesLook = false;
+    start();
+    collectorEnds(gcStatus2);
+    EXPECT_THAT(mWorld.take(), ElementsAre("signal 15 to agent"));
+    EXPECT_FALSE(mKeeper.isDone());
+    agentEnds(gcStatus0, ZTSE_Signal);
+    EXPECT_TRUE(mKeeper.isDone());
+    EXPECT_EQ(mKeeper.getExitStatus(), 2);
+    EXPECT_THAT(mWorld.mSaid, Contains(HasSubstr("the history or the settings cannot be used")));
+    pass(minutes(2));
+    EXPECT_THAT(mWorld.take(), Not(Contains(HasSubstr("start"))));
+}
+
+TEST_F(Keeper, ALaterCollectorThatRefusesTheHistoryIsStartedAgainAfterPauses) {
+    startWorking();
+    mDoesLook = false;
+    collectorEnds();
+    mWorld.take();
+    for (const int lPause : {1, 2, 4}) {
+        collectorEnds(gcStatus2);
+        EXPECT_EQ(waitFor("start collector"), seconds(lPause));
+    }
+    EXPECT_FALSE(mKeeper.isDone());
+}
+
 TEST_F(Keeper, ACollectorThatCompletesNoLookIsEnded) {
     startWorking();
     pass(minutes(30));

@@ -9,6 +9,7 @@
 
 inline constexpr int gcKilled = 9;  ///< wait statuses
 inline constexpr int gcStatus0 = 0;
+inline constexpr int gcStatus2 = 2 << 8;
 inline constexpr int gcStatus3 = 3 << 8;
 
 class Keeper : public testing::Test {

@@ -1,12 +1,14 @@
 // Versions of the schema, damaged databases, and files as operators see them.
 #include "sensor/store/src/Schema.h"
 
+#include <gmock/gmock.h>
 #include <sys/stat.h>
 
 #include <algorithm>
 #include <array>
 #include <filesystem>
 
+#include "sensor/store/src/DamageCheck.h"
 #include "tests/unit/store/Integrity.h"
 #include "tests/unit/store/StoreFixture.h"
 
@@ -126,6 +128,62 @@ TEST_F(SchemaTest, ADamagedDatabaseIsRenamedAndReportedAndANewOneBegun) {
     EXPECT_NE(mReports[0].find("history.damaged-"), std::string::npos) << mReports[0];
     take({makeQueueFull(gcPortA, gcBase, gcBase)});
     EXPECT_EQ(episodes().size(), 1U);
+}
+
+TEST_F(SchemaTest, DamageInTheMiddleIsFoundWhenTheDatabaseIsOpened) {
+    for (std::uint64_t i = 0; i < 200; ++i) {
+        take({makeQueueFull(gcPortA + i, gcBase, gcBase)});
+    }
+    closeStore();
+    std::string lContent = readFile(path());
+    ASSERT_GT(lContent.size(), 100000U);
+    const std::size_t lPage = lContent.size() / 4096 / 2 * 4096;
+    std::fill_n(lContent.begin() + static_cast<std::ptrdiff_t>(lPage), 4096, '\x55');
+    writeFile(path(), lContent);
+    store();
+    ASSERT_EQ(mReports.size(), 1U);
+    EXPECT_THAT(mReports[0], testing::HasSubstr("the database is damaged"));
+    EXPECT_TRUE(episodes().empty());
+    expectIntegrity(path());
+}
+
+TEST_F(SchemaTest, OfALargeDatabaseTheFirstRowOfEachTableIsReadAtItsOpening) {
+    for (std::uint64_t i = 0; i < 200; ++i) {
+        take({makeQueueFull(gcPortA + i, gcBase, gcBase)});
+    }
+    closeStore();
+    ZTCDatabase lGood(path(), ZTDA_ReadWrite);
+    EXPECT_NO_THROW(checkForDamage(lGood, 0));
+    EXPECT_NO_THROW(checkForDamage(lGood));
+    std::string lContent = readFile(path());
+    // All but the schema's pages: every table's first page.
+    std::fill(lContent.begin() + 4096 * 2, lContent.end(), '\x55');
+    writeFile(path(), lContent);
+    ZTCDatabase lBad(path(), ZTDA_ReadWrite);
+    EXPECT_THROW(checkForDamage(lBad, 0), ZTCStoreDamagedEx);
+}
+
+TEST_F(SchemaTest, DamageThatAQuestionMeetsIsSetAsideByReopening) {
+    for (std::uint64_t i = 0; i < 200; ++i) {
+        take({makeQueueFull(gcPortA + i, gcBase, gcBase)});
+    }
+    closeStore();
+    store();
+    std::string lContent = readFile(path());
+    std::fill(lContent.begin() + 4096 * 2, lContent.end(), '\x55');
+    writeFile(path(), lContent);
+    // A change by somebody else: the store reads its pages anew.
+    execute("PRAGMA user_version = " + std::to_string(getSchemaSteps().size()));
+    try {
+        for (int i = 0; i < 100; ++i) {
+            store().getValue("value " + std::to_string(i));
+            store().hasEnded("agent " + std::to_string(i));
+        }
+    } catch (const ZTCStoreDamagedEx&) {
+        store().reopen();
+    }
+    EXPECT_EQ(mReports.size(), 1U) << "the file has been set aside";
+    EXPECT_EQ(store().getValue("value"), "");
 }
 
 TEST_F(SchemaTest, DamageThatShowsLaterIsSetAsideByReopening) {
