@@ -173,7 +173,7 @@ void ZTCLinuxEngine::noteHosts() {
 
 void ZTCLinuxEngine::report() {
     const ZTCSourceReports::Moment lMoment{mWatcher.getVersion(), mWatcher.getState().getChanges(),
-                                           mMessages.getState().getChanges(), mOutcomes.getState().getChanges()};
+                                           mMessages.getState().getChanges(), mOutcomes.getChanges()};
     if (!mReports.isNew(lMoment)) {
         return;
     }
@@ -200,7 +200,14 @@ ZTSSourceReport ZTCLinuxEngine::makeReport(const ZTSLinuxBoard& acrBoard, std::s
     }
     if (lSource == ZTLSO_Trace) {
         ZTSSourceReport lReport = makeSourceReport(mOutcomes.getState().get(), mOutcomes.getState().getReason());
-        if (lReport.mState == KPM_STATE_WORKING && aKind == gcLinuxCheckCondition) {
+        if (lReport.mState != KPM_STATE_WORKING) {
+            return lReport;
+        }
+        const std::string lHostProblem = mOutcomes.getHostProblem(*acrBoard.mHost);
+        if (!lHostProblem.empty()) {
+            return {KPM_STATE_FAILED, lHostProblem};
+        }
+        if (aKind == gcLinuxCheckCondition) {
             lReport.mReason = mOutcomes.getSenseProblem();
         }
         return lReport;

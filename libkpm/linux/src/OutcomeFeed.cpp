@@ -1,6 +1,8 @@
 #include "libkpm/linux/src/OutcomeFeed.h"
 
+#include <algorithm>
 #include <exception>
+#include <new>
 #include <optional>
 #include <utility>
 
@@ -41,7 +43,8 @@ void ZTCLinuxOutcomeFeed::happen(ZTEFeedHappening aHappening, const std::string&
 void ZTCLinuxOutcomeFeed::open() {
     ZTSFeedProblem lProblem;
     mpTrace = ZTCTraceInstance::open(mPlace, mrFiles, lProblem);
-    if (mpTrace != nullptr && mpTrace->watchHosts(mrWatcher.getHosts(), lProblem) != ZTTF_Set) {
+    mFilteredHosts = mrWatcher.getHosts();
+    if (mpTrace != nullptr && mpTrace->watchHosts(mFilteredHosts, lProblem) != ZTTF_Set) {
         mpTrace.reset();
     }
     if (mpTrace == nullptr) {
@@ -79,6 +82,12 @@ void ZTCLinuxOutcomeFeed::close() {
     mpTrace.reset();
     mpProbe.reset();
     mSenseProblem.clear();
+    mFilterProblem.clear();
+}
+
+std::string ZTCLinuxOutcomeFeed::getHostProblem(std::uint32_t aHost) const {
+    const bool lIsFiltered = std::binary_search(mFilteredHosts.begin(), mFilteredHosts.end(), aHost);
+    return lIsFiltered ? std::string() : mFilterProblem;
 }
 
 void ZTCLinuxOutcomeFeed::tell() const {
@@ -99,9 +108,12 @@ void ZTCLinuxOutcomeFeed::noteHosts() {
 /// Has the filter name the hosts there are. Tried again with the next look where the kernel refuses.
 void ZTCLinuxOutcomeFeed::followHosts() {
     ZTSFeedProblem lProblem;
-    switch (mpTrace->watchHosts(mrWatcher.getHosts(), lProblem)) {
+    std::vector<std::uint32_t> lHosts = mrWatcher.getHosts();
+    switch (mpTrace->watchHosts(lHosts, lProblem)) {
         case ZTTF_Set:
+            mFilteredHosts.swap(lHosts);
             if (!std::exchange(mFilterProblem, std::string()).empty()) {
+                ++mFilterChanges;
                 logLibraryLine(KPM_LOG_NOTICE, "SCSI outcomes of all FC hosts are delivered again");
             }
             if (mpProbe != nullptr) {
@@ -113,6 +125,7 @@ void ZTCLinuxOutcomeFeed::followHosts() {
             mHostsVersion = 0;
             if (lProblem.mText != mFilterProblem) {
                 mFilterProblem = lProblem.mText;
+                ++mFilterChanges;
                 logLibraryLine(KPM_LOG_WARNING, "no SCSI outcomes of FC hosts that have come since: " + mFilterProblem);
             }
             return;
@@ -224,7 +237,16 @@ void ZTCLinuxOutcomeFeed::readRecord(ZTCByteSpan aRecord, std::uint64_t aTime) {
         // What the trace itself says, where it says it, does not count while the probe is in use.
         lOutcome->mSenseKey = lOutcome->mAsc = lOutcome->mAscq = gcUnknownSense;
         readCommandTags(aRecord, lrLayout, *lOutcome);
-        mMatcher.addOutcome(*lOutcome, aTime, ZTCSenseMatcher::Clock::now());
+        bool lWaits = false;
+        try {
+            mMatcher.addOutcome(*lOutcome, aTime, ZTCSenseMatcher::Clock::now());
+            lWaits = true;
+        } catch (const std::bad_alloc&) {
+            lWaits = false;  // no memory to wait in: delivered at once, without its sense data
+        }
+        if (!lWaits) {
+            handle(*lOutcome);
+        }
     } else {
         handle(*lOutcome);
     }

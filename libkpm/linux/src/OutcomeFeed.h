@@ -58,6 +58,13 @@ public:
     /// Why check conditions come without sense data; empty where they have them, or nothing is open.
     const std::string& getSenseProblem() const { return mSenseProblem; }
 
+    /// Why outcomes of this host do not come while the feed works: it came after the last filter that the kernel took.
+    /// Empty where they come.
+    std::string getHostProblem(std::uint32_t aHost) const;
+
+    /// Counts the changes of what the three above say.
+    std::uint64_t getChanges() const { return mState.getChanges() + mFilterChanges; }
+
 private:
     enum ZTEBufferState : std::uint8_t {
         ZTBS_Waiting,
@@ -99,8 +106,10 @@ private:
     std::unique_ptr<ZTCTraceInstance> mpTrace;  // set while the state is Working
     ZTCSenseMatcher mMatcher;                   // check conditions that wait for their sense data
     std::vector<Buffer> mBuffers;
-    std::uint64_t mHostsVersion = 0;  // of the hosts that the filter names; 0: to be set
-    std::string mFilterProblem;       // as it was told last
+    std::uint64_t mHostsVersion = 0;            // of the hosts that the filter names; 0: to be set
+    std::vector<std::uint32_t> mFilteredHosts;  // that the filter in use names, in ascending order
+    std::string mFilterProblem;                 // as it was told last; empty while the filter names all hosts
+    std::uint64_t mFilterChanges = 0;
     std::string mSenseProblem;
     std::vector<std::uint8_t> mPage;
 };

@@ -11,54 +11,63 @@ static void sInsert(std::vector<Entry>& arEntries, const Entry& acrEntry) {
     arEntries.insert(lPlace, acrEntry);
 }
 
+/// So that taking needs no memory: an outcome that was accepted is handed on, whatever happens.
+void ZTCSenseMatcher::makeRoom() {
+    if (mReady.capacity() <= mHeld) {
+        mReady.clear();
+        mReady.reserve(std::max<std::size_t>(2 * mHeld, 64));
+    }
+}
+
 void ZTCSenseMatcher::addOutcome(const ZTSScsiOutcome& acrOutcome, std::uint64_t aTime, Clock::time_point aNow) {
+    makeRoom();
     sInsert(mCommands[acrOutcome].mOutcomes, {acrOutcome, aTime, aNow + scWait});
     ++mHeld;
 }
 
 void ZTCSenseMatcher::addSense(const ZTSSenseRecord& acrRecord, std::uint64_t aTime, Clock::time_point aNow) {
+    makeRoom();
     sInsert(mCommands[acrRecord.mCommand].mSenses, {acrRecord.mValues, aTime, aNow + scWait});
     ++mHeld;
 }
 
-void ZTCSenseMatcher::settle(Command& arCommand, Clock::time_point aNow, std::vector<ZTSScsiOutcome>& arReady) {
-    std::vector<Outcome> lLeft;
-    for (std::size_t lIndex = 0; lIndex < arCommand.mOutcomes.size(); ++lIndex) {
-        Outcome& lrOutcome = arCommand.mOutcomes[lIndex];
-        const bool lIsLast = lIndex + 1 == arCommand.mOutcomes.size();
+void ZTCSenseMatcher::settle(Command& arCommand, Clock::time_point aNow) noexcept {
+    std::vector<Outcome>& lrOutcomes = arCommand.mOutcomes;
+    std::size_t lLeft = 0;
+    for (std::size_t lIndex = 0; lIndex < lrOutcomes.size(); ++lIndex) {
+        Outcome& lrOutcome = lrOutcomes[lIndex];
+        const bool lIsLast = lIndex + 1 == lrOutcomes.size();
         const auto lSense =
             std::find_if(arCommand.mSenses.begin(), arCommand.mSenses.end(), [&](const Sense& acrSense) {
-                return acrSense.mTime >= lrOutcome.mTime &&
-                       (lIsLast || acrSense.mTime < arCommand.mOutcomes[lIndex + 1].mTime);
+                return acrSense.mTime >= lrOutcome.mTime && (lIsLast || acrSense.mTime < lrOutcomes[lIndex + 1].mTime);
             });
         if (lSense != arCommand.mSenses.end()) {
             lrOutcome.mOutcome.mSenseKey = lSense->mValues.mSenseKey;
             lrOutcome.mOutcome.mAsc = lSense->mValues.mAsc;
             lrOutcome.mOutcome.mAscq = lSense->mValues.mAscq;
             arCommand.mSenses.erase(lSense);
-            arReady.push_back(lrOutcome.mOutcome);
+            mReady.push_back(lrOutcome.mOutcome);
         } else if (lrOutcome.mEnd <= aNow) {
-            arReady.push_back(lrOutcome.mOutcome);
+            mReady.push_back(lrOutcome.mOutcome);
         } else {
-            lLeft.push_back(lrOutcome);
+            lrOutcomes[lLeft++] = lrOutcome;
         }
     }
-    arCommand.mOutcomes.swap(lLeft);
+    lrOutcomes.erase(lrOutcomes.begin() + static_cast<std::ptrdiff_t>(lLeft), lrOutcomes.end());
     std::erase_if(arCommand.mSenses, [aNow](const Sense& acrSense) { return acrSense.mEnd <= aNow; });
 }
 
-std::vector<ZTSScsiOutcome> ZTCSenseMatcher::take(Clock::time_point aNow) {
-    std::vector<ZTSScsiOutcome> lReady;
+const std::vector<ZTSScsiOutcome>& ZTCSenseMatcher::take(Clock::time_point aNow) noexcept {
     const Clock::time_point lUntil = mHeld > scMostHeld ? Clock::time_point::max() : aNow;
-    lReady.reserve(mHeld);
+    mReady.clear();
     mHeld = 0;
     for (auto lCommand = mCommands.begin(); lCommand != mCommands.end();) {
-        settle(lCommand->second, lUntil, lReady);
+        settle(lCommand->second, lUntil);
         const std::size_t lLeft = lCommand->second.mOutcomes.size() + lCommand->second.mSenses.size();
         mHeld += lLeft;
         lCommand = lLeft == 0 ? mCommands.erase(lCommand) : std::next(lCommand);
     }
-    return lReady;
+    return mReady;
 }
 
 std::optional<ZTCSenseMatcher::Clock::time_point> ZTCSenseMatcher::getNextTime() const {

@@ -28,16 +28,17 @@ public:
     /// With more outcomes than this, the oldest of each command do not wait any longer.
     static constexpr std::size_t scMostHeld = 16384;
 
-    /// Times of records are in one clock, that of the trace; `aNow` is when they are read.
+    /// Times of records are in one clock, that of the trace; `aNow` is when they are read. Throw std::bad_alloc, with
+    /// what was held before as it was.
     void addOutcome(const ZTSScsiOutcome& acrOutcome, std::uint64_t aTime, Clock::time_point aNow);
     void addSense(const ZTSSenseRecord& acrRecord, std::uint64_t aTime, Clock::time_point aNow);
 
     /// The outcomes that have their sense data, or have waited long enough; each once. To be called when all records
-    /// at hand were added.
-    std::vector<ZTSScsiOutcome> take(Clock::time_point aNow);
+    /// at hand were added. Allocates nothing. What it returns is good until the next call of any operation.
+    const std::vector<ZTSScsiOutcome>& take(Clock::time_point aNow) noexcept;
 
     /// All outcomes that are held, with their sense data where these have come.
-    std::vector<ZTSScsiOutcome> takeAll() { return take(Clock::time_point::max()); }
+    const std::vector<ZTSScsiOutcome>& takeAll() noexcept { return take(Clock::time_point::max()); }
 
     /// When the first outcome will have waited long enough; nothing where none waits.
     std::optional<Clock::time_point> getNextTime() const;
@@ -58,10 +59,12 @@ private:
         std::vector<Sense> mSenses;      // by time
     };
 
-    static void settle(Command& arCommand, Clock::time_point aNow, std::vector<ZTSScsiOutcome>& arReady);
+    void makeRoom();
+    void settle(Command& arCommand, Clock::time_point aNow) noexcept;
 
     std::map<ZTSCommandName, Command> mCommands;
-    std::size_t mHeld = 0;  // outcomes and sense data
+    std::size_t mHeld = 0;               // outcomes and sense data
+    std::vector<ZTSScsiOutcome> mReady;  // as taken last; has room for all that are held
 };
 
 #endif

@@ -64,7 +64,7 @@ TEST_F(LinuxEngine, SourcesThatAreRefusedAtTheStartAreTriedAgainAndTheAgentIsTol
     mKernel.sendFc({.mNumber = 1, .mCode = ZTLFC_Rscn, .mData = rscnData(3)});
     EXPECT_EQ(mRecorder.waitFor(2).back(), "0 rscn 6104000800000003");
     EXPECT_EQ(registerPort(0, portName(1), 4, 2), KPM_STATUS_SUCCESS);
-    EXPECT_EQ(mLog.countSource(0, 4, 2), 2u) << "once a change";
+    EXPECT_EQ(mLog.sources(0, 4, 2).size(), 2u) << "once a change";
 }
 
 TEST_F(LinuxEngine, AFilterThatTheKernelRefusesSwitchesTheOutcomesOffUntilItIsTaken) {
@@ -88,6 +88,12 @@ TEST_F(LinuxEngine, AFilterThatFailsOnceKeepsTheOldOneAndIsTriedAgain) {
     waitForLog("3 SCSI outcomes of all FC hosts are delivered again");
     EXPECT_EQ(mKernel.instanceFile("events/scsi/scsi_dispatch_cmd_done/filter"), makeScsiFilter({0, 1}));
     EXPECT_EQ(mLog.count("no SCSI outcomes of FC hosts"), 1u) << "said once";
+    waitUntil([&] { return mLog.sources(1, 4, 1).size() == 2; }, "the reports of the new board");
+    EXPECT_EQ(mLog.sources(1, 4, 1),
+              (ZTCTexts{"failed (the filter of the trace event scsi_dispatch_cmd_done cannot be set: Cannot allocate "
+                        "memory)",
+                        "working"}));
+    EXPECT_EQ(mLog.sources(0, 4, 1), ZTCTexts{"working"}) << "the old filter names this board's host";
     EXPECT_EQ(mLog.count("2 no SCSI outcomes: "), 0u);
     mKernel.sendDone({.mResult = 0x28});
     EXPECT_EQ(mRecorder.waitFor(2).back(), "0 queue-full 0 0");
@@ -112,7 +118,7 @@ TEST_F(LinuxEngine, EveryKindOfEveryBoardIsReportedBeforeTheFirstRegistration) {
     mpEngine->start();
     for (std::uint32_t lBoard = 0; lBoard < 2; ++lBoard) {
         for (const ZTSScopeEventKind& lrKind : gcScopeEventKinds) {
-            EXPECT_EQ(mLog.countSource(lBoard, lrKind.mDeliveredCategory, lrKind.mDeliveredSubcategory), 1u)
+            EXPECT_EQ(mLog.sources(lBoard, lrKind.mDeliveredCategory, lrKind.mDeliveredSubcategory).size(), 1u)
                 << lrKind.mpName;
         }
     }

@@ -65,7 +65,8 @@ ZTCLinuxLog::~ZTCLinuxLog() {
     setLibraryReport(nullptr, nullptr, nullptr);
 }
 
-static std::vector<std::string> sTold(std::uint32_t aBoard, std::uint32_t aCategory, std::uint32_t aSubcategory) {
+std::vector<std::string> ZTCLinuxLog::sources(std::uint32_t aBoard, std::uint32_t aCategory,
+                                              std::uint32_t aSubcategory) const {
     const std::lock_guard<std::mutex> lGuard(sLogLock);
     std::vector<std::string> lTold;
     for (const ZTSToldSource& lrSource : sSources()) {
@@ -77,12 +78,8 @@ static std::vector<std::string> sTold(std::uint32_t aBoard, std::uint32_t aCateg
 }
 
 std::string ZTCLinuxLog::source(std::uint32_t aBoard, std::uint32_t aCategory, std::uint32_t aSubcategory) const {
-    const std::vector<std::string> lTold = sTold(aBoard, aCategory, aSubcategory);
+    const std::vector<std::string> lTold = sources(aBoard, aCategory, aSubcategory);
     return lTold.empty() ? std::string() : lTold.back();
-}
-
-std::size_t ZTCLinuxLog::countSource(std::uint32_t aBoard, std::uint32_t aCategory, std::uint32_t aSubcategory) const {
-    return sTold(aBoard, aCategory, aSubcategory).size();
 }
 
 std::optional<std::uint64_t> ZTCLinuxLog::loss(const std::string& acrName) const {

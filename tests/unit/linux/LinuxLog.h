@@ -39,8 +39,8 @@ public:
     /// The last report of a kind's source on a board: "working", "no source", "no rights" or "failed", and " (REASON)"
     /// where there is one; empty where there was no report.
     std::string source(std::uint32_t aBoard, std::uint32_t aCategory, std::uint32_t aSubcategory) const;
-    /// How many reports there were of it.
-    std::size_t countSource(std::uint32_t aBoard, std::uint32_t aCategory, std::uint32_t aSubcategory) const;
+    /// All reports of it, in order.
+    std::vector<std::string> sources(std::uint32_t aBoard, std::uint32_t aCategory, std::uint32_t aSubcategory) const;
     /// The last total of a loss; nothing where it was not reported.
     std::optional<std::uint64_t> loss(const std::string& acrName) const;
 };

@@ -96,6 +96,28 @@ TEST_F(LinuxMemory, WithoutMemoryTheLibraryStillCloses) {
     EXPECT_TRUE(mKernel.instances().empty());
 }
 
+TEST_F(LinuxMemory, CheckConditionsThatWaitForTheirSenseDataAreDeliveredWhateverHappensToMemory) {
+    mKernel.mFormat = doneFormat(false);
+    mKernel.addTypes();
+    mKernel.addHost(0);
+    startWithoutLooks();  // a look forgets the port's name, and looking it up needs memory
+    mKernel.sendDone({.mResult = 2, .mDriverTag = 1, .mHasSense = false});
+    mRecorder.waitFor(1);
+    for (std::uint32_t lTag = 2; lTag < 10; ++lTag) {
+        mKernel.sendDone({.mResult = 2, .mDriverTag = lTag, .mHasSense = false});
+    }
+    sDenied = 0;
+    sIsShort = true;
+    for (std::uint32_t lTag = 10; lTag < 20; ++lTag) {
+        mKernel.sendDone({.mResult = 2, .mDriverTag = lTag, .mHasSense = false});
+    }
+    mRecorder.waitFor(19);
+    sIsShort = false;
+    EXPECT_GE(sDenied, 1u);
+    mpEngine->stop();
+    EXPECT_EQ(mRecorder.count(), 19u) << "each once";
+}
+
 TEST_F(LinuxMemory, EachSingleFailureLeavesItServingTheNextEvent) {
     mKernel.addHost(0);
     start();

@@ -101,6 +101,23 @@ TEST_F(SenseMatcher, SenseDataOfNoOutcomeAreForgotten) {
     EXPECT_EQ(take(ZTCSenseMatcher::scWait), "1:-");
 }
 
+TEST_F(SenseMatcher, TakingNeedsNoMemoryHoweverManyAreHeld) {
+    static_assert(noexcept(mMatcher.take(mNow))&& noexcept(mMatcher.takeAll()));
+    const ZTSScsiOutcome* lpFirst = nullptr;
+    for (std::uint32_t lTag = 0; lTag < 1000; ++lTag) {
+        outcome(lTag, 100);
+        outcome(lTag, 200);
+        sense(lTag, 210, lTag);
+    }
+    const std::vector<ZTSScsiOutcome>& lrSome = mMatcher.take(mNow);
+    lpFirst = lrSome.data();
+    EXPECT_EQ(lrSome.size(), 1000u);
+    EXPECT_GE(lrSome.capacity(), 2000u);
+    const std::vector<ZTSScsiOutcome>& lrRest = mMatcher.takeAll();
+    EXPECT_EQ(lrRest.size(), 1000u);
+    EXPECT_EQ(lrRest.data(), lpFirst) << "the same memory serves again";
+}
+
 TEST_F(SenseMatcher, AtTheEndAllAreHandedOnWithWhatHasCome) {
     outcome(1, 100);
     outcome(2, 100);
