@@ -9,6 +9,18 @@
 #include "sensor/collector/include/AgentSession.h"
 #include "sensor/collector/include/SpoolRecovery.h"
 
+/// What the page of an agent that another keeper had started says of its end. Where its keeper vanished, the next one
+/// ended it without a last retrieval: that is a gap, also where the agent happened to hold nothing.
+static ZTSEndedAgent sDescribe(const ZTCPagePointer& acrPage, const std::string& acrPath) {
+    ZTSEndedAgent lAgent = describeEndedAgent(acrPage, acrPath);
+    const bool lIsForced = acrPage->mEndReason == ZTSE_Signal || acrPage->mEndReason == ZTSE_SensorGone;
+    if (lIsForced && (acrPage->mIsCollecting || acrPage->mRetrievals != 0)) {
+        lAgent.mIsVanished = true;
+        lAgent.mReason = "the sensor that had started the agent ended without an orderly stop";
+    }
+    return lAgent;
+}
+
 std::vector<std::string> ZTCLeftovers::listPages() const {
     std::vector<std::string> lPaths;
     std::error_code lError;
@@ -71,7 +83,7 @@ void ZTCLeftovers::endPages(const std::string& acrCurrent) {
         // to another program by now.
         const ZTSAgentState lAgent = lookAtAgent(mAgentDirectory);
         if (lAgent.mPresence == ZTAP_None || lAgent.mPid != static_cast<long>(lpPage->mPid)) {
-            mrHistory.endAgent(describeEndedAgent(lpPage, lrPath));
+            mrHistory.endAgent(sDescribe(lpPage, lrPath));
         }
     }
 }

@@ -1,9 +1,22 @@
 #include "sensor/store/src/DamageCheck.h"
 
-#include <string>
+#include <array>
+#include <fstream>
+#include <string_view>
 #include <vector>
 
 #include "sensor/store/include/StoreErrors.h"
+
+void refuseForeignFile(const std::string& acrPath) {
+    static constexpr std::string_view scBegin("SQLite format 3\0", 16);
+    std::array<char, scBegin.size()> lBegin{};
+    std::ifstream lFile(acrPath, std::ios::binary);
+    lFile.read(lBegin.data(), static_cast<std::streamsize>(lBegin.size()));
+    const auto lCount = static_cast<std::size_t>(lFile.gcount());
+    if (lCount != 0 && std::string_view(lBegin.data(), lCount) != scBegin) {
+        throw ZTCStoreDamagedEx(acrPath + ": it does not begin as a database does");
+    }
+}
 
 static std::string sQuoted(const std::string& acrName) {
     std::string lText = "\"";

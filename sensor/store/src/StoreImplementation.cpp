@@ -15,6 +15,7 @@ static constexpr std::uint64_t scJournalBytes = 4ULL * 1024 * 1024;
 
 static ZTCDatabase sOpenDatabase(const std::string& acrPath) {
     createHistoryFile(acrPath);
+    refuseForeignFile(acrPath);
     ZTCDatabase lDatabase(acrPath, ZTDA_ReadWrite);
     if (sqlite3_db_readonly(lDatabase.handle(), "main") != 0) {
         throw ZTCStoreNoRoomEx(acrPath + ": it can be read but not written: a read-only file system, or no rights");
@@ -62,6 +63,15 @@ ZTCStore::Implementation::Implementation(const std::string& acrStateDirectory, c
                                          Report aReport)
     : mPath(getHistoryPath(acrStateDirectory)), mLimits(acrLimits), mReport(std::move(aReport)) {
     open();
+}
+
+/// Moves the journal into the database, which is then whole in one file: a copy of it, or damage to it, is seen as
+/// such.
+ZTCStore::Implementation::~Implementation() {
+    if (mpOpen != nullptr && !mIsInTransaction && !mIsDamaged) {
+        sqlite3_busy_timeout(mpOpen->mDatabase.handle(), 0);  // a reader that is at it now must not hold up the end
+        sqlite3_wal_checkpoint_v2(mpOpen->mDatabase.handle(), nullptr, SQLITE_CHECKPOINT_TRUNCATE, nullptr, nullptr);
+    }
 }
 
 void ZTCStore::Implementation::open() {

@@ -72,6 +72,10 @@ public:
         return watch(apName, aCall);
     }
 
+    ~Implementation();
+    Implementation(const Implementation&) = delete;
+    Implementation& operator=(const Implementation&) = delete;
+
     void open();
     void reopen();
     void begin();

@@ -147,6 +147,19 @@ TEST_F(SchemaTest, DamageInTheMiddleIsFoundWhenTheDatabaseIsOpened) {
     expectIntegrity(path());
 }
 
+TEST_F(SchemaTest, AFileThatIsNoDatabaseIsSetAsideAlsoWhereAJournalStandsBesideIt) {
+    take({makeQueueFull(gcPortA, gcBase, gcBase)});
+    const std::string lJournal = readFile(path() + "-wal");
+    ASSERT_GT(lJournal.size(), 4096U);
+    closeStore();
+    EXPECT_EQ(readFile(path() + "-wal"), "") << "the database is whole after a clean end";
+    writeFile(path() + "-wal", lJournal);
+    writeFile(path(), "garbage");
+    store();
+    ASSERT_EQ(mReports.size(), 1U);
+    EXPECT_TRUE(episodes().empty());
+}
+
 TEST_F(SchemaTest, OfALargeDatabaseTheFirstRowOfEachTableIsReadAtItsOpening) {
     for (std::uint64_t i = 0; i < 200; ++i) {
         take({makeQueueFull(gcPortA + i, gcBase, gcBase)});
