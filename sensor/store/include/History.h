@@ -16,6 +16,10 @@
 #include "sensor/store/include/Episode.h"
 #include "sensor/store/include/Ledger.h"
 #include "sensor/store/include/StoreErrors.h"
+#include "sensor/store/include/TopologyHistory.h"
+
+/// Versions of things that one question for changes looks at, the oldest first.
+inline constexpr std::size_t gcMostTopologyVersions = 100000;
 
 /// Which episodes or records. Several values of one field mean or; several fields mean and; an empty field means all.
 struct ZTSHistoryFilter {
@@ -102,6 +106,16 @@ public:
     std::vector<ZTSCoverage> readCoverage(std::optional<ZTCHistoryTime> aSince = std::nullopt,
                                           std::optional<ZTCHistoryTime> aUntil = std::nullopt) const;
     std::vector<ZTSRun> readRuns(std::optional<ZTCHistoryTime> aSince = std::nullopt) const;
+    // Times here are microseconds since the epoch.
+
+    /// The topology as it was at a time; absent where none was stored by then, or retention has taken it.
+    std::optional<ZTSStoredTopology> readTopology(std::int64_t aTime) const;
+    /// What changed later than `aFrom` and not later than `aTo`, by time, then thing and key. What the first scan of
+    /// all found did not appear then, so it is no change.
+    std::vector<ZTSTopologyChange> readTopologyChanges(std::int64_t aFrom, std::int64_t aTo) const;
+    /// How far counters rose in the minutes from that of `aFrom` to that of `aTo`, by minute: the oldest `aMost`.
+    std::vector<ZTSCounterSample> readCounters(std::int64_t aFrom, std::int64_t aTo, std::size_t aMost) const;
+
     /// By time.
     std::vector<ZTSMark> readMarks() const;
     ZTSRetrievalTotals readRetrievalTotals() const;

@@ -19,6 +19,7 @@
 #include "sensor/store/include/Episode.h"
 #include "sensor/store/include/Ledger.h"
 #include "sensor/store/include/StoreErrors.h"
+#include "sensor/store/include/TopologyHistory.h"
 
 /// Settings of the store. The defaults are those of the configuration.
 struct ZTSStoreLimits {
@@ -29,6 +30,9 @@ struct ZTSStoreLimits {
     std::uint32_t mStepRows = 2000;                                    ///< most rows that one step of retention deletes
     std::chrono::milliseconds mReportAfter = std::chrono::seconds(1);  ///< a longer operation is reported
 };
+
+/// Rows of the topology that one transaction writes, so that frames do not wait for a large host's first scan.
+inline constexpr std::uint32_t gcMostTopologyRows = 10000;
 
 /// What was taken in out of one frame.
 struct ZTSTakenIn {
@@ -127,6 +131,15 @@ public:
     /// What is known of a local or remote port beside its WWPN. Fields that are absent leave what is stored.
     void noteInitiator(const ZTSInitiator& acrInitiator);
     void noteRemotePort(const ZTSRemotePort& acrPort);
+
+    // ---- topology ----
+
+    /// A scan that was finished at this time (microseconds since the epoch). Only what differs from the scan before is
+    /// written. Values whose files blocked stay as they were. At most `aMostRows` rows are written: returns false where
+    /// more remain, and the same call in a later transaction goes on.
+    bool noteTopology(std::int64_t aTime, const ZTSTopology& acrTopology, std::uint32_t aMostRows = gcMostTopologyRows);
+    /// How far counters rose. Adds to what is stored of the same minute, port and counter.
+    void noteCounters(std::span<const ZTSCounterSample> aSamples);
 
     // ---- ledger, gaps, coverage ----
 

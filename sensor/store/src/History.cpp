@@ -149,7 +149,8 @@ void ZTCHistory::visitRecords(const ZTSHistoryFilter& acrFilter,
 
 std::vector<std::string> ZTCHistory::getQueries() {
     using namespace HistoryQueries;
-    return {gcEpisodeRange, gcOpenEpisodes,  gcEpisode,      gcChanges, gcChangedEpisode, gcFirstEpisodeSince,
-            gcFirstEpisode, gcLastEpisode,   gcRecords,      gcMinutes, gcDays,           gcGaps,
-            gcGapCounts,    gcEndedCoverage, gcOpenCoverage, gcRuns};
+    return {gcEpisodeRange, gcOpenEpisodes,  gcEpisode,      gcChanges,     gcChangedEpisode, gcFirstEpisodeSince,
+            gcFirstEpisode, gcLastEpisode,   gcRecords,      gcMinutes,     gcDays,           gcGaps,
+            gcGapCounts,    gcEndedCoverage, gcOpenCoverage, gcRuns,        gcScan,           gcFirstScan,
+            gcOpenThings,   gcEndedThings,   gcThingsBegun,  gcThingsEnded, gcCounters};
 }

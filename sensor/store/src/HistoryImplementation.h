@@ -47,6 +47,22 @@ inline constexpr const char* gcEndedCoverage =
     "SELECT initiator, kind, state, timeFrom, timeTo FROM coverage WHERE timeTo >= ?";
 inline constexpr const char* gcOpenCoverage =
     "SELECT initiator, kind, state, timeFrom, timeTo FROM coverage WHERE timeTo IS NULL";
+inline constexpr const char* gcScan =
+    "SELECT timeTo, blocked FROM scan WHERE timeFrom <= ? ORDER BY timeFrom DESC LIMIT 1";
+inline constexpr const char* gcFirstScan = "SELECT min(timeFrom) FROM scan";
+#define ZT_THING_COLUMNS "id, thing, key, body, timeFrom, timeTo"
+inline constexpr const char* gcOpenThings =
+    "SELECT " ZT_THING_COLUMNS " FROM topology WHERE timeTo IS NULL AND timeFrom <= ?1";
+inline constexpr const char* gcEndedThings =
+    "SELECT " ZT_THING_COLUMNS " FROM topology WHERE timeTo > ?1 AND timeFrom <= ?1";
+inline constexpr const char* gcThingsBegun =
+    "SELECT " ZT_THING_COLUMNS " FROM topology WHERE timeFrom > ? AND timeFrom <= ? ORDER BY timeFrom LIMIT ?";
+inline constexpr const char* gcThingsEnded =
+    "SELECT " ZT_THING_COLUMNS " FROM topology WHERE timeTo > ? AND timeTo <= ? ORDER BY timeTo LIMIT ?";
+#undef ZT_THING_COLUMNS
+inline constexpr const char* gcCounters =
+    "SELECT p.slot, p.initiator, p.port, n.name, p.difference FROM portCounter p "
+    "CROSS JOIN counterName n ON n.id = p.counter WHERE p.slot >= ? AND p.slot <= ? ORDER BY p.slot LIMIT ?";
 inline constexpr const char* gcRuns = "SELECT timeFrom, timeTo, ended FROM run WHERE timeTo >= ? ORDER BY timeTo";
 }  // namespace HistoryQueries
 

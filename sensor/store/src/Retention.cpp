@@ -33,6 +33,8 @@ std::optional<std::int64_t> ZTCRetention::findOldestDay() {
                     "LIMIT 1",
                     std::int64_t{1}),
           std::pair("SELECT slot FROM minute WHERE slot >= ? ORDER BY slot LIMIT 1", gcMinuteMicroseconds),
+          std::pair("SELECT timeTo FROM topology WHERE timeTo >= ? ORDER BY timeTo LIMIT 1", std::int64_t{1}),
+          std::pair("SELECT slot FROM portCounter WHERE slot >= ? ORDER BY slot LIMIT 1", gcMinuteMicroseconds),
           std::pair("SELECT slot FROM day WHERE slot >= ? ORDER BY slot LIMIT 1", gcDayMicroseconds)}) {
         ZTCStatement lFirst(mrDatabase, lpSql);
         if (lFirst.query(std::numeric_limits<std::int64_t>::min()).step()) {
@@ -137,7 +139,7 @@ void ZTCRetention::deleteSlots(const char* apSelect, const char* apDelete, std::
     }
 }
 
-/// Counts, coverage, runs and gaps that ended before that time, which begins a day.
+/// Counts, counters, coverage, runs, gaps and what the topology was, that ended before that time, which begins a day.
 void ZTCRetention::deleteOlder(std::int64_t aBefore) {
     deleteSlots("SELECT slot, initiator, kind, port FROM minute WHERE slot < ? ORDER BY slot LIMIT ?",
                 "DELETE FROM minute WHERE slot = ? AND initiator = ? AND kind = ? AND port = ?",
@@ -145,10 +147,16 @@ void ZTCRetention::deleteOlder(std::int64_t aBefore) {
     deleteSlots("SELECT slot, initiator, kind, port FROM day WHERE slot < ? ORDER BY slot LIMIT ?",
                 "DELETE FROM day WHERE slot = ? AND initiator = ? AND kind = ? AND port = ?",
                 getSlot(aBefore, gcDayMicroseconds));
+    deleteSlots("SELECT slot, initiator, port, counter FROM portCounter WHERE slot < ? ORDER BY slot LIMIT ?",
+                "DELETE FROM portCounter WHERE slot = ? AND initiator = ? AND port = ? AND counter = ?",
+                getSlot(aBefore, gcMinuteMicroseconds));
     for (const char* const lpSql :
          {"DELETE FROM coverage WHERE id IN (SELECT id FROM coverage WHERE timeTo < ? LIMIT ?)",
           "DELETE FROM run WHERE id IN (SELECT id FROM run WHERE timeTo < ? AND id < (SELECT max(id) FROM run) LIMIT "
           "?)",
+          "DELETE FROM topology WHERE id IN (SELECT id FROM topology WHERE timeTo < ? LIMIT ?)",
+          "DELETE FROM scan WHERE id IN (SELECT id FROM scan WHERE timeTo < ? AND id < (SELECT max(id) FROM scan) "
+          "LIMIT ?)",
           "DELETE FROM gapCount WHERE (gap, initiator, kind) IN (SELECT c.gap, c.initiator, c.kind FROM gap g "
           "JOIN gapCount c ON c.gap = g.seq WHERE g.timeTo < ? LIMIT ?)",
           "DELETE FROM gap WHERE seq IN (SELECT seq FROM gap WHERE timeTo < ? AND "

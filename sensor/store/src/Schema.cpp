@@ -83,8 +83,26 @@ CREATE TABLE mark(name TEXT PRIMARY KEY, time INTEGER NOT NULL) WITHOUT ROWID;
 CREATE TABLE value(name TEXT PRIMARY KEY, value TEXT NOT NULL) WITHOUT ROWID;
 )sql";
 
+/// `thing` is a ZTETopologyThing; `body` is described in ThingBody.h. An interval without an end is open. `scan` has a
+/// row for each stretch of scans that lie close together and had the same files blocked, one a line. `portCounter` has
+/// slots as `minute`.
+static constexpr const char* scTopologyVersion = R"sql(
+CREATE TABLE topology(
+    id INTEGER PRIMARY KEY, thing INTEGER NOT NULL, key TEXT NOT NULL, body BLOB NOT NULL, timeFrom INTEGER NOT NULL,
+    timeTo INTEGER);
+CREATE INDEX topology_to ON topology(timeTo, timeFrom);
+CREATE INDEX topology_from ON topology(timeFrom);
+CREATE TABLE scan(id INTEGER PRIMARY KEY, timeFrom INTEGER NOT NULL, timeTo INTEGER NOT NULL, blocked TEXT NOT NULL);
+CREATE INDEX scan_from ON scan(timeFrom);
+CREATE INDEX scan_to ON scan(timeTo);
+CREATE TABLE counterName(id INTEGER PRIMARY KEY, name TEXT NOT NULL UNIQUE);
+CREATE TABLE portCounter(
+    slot INTEGER NOT NULL, initiator INTEGER NOT NULL, port INTEGER NOT NULL, counter INTEGER NOT NULL,
+    difference INTEGER NOT NULL, PRIMARY KEY (slot, initiator, port, counter)) WITHOUT ROWID;
+)sql";
+
 ZTCSchemaSteps getSchemaSteps() {
-    static constexpr std::array scSteps = {scFirstVersion};
+    static constexpr std::array scSteps = {scFirstVersion, scTopologyVersion};
     return scSteps;
 }
 

@@ -92,6 +92,15 @@ void ZTCStore::noteRemotePort(const ZTSRemotePort& acrPort) {
     });
 }
 
+bool ZTCStore::noteTopology(std::int64_t aTime, const ZTSTopology& acrTopology, std::uint32_t aMostRows) {
+    return mpImplementation->change(
+        "noteTopology", [&] { return mpImplementation->mpOpen->mTopology.note(aTime, acrTopology, aMostRows); });
+}
+
+void ZTCStore::noteCounters(std::span<const ZTSCounterSample> aSamples) {
+    mpImplementation->change("noteCounters", [&] { mpImplementation->mpOpen->mPortCounters.note(aSamples); });
+}
+
 void ZTCStore::noteLedger(const std::string& acrGeneration, std::span<const ZTSPageCounts> aCounts) {
     mpImplementation->change("noteLedger", [&] { mpImplementation->mpOpen->mLedger.note(acrGeneration, aCounts); });
 }

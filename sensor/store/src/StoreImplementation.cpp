@@ -47,6 +47,8 @@ void ZTSOpenStore::load() {
     mCounts.clear();
     mLedger.clear();
     mCoverage.load();
+    mTopology.clear();
+    mPortCounters.clear();
 }
 
 void ZTSOpenStore::flush() {

@@ -13,11 +13,13 @@
 #include "sensor/store/include/Store.h"
 #include "sensor/store/src/CountBook.h"
 #include "sensor/store/src/Counter.h"
+#include "sensor/store/src/CounterBook.h"
 #include "sensor/store/src/CoverageBook.h"
 #include "sensor/store/src/EpisodeBook.h"
 #include "sensor/store/src/LedgerBook.h"
 #include "sensor/store/src/NameTable.h"
 #include "sensor/store/src/Retention.h"
+#include "sensor/store/src/TopologyBook.h"
 
 /// Everything that is tied to one open database.
 struct ZTSOpenStore {
@@ -34,6 +36,8 @@ struct ZTSOpenStore {
     ZTCCountBook mCounts{mDatabase};
     ZTCLedgerBook mLedger{mDatabase, mCounter, mNames};
     ZTCCoverageBook mCoverage{mDatabase, mNames};
+    ZTCTopologyBook mTopology{mDatabase};
+    ZTCCounterBook mPortCounters{mDatabase, mNames};
     ZTCRetention mRetention{mDatabase};
     ZTCStatement mFindFrame{mDatabase, "SELECT 1 FROM frame WHERE number = ?"};
     ZTCStatement mInsertFrame{mDatabase,

@@ -16,6 +16,9 @@
 /// Most bytes that are read of a file.
 inline constexpr std::size_t gcMostAttributeBytes = 4096;
 
+/// Files that may block at once. With so many, the rest of a call is not read.
+inline constexpr std::size_t gcMostBlockedFiles = 32;
+
 class ZTCPatientReader {
 public:
     /// @param aPatience  longest wait for one file

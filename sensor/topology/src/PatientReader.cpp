@@ -10,9 +10,6 @@
 #include <set>
 #include <thread>
 
-/// Threads that are left behind at most. With so many, nothing more is read until one comes back.
-static constexpr std::size_t scMostBlocked = 32;
-
 /// The files that have not answered. Shared with the threads that wait for them, which may outlive the reader.
 struct ZTCPatientReader::ZTSBlocked {
     mutable std::mutex mMutex;
@@ -111,7 +108,7 @@ std::vector<std::optional<std::string>> ZTCPatientReader::readAll(std::vector<st
         const unsigned lReader = ++lpReading->mReader;
         ++lpReading->mNext;
         lpReading->mSince = std::chrono::steady_clock::now();
-        if (lBlockedCount >= scMostBlocked) {
+        if (lBlockedCount >= gcMostBlockedFiles) {
             break;
         }
         std::thread(lRead, lReader).detach();

@@ -81,7 +81,7 @@ TEST_F(SchemaTest, ANewerSchemaIsRefusedAndTheFileStaysAsItIs) {
     lMustRefuse([&] { store(); });
     lMustRefuse([&] { const ZTCHistory lHistory(mDirectory.path()); });
     EXPECT_TRUE(mReports.empty());
-    execute("PRAGMA user_version = 1");
+    execute("PRAGMA user_version = " + std::to_string(getSchemaSteps().size()));
     EXPECT_EQ(episodes().size(), 1U);
 }
 

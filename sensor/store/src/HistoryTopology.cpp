@@ -1,0 +1,193 @@
+#include <algorithm>
+#include <limits>
+#include <map>
+#include <set>
+
+#include "sensor/store/src/CountBook.h"
+#include "sensor/store/src/HistoryImplementation.h"
+#include "sensor/store/src/ThingBody.h"
+
+/// A version of a thing, as a row of the table holds it.
+struct ZTSThingRow {
+    std::int64_t mId = 0;
+    ZTSThing mThing;
+    std::int64_t mFrom = 0;
+    std::optional<std::int64_t> mTo;
+};
+
+static ZTSThingRow sReadRow(const ZTCStatement& acrRow) {
+    const std::span<const std::uint8_t> lBody = acrRow.blob(3);
+    return {.mId = acrRow.number(0),
+            .mThing = {.mThing = static_cast<ZTETopologyThing>(acrRow.number(1)),
+                       .mKey = acrRow.text(2),
+                       .mBody = ZTCStoreBytes(lBody.begin(), lBody.end())},
+            .mFrom = acrRow.number(4),
+            .mTo = acrRow.isNull(5) ? std::nullopt : std::optional(acrRow.number(5))};
+}
+
+static std::vector<std::string> sLines(const std::string& acrText) {
+    std::vector<std::string> lLines;
+    for (std::size_t lBegin = 0, lEnd; (lEnd = acrText.find('\n', lBegin)) != std::string::npos; lBegin = lEnd + 1) {
+        lLines.push_back(acrText.substr(lBegin, lEnd - lBegin));
+    }
+    return lLines;
+}
+
+std::optional<ZTSStoredTopology> ZTCHistory::readTopology(std::int64_t aTime) const {
+    ZTCDatabase& lrDatabase = mpImplementation->mDatabase;
+    ZTSStoredTopology lStored;
+    // One transaction for all, so that a thing that changes meanwhile is seen exactly once.
+    lrDatabase.execute("BEGIN");
+    try {
+        ZTCStatement lScan(lrDatabase, HistoryQueries::gcScan);
+        if (!lScan.query(aTime).step()) {
+            lScan.reset();
+            lrDatabase.execute("COMMIT");
+            return std::nullopt;
+        }
+        lStored.mScanned = std::min(lScan.number(0), aTime);
+        lStored.mTopology.mBlocked = sLines(lScan.text(1));
+        lStored.mIsStale = !lStored.mTopology.mBlocked.empty();
+        lScan.reset();
+        for (const char* const lpSql : {HistoryQueries::gcOpenThings, HistoryQueries::gcEndedThings}) {
+            ZTCStatement lRows(lrDatabase, lpSql);
+            lRows.query(aTime);
+            while (lRows.step()) {
+                addThing(lStored.mTopology, static_cast<ZTETopologyThing>(lRows.number(1)), lRows.text(2),
+                         lRows.blob(3));
+            }
+        }
+        lrDatabase.execute("COMMIT");
+    } catch (...) {
+        lrDatabase.rollBack();
+        throw;
+    }
+    sortTopology(lStored.mTopology);
+    return lStored;
+}
+
+/// As changes show lists: the database has line breaks.
+static std::string sShown(std::string aText) {
+    for (std::size_t lAt = 0; (lAt = aText.find('\n', lAt)) != std::string::npos; lAt += 2) {
+        aText.replace(lAt, 1, ", ");
+    }
+    return aText;
+}
+
+/// What differs between two versions of a thing.
+static void sCompare(const ZTSThingRow& acrBefore, const ZTSThingRow& acrAfter,
+                     std::vector<ZTSTopologyChange>& arChanges) {
+    const ZTCThingValues lBefore = readValues(acrBefore.mThing.mBody);
+    const ZTCThingValues lAfter = readValues(acrAfter.mThing.mBody);
+    std::set<std::uint64_t> lAttributes;
+    for (const ZTCThingValues* const lpValues : {&lBefore, &lAfter}) {
+        for (const auto& [lAttribute, lrText] : *lpValues) {
+            lAttributes.insert(lAttribute);
+        }
+    }
+    const auto lFind = [](const ZTCThingValues& acrValues, std::uint64_t aAttribute) {
+        const auto lFound = acrValues.find(aAttribute);
+        return lFound == acrValues.end() ? std::nullopt : std::optional(sShown(lFound->second));
+    };
+    for (const std::uint64_t lAttribute : lAttributes) {
+        ZTSTopologyChange lChange{.mTime = acrAfter.mFrom,
+                                  .mThing = acrAfter.mThing.mThing,
+                                  .mKey = acrAfter.mThing.mKey,
+                                  .mAttribute = getAttributeName(lAttribute),
+                                  .mBefore = lFind(lBefore, lAttribute),
+                                  .mAfter = lFind(lAfter, lAttribute)};
+        if (lChange.mBefore != lChange.mAfter && !lChange.mAttribute.empty()) {
+            arChanges.push_back(std::move(lChange));
+        }
+    }
+}
+
+std::vector<ZTSTopologyChange> ZTCHistory::readTopologyChanges(std::int64_t aFrom, std::int64_t aTo) const {
+    ZTCDatabase& lrDatabase = mpImplementation->mDatabase;
+    // What the very first scan found was there before.
+    ZTCStatement lFirstScan(lrDatabase, HistoryQueries::gcFirstScan);
+    const std::int64_t lFirst = lFirstScan.query().step() ? lFirstScan.number(0) : 0;
+    lFirstScan.reset();
+
+    // By thing and begin: two versions, one of which begins when the other ends, stand side by side.
+    std::map<std::pair<ZTETopologyThing, std::string>, std::map<std::int64_t, ZTSThingRow>> lThings;
+    lrDatabase.execute("BEGIN");
+    try {
+        for (const char* const lpSql : {HistoryQueries::gcThingsBegun, HistoryQueries::gcThingsEnded}) {
+            ZTCStatement lRows(lrDatabase, lpSql);
+            lRows.query(aFrom, aTo, gcMostTopologyVersions);
+            while (lRows.step()) {
+                ZTSThingRow lRow = sReadRow(lRows);
+                const std::int64_t lFrom = lRow.mFrom;
+                auto& lrVersions = lThings[{lRow.mThing.mThing, lRow.mThing.mKey}];
+                // Two of one begin: the earlier row lasted for no time, since the clock was set back.
+                const auto lKnown = lrVersions.find(lFrom);
+                if (lKnown == lrVersions.end() || lKnown->second.mId < lRow.mId) {
+                    lrVersions.insert_or_assign(lFrom, std::move(lRow));
+                }
+            }
+        }
+        lrDatabase.execute("COMMIT");
+    } catch (...) {
+        lrDatabase.rollBack();
+        throw;
+    }
+
+    const auto lIsWithin = [&](std::int64_t aTime) { return aTime > aFrom && aTime <= aTo; };
+    std::vector<ZTSTopologyChange> lChanges;
+    for (const auto& [lrKey, lrVersions] : lThings) {
+        const ZTSThingRow* lpBefore = nullptr;
+        const auto lVanish = [&](const ZTSThingRow& acrRow) {
+            if (acrRow.mTo && lIsWithin(*acrRow.mTo)) {
+                lChanges.push_back({.mTime = *acrRow.mTo,
+                                    .mThing = lrKey.first,
+                                    .mKey = lrKey.second,
+                                    .mAttribute = {},
+                                    .mBefore = std::string(),
+                                    .mAfter = std::nullopt});
+            }
+        };
+        for (const auto& [lFrom, lrRow] : lrVersions) {
+            if (lpBefore != nullptr && lpBefore->mTo == lFrom) {
+                sCompare(*lpBefore, lrRow, lChanges);
+            } else {
+                if (lpBefore != nullptr) {
+                    lVanish(*lpBefore);
+                }
+                if (lIsWithin(lFrom) && lFrom != lFirst) {
+                    lChanges.push_back({.mTime = lFrom,
+                                        .mThing = lrKey.first,
+                                        .mKey = lrKey.second,
+                                        .mAttribute = {},
+                                        .mBefore = std::nullopt,
+                                        .mAfter = std::string()});
+                }
+            }
+            lpBefore = &lrRow;
+        }
+        lVanish(*lpBefore);
+    }
+    std::ranges::stable_sort(lChanges, {}, &ZTSTopologyChange::mTime);
+    return lChanges;
+}
+
+std::vector<ZTSCounterSample> ZTCHistory::readCounters(std::int64_t aFrom, std::int64_t aTo, std::size_t aMost) const {
+    mpImplementation->loadNames();
+    std::vector<ZTSCounterSample> lSamples;
+    ZTCStatement lRows(mpImplementation->mDatabase, HistoryQueries::gcCounters);
+    lRows.query(getSlot(aFrom, gcMinuteMicroseconds), getSlot(aTo, gcMinuteMicroseconds), aMost);
+    while (lRows.step()) {
+        const std::optional<ZTSFcName>& lrInitiator =
+            mpImplementation->getInitiator(lRows.number<std::uint32_t>(1)).mWwpn;
+        if (!lrInitiator) {
+            continue;
+        }
+        const std::optional<ZTSRemotePort> lPort = mpImplementation->getPort(lRows.number<std::uint32_t>(2));
+        lSamples.push_back({.mMinute = lRows.number(0) * gcMinuteMicroseconds,
+                            .mInitiator = *lrInitiator,
+                            .mRemotePort = lPort ? std::optional(lPort->mWwpn) : std::nullopt,
+                            .mCounter = lRows.text(3),
+                            .mDifference = lRows.number<std::uint64_t>(4)});
+    }
+    return lSamples;
+}
