@@ -7,25 +7,25 @@
 
 #include "common/include/Log.h"
 
-/// Ends the process through exit(1). Where several threads come here, one runs exit and the others wait for the end; a
-/// thread that comes here out of its own exit ends the process at once.
-[[noreturn]] void exitOnFailedAssertion() noexcept;
+/// Logs that the assertion of this text failed, and ends the process through exit(1). Where several threads come here,
+/// one runs exit and the others wait for the end; a thread that comes here out of its own exit ends the process at
+/// once. Its calls are kept out of the way of the code around them.
+[[noreturn, gnu::cold]] void failAssertion(unsigned aLine, const char* apFunction, const char* apFile,
+                                           const char* apText) noexcept;
 
-#define ZT_ASSERT_IMPL(aCondition, aText)                    \
-    do {                                                     \
-        if (!(aCondition)) [[unlikely]] {                    \
-            ZT_LOG_HALT("Assertion [ %s ] failed\n", aText); \
-            exitOnFailedAssertion();                         \
-        }                                                    \
+#define ZT_ASSERT_IMPL(aCondition, aText)                            \
+    do {                                                             \
+        if (!(aCondition)) [[unlikely]] {                            \
+            failAssertion(__LINE__, __func__, ZT_FILE_LABEL, aText); \
+        }                                                            \
     } while (false)
 
-#define ZT_ASSERT_MSG_IMPL(aCondition, aText, ...)           \
-    do {                                                     \
-        if (!(aCondition)) [[unlikely]] {                    \
-            ZT_LOG_HALT(__VA_ARGS__);                        \
-            ZT_LOG_HALT("Assertion [ %s ] failed\n", aText); \
-            exitOnFailedAssertion();                         \
-        }                                                    \
+#define ZT_ASSERT_MSG_IMPL(aCondition, aText, ...)                   \
+    do {                                                             \
+        if (!(aCondition)) [[unlikely]] {                            \
+            ZT_LOG_HALT(__VA_ARGS__);                                \
+            failAssertion(__LINE__, __func__, ZT_FILE_LABEL, aText); \
+        }                                                            \
     } while (false)
 
 #define ZT_ASSERT(aCondition) ZT_ASSERT_IMPL(aCondition, #aCondition)

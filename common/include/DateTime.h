@@ -43,7 +43,14 @@ public:
 
 private:
     /// Everything but the local fields.
-    ZTCDateTime(const std::timespec& acrTime, const char* apSeparator, std::nullptr_t) noexcept;
+    ZTCDateTime(const std::timespec& acrTime, const char* apSeparator, std::nullptr_t) noexcept
+        : mMilliSeconds(static_cast<std::uint16_t>(acrTime.tv_nsec / 1000000)),
+          mMicroSeconds(static_cast<std::uint16_t>(acrTime.tv_nsec / 1000 % 1000)),
+          mSecondsSinceEpoch(static_cast<std::uint64_t>(acrTime.tv_sec)) {
+        if (apSeparator != nullptr && apSeparator[0] != '\0') {
+            mSeparator = apSeparator[0];
+        }
+    }
     void setLocalFields(const std::tm& acrLocal) noexcept;
 
     /// Bytes of the local fields, which stand first and without gaps.

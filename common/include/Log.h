@@ -79,6 +79,11 @@ void setLogFileBound(std::uint64_t aBytes) noexcept;
 void printLogMessageFromText(unsigned aLevel, const char* apMark, unsigned aLine, const char* apFunction,
                              const char* apFile, const char* apText) noexcept;
 
+/// Writes one line at debug level, if the level is enabled. The text is taken as it stands. Its calls are kept out of
+/// the way of the code around them.
+[[gnu::cold]] void printTraceLine(unsigned aLine, const char* apFunction, const char* apFile,
+                                  const char* apText) noexcept;
+
 // The arguments behind the level are evaluated only where the level is enabled. Each macro is one statement.
 
 #define ZT_LOG(aLevel, aMark, ...)                                                                       \
@@ -106,11 +111,11 @@ void printLogMessageFromText(unsigned aLevel, const char* apMark, unsigned aLine
 
 // Every function of the agent has these two, the path of an event included: where tracing is off, which is nearly
 // always, they cost one load and one branch that is not taken.
-#define ZT_TRACE_LINE(aText)                                                                                   \
-    do {                                                                                                       \
-        if (isLogLevelEnabled(ZTLL_Debug)) [[unlikely]] {                                                      \
-            PrintLogMessageWithTimeStamp(ZTLL_Debug, "-T-", __LINE__, __func__, ZT_FILE_LABEL, "%s", (aText)); \
-        }                                                                                                      \
+#define ZT_TRACE_LINE(aText)                                          \
+    do {                                                              \
+        if (isLogLevelEnabled(ZTLL_Debug)) [[unlikely]] {             \
+            printTraceLine(__LINE__, __func__, ZT_FILE_LABEL, aText); \
+        }                                                             \
     } while (false)
 
 #define ZT_ENTRY() ZT_TRACE_LINE("Entered")

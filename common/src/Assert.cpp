@@ -5,7 +5,9 @@
 #include <atomic>
 #include <cstdlib>
 
-void exitOnFailedAssertion() noexcept {
+void failAssertion(unsigned aLine, const char* apFunction, const char* apFile, const char* apText) noexcept {
+    PrintLogMessageWithTimeStamp(ZTLL_Halt, "-H-", aLine, apFunction, apFile, "Assertion [ %s ] failed\n", apText);
+
     static constinit std::atomic<bool> sIsExiting{false};
     static constinit thread_local bool sIsExitingHere = false;
 

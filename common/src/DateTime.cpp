@@ -51,15 +51,6 @@ ZTCDateTime::ZTCDateTime(const std::timespec& acrTime, const char* apSeparator) 
     }
 }
 
-ZTCDateTime::ZTCDateTime(const std::timespec& acrTime, const char* apSeparator, std::nullptr_t) noexcept
-    : mMilliSeconds(static_cast<std::uint16_t>(acrTime.tv_nsec / 1000000)),
-      mMicroSeconds(static_cast<std::uint16_t>(acrTime.tv_nsec / 1000 % 1000)),
-      mSecondsSinceEpoch(static_cast<std::uint64_t>(acrTime.tv_sec)) {
-    if (apSeparator != nullptr && apSeparator[0] != '\0') {
-        mSeparator = apSeparator[0];
-    }
-}
-
 void ZTCDateTime::setLocalFields(const std::tm& acrLocal) noexcept {
     mYear = static_cast<std::uint16_t>(acrLocal.tm_year + 1900);
     mMonth = static_cast<std::uint8_t>(acrLocal.tm_mon + 1);

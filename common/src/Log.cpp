@@ -81,6 +81,10 @@ void setLogFileBound(std::uint64_t aBytes) noexcept {
     sLogSink.setBound(aBytes);
 }
 
+void printTraceLine(unsigned aLine, const char* apFunction, const char* apFile, const char* apText) noexcept {
+    PrintLogMessageWithTimeStamp(ZTLL_Debug, "-T-", aLine, apFunction, apFile, "%s", apText);
+}
+
 void printLogMessageFromText(unsigned aLevel, const char* apMark, unsigned aLine, const char* apFunction,
                              const char* apFile, const char* apText) noexcept {
 #pragma GCC diagnostic push

@@ -182,7 +182,12 @@ public:
     void appendEventData(unsigned char* apData, unsigned int aLength) ZT_REQUIRES(mPrevDataLock);
 
     /// Adds an occurrence to the pending record.
-    void incrementOccurences() ZT_REQUIRES(mPrevDataLock);
+    void incrementOccurences() ZT_REQUIRES(mPrevDataLock) {
+        ZT_ENTRY();
+        mPrevScopeRecord->incrementOccurrences();
+        countOccurrence();
+        ZT_EXIT();
+    }
 
 private:
     void initStatusPage();
@@ -200,7 +205,15 @@ private:
     void destroyCommandIpc();
     void destroyOutputIpc();
     void filePrevScopeRecord() ZT_REQUIRES(mPrevDataLock);
-    void countOccurrence() noexcept ZT_REQUIRES(mPrevDataLock);
+
+    /// Counts the latest occurrence of the pending record on the page.
+    void countOccurrence() noexcept ZT_REQUIRES(mPrevDataLock) {
+        ZT_ENTRY();
+        if (mpPrevRow != nullptr) {
+            ZTCStatusPageWriter::countConsolidated(*mpPrevRow, mPrevScopeRecord->getEndTime());
+        }
+        ZT_EXIT();
+    }
 
     std::atomic<Size> mMaxScopeEventDataSize;
     [[maybe_unused]] Size mMaxTotalEventDataSize;  ///< the admission test uses gcMaxScopeDataSize

@@ -6,6 +6,7 @@
 #include <cstddef>
 #include <vector>
 
+#include "common/include/Log.h"
 #include "sensor/agentcommon/include/WorldWideName.h"
 
 /// A remote port's names.
@@ -28,7 +29,14 @@ public:
 
 private:
     /// Where the search for a key begins.
-    std::size_t getFirstSlot(unsigned long aKey) const noexcept;
+    std::size_t getFirstSlot(unsigned long aKey) const noexcept {
+        ZT_ENTRY();
+        const auto lSlot = static_cast<std::size_t>(aKey * gcHashFactor >> mShift);
+        ZT_EXIT();
+        return lSlot;
+    }
+
+    static constexpr unsigned long gcHashFactor = 0x9e3779b97f4a7c15;
 
     /// A slot whose port name is that of no port is free, so that a port of that name stands by itself. The number of
     /// slots is a power of 2, and at most two thirds of them are taken.

@@ -40,7 +40,7 @@ void sNoteIdentity(const ZTSConsolidationKind& acrKind, const ZTSPrevIdentity& a
     ZT_EXIT();
 }
 
-void sCopyFields(const ZTSFieldCopy* apFields, const unsigned char* apPayload, unsigned char* apRecord) {
+inline void sCopyFields(const ZTSFieldCopy* apFields, const unsigned char* apPayload, unsigned char* apRecord) {
     ZT_ENTRY();
     for (; apFields->mSize != 0; ++apFields) {
         unsigned char* lpTo = apRecord + apFields->mRecordOffset;
@@ -53,7 +53,7 @@ void sCopyFields(const ZTSFieldCopy* apFields, const unsigned char* apPayload, u
     ZT_EXIT();
 }
 
-void sSetBits(const ZTSConsolidationKind& acrKind, const unsigned char* apPayload, unsigned char* apRecord) {
+inline void sSetBits(const ZTSConsolidationKind& acrKind, const unsigned char* apPayload, unsigned char* apRecord) {
     ZT_ENTRY();
     for (const ZTSBitFieldCopy* lpField = acrKind.mBitFields; lpField->mFieldOffset != 0; ++lpField) {
         const unsigned int lNumber = loadUnaligned<unsigned int>(apPayload + lpField->mPayloadOffset);

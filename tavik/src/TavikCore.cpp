@@ -10,6 +10,7 @@
 #include "common/include/Exception.h"
 #include "common/include/Log.h"
 #include "common/include/Memory.h"
+#include "common/include/Unaligned.h"
 #include "libkpm/include/ScopeEventKinds.h"
 #include "os/common/include/Clib.h"
 #include "sensor/agentcommon/include/EventDataRecords.h"
@@ -278,12 +279,6 @@ constexpr auto scDispatchBySlot = [] {
 }();
 static_assert(scDispatchBySlot[gcKindSlots] == nullptr);
 
-const ZTSDispatch* sFindDispatch(unsigned char aCategory, unsigned char aSubcategory) {
-    ZT_ENTRY();
-    ZT_EXIT();
-    return scDispatchBySlot[getKindSlot(aCategory, aSubcategory)];
-}
-
 /// Makes a kind that is never destroyed: callbacks may run while the process exits.
 const ZTCPointer<ZTCScopeEvent>* sMakeKind(unsigned char aCategory, unsigned char aSubcategory) {
     ZT_ENTRY();
@@ -297,32 +292,32 @@ const ZTCPointer<ZTCScopeEvent>* sMakeKind(unsigned char aCategory, unsigned cha
     return lpKind;
 }
 
-/// The kind of an event. It never changes, so that all events and records of one pair share it, from the first event
-/// on; a pair of no slot has its kind anew each time, in arHolder. Throws ZTCNoMemoryEx.
-const ZTCPointer<ZTCScopeEvent>& sGetKind(unsigned char aCategory, unsigned char aSubcategory,
+/// The kind of an event, whose slot is given. It never changes, so that all events and records of one pair share it,
+/// from the first event on; a pair of no slot has its kind anew each time, in arHolder. Throws ZTCNoMemoryEx.
+const ZTCPointer<ZTCScopeEvent>& sGetKind(unsigned int aSlot, unsigned char aCategory, unsigned char aSubcategory,
                                           ZTCPointer<ZTCScopeEvent>& arHolder)
     ZT_REQUIRES(gpTavikSystem->getPrevDataLock()) {
     ZT_ENTRY();
     static const ZTCPointer<ZTCScopeEvent>* spKinds[gcKindSlots];
-    const unsigned int lSlot = getKindSlot(aCategory, aSubcategory);
-    if (lSlot == gcKindSlots) {
+    if (aSlot == gcKindSlots) {
         arHolder = ZTCPointer<ZTCScopeEvent>(NEW ZTCScopeEvent(aCategory, aSubcategory));
         ZT_EXIT();
         return arHolder;
     }
-    if (spKinds[lSlot] == nullptr) {
-        spKinds[lSlot] = sMakeKind(aCategory, aSubcategory);
+    if (spKinds[aSlot] == nullptr) {
+        spKinds[aSlot] = sMakeKind(aCategory, aSubcategory);
     }
     ZT_EXIT();
-    return *spKinds[lSlot];
+    return *spKinds[aSlot];
 }
 
-int sConsolidateEvents(const ZTCPointer<ZTCScopeEvent>& acrEvent, unsigned int aBoardId, const void* apData,
-                       unsigned int aLength, ZTCEventOutcome& arOutcome) ZT_REQUIRES(gpTavikSystem->getPrevDataLock()) {
+int sConsolidateEvents(unsigned int aSlot, const ZTCPointer<ZTCScopeEvent>& acrEvent, unsigned int aBoardId,
+                       const void* apData, unsigned int aLength, ZTCEventOutcome& arOutcome)
+    ZT_REQUIRES(gpTavikSystem->getPrevDataLock()) {
     ZT_ENTRY();
     const unsigned int lCategory = acrEvent->getCategory();
     const unsigned int lSubcategory = acrEvent->getSubcategory();
-    const ZTSDispatch* lpDispatch = sFindDispatch(acrEvent->getCategory(), acrEvent->getSubcategory());
+    const ZTSDispatch* lpDispatch = scDispatchBySlot[aSlot];
     const bool lIsNew = !gpTavikSystem->isPrevScopeDataSet() ||
                         gpTavikSystem->getPrevScopeData()->getCategory() != lCategory ||
                         gpTavikSystem->getPrevScopeData()->getSubcategory() != lSubcategory ||
@@ -438,9 +433,7 @@ bool sProcessRscnEvent(unsigned int aBoardId, const void* apData, unsigned int a
     const unsigned char* lpPage = lpPayload + scRscnHeaderSize;
     bool lHasRecordList = true;
     for (std::int16_t lPage = 0; lPage < lPageCount && lHasRecordList; ++lPage) {
-        unsigned int lWord;
-        ClibMemcpy(&lWord, lpPage, sizeof lWord);
-        lHasRecordList = sConsolidateRscnEvent(acrEvent, aBoardId, ClibNtohl(lWord));
+        lHasRecordList = sConsolidateRscnEvent(acrEvent, aBoardId, ClibNtohl(loadUnaligned<unsigned int>(lpPage)));
         if (lHasRecordList) {
             arOutcome.noteConsolidated();
         }
@@ -464,10 +457,11 @@ void sProcessScopeEvent(const ZTCCallbackEventData* apEventData, ZTCEventOutcome
         const ZTCPrevDataHold lHold(*gpTavikSystem);
         lHasRecordList = gpTavikSystem->isRecordListExist(lBoardId);
         if (lHasRecordList && !lIsRscn) {
+            const unsigned int lSlot = getKindSlot(lCategory, lSubcategory);
             ZTCPointer<ZTCScopeEvent> lUnknown;
             try {
-                sConsolidateEvents(sGetKind(lCategory, lSubcategory, lUnknown), lBoardId, apEventData->getEventData(),
-                                   apEventData->getEventDataLength(), arOutcome);
+                sConsolidateEvents(lSlot, sGetKind(lSlot, lCategory, lSubcategory, lUnknown), lBoardId,
+                                   apEventData->getEventData(), apEventData->getEventDataLength(), arOutcome);
             } catch (const ZTCNotFoundEx&) {  // the event's port or board is gone: there is nothing to say about it
                 arOutcome.refuse(ZTSR_Failed);
             }

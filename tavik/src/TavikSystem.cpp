@@ -33,7 +33,7 @@ constexpr char scRuntimeDir[] = "/tmp";
 constexpr int scRuntimeDirMode = 0x777;
 
 /// Who changes the total holds the lock, so that nobody comes in between; its readers without the lock need no order.
-void sAddToTotal(std::atomic<std::uint32_t>& arTotal, unsigned int aBytes) noexcept {
+inline void sAddToTotal(std::atomic<std::uint32_t>& arTotal, unsigned int aBytes) noexcept {
     ZT_ENTRY();
     arTotal.store(arTotal.load(std::memory_order_relaxed) + aBytes, std::memory_order_relaxed);
     ZT_EXIT();
@@ -560,21 +560,5 @@ void ZTCTavikSystem::appendEventData(unsigned char* apData, unsigned int aLength
         mStatusPage.setHeldBytes(getTotalEventDataSize());
     }
     mBell.noteHeld(getTotalEventDataSize());
-    ZT_EXIT();
-}
-
-void ZTCTavikSystem::incrementOccurences() {
-    ZT_ENTRY();
-    mPrevScopeRecord->incrementOccurrences();
-    countOccurrence();
-    ZT_EXIT();
-}
-
-/// Counts the latest occurrence of the pending record on the page.
-void ZTCTavikSystem::countOccurrence() noexcept {
-    ZT_ENTRY();
-    if (mpPrevRow != nullptr) {
-        ZTCStatusPageWriter::countConsolidated(*mpPrevRow, mPrevScopeRecord->getEndTime());
-    }
     ZT_EXIT();
 }

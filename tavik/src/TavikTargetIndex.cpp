@@ -10,7 +10,6 @@ namespace {
 
 constexpr std::size_t scLeastSlots = 16;
 constexpr unsigned scHashBits = 64;
-constexpr unsigned long scHashFactor = 0x9e3779b97f4a7c15;
 
 }  // namespace
 
@@ -69,11 +68,4 @@ const ZTSRemotePortNames* ZTCTavikTargetIndex::find(unsigned long aKey) const no
     }
     ZT_EXIT();
     return lpFound;
-}
-
-std::size_t ZTCTavikTargetIndex::getFirstSlot(unsigned long aKey) const noexcept {
-    ZT_ENTRY();
-    const auto lSlot = static_cast<std::size_t>(aKey * scHashFactor >> mShift);
-    ZT_EXIT();
-    return lSlot;
 }
