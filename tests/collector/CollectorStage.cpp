@@ -18,7 +18,7 @@
 
 #include "sensor/agentcommon/include/SensorAgentProtocol.h"
 #include "sensor/link/include/Inheritance.h"
-#include "tests/collector/UnixLine.h"
+#include "tests/sensor/UnixLine.h"
 
 static void sCheck(bool aIsGood, const std::string& acrWhat) {
     if (!aIsGood) {

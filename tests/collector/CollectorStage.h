@@ -15,7 +15,7 @@
 #include "sensor/client/include/FileDescriptor.h"
 #include "sensor/link/include/Link.h"
 #include "sensor/store/include/History.h"
-#include "tests/collector/HistoryCheck.h"
+#include "tests/sensor/HistoryCheck.h"
 #include "tests/support/ChildProcess.h"
 #include "tests/support/SystemCallKiller.h"
 #include "tests/support/TemporaryDirectory.h"

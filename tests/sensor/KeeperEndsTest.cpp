@@ -5,12 +5,12 @@
 #include <sys/wait.h>
 #include <unistd.h>
 
-#include "tests/sensor/SensorProcess.h"
+#include "tests/sensor/KeeperProcess.h"
 
 using testing::HasSubstr;
 
 TEST(KeeperEnds, AKilledCollectorIsReplacedAtOnceAndTheAgentStays) {
-    ZTCSensorProcess lSensor;
+    ZTCKeeperProcess lSensor;
     lSensor.startAndWait();
     const pid_t lAgent = lSensor.agentPid();
     for (std::size_t i = 1; i <= 3; ++i) {
@@ -29,7 +29,7 @@ TEST(KeeperEnds, AKilledCollectorIsReplacedAtOnceAndTheAgentStays) {
 }
 
 TEST(KeeperEnds, AKilledAgentIsReplacedAndTheCollectorHearsOfBoth) {
-    ZTCSensorProcess lSensor;
+    ZTCKeeperProcess lSensor;
     lSensor.startAndWait();
     ASSERT_EQ(kill(lSensor.agentPid(), SIGKILL), 0);
     lSensor.waitFor("StartAnswered 2");
@@ -41,7 +41,7 @@ TEST(KeeperEnds, AKilledAgentIsReplacedAndTheCollectorHearsOfBoth) {
 }
 
 TEST(KeeperEnds, AKilledKeeperTakesTheCollectorWithItAndTheNextOneReplacesTheAgent) {
-    ZTCSensorProcess lSensor;
+    ZTCKeeperProcess lSensor;
     lSensor.startAndWait();
     const pid_t lAgent = lSensor.agentPid();
     const pid_t lCollector = lSensor.collectorPid();
@@ -56,7 +56,7 @@ TEST(KeeperEnds, AKilledKeeperTakesTheCollectorWithItAndTheNextOneReplacesTheAge
 }
 
 TEST(KeeperEnds, AStoppedAgentIsTakenForHungAndKilled) {
-    ZTCSensorProcess lSensor;
+    ZTCKeeperProcess lSensor;
     lSensor.startAndWait();
     const pid_t lAgent = lSensor.agentPid();
     ASSERT_EQ(kill(lAgent, SIGSTOP), 0);
@@ -69,7 +69,7 @@ TEST(KeeperEnds, AStoppedAgentIsTakenForHungAndKilled) {
 }
 
 TEST(KeeperEnds, AnAgentThatTheCollectorCallsSilentIsReplaced) {
-    ZTCSensorProcess lSensor;
+    ZTCKeeperProcess lSensor;
     lSensor.startAndWait();
     lSensor.putFile("silent");
     lSensor.waitForMessage("the collector has waited 60 s for a byte of an answer: SIGTERM");
@@ -80,7 +80,7 @@ TEST(KeeperEnds, AnAgentThatTheCollectorCallsSilentIsReplaced) {
 }
 
 TEST(KeeperEnds, AStopWithAHungAgentEndsWithin20SecondsAndWithStatus1) {
-    ZTCSensorProcess lSensor;
+    ZTCKeeperProcess lSensor;
     lSensor.configure("agent.heartbeat = 60\n");
     writeFile(lSensor.configPath(), [&] {
         std::string lText = readFile(lSensor.configPath());
@@ -98,9 +98,9 @@ TEST(KeeperEnds, AStopWithAHungAgentEndsWithin20SecondsAndWithStatus1) {
 }
 
 TEST(KeeperEnds, ACollectorThatCannotWorkIsTriedAgainEverMoreSeldom) {
-    ZTCSensorProcess lSensor;
+    ZTCKeeperProcess lSensor;
     lSensor.putFile("die");
-    lSensor.start();
+    lSensor.launch();
     lSensor.waitForMessage("collector: ended: status 3; the next one is started in 1 s");
     lSensor.waitForMessage("collector: ended: status 3; the next one is started in 2 s");
     lSensor.waitForMessage("collector: ended: status 3; the next one is started in 4 s");
@@ -111,11 +111,11 @@ TEST(KeeperEnds, ACollectorThatCannotWorkIsTriedAgainEverMoreSeldom) {
 }
 
 TEST(KeeperEnds, AProgramThatIsNotThereIsNamedAndTriedAgain) {
-    ZTCSensorProcess lSensor;
+    ZTCKeeperProcess lSensor;
     lSensor.setEnvironment("PATH", "/nowhere");
     writeFile(lSensor.configPath(), "agent.program = \"no-such-agent\"\nsensor.directory = \"" + lSensor.path("run") +
                                         "\"\nsensor.state = \"" + lSensor.path("state") + "\"\n");
-    lSensor.start();
+    lSensor.launch();
     lSensor.waitForMessage("agent: no program no-such-agent in " + lSensor.path("sbin"));
     lSensor.waitForMessage("agent: cannot be started; the next one is started in 2 s");
     lSensor.process().sendSignal(SIGTERM);

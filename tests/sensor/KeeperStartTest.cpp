@@ -10,7 +10,7 @@
 #include <filesystem>
 
 #include "sensor/client/include/FileDescriptor.h"
-#include "tests/sensor/SensorProcess.h"
+#include "tests/sensor/KeeperProcess.h"
 
 using testing::AllOf;
 using testing::Each;
@@ -39,7 +39,7 @@ static std::string sEnvironment(pid_t aPid) {
 }
 
 TEST(KeeperStart, MakesItsFilesWithTheirModesAndStopsInOrder) {
-    ZTCSensorProcess lSensor;
+    ZTCKeeperProcess lSensor;
     lSensor.startAndWait();
     EXPECT_EQ(sMode(lSensor.agentFolder()), 0700U);
     EXPECT_EQ(sMode(lSensor.path("run/control")), 0660U);
@@ -56,7 +56,7 @@ TEST(KeeperStart, MakesItsFilesWithTheirModesAndStopsInOrder) {
 }
 
 TEST(KeeperStart, SigintStopsInOrderToo) {
-    ZTCSensorProcess lSensor;
+    ZTCKeeperProcess lSensor;
     lSensor.startAndWait();
     lSensor.process().sendSignal(SIGINT);
     EXPECT_EQ(lSensor.waitForExit(), 0);
@@ -64,7 +64,7 @@ TEST(KeeperStart, SigintStopsInOrderToo) {
 }
 
 TEST(KeeperStart, AgentAndCollectorGetWhatTheyNeedAndNothingElse) {
-    ZTCSensorProcess lSensor;
+    ZTCKeeperProcess lSensor;
     lSensor.setEnvironment("NOTIFY_SOCKET", lSensor.path("notify"));
     lSensor.setEnvironment("WATCHDOG_USEC", "60000000");
     lSensor.setEnvironment("KEPT", "yes");
@@ -88,7 +88,7 @@ TEST(KeeperStart, AgentAndCollectorGetWhatTheyNeedAndNothingElse) {
 }
 
 TEST(KeeperStart, TellsTheServiceManagerThatItIsReadyAliveAndStopping) {
-    ZTCSensorProcess lSensor;
+    ZTCKeeperProcess lSensor;
     const std::string lPath = lSensor.path("notify");
     const ZTCFileDescriptor lSocket(socket(AF_UNIX, SOCK_DGRAM | SOCK_CLOEXEC | SOCK_NONBLOCK, 0));
     sockaddr_un lAddress{};
@@ -111,7 +111,7 @@ TEST(KeeperStart, TellsTheServiceManagerThatItIsReadyAliveAndStopping) {
             },
             "the notification " + acrWanted);
     };
-    lSensor.start();
+    lSensor.launch();
     lWaitFor("READY=1\n");
     lWaitFor("WATCHDOG=1\n");
     lWaitFor("STATUS=running\n");
@@ -123,7 +123,7 @@ TEST(KeeperStart, TellsTheServiceManagerThatItIsReadyAliveAndStopping) {
 }
 
 TEST(KeeperStart, ASecondSensorNamesTheFirstAndEndsWith1) {
-    ZTCSensorProcess lSensor;
+    ZTCKeeperProcess lSensor;
     lSensor.startAndWait();
     std::string lError;
     EXPECT_EQ(lSensor.run({"--config", lSensor.configPath()}, &lError), 1);
@@ -134,7 +134,7 @@ TEST(KeeperStart, ASecondSensorNamesTheFirstAndEndsWith1) {
 }
 
 TEST(KeeperStart, TavikctlNamesARunningSensorAtOnce) {
-    ZTCSensorProcess lSensor;
+    ZTCKeeperProcess lSensor;
     lSensor.startAndWait();
     ZTSChildProcessSetup lSetup;
     lSetup.mProgram = TAVIKCTL_PROGRAM;
@@ -148,7 +148,7 @@ TEST(KeeperStart, TavikctlNamesARunningSensorAtOnce) {
 }
 
 TEST(KeeperStart, CheckAndABadStartReportEachErrorAndEndWith2) {
-    ZTCSensorProcess lSensor;
+    ZTCKeeperProcess lSensor;
     std::string lError;
     EXPECT_EQ(lSensor.run({"--config", lSensor.configPath(), "--check"}, &lError), 0);
     EXPECT_EQ(lError, "");
@@ -163,7 +163,7 @@ TEST(KeeperStart, CheckAndABadStartReportEachErrorAndEndWith2) {
 }
 
 TEST(KeeperStart, WrongUseIs2InOneLine) {
-    ZTCSensorProcess lSensor;
+    ZTCKeeperProcess lSensor;
     std::string lError;
     EXPECT_EQ(lSensor.run({"--colour"}, &lError), 2);
     EXPECT_EQ(std::count(lError.begin(), lError.end(), '\n'), 1);
@@ -171,7 +171,7 @@ TEST(KeeperStart, WrongUseIs2InOneLine) {
 }
 
 TEST(KeeperStart, AReloadGivesTheCollectorTheNewTextAndABadFileChangesNothing) {
-    ZTCSensorProcess lSensor;
+    ZTCKeeperProcess lSensor;
     lSensor.startAndWait();
     lSensor.configure("collect.period = 0\n");
     lSensor.process().sendSignal(SIGHUP);

@@ -5,7 +5,7 @@
 
 #include <filesystem>
 
-#include "tests/sensor/SensorProcess.h"
+#include "tests/sensor/KeeperProcess.h"
 
 using testing::HasSubstr;
 
@@ -14,9 +14,9 @@ static constexpr const char* scTwoAdapters =
     "adapter hba1 wwpn=30:00:00:00:00:01:00:01 wwnn=30:00:00:00:00:01:00:81\n";
 
 TEST(KeeperWaits, NoAdaptersIsAStateThatEndsWhenTheHostHasAdapters) {
-    ZTCSensorProcess lSensor;
+    ZTCKeeperProcess lSensor;
     lSensor.setScenario("count 0\n");
-    lSensor.start();
+    lSensor.launch();
     lSensor.waitFor("KeeperState waiting-for-adapters ended: no-adapters");
     lSensor.setScenario(scTwoAdapters);
     std::filesystem::create_directory(lSensor.sysfs() + "/class/fc_host/host7");
@@ -29,9 +29,9 @@ TEST(KeeperWaits, NoAdaptersIsAStateThatEndsWhenTheHostHasAdapters) {
 }
 
 TEST(KeeperWaits, ALibraryThatCannotBeLoadedIsAState) {
-    ZTCSensorProcess lSensor;
+    ZTCKeeperProcess lSensor;
     lSensor.setLibrary(lSensor.path("no-such-library.so"));
-    lSensor.start();
+    lSensor.launch();
     lSensor.waitFor("KeeperState waiting-for-adapters ended: no-library");
     EXPECT_EQ(lSensor.count("AgentEnded 1 status=0"), 1U);
     lSensor.process().sendSignal(SIGTERM);

@@ -1,96 +1,98 @@
 #include "tests/sensor/SensorProcess.h"
 
 #include <gtest/gtest.h>
-#include <signal.h>
-#include <unistd.h>
 
-#include <algorithm>
-#include <cstdlib>
+#include <csignal>
 #include <filesystem>
+#include <fstream>
 #include <iostream>
 #include <sstream>
+#include <stdexcept>
 
 #include "sensor/client/include/SensorPidFile.h"
+#include "tests/sensor/HistoryCheck.h"
+#include "tests/sensor/UnixLine.h"
 
-ZTCSensorProcess::ZTCSensorProcess() : mLibrary(TAVIK_SIMULATED_LIBRARY) {
-    // The sensor looks for the collector from where it is itself: a copy of it finds the fake one.
-    std::filesystem::create_directories(path("sbin"));
-    std::filesystem::create_directories(path("libexec/tavik"));
-    std::filesystem::create_directories(path("collector"));
+ZTCSensorProcess::ZTCSensorProcess(const std::string& acrSettings)
+    : mProgram(TAVIK_SENSOR_PROGRAM),
+      mLibrary(TAVIK_SIM_LIBRARY),
+      mEnvironment{{"PATH", "/usr/bin:/bin"}, {"KPM_SIM_SOCKET", path("sim.sock")}, {"TAVIK_SYSFS_ROOT", sysfs()}} {
     std::filesystem::create_directories(sysfs() + "/class/fc_host");
-    std::filesystem::copy_file(TAVIK_SENSOR_PROGRAM, path("sbin/tavik-sensor"));
-    std::filesystem::copy_file(TAVIK_FAKE_COLLECTOR, path("libexec/tavik/tavik-collector"));
-    setScenario("adapter hba0 wwpn=30:00:00:00:00:01:00:00 wwnn=30:00:00:00:00:01:00:80\n");
-    mEnvironment = {{"FAKE_COLLECTOR_DIR", path("collector")},
-                    {"KPM_SIM_SCENARIO", path("scenario.kpm")},
-                    {"TAVIK_SYSFS_ROOT", sysfs()},
-                    {"PATH", "/usr/bin:/bin"}};
-    writeConfiguration("");
+    configure(acrSettings);
 }
 
+/// Where the test has not ended it: in order, after a failure by force.
 ZTCSensorProcess::~ZTCSensorProcess() {
-    if (mProcess) {
-        mProcess->kill();
-        if (testing::Test::HasFailure()) {
-            std::cerr << "---- standard error of the sensor\n"
-                      << mProcess->standardError() << "---- messages of the collector\n"
-                      << readFile(path("collector/messages"));
+    try {
+        if (mProcess != nullptr && !mProcess->hasEnded()) {
+            mProcess->sendSignal(SIGTERM);
+            EXPECT_LE(mProcess->waitForExit(ZTCDeadline(3 * gcTestPatience)), 1);
         }
+    } catch (const std::exception& lrEx) {
+        ADD_FAILURE() << "the sensor does not end: " << lrEx.what();
     }
-    for (const std::string& lcrLine : messages()) {
-        const std::size_t lPid = lcrLine.find("pid=");
-        const pid_t lProcess = lcrLine.starts_with("Collector ") ? std::atoi(lcrLine.c_str() + 10)
-                               : lPid != std::string::npos       ? std::atoi(lcrLine.c_str() + lPid + 4)
-                                                                 : 0;
-        // Ours still: the pid of a process that has ended may have been given away, but not to one of this directory.
-        std::error_code lError;
-        const std::string lEnvironment = readFile("/proc/" + std::to_string(lProcess) + "/environ");
-        if (lProcess > 0 && lEnvironment.find(path("collector")) != std::string::npos) {
-            kill(lProcess, SIGKILL);
-        }
+    if (testing::Test::HasFailure()) {
+        std::cerr << "---- the sensor's messages\n" << standardError();
     }
 }
 
-void ZTCSensorProcess::writeConfiguration(const std::string& acrMore) const {
+void ZTCSensorProcess::configure(const std::string& acrLines) {
+    mSettings = acrLines;
     writeFile(configPath(), "agent.program = \"" TAVIK_AGENT_PROGRAM "\"\nagent.library = \"" + mLibrary +
-                                "\"\nagent.log = \"" + path("agent.log") + "\"\nagent.heartbeat = 1\n" +
-                                "sensor.directory = \"" + path("run") + "\"\nsensor.state = \"" + path("state") +
-                                "\"\n" + acrMore);
-}
-
-void ZTCSensorProcess::configure(const std::string& acrLines) const {
-    writeConfiguration(acrLines);
+                                "\"\nagent.log = \"" + path("agent.log") + "\"\nsensor.directory = \"" + path("run") +
+                                "\"\nsensor.state = \"" + stateDirectory() + "\"\n" + mSettings);
 }
 
 void ZTCSensorProcess::setLibrary(const std::string& acrPath) {
     mLibrary = acrPath;
-    writeConfiguration("");
+    configure(mSettings);
 }
 
-void ZTCSensorProcess::start() {
+void ZTCSensorProcess::setScenario(const std::string& acrText) {
+    writeFile(path("scenario.kpm"), acrText);
+    setEnvironment("KPM_SIM_SCENARIO", path("scenario.kpm"));
+}
+
+ZTSChildProcessSetup ZTCSensorProcess::makeSetup(const std::vector<std::string>& acrArguments,
+                                                 const std::string& acrOutput) const {
     ZTSChildProcessSetup lSetup;
-    lSetup.mProgram = path("sbin/tavik-sensor");
-    lSetup.mArguments = {"--config", configPath()};
-    lSetup.mEnvironment = mEnvironment;
-    lSetup.mWorkingDirectory = mDirectory.path();
-    lSetup.mOutputPrefix = path("sensor" + std::to_string(++mRuns));
-    mProcess = std::make_unique<ZTCChildProcess>(lSetup);
-}
-
-void ZTCSensorProcess::startAndWait() {
-    const std::size_t lBefore = count("StartAnswered ");
-    start();
-    waitFor("StartAnswered ", lBefore + 1);
-}
-
-int ZTCSensorProcess::run(const std::vector<std::string>& acrArguments, std::string* apError) {
-    ZTSChildProcessSetup lSetup;
-    lSetup.mProgram = path("sbin/tavik-sensor");
+    lSetup.mProgram = mProgram;
     lSetup.mArguments = acrArguments;
     lSetup.mEnvironment = mEnvironment;
     lSetup.mWorkingDirectory = mDirectory.path();
-    lSetup.mOutputPrefix = path("other" + std::to_string(++mRuns));
-    ZTCChildProcess lProcess(lSetup);
+    lSetup.mOutputPrefix = path(acrOutput);
+    return lSetup;
+}
+
+void ZTCSensorProcess::launch() {
+    mProcess =
+        std::make_unique<ZTCChildProcess>(makeSetup({"--config", configPath()}, "sensor" + std::to_string(++mRuns)));
+}
+
+void ZTCSensorProcess::start() {
+    launch();
+    waitUntilListening();
+}
+
+void ZTCSensorProcess::waitUntilListening() const {
+    waitUntil(
+        [this] {
+            try {
+                return simulate("status").find("schedule=done") != std::string::npos;
+            } catch (const std::runtime_error&) {
+                return false;  // the library is not open yet
+            }
+        },
+        "the library's schedule", ZTCDeadline(3 * gcTestPatience));
+}
+
+int ZTCSensorProcess::stop() {
+    mProcess->sendSignal(SIGTERM);
+    return mProcess->waitForExit(ZTCDeadline(3 * gcTestPatience));
+}
+
+int ZTCSensorProcess::run(const std::vector<std::string>& acrArguments, std::string* apError) {
+    ZTCChildProcess lProcess(makeSetup(acrArguments, "other" + std::to_string(++mRuns)));
     const int lStatus = lProcess.waitForExit();
     if (apError != nullptr) {
         *apError = lProcess.standardError();
@@ -103,45 +105,65 @@ void ZTCSensorProcess::waitForMessage(const std::string& acrText, const ZTCDeadl
               "the sensor's message \"" + acrText + "\"", acrDeadline);
 }
 
-void ZTCSensorProcess::removeFile(const std::string& acrName) const {
-    std::filesystem::remove(path("collector/" + acrName));
-}
-
-std::vector<std::string> ZTCSensorProcess::messages() const {
-    std::vector<std::string> lLines;
-    std::istringstream lText(readFile(path("collector/messages")));
-    for (std::string lLine; std::getline(lText, lLine) && !lText.eof();) {
-        lLines.push_back(lLine);
-    }
-    return lLines;
-}
-
-std::size_t ZTCSensorProcess::count(const std::string& acrStart) const {
-    const std::vector<std::string> lLines = messages();
-    return static_cast<std::size_t>(std::count_if(
-        lLines.begin(), lLines.end(), [&](const std::string& acrLine) { return acrLine.starts_with(acrStart); }));
-}
-
-std::string ZTCSensorProcess::waitFor(const std::string& acrStart, std::size_t aCount,
-                                      const ZTCDeadline& acrDeadline) const {
-    waitUntil([&] { return count(acrStart) >= aCount; },
-              std::to_string(aCount) + " messages \"" + acrStart + "\" to the collector", acrDeadline);
-    std::string lFound;
-    for (const std::string& lcrLine : messages()) {
-        lFound = lcrLine.starts_with(acrStart) ? lcrLine : lFound;
-    }
-    return lFound;
-}
-
-pid_t ZTCSensorProcess::collectorPid() const {
-    return std::atoi(waitFor("Collector ").c_str() + 10);
-}
-
-pid_t ZTCSensorProcess::agentPid() const {
-    const std::string lLine = waitFor("AgentStarted ");
-    return std::atoi(lLine.c_str() + lLine.find("pid=") + 4);
-}
-
 void waitForEnd(pid_t aPid, const ZTCDeadline& acrDeadline) {
     waitUntil([&] { return !isProcessAlive(aPid); }, "the end of process " + std::to_string(aPid), acrDeadline);
+}
+
+nlohmann::json ZTCSensorProcess::status() const {
+    return nlohmann::json::parse(askLine(path("run/control"), R"({"request":"status"})"));
+}
+
+pid_t ZTCSensorProcess::findChild(const std::string& acrName) const {
+    const std::string lSensor = std::to_string(mProcess->getPid());
+    std::ifstream lChildren("/proc/" + lSensor + "/task/" + lSensor + "/children");
+    pid_t lPid = 0;
+    while (lChildren >> lPid) {
+        std::string lName;
+        std::ifstream("/proc/" + std::to_string(lPid) + "/comm") >> lName;
+        if (lName == acrName) {
+            return lPid;
+        }
+    }
+    return 0;
+}
+
+std::string ZTCSensorProcess::simulate(const std::string& acrLine) const {
+    const std::string lAnswer = askLine(path("sim.sock"), acrLine);
+    if (!lAnswer.starts_with("ok ")) {
+        throw std::runtime_error("the simulated library: " + lAnswer);
+    }
+    return lAnswer.substr(3);
+}
+
+std::map<std::string, std::uint64_t> ZTCSensorProcess::countDelivered() const {
+    std::map<std::string, std::uint64_t> lCounts;
+    const auto lAdd = [&lCounts](const std::string& acrAnswer) {
+        std::istringstream lWords(acrAnswer);
+        std::string lWord;
+        while (lWords >> lWord) {
+            const std::size_t lEquals = lWord.find('=');
+            lCounts[lWord.substr(0, lEquals)] = std::strtoull(lWord.c_str() + lEquals + 1, nullptr, 10);
+        }
+    };
+    lAdd(simulate("counts"));
+    const std::map<std::string, std::uint64_t> lKinds = lCounts;
+    lAdd(simulate("status"));
+    const std::uint64_t lPages = lCounts["pages"];
+    lCounts = lKinds;
+    lCounts["rscn"] = lPages;
+    return lCounts;
+}
+
+void ZTCSensorProcess::waitUntilAllIsStored() const {
+    waitUntil(
+        [this] {
+            try {
+                const nlohmann::json lStatus = status();
+                return lStatus["agent"].value("heldRecords", 1) == 0 && lStatus["collector"]["waitingFrames"] == 0 &&
+                       listSpool(stateDirectory()).empty();
+            } catch (const std::exception&) {
+                return false;  // a collector is just starting
+            }
+        },
+        "an empty agent and an empty spool", ZTCDeadline(6 * gcTestPatience));
 }

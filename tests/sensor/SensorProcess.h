@@ -1,15 +1,14 @@
-/// tavik-sensor as a test runs it: own directories, the real agent on the simulated library, and a collector that the
-/// test watches (FakeCollector.cpp). Everything waits for events with a deadline and throws std::runtime_error where
-/// that is over.
-///
-/// When the object goes, every process that it started is killed, by its pid.
+/// tavik-sensor as a test runs it: own directories, the real collector, the real agent on the simulated library.
+/// Everything waits for events with a deadline and throws std::runtime_error where that is over.
 #ifndef TESTS_SENSOR_SENSORPROCESS_H
 #define TESTS_SENSOR_SENSORPROCESS_H
 
 #include <sys/types.h>
 
+#include <cstdint>
 #include <map>
 #include <memory>
+#include <nlohmann/json.hpp>
 #include <string>
 #include <vector>
 
@@ -19,55 +18,68 @@
 
 class ZTCSensorProcess {
 public:
-    /// Makes the directories and a configuration file; nothing runs.
-    ZTCSensorProcess();
+    /// Makes the directories and a configuration file with these lines of TOML in it; nothing runs.
+    explicit ZTCSensorProcess(const std::string& acrSettings = "");
     ~ZTCSensorProcess();
     ZTCSensorProcess(const ZTCSensorProcess&) = delete;
     ZTCSensorProcess& operator=(const ZTCSensorProcess&) = delete;
 
     // ---- before the start ----
-    /// Adds lines to the configuration file, which already has sensor.*, agent.log, agent.library and
-    /// agent.heartbeat=1.
-    void configure(const std::string& acrLines) const;
+    /// Writes the configuration file anew: sensor.*, agent.program, agent.log and agent.library, and these lines.
+    void configure(const std::string& acrLines);
     void setLibrary(const std::string& acrPath);
     void setEnvironment(const std::string& acrName, const std::string& acrValue) { mEnvironment[acrName] = acrValue; }
     /// The simulated library plays this from the next start of an agent on.
-    void setScenario(const std::string& acrText) const { writeFile(mDirectory.path("scenario.kpm"), acrText); }
+    void setScenario(const std::string& acrText);
 
     // ---- places ----
     std::string path(const std::string& acrName) const { return mDirectory.path(acrName); }
     std::string configPath() const { return path("tavik.toml"); }
     std::string agentFolder() const { return path("run/agent"); }
+    std::string stateDirectory() const { return path("state"); }
     std::string sysfs() const { return path("sysfs"); }
 
     // ---- running ----
+    /// Starts the process, and waits for nothing.
+    void launch();
+    /// Starts it, and returns when the agent has registered for all events.
     void start();
-    /// Starts it and waits until the agent has answered the start command.
-    void startAndWait();
+    /// Until the agent that runs now has registered for all events.
+    void waitUntilListening() const;
+    /// SIGTERM. Returns the exit status.
+    int stop();
     /// Runs another one with these arguments until it has ended.
     int run(const std::vector<std::string>& acrArguments, std::string* apError = nullptr);
     ZTCChildProcess& process() { return *mProcess; }
     int waitForExit(const ZTCDeadline& acrDeadline = ZTCDeadline()) { return mProcess->waitForExit(acrDeadline); }
-    std::string standardError() const { return mProcess->standardError(); }
+    /// Of the sensor and its collector, since the last start.
+    std::string standardError() const { return mProcess != nullptr ? mProcess->standardError() : ""; }
     void waitForMessage(const std::string& acrText, const ZTCDeadline& acrDeadline = ZTCDeadline()) const;
 
-    // ---- the collector ----
-    void putFile(const std::string& acrName) const { writeFile(path("collector/" + acrName), ""); }
-    void removeFile(const std::string& acrName) const;
-    /// The lines that the collectors have written, in order.
-    std::vector<std::string> messages() const;
-    std::size_t count(const std::string& acrStart) const;
-    /// Waits until so many lines begin like that, and returns the last of them.
-    std::string waitFor(const std::string& acrStart, std::size_t aCount = 1,
-                        const ZTCDeadline& acrDeadline = ZTCDeadline()) const;
-    pid_t collectorPid() const;
-    pid_t agentPid() const;
+    // ---- what it shows and does ----
+    /// The live state.
+    nlohmann::json status() const;
+    /// The collector that runs now; 0 where none does.
+    pid_t findCollector() const { return findChild("tavik-collector"); }
+    pid_t findAgent() const { return findChild("qrv-tvk"); }
+    /// One line to the simulated library; its answer without the "ok ". Throws std::runtime_error where it refuses.
+    std::string simulate(const std::string& acrLine) const;
+    /// What the library has delivered: events of each kind; of RSCNs the pages.
+    std::map<std::string, std::uint64_t> countDelivered() const;
+    /// Until the agent holds nothing and the spool is empty.
+    void waitUntilAllIsStored() const;
+
+protected:
+    void setProgram(const std::string& acrPath) { mProgram = acrPath; }
 
 private:
-    void writeConfiguration(const std::string& acrMore) const;
+    pid_t findChild(const std::string& acrName) const;
+    ZTSChildProcessSetup makeSetup(const std::vector<std::string>& acrArguments, const std::string& acrOutput) const;
 
     ZTCTemporaryDirectory mDirectory;
+    std::string mProgram;
     std::string mLibrary;
+    std::string mSettings;
     std::map<std::string, std::string> mEnvironment;
     std::unique_ptr<ZTCChildProcess> mProcess;
     unsigned mRuns = 0;

@@ -1,4 +1,4 @@
-#include "tests/collector/HistoryCheck.h"
+#include "tests/sensor/HistoryCheck.h"
 
 #include <gtest/gtest.h>
 #include <sqlite3.h>

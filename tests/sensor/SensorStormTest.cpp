@@ -7,8 +7,8 @@
 #include <thread>
 
 #include "sensor/store/include/History.h"
-#include "tests/collector/HistoryCheck.h"
-#include "tests/collector/SensorProcess.h"
+#include "tests/sensor/HistoryCheck.h"
+#include "tests/sensor/SensorProcess.h"
 #include "tests/support/Seed.h"
 #include "tests/support/Waiting.h"
 
@@ -64,7 +64,7 @@ protected:
         EXPECT_TRUE(lHistory.readGaps().empty());
     }
 
-    ZTCSensorProcess mSensor;
+    ZTCSensorProcess mSensor{"agent.log_level = 1\n"};
     std::map<std::string, std::uint64_t> mDelivered[2];
     std::uint64_t mRefused = 0;
 };

@@ -1,6 +1,6 @@
 /// One question on a Unix stream socket: a line out, a line in.
-#ifndef TESTS_COLLECTOR_UNIXLINE_H
-#define TESTS_COLLECTOR_UNIXLINE_H
+#ifndef TESTS_SENSOR_UNIXLINE_H
+#define TESTS_SENSOR_UNIXLINE_H
 
 #include <sys/un.h>
 

@@ -1,4 +1,4 @@
-#include "tests/collector/UnixLine.h"
+#include "tests/sensor/UnixLine.h"
 
 #include <sys/socket.h>
 #include <sys/time.h>

@@ -1,6 +1,6 @@
 /// What tests look at in a history when nothing is in flight.
-#ifndef TESTS_COLLECTOR_HISTORYCHECK_H
-#define TESTS_COLLECTOR_HISTORYCHECK_H
+#ifndef TESTS_SENSOR_HISTORYCHECK_H
+#define TESTS_SENSOR_HISTORYCHECK_H
 
 #include <cstdint>
 #include <string>
