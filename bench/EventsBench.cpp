@@ -36,8 +36,8 @@
 
 namespace {
 
-constexpr unsigned gcBatch = 4000;
-constexpr unsigned gcAppendBatch = 16384;
+constexpr unsigned scBatch = 4000;
+constexpr unsigned scAppendBatch = 16384;
 
 /// Scattered, and every number below the (uneven) count is met.
 std::uint64_t sScatter(std::uint64_t aIndex, std::uint64_t aCount) {
@@ -81,8 +81,8 @@ template <bool HasStatusPage>
 void sMatchedLsRjt(benchmark::State& arState) {
     ZTCBenchAgent& lrAgent = sUse<HasStatusPage>();
     ZTCBenchEvent lEvent(1, 0x08, gcBenchPortBase, {3, 9, 0x29});
-    while (arState.KeepRunningBatch(gcAppendBatch)) {
-        for (unsigned i = 0; i < gcAppendBatch; ++i) {
+    while (arState.KeepRunningBatch(scAppendBatch)) {
+        for (unsigned i = 0; i < scAppendBatch; ++i) {
             lEvent.deliver();
         }
         arState.PauseTiming();
@@ -127,8 +127,8 @@ void sNew(benchmark::State& arState, std::uint64_t aFirstPort) {
     ZTCBenchAgent& lrAgent = sUse<HasStatusPage>(lTargets);
     ZTCBenchQFull lEvent;
     std::uint64_t lNext = 0;
-    while (arState.KeepRunningBatch(gcBatch)) {
-        for (unsigned i = 0; i < gcBatch; ++i) {
+    while (arState.KeepRunningBatch(scBatch)) {
+        for (unsigned i = 0; i < scBatch; ++i) {
             lEvent.setPort(aFirstPort + sScatter(lNext++, lTargets));
             lEvent.deliver();
         }
@@ -149,9 +149,9 @@ void sNewUnknown(benchmark::State& arState) {
 
 void sMapInsert(benchmark::State& arState) {
     std::map<std::uint64_t, std::uint64_t> lMap;
-    while (arState.KeepRunningBatch(gcBatch)) {
-        for (std::uint64_t i = 0; i < gcBatch; ++i) {
-            lMap.try_emplace(gcBenchPortBase + sScatter(i, gcBatch - 1), i);
+    while (arState.KeepRunningBatch(scBatch)) {
+        for (std::uint64_t i = 0; i < scBatch; ++i) {
+            lMap.try_emplace(gcBenchPortBase + sScatter(i, scBatch - 1), i);
         }
         arState.PauseTiming();
         lMap.clear();

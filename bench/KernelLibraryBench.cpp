@@ -33,9 +33,9 @@
 
 namespace {
 
-constexpr const char* gcKernels[] = {"6.1", "6.12"};
-constexpr std::size_t gcMessages = 16384;
-constexpr std::uint32_t gcScsiCategory = 4;
+constexpr const char* scKernels[] = {"6.1", "6.12"};
+constexpr std::size_t scMessages = 16384;
+constexpr std::uint32_t scScsiCategory = 4;
 constexpr std::uint32_t gcCheckCondition = 4;
 
 // ---- A page and a message as those know them who have the layout built in ----
@@ -282,7 +282,7 @@ void sPageDelivered(benchmark::State& arState, const char* apKernel) {
     HBA_wwn lPort{};
     std::uint32_t lHandle = 0;
     sRequire(lEngine.getAdapterInfo(0, &lNode, &lPort) == ZTLST_Success, "the captured hosts are no boards");
-    sRequire(lEngine.registerForPort(0, lPort, gcScsiCategory, gcCheckCondition, nullptr, &lHandle, sScopeCallback) ==
+    sRequire(lEngine.registerForPort(0, lPort, scScsiCategory, gcCheckCondition, nullptr, &lHandle, sScopeCallback) ==
                  ZTLST_Success,
              "check conditions have no source");
     const std::size_t lInPage = sCountOutcomes(apKernel);
@@ -313,7 +313,7 @@ void sPipeOverlay(benchmark::State& arState, const char* apKernel) {
                 ZT_event lEvent{ZT_EVENT_VERSION, ZT_EVENT_HEADER_SIZE + sizeof arData, &lPayload};
                 KPM_ScopeCallback lpCallback = sScopeCallback;
                 benchmark::DoNotOptimize(lpCallback);
-                lpCallback(aHost, lPort, gcScsiCategory, gcCheckCondition, nullptr, &lEvent);
+                lpCallback(aHost, lPort, scScsiCategory, gcCheckCondition, nullptr, &lEvent);
             });
         }
         const double lTime = gDeliveries.wait();
@@ -334,8 +334,8 @@ void sMessageDelivered(benchmark::State& arState) {
     sRequire(lEngine.registerForBoard(0, FC_REG_RSCN_EVENT, nullptr, lpGeneric) != 0, "RSCNs have no source");
     const ZTCBenchBytes lMessage = readCapture("6.12", "netlink/post-rscn-port.bin");
     sMeasureDeliveries(arState, lKernel, [&] {
-        lKernel.addMessages(lMessage, gcMessages);
-        return std::size_t{gcMessages};
+        lKernel.addMessages(lMessage, scMessages);
+        return std::size_t{scMessages};
     });
     lEngine.stop();
 }
@@ -343,7 +343,7 @@ void sMessageDelivered(benchmark::State& arState) {
 }  // namespace
 
 int main(int aArgc, char** appArgv) {
-    for (const char* lpKernel : gcKernels) {
+    for (const char* lpKernel : scKernels) {
         const auto lName = [lpKernel](const char* apBenchmark) { return std::string(apBenchmark) + "/" + lpKernel; };
         benchmark::RegisterBenchmark(lName("PageParsed").c_str(), sPageParsed, lpKernel);
         benchmark::RegisterBenchmark(lName("PageOverlay").c_str(), sPageOverlay, lpKernel);

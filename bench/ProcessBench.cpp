@@ -37,8 +37,8 @@
 
 namespace {
 
-constexpr std::size_t gcResponseSize = 300 * 1024;
-constexpr const char* gcReadyText = "Waiting for control availability";
+constexpr std::size_t scResponseSize = 300 * 1024;
+constexpr const char* scReadyText = "Waiting for control availability";
 
 using Clock = std::chrono::steady_clock;
 
@@ -78,14 +78,14 @@ private:
 void sFifoResponse(benchmark::State& arState) {
     ZTCBenchAgent& lrAgent = ZTCBenchAgent::use(1);
     const ZTCPointer<ZTCBuffer> lResponse(new ZTCBuffer());
-    lResponse->resize(gcResponseSize);
+    lResponse->resize(scResponseSize);
     const ZTCFifoReader lReader(lrAgent.system().getTvkOutIpcPath().get());
     const ZTCPointer<ZTCWriter> lWriter = lrAgent.system().getWriter(0);
     ZTCProtocolHelper lHelper;
     for (auto lUnused : arState) {
         lHelper.send(lWriter, lResponse, 0);
     }
-    arState.SetBytesProcessed(arState.iterations() * static_cast<std::int64_t>(gcResponseSize));
+    arState.SetBytesProcessed(arState.iterations() * static_cast<std::int64_t>(scResponseSize));
 }
 
 void sFifoPlain(benchmark::State& arState) {
@@ -96,7 +96,7 @@ void sFifoPlain(benchmark::State& arState) {
     }
     const ZTCFifoReader lReader(lPath);
     const int lWriter = open(lPath.c_str(), O_WRONLY | O_CLOEXEC);
-    const std::vector<char> lBytes(gcResponseSize);
+    const std::vector<char> lBytes(scResponseSize);
     for (auto lUnused : arState) {
         std::size_t lWritten = 0;
         while (lWritten < lBytes.size()) {
@@ -109,7 +109,7 @@ void sFifoPlain(benchmark::State& arState) {
         }
     }
     close(lWriter);
-    arState.SetBytesProcessed(arState.iterations() * static_cast<std::int64_t>(gcResponseSize));
+    arState.SetBytesProcessed(arState.iterations() * static_cast<std::int64_t>(scResponseSize));
 }
 
 /// A real agent with a directory of its own; ends with the object.
@@ -153,7 +153,7 @@ public:
 
     void waitUntilReady() const {
         std::string lText;
-        while (lText.find(gcReadyText) == std::string::npos) {
+        while (lText.find(scReadyText) == std::string::npos) {
             pollfd lWait{mNotify, POLLIN, 0};
             if (poll(&lWait, 1, 10000) <= 0) {
                 throw std::runtime_error("the agent does not start; its log: " + lText);

@@ -46,7 +46,7 @@ namespace {
 
 enum ZTELoad { ZTBL_Empty, ZTBL_One, ZTBL_Mixed };
 
-constexpr unsigned gcManyTargets = 20000;
+constexpr unsigned scManyTargets = 20000;
 
 /// Events of all kinds with data, in the order of their category and subcategory.
 std::vector<std::unique_ptr<ZTCBenchEvent>> sMakeMixture(std::uint64_t aPort) {
@@ -220,7 +220,7 @@ void sLatency(benchmark::State& arState, bool aIsRetrieved) {
 }
 
 void sRegisterTargets(benchmark::State& arState) {
-    const std::vector<unsigned char> lBody = ZTCBenchAgent::makeRegisterTargets(gcManyTargets);
+    const std::vector<unsigned char> lBody = ZTCBenchAgent::makeRegisterTargets(scManyTargets);
     for (auto lUnused : arState) {
         // Targets are never removed, so each command gets an agent of its own.
         ZTCBenchAgent lAgent(1, 0);
@@ -228,19 +228,19 @@ void sRegisterTargets(benchmark::State& arState) {
         lAgent.request(lBody);
         arState.SetIterationTime(sThreadSeconds() - lBegin);
     }
-    arState.SetItemsProcessed(arState.iterations() * gcManyTargets);
+    arState.SetItemsProcessed(arState.iterations() * scManyTargets);
 }
 
 void sMapInsert(benchmark::State& arState) {
     for (auto lUnused : arState) {
         std::map<unsigned long, unsigned long> lMap;
         const double lBegin = sThreadSeconds();
-        for (unsigned long i = 0; i < gcManyTargets; ++i) {
+        for (unsigned long i = 0; i < scManyTargets; ++i) {
             lMap.try_emplace(ZTCWorldWideName(makeBenchName(gcBenchPortBase + i).wwn).getKey(), i);
         }
         arState.SetIterationTime(sThreadSeconds() - lBegin);
     }
-    arState.SetItemsProcessed(arState.iterations() * gcManyTargets);
+    arState.SetItemsProcessed(arState.iterations() * scManyTargets);
 }
 
 /// The peak of this process's resident memory in KiB.

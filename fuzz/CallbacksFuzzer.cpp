@@ -19,14 +19,14 @@
 #include "tavik/include/TavikCore.h"
 #include "tavik/include/TavikProtocolHandler.h"
 
-static constexpr std::uint32_t gcMaxAdapters = 4;
+static constexpr std::uint32_t scMaxAdapters = 4;
 
 /// Bytes that an event of the kind needs to be consolidated. An RSCN is counted by its pages instead.
 static constexpr std::size_t sLeastSize(const ZTSScopeEventKind& acrKind) {
     return acrKind.isScope() ? acrKind.mDataSize : 0;
 }
 
-static constexpr unsigned gcRscnPair = 1 << 8 | 0x20;
+static constexpr unsigned scRscnPair = 1 << 8 | 0x20;
 
 /// The agent with the count that its responses are held against.
 class ZTCConservation {
@@ -77,7 +77,7 @@ static std::uint64_t sPages(std::span<const std::uint8_t> aPayload, std::size_t 
 }
 
 void ZTCConservation::scope(ZTCFuzzInput& arInput, std::uint8_t aShape) {
-    const std::uint32_t lBoard = arInput.takeByte() % (gcMaxAdapters + 2);
+    const std::uint32_t lBoard = arInput.takeByte() % (scMaxAdapters + 2);
     // Half of the events are of a known kind, so that there is something to consolidate.
     unsigned lCategory;
     unsigned lSubcategory;
@@ -92,7 +92,7 @@ void ZTCConservation::scope(ZTCFuzzInput& arInput, std::uint8_t aShape) {
     const unsigned lPair = (lCategory & 0xFF) << 8 | (lSubcategory & 0xFF);
     const std::span<const std::uint8_t> lBytes = arInput.take(arInput.takeByte());
     const std::vector<std::uint8_t> lData =
-        lPair == gcRscnPair ? sHonestRscn(lBytes) : std::vector<std::uint8_t>(lBytes.begin(), lBytes.end());
+        lPair == scRscnPair ? sHonestRscn(lBytes) : std::vector<std::uint8_t>(lBytes.begin(), lBytes.end());
 
     const std::size_t lOffset = aShape >> 1 & 7;
     const bool lHasPayload = (aShape >> 4 & 7) != 1;
@@ -120,11 +120,11 @@ void ZTCConservation::scope(ZTCFuzzInput& arInput, std::uint8_t aShape) {
         for (const ZTSScopeEventKind& lrKind : gcScopeEventKinds) {
             const unsigned lKindsPair =
                 static_cast<unsigned>(lrKind.mDeliveredCategory << 8 | lrKind.mDeliveredSubcategory);
-            if (lKindsPair == lPair && lPair != gcRscnPair && lLength >= sLeastSize(lrKind)) {
+            if (lKindsPair == lPair && lPair != scRscnPair && lLength >= sLeastSize(lrKind)) {
                 lExpected = 1;
             }
         }
-        if (lPair == gcRscnPair) {
+        if (lPair == scRscnPair) {
             lExpected = sPages(lData, lLength);
         }
     }
@@ -134,7 +134,7 @@ void ZTCConservation::scope(ZTCFuzzInput& arInput, std::uint8_t aShape) {
 }
 
 void ZTCConservation::rscn(ZTCFuzzInput& arInput) {
-    const std::uint32_t lBoard = arInput.takeByte() % (gcMaxAdapters + 2);
+    const std::uint32_t lBoard = arInput.takeByte() % (scMaxAdapters + 2);
     const std::vector<std::uint8_t> lPayload = sHonestRscn(arInput.take(arInput.takeByte()));
     const ZTCExactBlock lBlock(lPayload, lPayload.size() & 7);
     mExpected += isAdmitted(lBoard) ? sPages(lPayload, lPayload.size()) : 0;
@@ -142,7 +142,7 @@ void ZTCConservation::rscn(ZTCFuzzInput& arInput) {
 }
 
 void ZTCConservation::link(ZTCFuzzInput& arInput) {
-    const std::uint32_t lBoard = arInput.takeByte() % (gcMaxAdapters + 2);
+    const std::uint32_t lBoard = arInput.takeByte() % (scMaxAdapters + 2);
     std::vector<std::uint8_t> lInfo(sizeof(LINKINFO));
     const std::span<const std::uint8_t> lName = arInput.take(sizeof(HBA_wwn));
     std::copy(lName.begin(), lName.end(), lInfo.begin() + offsetof(LINKINFO, a_wwpName));
@@ -175,7 +175,7 @@ void ZTCConservation::command(ZTCFuzzInput& arInput, std::uint8_t aWhich) {
             break;
         }
         default:
-            mAgent.getLibrary().mAdapters = arInput.takeByte() % (gcMaxAdapters + 2);
+            mAgent.getLibrary().mAdapters = arInput.takeByte() % (scMaxAdapters + 2);
             retrieve();
             break;
     }
@@ -214,7 +214,7 @@ void ZTCConservation::play(ZTCFuzzInput& arInput) {
             link(arInput);
             break;
         case 3: {
-            const std::uint32_t lBoard = arInput.takeByte() % (gcMaxAdapters + 2);
+            const std::uint32_t lBoard = arInput.takeByte() % (scMaxAdapters + 2);
             mExpected += isAdmitted(lBoard) ? 1 : 0;
             ScopeCb_KpmTemp(lBoard, 60, 70);
             break;
@@ -228,7 +228,7 @@ void ZTCConservation::play(ZTCFuzzInput& arInput) {
 extern "C" int LLVMFuzzerTestOneInput(const std::uint8_t* apData, std::size_t aSize);
 int LLVMFuzzerTestOneInput(const std::uint8_t* apData, std::size_t aSize) {
     ZTCFuzzInput lInput(apData, aSize);
-    const std::uint32_t lAdapters = 1 + lInput.takeByte() % gcMaxAdapters;
+    const std::uint32_t lAdapters = 1 + lInput.takeByte() % scMaxAdapters;
     const unsigned lLogCode = lInput.takeByte() % 16 == 0 ? gcWholeLog : gcNoLog;
     ZTCConservation lConservation(lAdapters, lLogCode);
     while (!lInput.isAtEnd()) {

@@ -19,8 +19,8 @@
 
 using ZTCPiece = std::span<const std::uint8_t>;
 
-static constexpr std::size_t gcMaxFrame = 1048576;
-static constexpr std::size_t gcPipeRoom = 65536;
+static constexpr std::size_t scMaxFrame = 1048576;
+static constexpr std::size_t scPipeRoom = 65536;
 
 /// The frames in bytes, by the definition. A part at the end stays in arRest; a bad length throws everything away.
 static std::vector<std::string> sFramesIn(std::string& arRest) {
@@ -30,7 +30,7 @@ static std::vector<std::string> sFramesIn(std::string& arRest) {
         for (std::size_t lByte = 0; lByte < 4; ++lByte) {
             lLength = lLength << 8 | static_cast<unsigned char>(arRest[lByte]);
         }
-        if (lLength == 0 || lLength > gcMaxFrame) {
+        if (lLength == 0 || lLength > scMaxFrame) {
             arRest.clear();
             break;
         }
@@ -106,7 +106,7 @@ int LLVMFuzzerTestOneInput(const std::uint8_t* apData, std::size_t aSize) {
     for (std::size_t& lrLength : lLengths) {
         lrLength = lInput.takeShort();
     }
-    lLengths.push_back(gcPipeRoom);
+    lLengths.push_back(scPipeRoom);
 
     ZTCFrameAssembler lAssembler;
     std::string lRest;

@@ -11,8 +11,8 @@
 #include "fuzz/support/FuzzInput.h"
 #include "sensor/agentcommon/include/SensorAgentProtocol.h"
 
-static constexpr std::uint8_t gcCommands = 6;
-static constexpr std::uint32_t gcMaxAdapters = 4;
+static constexpr std::uint8_t scCommands = 6;
+static constexpr std::uint32_t scMaxAdapters = 4;
 
 /// Whether the command may be answered so.
 static bool sIsAnswer(std::uint8_t aCommand, const ZTSResponse& acrResponse) {
@@ -34,20 +34,20 @@ static bool sIsAnswer(std::uint8_t aCommand, const ZTSResponse& acrResponse) {
 extern "C" int LLVMFuzzerTestOneInput(const std::uint8_t* apData, std::size_t aSize);
 int LLVMFuzzerTestOneInput(const std::uint8_t* apData, std::size_t aSize) {
     ZTCFuzzInput lInput(apData, aSize);
-    const std::uint32_t lAdapters = 1 + lInput.takeByte() % gcMaxAdapters;
+    const std::uint32_t lAdapters = 1 + lInput.takeByte() % scMaxAdapters;
     const unsigned lLogCode = lInput.takeByte();
     const std::span<const std::uint8_t> lStatuses = lInput.take(lInput.takeByte());
     ZTCFuzzAgent lAgent(lAdapters, lLogCode);
     lAgent.getLibrary().mpStatuses = lStatuses.data();
     lAgent.getLibrary().mStatusCount = static_cast<std::uint32_t>(lStatuses.size());
     while (!lInput.isAtEnd()) {
-        lAgent.getLibrary().mAdapters = lInput.takeByte() % (gcMaxAdapters + 2);
+        lAgent.getLibrary().mAdapters = lInput.takeByte() % (scMaxAdapters + 2);
         const std::span<const std::uint8_t> lBytes = lInput.take(lInput.takeShort());
         std::vector<std::uint8_t> lBody(lBytes.begin(), lBytes.end());
         if (lBody.empty()) {
             continue;  // no frame has an empty body
         }
-        lBody[0] = static_cast<std::uint8_t>(lBody[0] % gcCommands);
+        lBody[0] = static_cast<std::uint8_t>(lBody[0] % scCommands);
         const std::optional<ZTSResponse> lResponse = lAgent.request(lBody);
         if (!lResponse) {
             break;

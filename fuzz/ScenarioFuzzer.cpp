@@ -12,8 +12,8 @@
 #include "libkpm/sim/src/Scenario.h"
 #include "libkpm/sim/src/ScenarioFile.h"
 
-static constexpr std::size_t gcPlayedLines = 16;
-static constexpr std::uint64_t gcPlayedOccurrences = 4;
+static constexpr std::size_t scPlayedLines = 16;
+static constexpr std::uint64_t scPlayedOccurrences = 4;
 
 static std::uint64_t sCallbacks = 0;
 static std::uint64_t sSum = 0;  // of all bytes that the callbacks were lent, so that each is read
@@ -111,19 +111,19 @@ static void sPlay(const ZTSSimScenario& acrScenario) {
     sRegisterAll(lEngine);
     sCallbacks = 0;
     std::uint64_t lDelivered = 0;
-    for (std::size_t lLine = 0; lLine < std::min(acrScenario.mEvents.size(), gcPlayedLines); ++lLine) {
+    for (std::size_t lLine = 0; lLine < std::min(acrScenario.mEvents.size(), scPlayedLines); ++lLine) {
         ZTSSimEvent lEvent = acrScenario.mEvents[lLine];
         const auto lLast = static_cast<std::uint32_t>(acrScenario.mAdapters.size() - 1);
         for (const std::uint64_t lOccurrence : {std::uint64_t{0}, std::uint64_t{1}, gcSimMaxTimes}) {
             sCheckDelivery(acrScenario, lEvent, lLast, lOccurrence);
         }
-        lEvent.mTimes = lEvent.mTimes == 0 ? gcPlayedOccurrences : std::min(lEvent.mTimes, gcPlayedOccurrences);
+        lEvent.mTimes = lEvent.mTimes == 0 ? scPlayedOccurrences : std::min(lEvent.mTimes, scPlayedOccurrences);
         lEvent.mThreads = 1;
         lDelivered += lEngine.inject(lEvent);
     }
-    for (std::size_t lLine = 0; lLine < std::min(acrScenario.mStorms.size(), gcPlayedLines); ++lLine) {
+    for (std::size_t lLine = 0; lLine < std::min(acrScenario.mStorms.size(), scPlayedLines); ++lLine) {
         ZTSSimStorm lStorm = acrScenario.mStorms[lLine];
-        lStorm.mCount = std::min(lStorm.mCount, gcPlayedOccurrences);
+        lStorm.mCount = std::min(lStorm.mCount, scPlayedOccurrences);
         lStorm.mThreads = 1;
         lDelivered += lEngine.inject(lStorm);
     }

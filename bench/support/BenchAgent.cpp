@@ -21,7 +21,7 @@
 
 namespace {
 
-constexpr unsigned gcRecordLimit = 4096;
+constexpr unsigned scRecordLimit = 4096;
 
 void sAppend32(std::vector<unsigned char>& arBytes, unsigned aValue) {
     for (int lShift = 24; lShift >= 0; lShift -= 8) {
@@ -98,7 +98,7 @@ ZTCBenchAgent::ZTCBenchAgent(unsigned aBoards, unsigned aTargets, bool aHasStatu
     setLogCode(gcQuietLogCode);
     mpSystem->init();
     std::vector<unsigned char> lStart{0};
-    sAppend32(lStart, gcRecordLimit);
+    sAppend32(lStart, scRecordLimit);
     request(lStart);
     if (aTargets != 0) {
         request(makeRegisterTargets(aTargets));

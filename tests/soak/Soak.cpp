@@ -17,18 +17,18 @@
 
 namespace {
 
-constexpr unsigned gcBoards = 3;
-constexpr double gcLeastSeconds = 10;
+constexpr unsigned scBoards = 3;
+constexpr double scLeastSeconds = 10;
 
 double sSecondsSince(std::chrono::steady_clock::time_point aBegin) {
     return std::chrono::duration<double>(std::chrono::steady_clock::now() - aBegin).count();
 }
 
 int sSoak(double aSeconds) {
-    ZTCAgentProcess lAgent(gcBoards);
+    ZTCAgentProcess lAgent(scBoards);
     const ZTCFaultInjection lBlocks(lAgent);  // it counts them
     lAgent.startAndConnectQuietly(63, {"-b", "2"});
-    ZTCSoakLoad lLoad(lAgent, gcBoards);
+    ZTCSoakLoad lLoad(lAgent, scBoards);
 
     const std::vector<std::string> lFiles = {lAgent.agentLogPath(), lAgent.agentLogPath() + ".1",
                                              lAgent.defaultLogPath(), lAgent.pidFilePath()};
@@ -75,8 +75,8 @@ int sSoak(double aSeconds) {
 int main(int argc, char** argv) {
     testing::InitGoogleTest(&argc, argv);
     const double lSeconds = argc == 2 ? std::atof(argv[1]) : 0;
-    if (lSeconds < gcLeastSeconds) {
-        std::fprintf(stderr, "Usage: soak SECONDS, %.0f at least\n", gcLeastSeconds);
+    if (lSeconds < scLeastSeconds) {
+        std::fprintf(stderr, "Usage: soak SECONDS, %.0f at least\n", scLeastSeconds);
         return 2;
     }
     try {

@@ -10,11 +10,11 @@
 namespace {
 
 // Two files, each up to its bound, and the FIFOs and pid files beside them.
-constexpr std::int64_t gcMostDisk = 2 * 64 * 1024 + 64;
+constexpr std::int64_t scMostDisk = 2 * 64 * 1024 + 64;
 
 // What the allocator may come to keep when threads meet in new ways; a leak passes it in the course of a long run, and
 // the blocks tell of it in a short one.
-constexpr std::int64_t gcMostMemoryGrowth = 2048;
+constexpr std::int64_t scMostMemoryGrowth = 2048;
 
 std::int64_t sNumberOfEntries(const std::string& acrDirectory) {
     const std::filesystem::directory_iterator lAll(acrDirectory);
@@ -75,7 +75,7 @@ std::vector<ZTSSoakVerdict> judgeSoak(const std::vector<ZTSSoakFigures>& acrFigu
         const auto lMedian = [](const std::vector<std::int64_t>& acrValues) { return acrValues[acrValues.size() / 2]; };
         const std::int64_t lBegin = lMedian(lOver(1, apFigure));
         return ZTSSoakVerdict{apName, lBegin, lMedian(lOver(2, apFigure)), lMedian(lOver(3, apFigure)),
-                              lBegin + std::max(gcMostMemoryGrowth, lBegin / 10)};
+                              lBegin + std::max(scMostMemoryGrowth, lBegin / 10)};
     };
     // Of these the agent has a number of its own when it has nothing to do: the least of them that was ever seen.
     const auto lLeasts = [&](const char* apName, std::int64_t ZTSSoakFigures::*apFigure, std::int64_t aMargin) {
@@ -84,7 +84,7 @@ std::vector<ZTSSoakVerdict> judgeSoak(const std::vector<ZTSSoakFigures>& acrFigu
     };
     const ZTSSoakVerdict lDisk{"disk, KiB", lOver(1, &ZTSSoakFigures::mDisk).back(),
                                lOver(2, &ZTSSoakFigures::mDisk).back(), lOver(3, &ZTSSoakFigures::mDisk).back(),
-                               gcMostDisk};
+                               scMostDisk};
     return {lMedians("RSS, KiB", &ZTSSoakFigures::mRss),
             lMedians("PSS, KiB", &ZTSSoakFigures::mPss),
             lLeasts("blocks of memory", &ZTSSoakFigures::mBlocks, 0),

@@ -7,13 +7,13 @@
 
 #include "tests/support/AgentProcess.h"
 
-static constexpr const char* gcBegin = "The sensor directory '";
+static constexpr const char* scBegin = "The sensor directory '";
 
 /// The warnings about its directory of an agent that has started and ended, at the log levels of a start without -d.
 static std::vector<ZTSLogLine> sWarnings(ZTCAgentProcess& arAgent) {
     arAgent.startAndConnectQuietly(63);
     EXPECT_EQ(arAgent.stop(), 0);
-    return arAgent.log().containing(gcBegin);
+    return arAgent.log().containing(scBegin);
 }
 
 TEST(SensorDirectory, OneThatItsGroupOrEverybodyMayWriteInDrawsOneWarningWithTheRemedy) {
@@ -61,7 +61,7 @@ TEST(SensorDirectory, TheWarningStandsBehindTheInstanceCheckAndInFrontOfTheFifos
     ZTCAgentProcess lAgent;
     ASSERT_EQ(chmod(lAgent.sensorDirectory().c_str(), 0777), 0);
     lAgent.startAndConnect();
-    const std::string lText = lAgent.log().containing(gcBegin).at(0).mText;
+    const std::string lText = lAgent.log().containing(scBegin).at(0).mText;
     const auto lWarning = lAgent.log().find(lText);
     const auto lFifo = lAgent.log().find("Creating Tavik Command Reader IPC...");
     ASSERT_TRUE(lWarning && lFifo);
@@ -69,6 +69,6 @@ TEST(SensorDirectory, TheWarningStandsBehindTheInstanceCheckAndInFrontOfTheFifos
     // A second start ends at the instance check, and says nothing of the directory.
     const std::string lSecondLog = lAgent.workingDirectory() + "/second.log";
     EXPECT_EQ(lAgent.run({"-D", "false", "-d", "255", "-l", lSecondLog}).mStatus, 0);
-    EXPECT_TRUE(ZTCAgentLog(lSecondLog).containing(gcBegin).empty());
-    EXPECT_EQ(lAgent.log().containing(gcBegin).size(), 1u);
+    EXPECT_TRUE(ZTCAgentLog(lSecondLog).containing(scBegin).empty());
+    EXPECT_EQ(lAgent.log().containing(scBegin).size(), 1u);
 }

@@ -21,8 +21,8 @@
 #include "libkpm/sim/src/Report.h"
 #include "libkpm/sim/src/Scenario.h"
 
-static constexpr std::size_t gcMaxClients = 32;
-static constexpr int gcAcceptPause = 100;  // ms that a client waits while the process has no descriptor left
+static constexpr std::size_t scMaxClients = 32;
+static constexpr int scAcceptPause = 100;  // ms that a client waits while the process has no descriptor left
 
 [[noreturn]] static void sRefuse(const std::string& acrPath, const std::string& acrReason) {
     throw std::runtime_error(acrPath + ": " + acrReason);
@@ -118,7 +118,7 @@ void ZTCSimControlSocket::listenOn(const sockaddr_un& acrAddress) {
     if (!S_ISSOCK(mIdentity.st_mode)) {
         sRefuse(mPath, "was replaced by something that is not a socket");
     }
-    if (::listen(mListener.get(), static_cast<int>(gcMaxClients)) != 0) {
+    if (::listen(mListener.get(), static_cast<int>(scMaxClients)) != 0) {
         const int lError = errno;
         ::unlink(mPath.c_str());
         sRefuse(mPath, "listen", lError);
@@ -130,7 +130,7 @@ void ZTCSimControlSocket::serve() {
         bool lIsPaused = false;
         while (true) {
             std::vector<pollfd> lPolled{{mQuit.get(), POLLIN, 0}};
-            const bool lAccepts = mClients.size() < gcMaxClients && !lIsPaused;
+            const bool lAccepts = mClients.size() < scMaxClients && !lIsPaused;
             lPolled.push_back({lAccepts ? mListener.get() : -1, POLLIN, 0});
             for (const Client& lrClient : mClients) {
                 // A client with an answer on its way is not heard before it has read it.
@@ -138,7 +138,7 @@ void ZTCSimControlSocket::serve() {
                 lPolled.push_back({lrClient.mSocket.get(), lEvents, 0});
             }
             const int lReady =
-                ::poll(lPolled.data(), static_cast<nfds_t>(lPolled.size()), lIsPaused ? gcAcceptPause : -1);
+                ::poll(lPolled.data(), static_cast<nfds_t>(lPolled.size()), lIsPaused ? scAcceptPause : -1);
             lIsPaused = false;
             if (lReady < 0) {
                 if (errno == EINTR) {

@@ -5,7 +5,7 @@
 
 #include "libkpm/include/libkpm.h"
 
-static constexpr std::uint32_t gcAllLuns = 0xFFFFFFFFu;
+static constexpr std::uint32_t scAllLuns = 0xFFFFFFFFu;
 
 static constexpr ZTSSimField sVersion(std::size_t aOffset) {
     return {"version", ZTSFF_Number,         static_cast<std::uint16_t>(aOffset), 4, ZTSDF_Constant, 0,
@@ -19,7 +19,7 @@ static constexpr ZTSSimField sNumber(const char* apName, std::size_t aOffset, st
 }
 
 static constexpr ZTSSimField sLun(std::size_t aOffset) {
-    return {"lun", ZTSFF_Number, static_cast<std::uint16_t>(aOffset), 4, ZTSDF_Lun, 0, gcAllLuns, "LUN, or all"};
+    return {"lun", ZTSFF_Number, static_cast<std::uint16_t>(aOffset), 4, ZTSDF_Lun, 0, scAllLuns, "LUN, or all"};
 }
 
 static constexpr ZTSSimField sName(const char* apName, std::size_t aOffset, ZTESimDefault aDefault,
@@ -54,7 +54,7 @@ static constexpr ZTSSimField gcAdisc[] = {
     sName("nodename", offsetof(zt_adisc_rcv_v0, zt_adiscr_nodename), ZTSDF_RemoteNode, "remote port's node name"),
 };
 
-static constexpr ZTSSimField gcLsrjt[] = {
+static constexpr ZTSSimField scLsrjt[] = {
     sVersion(offsetof(zt_lsrjt_rcv_v0, zt_lsrjtr_version)),
     sName("remoteport", offsetof(zt_lsrjt_rcv_v0, zt_lsrjtr_remoteport), ZTSDF_RemotePort, "remote port's name"),
     sNumber("command", offsetof(zt_lsrjt_rcv_v0, zt_lsrjtr_original_cmd), 0x03, 3, "ELS command that was rejected"),
@@ -74,7 +74,7 @@ static constexpr ZTSSimField gcPortBusy[] = {
     sName("remoteport", offsetof(zt_pbsy_rcv_v0, zt_pbsyr_rport), ZTSDF_RemotePort, "remote port's name"),
 };
 
-static constexpr ZTSSimField gcFcpReadCheck[] = {
+static constexpr ZTSSimField scFcpReadCheck[] = {
     sVersion(offsetof(zt_fcprdchkerr_v0, zt_fcprdchkerr_version)),
     sName("remoteport", offsetof(zt_fcprdchkerr_v0, zt_fcprdchkerr_rport), ZTSDF_RemotePort, "remote port's name"),
     sLun(offsetof(zt_fcprdchkerr_v0, zt_fcprdchkerr_lun)),
@@ -82,7 +82,7 @@ static constexpr ZTSSimField gcFcpReadCheck[] = {
     sNumber("parameter", offsetof(zt_fcprdchkerr_v0, zt_fcprdchkerr_fcpiparam), 0, 65535, "FCP parameter word"),
 };
 
-static constexpr ZTSSimField gcScsiGeneric[] = {
+static constexpr ZTSSimField scScsiGeneric[] = {
     sVersion(offsetof(ZT_scsi_generic_v0, zt_scsi_generic_version)),
     sName("remoteport", offsetof(ZT_scsi_generic_v0, zt_scsi_generic_rport), ZTSDF_RemotePort, "remote port's name"),
     sLun(offsetof(ZT_scsi_generic_v0, zt_scsi_generic_lun)),
@@ -130,37 +130,37 @@ static constexpr ZTSSimField gcLink[] = {
     sName("wwnn", offsetof(LINKINFO, a_wwnName), ZTSDF_LocalNode, "local port's node name"),
 };
 
-static constexpr ZTSSimField gcTemperature[] = {
+static constexpr ZTSSimField scTemperature[] = {
     sNumber("first", 0, 0, 100, "first value handed to the callback"),
     sNumber("second", 4, 0, 100, "second value"),
 };
 
-static constexpr std::array<ZTSSimKind, gcSimKindCount> gcSimKinds{{
+static constexpr std::array<ZTSSimKind, gcSimKindCount> scSimKinds{{
     {"plogi", ZTSD_Scope, gcPlogi},
     {"prlo", ZTSD_Scope, gcPrlo},
     {"adisc", ZTSD_Scope, gcAdisc},
-    {"lsrjt", ZTSD_Scope, gcLsrjt},
+    {"lsrjt", ZTSD_Scope, scLsrjt},
     {"logo", ZTSD_Scope, gcLogo},
     {"rscn", ZTSD_Rscn, gcRscn},
     {"fabric-busy", ZTSD_Scope, {}},
     {"port-busy", ZTSD_Scope, gcPortBusy},
-    {"fcp-read-check", ZTSD_Scope, gcFcpReadCheck},
-    {"queue-full", ZTSD_Scope, gcScsiGeneric},
-    {"device-busy", ZTSD_Scope, gcScsiGeneric},
+    {"fcp-read-check", ZTSD_Scope, scFcpReadCheck},
+    {"queue-full", ZTSD_Scope, scScsiGeneric},
+    {"device-busy", ZTSD_Scope, scScsiGeneric},
     {"check-condition", ZTSD_Scope, gcCheckCondition},
-    {"lun-reset", ZTSD_Scope, gcScsiGeneric},
-    {"target-reset", ZTSD_Scope, gcScsiGeneric},
+    {"lun-reset", ZTSD_Scope, scScsiGeneric},
+    {"target-reset", ZTSD_Scope, scScsiGeneric},
     {"bus-reset", ZTSD_Scope, {}},
     {"queue-depth", ZTSD_Scope, gcQueueDepth},
     {"port-interrupt", ZTSD_Scope, {}},
     {"link", ZTSD_Link, gcLink},
-    {"temperature", ZTSD_Temperature, gcTemperature},
+    {"temperature", ZTSD_Temperature, scTemperature},
     {"adapter-arrival", ZTSD_Scope, {}},
 }};
 
 static constexpr bool sIsInCatalogueOrder() {
     for (std::size_t lKind = 0; lKind < gcSimKindCount; ++lKind) {
-        if (std::string_view(gcSimKinds[lKind].mpName) != gcScopeEventKinds[lKind].mpName) {
+        if (std::string_view(scSimKinds[lKind].mpName) != gcScopeEventKinds[lKind].mpName) {
             return false;
         }
     }
@@ -168,7 +168,7 @@ static constexpr bool sIsInCatalogueOrder() {
 }
 
 static constexpr bool sHasOnlyNumbersOfAtMostFourBytes() {
-    for (const ZTSSimKind& lrKind : gcSimKinds) {
+    for (const ZTSSimKind& lrKind : scSimKinds) {
         for (const ZTSSimField& lrField : lrKind.mFields) {
             if ((lrField.mForm == ZTSFF_Number || lrField.mForm == ZTSFF_BigEndian) && lrField.mWidth > 4) {
                 return false;
@@ -180,7 +180,7 @@ static constexpr bool sHasOnlyNumbersOfAtMostFourBytes() {
 
 static constexpr bool sHasEveryFieldInsideItsData() {
     for (std::size_t lKind = 0; lKind < gcSimKindCount; ++lKind) {
-        for (const ZTSSimField& lrField : gcSimKinds[lKind].mFields) {
+        for (const ZTSSimField& lrField : scSimKinds[lKind].mFields) {
             if (lrField.mOffset + lrField.mWidth > gcScopeEventKinds[lKind].mDataSize) {
                 return false;
             }
@@ -195,7 +195,7 @@ static_assert(sHasOnlyNumbersOfAtMostFourBytes());
 static_assert(sizeof(LINKINFO) == 168 && offsetof(LINKINFO, a_wwpName) == 152);
 
 const ZTSSimKind& getSimKind(std::size_t aKind) {
-    return gcSimKinds.at(aKind);
+    return scSimKinds.at(aKind);
 }
 
 void storeSimNumber(const ZTSSimField& acrField, std::uint32_t aNumber, std::uint8_t* apPlace) {

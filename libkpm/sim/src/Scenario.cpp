@@ -119,7 +119,7 @@ struct ZTSSimDirective {
     void (*mpParse)(ZTCSimLine& arLine, ZTSSimScenario& arScenario);
 };
 
-static constexpr std::array<ZTSSimDirective, 10> gcDirectives{{
+static constexpr std::array<ZTSSimDirective, 10> scDirectives{{
     {"adapter", sParseAdapter},
     {"port", sParseRemotePort},
     {"count", sParseCount},
@@ -133,9 +133,9 @@ static constexpr std::array<ZTSSimDirective, 10> gcDirectives{{
 }};
 
 static const ZTSSimDirective* sFindDirective(std::string_view aName) {
-    const auto lFound = std::find_if(gcDirectives.begin(), gcDirectives.end(),
+    const auto lFound = std::find_if(scDirectives.begin(), scDirectives.end(),
                                      [&](const ZTSSimDirective& acrDirective) { return acrDirective.mName == aName; });
-    return lFound == gcDirectives.end() ? nullptr : &*lFound;
+    return lFound == scDirectives.end() ? nullptr : &*lFound;
 }
 
 static std::optional<ZTSSimEventLine> sParseEventLine(ZTCSimLine& arLine, const ZTSSimScenario& acrScenario) {

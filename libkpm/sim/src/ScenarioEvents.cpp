@@ -7,7 +7,7 @@
 
 #include "libkpm/sim/src/ScenarioFields.h"
 
-static constexpr std::size_t gcSimMaxPages = 16382;  // the length field of an RSCN holds no more
+static constexpr std::size_t scSimMaxPages = 16382;  // the length field of an RSCN holds no more
 
 static std::vector<std::uint8_t> sStoredNumber(const ZTSSimField& acrField, std::uint32_t aNumber) {
     std::vector<std::uint8_t> lBytes(acrField.mWidth);
@@ -104,8 +104,8 @@ static void sParseOverrides(ZTCSimLine& arLine, const ZTSSimScenario& acrScenari
             }
             forEachSimPart("pages", *lText, [&](std::string_view aPart) {
                 arEvent.mPages->push_back(sPage(aPart, acrScenario));
-                if (arEvent.mPages->size() > gcSimMaxPages) {
-                    refuseSim("pages= lists more than " + std::to_string(gcSimMaxPages) + " pages");
+                if (arEvent.mPages->size() > scSimMaxPages) {
+                    refuseSim("pages= lists more than " + std::to_string(scSimMaxPages) + " pages");
                 }
             });
         }

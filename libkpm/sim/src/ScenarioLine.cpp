@@ -2,11 +2,11 @@
 
 #include "libkpm/sim/src/Scenario.h"
 
-static constexpr std::size_t gcMaxNamedWord = 40;
+static constexpr std::size_t scMaxNamedWord = 40;
 
 std::string showSimWord(std::string_view aWord) {
     std::string lText;
-    for (const char lChar : aWord.substr(0, gcMaxNamedWord)) {
+    for (const char lChar : aWord.substr(0, scMaxNamedWord)) {
         const auto lByte = static_cast<unsigned char>(lChar);
         if (lByte < 0x20 || lByte == 0x7F) {
             static constexpr char scDigits[] = "0123456789abcdef";
@@ -17,7 +17,7 @@ std::string showSimWord(std::string_view aWord) {
             lText += lChar;
         }
     }
-    return aWord.size() > gcMaxNamedWord ? lText + "..." : lText;
+    return aWord.size() > scMaxNamedWord ? lText + "..." : lText;
 }
 
 std::string quoteSimWord(std::string_view aWord) {

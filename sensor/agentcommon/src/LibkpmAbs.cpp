@@ -8,25 +8,26 @@
 
 #include "common/include/Log.h"
 #include "common/include/Memory.h"
+#include "common/include/ThrowWith.h"
 #include "os/common/include/Clib.h"
 
 namespace {
 
-constexpr unsigned gcReasonSize = 512;
+constexpr unsigned scReasonSize = 512;
 
 /// Why this table of functions cannot be used, written to apReason; false where it can.
 bool sIsRefused(const KPM_FunctionList* apFunctions, char* apReason) {
     if (apFunctions == nullptr) {
-        std::snprintf(apReason, gcReasonSize, "it gave no table of functions");
+        std::snprintf(apReason, scReasonSize, "it gave no table of functions");
         return true;
     }
     if (apFunctions->version != KPM_INTERFACE_VERSION) {
-        std::snprintf(apReason, gcReasonSize, "its table of functions has version %u, wanted %u", apFunctions->version,
+        std::snprintf(apReason, scReasonSize, "its table of functions has version %u, wanted %u", apFunctions->version,
                       KPM_INTERFACE_VERSION);
         return true;
     }
     if (apFunctions->size < KPM_FUNCTION_LIST_SIZE_V1) {
-        std::snprintf(apReason, gcReasonSize, "its table of functions has %u bytes, wanted at least %u",
+        std::snprintf(apReason, scReasonSize, "its table of functions has %u bytes, wanted at least %u",
                       apFunctions->size, KPM_FUNCTION_LIST_SIZE_V1);
         return true;
     }
@@ -34,7 +35,7 @@ bool sIsRefused(const KPM_FunctionList* apFunctions, char* apReason) {
         apFunctions->IsZtapiSupported == nullptr || apFunctions->GetAdapterInfo == nullptr ||
         apFunctions->ZtapiRegEvent == nullptr || apFunctions->ZtapiUnregEvent == nullptr ||
         apFunctions->KpmRegEvent == nullptr || apFunctions->KpmUnregEvent == nullptr) {
-        std::snprintf(apReason, gcReasonSize, "its table of functions has an empty entry");
+        std::snprintf(apReason, scReasonSize, "its table of functions has an empty entry");
         return true;
     }
     return false;
@@ -97,7 +98,7 @@ void ZTCLibkpmAbs::LIBKPM_LoadLibrary(ZTCLibkpmReports* apReports) {
         throw ZTCNotFoundEx("Libkpm cannot be loaded");
     }
 
-    char lReason[gcReasonSize];
+    char lReason[scReasonSize];
     bool lRefused = true;
     const KPM_FunctionList* lpFunctions = nullptr;
     const auto lpGetFunctionList = reinterpret_cast<KPM_GetFunctionListType>(dlsym(lpHandle, "KPM_GetFunctionList"));
@@ -136,9 +137,7 @@ void ZTCLibkpmAbs::LIBKPM_FreeLibrary() {
 
 void ZTCLibkpmAbs::LIBKPM_Init() {
     if (const uint32_t lStatus = getFunctions().Init(); lStatus != 0) {
-        char lText[gcReasonSize];
-        std::snprintf(lText, sizeof lText, "LIBKPM_Init failed with status %u", lStatus);
-        throw ZTCLibkpmFailedEx(lText);
+        throwWith<ZTCLibkpmFailedEx>("LIBKPM_Init failed with status %u", lStatus);
     }
 }
 
@@ -159,10 +158,7 @@ void ZTCLibkpmAbs::LIBKPM_GetAdapterInfo(unsigned int aIndex, ZTCPointer<ZTCWorl
     HBA_wwn lNodeName{};
     HBA_wwn lPortName{};
     if (const uint32_t lStatus = getFunctions().GetAdapterInfo(aIndex, &lNodeName, &lPortName); lStatus != 0) {
-        char lText[gcReasonSize];
-        std::snprintf(lText, sizeof lText, "LIBKPM_GetAdapterInfo failed for adapter %u with status %u", aIndex,
-                      lStatus);
-        throw ZTCLibkpmFailedEx(lText);
+        throwWith<ZTCLibkpmFailedEx>("LIBKPM_GetAdapterInfo failed for adapter %u with status %u", aIndex, lStatus);
     }
     arWwnn = ZTCPointer<ZTCWorldWideName>(NEW ZTCWorldWideName(lNodeName.wwn));
     arWwpn = ZTCPointer<ZTCWorldWideName>(NEW ZTCWorldWideName(lPortName.wwn));

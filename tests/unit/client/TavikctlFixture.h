@@ -22,7 +22,7 @@ inline const char* const gcTarget = "50:06:01:60:bb:a0:12:34,50:06:01:60:3b:a0:1
 /// One run of the tool in a directory of its own.
 class ZTCTavikctlFixture : public testing::Test {
 protected:
-    struct ZTSRun {
+    struct ZTSFinishedRun {
         int mStatus;
         std::string mOutput;
         std::string mErrors;
@@ -38,14 +38,14 @@ protected:
                 .mOutputPrefix = mOther.path("run" + std::to_string(++mRuns))};
     }
 
-    ZTSRun run(const std::vector<std::string>& acrArguments) {
+    ZTSFinishedRun run(const std::vector<std::string>& acrArguments) {
         ZTCChildProcess lProcess(setup(acrArguments));
         const int lStatus = lProcess.waitForExit();
         return {lStatus, lProcess.standardOutput(), lProcess.standardError()};
     }
 
     /// The tool behind a shell, for what only a shell can do to its standard streams.
-    ZTSRun runShell(const std::string& acrScript) {
+    ZTSFinishedRun runShell(const std::string& acrScript) {
         ZTSChildProcessSetup lSetup = setup({"-c", acrScript, TAVIKCTL_PROGRAM});
         lSetup.mProgram = "/bin/sh";
         lSetup.mEnvironment["PATH"] = "/usr/bin:/bin";

@@ -20,7 +20,7 @@ TEST_F(Tavikctl, EachCommandSendsItsRequestAndEndsWith0) {
         {{"shutdown"}, bytesOf("04")},
     };
     for (const auto& [lArguments, lRequest] : lCommands) {
-        const ZTSRun lRun = run(lArguments);
+        const ZTSFinishedRun lRun = run(lArguments);
         EXPECT_EQ(lRun.mStatus, 0) << lRun.mErrors;
         EXPECT_EQ(lRun.mOutput, lArguments[0] + ": done\n");
         EXPECT_EQ(lRun.mErrors, "");
@@ -30,14 +30,14 @@ TEST_F(Tavikctl, EachCommandSendsItsRequestAndEndsWith0) {
 
 TEST_F(Tavikctl, ARefusalEndsWith1AndNamesTheStatus) {
     const ZTCFakeAgent lAgent(dir(), {ZTCFakeAgent::answering(gcInvalid)});
-    const ZTSRun lRun = run({"period", "0"});
+    const ZTSFinishedRun lRun = run({"period", "0"});
     EXPECT_EQ(lRun.mStatus, 1);
     EXPECT_EQ(lRun.mOutput, "");
     expectOneLine(lRun.mErrors);
     EXPECT_THAT(lRun.mErrors,
                 AllOf(HasSubstr("refused period"), HasSubstr("status 6 ZTSAPS_Invalid"), HasSubstr(dir())));
 
-    const ZTSRun lJsonRun = run({"--json", "period", "0"});
+    const ZTSFinishedRun lJsonRun = run({"--json", "period", "0"});
     EXPECT_EQ(lJsonRun.mStatus, 1);
     EXPECT_EQ(parseJson(lJsonRun.mOutput), parseJson(R"({"command":"period","outcome":"failed","lateAnswers":[],
                                                   "status":{"code":6,"name":"ZTSAPS_Invalid"}})"));
@@ -66,7 +66,7 @@ TEST_F(Tavikctl, WrongUseEndsWith2AndSendsNothing) {
     };
     for (const std::vector<std::string>& lrLine : lLines) {
         SCOPED_TRACE(testing::PrintToString(lrLine));
-        const ZTSRun lRun = run(lrLine);
+        const ZTSFinishedRun lRun = run(lrLine);
         EXPECT_EQ(lRun.mStatus, 2);
         EXPECT_EQ(lRun.mOutput, "");
         expectOneLine(lRun.mErrors);
@@ -87,7 +87,7 @@ TEST_F(Tavikctl, WhereNobodyHoldsThePidFileItAnswersAtOnceAndSaysWhatToDo) {
     for (const std::vector<std::string>& lrCommand : lCommands) {
         std::vector<std::string> lArguments = lrCommand;
         lArguments.insert(lArguments.end(), {"--timeout", "3600"});
-        const ZTSRun lRun = run(lArguments);  // waiting out the time limit would fail the test
+        const ZTSFinishedRun lRun = run(lArguments);  // waiting out the time limit would fail the test
         EXPECT_EQ(lRun.mStatus, 3);
         EXPECT_EQ(lRun.mOutput, "");
         expectOneLine(lRun.mErrors);
@@ -97,7 +97,7 @@ TEST_F(Tavikctl, WhereNobodyHoldsThePidFileItAnswersAtOnceAndSaysWhatToDo) {
 }
 
 TEST_F(Tavikctl, ToldToWaitItWaitsForAnAgentUntilTheTimeLimit) {
-    const ZTSRun lRun = run({"--timeout", "0.05", "get", "--wait"});
+    const ZTSFinishedRun lRun = run({"--timeout", "0.05", "get", "--wait"});
     EXPECT_EQ(lRun.mStatus, 3);
     EXPECT_EQ(lRun.mOutput, "");
     expectOneLine(lRun.mErrors);
@@ -112,7 +112,7 @@ TEST_F(Tavikctl, ToldToWaitItWaitsForAnAgentUntilTheTimeLimit) {
 
 TEST_F(Tavikctl, NoAnswerInTimeEndsWith3) {
     const ZTCFakeAgent lAgent(dir(), {ZTCFakeAgent::silent()});
-    const ZTSRun lRun = run({"stop", "--timeout", "0.3"});
+    const ZTSFinishedRun lRun = run({"stop", "--timeout", "0.3"});
     EXPECT_EQ(lRun.mStatus, 3);
     expectOneLine(lRun.mErrors);
 }
@@ -120,7 +120,7 @@ TEST_F(Tavikctl, NoAnswerInTimeEndsWith3) {
 TEST_F(Tavikctl, AnAnswerThatIsNoneEndsWith3) {
     const ZTCFakeAgent lAgent(dir(), {ZTCFakeAgent::answering({77, 1})});
     for (const char* lpCommand : {"get", "stop"}) {
-        const ZTSRun lRun = run({lpCommand});
+        const ZTSFinishedRun lRun = run({lpCommand});
         EXPECT_EQ(lRun.mStatus, 3);
         EXPECT_THAT(lRun.mErrors, AllOf(HasSubstr("outcome 77"), HasSubstr("offset 0")));
     }
@@ -128,7 +128,7 @@ TEST_F(Tavikctl, AnAnswerThatIsNoneEndsWith3) {
 
 TEST_F(Tavikctl, GetPrintsATableForPeople) {
     const ZTCFakeAgent lAgent(dir(), {ZTCFakeAgent::answering(makeFullSampleResponse())});
-    const ZTSRun lRun = run({"get"});
+    const ZTSFinishedRun lRun = run({"get"});
     EXPECT_EQ(lRun.mStatus, 0) << lRun.mErrors;
     EXPECT_THAT(lRun.mOutput, StartsWith("INITIATOR "));
     for (const ZTSSampleKind& lrKind : makeSampleKinds()) {
@@ -139,7 +139,7 @@ TEST_F(Tavikctl, GetPrintsATableForPeople) {
 
 TEST_F(Tavikctl, GetPrintsJsonForPrograms) {
     const ZTCFakeAgent lAgent(dir(), {ZTCFakeAgent::answering(makeFullSampleResponse())});
-    const ZTSRun lRun = run({"get", "--json"});
+    const ZTSFinishedRun lRun = run({"get", "--json"});
     EXPECT_EQ(lRun.mStatus, 0) << lRun.mErrors;
     const nlohmann::json lDocument = parseJson(lRun.mOutput);
     EXPECT_EQ(lDocument["command"], "get");
@@ -153,7 +153,7 @@ TEST_F(Tavikctl, GetPrintsWhatStandsInFrontOfAProblem) {
     ZTCBytes lCut = makeFullSampleResponse();
     lCut.resize(lCut.size() - 20);
     const ZTCFakeAgent lAgent(dir(), {ZTCFakeAgent::answering(lCut)});
-    const ZTSRun lRun = run({"get", "--json"});
+    const ZTSFinishedRun lRun = run({"get", "--json"});
     EXPECT_EQ(lRun.mStatus, 3);
     expectOneLine(lRun.mErrors);
     const nlohmann::json lDocument = parseJson(lRun.mOutput);
@@ -163,7 +163,7 @@ TEST_F(Tavikctl, GetPrintsWhatStandsInFrontOfAProblem) {
 
 TEST_F(Tavikctl, GetSaysThatListsAreMissing) {
     const ZTCFakeAgent lAgent(dir(), {ZTCFakeAgent::answering(makeSampleResponse(2, {makeSampleList("k", {})}))});
-    const ZTSRun lRun = run({"get"});
+    const ZTSFinishedRun lRun = run({"get"});
     EXPECT_EQ(lRun.mStatus, 0);
     EXPECT_THAT(lRun.mErrors, HasSubstr("announced 2 lists and sent 1"));
 }
@@ -171,11 +171,11 @@ TEST_F(Tavikctl, GetSaysThatListsAreMissing) {
 TEST_F(Tavikctl, GetSavesTheBytesAndDecodeReadsThem) {
     const ZTCFakeAgent lAgent(dir(), {ZTCFakeAgent::answering(makeFullSampleResponse())});
     const std::string lRaw = mOther.path("answer.bin");
-    const ZTSRun lRun = run({"get", "--raw", lRaw});
+    const ZTSFinishedRun lRun = run({"get", "--raw", lRaw});
     EXPECT_EQ(lRun.mStatus, 0) << lRun.mErrors;
     const ZTCBytes lBytes = makeFullSampleResponse();
     EXPECT_EQ(readFile(lRaw), std::string(lBytes.begin(), lBytes.end()));
-    const ZTSRun lDecoded = run({"decode", lRaw});
+    const ZTSFinishedRun lDecoded = run({"decode", lRaw});
     EXPECT_EQ(lDecoded.mStatus, 0) << lDecoded.mErrors;
     EXPECT_EQ(lDecoded.mOutput, lRun.mOutput);
 }
@@ -201,7 +201,7 @@ TEST_F(Tavikctl, MessagesNeverGoIntoAFileThatWasOpenedInPlaceOfAClosedStream) {
 
 TEST_F(Tavikctl, GetAsksNothingWhereTheRawFileCannotBeOpened) {
     const ZTCFakeAgent lAgent(dir(), {ZTCFakeAgent::answering(makeFullSampleResponse())});
-    const ZTSRun lRun = run({"get", "--raw", mOther.path("missing/file")});
+    const ZTSFinishedRun lRun = run({"get", "--raw", mOther.path("missing/file")});
     EXPECT_EQ(lRun.mStatus, 4);
     expectOneLine(lRun.mErrors);
     EXPECT_TRUE(lAgent.getRequests().empty());
@@ -215,14 +215,14 @@ TEST_F(Tavikctl, GetWithoutAnAgentLeavesTheRawFileAsItWas) {
 
 TEST_F(Tavikctl, RecordsThatCannotBePrintedAreReported) {
     const ZTCFakeAgent lAgent(dir(), {ZTCFakeAgent::answering(makeFullSampleResponse())});
-    const ZTSRun lFull = runShell("\"$0\" get >/dev/full");
+    const ZTSFinishedRun lFull = runShell("\"$0\" get >/dev/full");
     EXPECT_EQ(lFull.mStatus, 4);
     EXPECT_THAT(lFull.mErrors, AllOf(HasSubstr("20 records"), HasSubstr("No space left")));
 }
 
 TEST_F(Tavikctl, AClosedStandardOutputIsNoticedBeforeAnythingIsAsked) {
     const ZTCFakeAgent lAgent(dir(), {ZTCFakeAgent::answering(makeFullSampleResponse())});
-    const ZTSRun lRun = runShell("\"$0\" get >&-");
+    const ZTSFinishedRun lRun = runShell("\"$0\" get >&-");
     EXPECT_EQ(lRun.mStatus, 4);
     EXPECT_TRUE(lAgent.getRequests().empty());
 }
@@ -246,22 +246,22 @@ TEST_F(Tavikctl, ALateAnswersRecordsAreNotLost) {
                                   arAgent.sendFrame(makeFullSampleResponse());
                                   arAgent.sendFrame(gcSuccess);
                               }});
-    const ZTSRun lTable = run({"stop"});
+    const ZTSFinishedRun lTable = run({"stop"});
     EXPECT_EQ(lTable.mStatus, 0);
     EXPECT_THAT(lTable.mOutput, HasSubstr("20 records"));
     EXPECT_THAT(lTable.mErrors, HasSubstr("late answer"));
-    const ZTSRun lJson = run({"stop", "--json"});
+    const ZTSFinishedRun lJson = run({"stop", "--json"});
     EXPECT_EQ(lJson.mStatus, 0);
     EXPECT_EQ(parseJson(lJson.mOutput)["lateAnswers"][0]["totals"]["records"], 20);
 }
 
 TEST_F(Tavikctl, StatusTellsWhetherAnAgentRunsAndAnswers) {
-    const ZTSRun lNone = run({"status", "--json"});
+    const ZTSFinishedRun lNone = run({"status", "--json"});
     EXPECT_EQ(lNone.mStatus, 3);
     EXPECT_EQ(parseJson(lNone.mOutput)["agent"]["state"], "none");
 
     const ZTCFakeAgent lAgent(dir(), {ZTCFakeAgent::answering(gcSuccess)});
-    const ZTSRun lRunning = run({"status", "--json"});
+    const ZTSFinishedRun lRunning = run({"status", "--json"});
     EXPECT_EQ(lRunning.mStatus, 0) << lRunning.mErrors;
     const nlohmann::json lDocument = parseJson(lRunning.mOutput);
     EXPECT_EQ(lDocument["agent"]["state"], "running");
@@ -271,7 +271,7 @@ TEST_F(Tavikctl, StatusTellsWhetherAnAgentRunsAndAnswers) {
 }
 
 TEST_F(Tavikctl, HelpAndVersionGoToStandardOutput) {
-    const ZTSRun lHelp = run({"--help"});
+    const ZTSFinishedRun lHelp = run({"--help"});
     EXPECT_EQ(lHelp.mStatus, 0);
     EXPECT_THAT(lHelp.mOutput, AllOf(HasSubstr("watch"), HasSubstr("Exit status")));
     EXPECT_THAT(run({"get", "--help"}).mOutput, HasSubstr("tavikctl get"));

@@ -25,7 +25,7 @@ TEST_F(TavikctlWatch, PlaysTheSensorUntilItsLastRetrieval) {
                                   lHadPidFile = lHadPidFile && exists(dir() + "/qrv-sn.pid");
                                   arAgent.sendFrame(acrRequest[0] == 1 ? makeFullSampleResponse() : gcSuccess);
                               }});
-    const ZTSRun lRun = run({"watch", "--interval", "0.05", "--count", "3", "--targets", gcTarget, "--json"});
+    const ZTSFinishedRun lRun = run({"watch", "--interval", "0.05", "--count", "3", "--targets", gcTarget, "--json"});
     EXPECT_EQ(lRun.mStatus, 0) << lRun.mErrors;
     EXPECT_TRUE(lHadPidFile);
     EXPECT_FALSE(exists(dir() + "/qrv-sn.pid"));
@@ -66,7 +66,7 @@ TEST_F(TavikctlWatch, ASecondOneIsRefused) {
     ZTCChildProcess lWatch(setup({"watch"}));
     waitUntil([&] { return readFile(dir() + "/qrv-sn.pid") == std::to_string(lWatch.getPid()) + "\n"; },
               "the pid file");
-    const ZTSRun lSecond = run({"watch"});
+    const ZTSFinishedRun lSecond = run({"watch"});
     EXPECT_EQ(lSecond.mStatus, 2);
     expectOneLine(lSecond.mErrors);
     EXPECT_THAT(lSecond.mErrors, HasSubstr(std::to_string(lWatch.getPid())));
@@ -78,7 +78,7 @@ TEST_F(TavikctlWatch, AGetBesideItIsServed) {
     const ZTCFakeAgent lAgent(dir(), {sServing()});
     ZTCChildProcess lWatch(setup({"watch", "--interval", "3600"}));
     waitUntil([&] { return !lAgent.getRequests().empty(); }, "the watch's start command");
-    const ZTSRun lGet = run({"get"});
+    const ZTSFinishedRun lGet = run({"get"});
     EXPECT_EQ(lGet.mStatus, 0) << lGet.mErrors;
     lWatch.sendSignal(SIGTERM);
     EXPECT_EQ(lWatch.waitForExit(), 0) << lWatch.standardError();

@@ -39,9 +39,9 @@ struct ZTSFcEventMessage {
 };
 static_assert(sizeof(ZTSFcEventMessage) == 56);
 
-static constexpr unsigned gcFcEventsGroup = 4;
-static constexpr std::uint16_t gcScsiTransportMessage = NLMSG_MIN_TYPE + 1;
-static constexpr int gcReceiveBufferBytes = 4 << 20;
+static constexpr unsigned scFcEventsGroup = 4;
+static constexpr std::uint16_t scScsiTransportMessage = NLMSG_MIN_TYPE + 1;
+static constexpr int scReceiveBufferBytes = 4 << 20;
 
 [[noreturn]] static void sFail(std::string_view aWhat) {
     std::cerr << "fc-capture: " << aWhat << ": " << std::strerror(errno) << '\n';
@@ -67,8 +67,8 @@ static void sWrite(const std::string& acrFile, const void* apBytes, std::size_t 
 }
 
 static int sCaptureMessages(const std::string& acrDirectory) {
-    const int lSocket = sOpenSocket(1U << (gcFcEventsGroup - 1));
-    setsockopt(lSocket, SOL_SOCKET, SO_RCVBUFFORCE, &gcReceiveBufferBytes, sizeof gcReceiveBufferBytes);
+    const int lSocket = sOpenSocket(1U << (scFcEventsGroup - 1));
+    setsockopt(lSocket, SOL_SOCKET, SO_RCVBUFFORCE, &scReceiveBufferBytes, sizeof scReceiveBufferBytes);
     std::ofstream lIndex(acrDirectory + "/index");
     for (unsigned lNumber = 1;; ++lNumber) {
         std::array<char, 8192> lBuffer{};
@@ -107,11 +107,11 @@ static int sCapturePages(const char* apRaw, const char* apFile) {
 static int sForge(const char* apCode) {
     ZTSFcEventMessage lMessage;
     lMessage.mHeader.nlmsg_len = sizeof lMessage;
-    lMessage.mHeader.nlmsg_type = gcScsiTransportMessage;
+    lMessage.mHeader.nlmsg_type = scScsiTransportMessage;
     lMessage.mCode = static_cast<std::uint32_t>(std::strtoul(apCode, nullptr, 0));
     sockaddr_nl lTo{};
     lTo.nl_family = AF_NETLINK;
-    lTo.nl_groups = 1U << (gcFcEventsGroup - 1);
+    lTo.nl_groups = 1U << (scFcEventsGroup - 1);
     if (sendto(sOpenSocket(0), &lMessage, sizeof lMessage, 0, reinterpret_cast<sockaddr*>(&lTo), sizeof lTo) < 0 &&
         errno != ECONNREFUSED) {  // refused: of the two ends it addresses, the kernel takes no such message
         sFail("send");
