@@ -22,7 +22,7 @@ protected:
 
 TEST_F(EventsCommand, EpisodesComeNewestLastWithNamesAndCounts) {
     fill();
-    const ZTSRun lRun = run({"events"});
+    const ZTSFinishedRun lRun = run({"events"});
     EXPECT_EQ(lRun.mStatus, 0);
     EXPECT_THAT(lRun.mOutput, StartsWith("EPISODE  LAST"));
     EXPECT_THAT(lRun.mOutput, HasSubstr("5  queue-full  host7      ctrl-A                   LUNs 3,4\n"));
@@ -83,7 +83,7 @@ TEST_F(EventsCommand, ClosedEpisodesAreNotOpen) {
               3U);
     lTransaction.commit();
     EXPECT_THAT(counts({"--open"}), ElementsAre());
-    const ZTSRun lRun = run({"events", "--open"});
+    const ZTSFinishedRun lRun = run({"events", "--open"});
     EXPECT_EQ(lRun.mStatus, 0);
     EXPECT_THAT(lRun.mOutput, StartsWith("No episode matches.\nNOT COLLECTING; no sensor is running: tavik status\n"));
 }
@@ -145,10 +145,10 @@ TEST_F(EventsCommand, AReaderThatGoesAwayEndsItQuietly) {
     }
     takeIn(lRecords);
     for (const char* lpArguments : {"events --limit 0", "--json events", "events --records --limit 0"}) {
-        const ZTSRun lRun = runShell("\"$0\" " + std::string(lpArguments) + " | head -1; echo ${PIPESTATUS:-done}");
+        const ZTSFinishedRun lRun = runShell("\"$0\" " + std::string(lpArguments) + " | head -1; echo ${PIPESTATUS:-done}");
         EXPECT_EQ(lRun.mStatus, 0);
         EXPECT_EQ(lRun.mErrors, "");
     }
-    const ZTSRun lIgnoring = runShell("trap '' PIPE; \"$0\" events --limit 0 | head -1");
+    const ZTSFinishedRun lIgnoring = runShell("trap '' PIPE; \"$0\" events --limit 0 | head -1");
     EXPECT_EQ(lIgnoring.mErrors, "") << "a parent that ignores the signal changes nothing";
 }

@@ -15,7 +15,7 @@ class StatusCommand : public TavikProgram {};
 TEST_F(StatusCommand, CollectingIs0) {
     store();
     const ZTCFakeSensor lSensor(controlPath(), ZTCFakeSensor::withState(makeLiveState()));
-    const ZTSRun lRun = run({});
+    const ZTSFinishedRun lRun = run({});
     EXPECT_EQ(lRun.mStatus, 0);
     EXPECT_THAT(lRun.mOutput, HasSubstr("\n state: COLLECTING; nothing lost\n"));
     EXPECT_EQ(lRun.mErrors, "");
@@ -29,7 +29,7 @@ TEST_F(StatusCommand, DeafForAKindIs1) {
     nlohmann::json lLive = makeLiveState();
     lLive["kinds"][0]["kinds"]["link"] = "no_rights";
     const ZTCFakeSensor lSensor(controlPath(), ZTCFakeSensor::withState(lLive));
-    const ZTSRun lRun = run({"status"});
+    const ZTSFinishedRun lRun = run({"status"});
     EXPECT_EQ(lRun.mStatus, 1);
     EXPECT_THAT(lRun.mOutput, HasSubstr("PARTLY DEAF"));
 }
@@ -49,7 +49,7 @@ TEST_F(StatusCommand, AGapOfTheLast24HoursIs1AndAnOlderOneIsForgiven) {
     lNoteGap("long ago", std::chrono::hours(25));
     EXPECT_EQ(run({"status"}).mStatus, 0);
     lNoteGap("the agent was killed", std::chrono::hours(1));
-    const ZTSRun lRun = run({"--json", "status"});
+    const ZTSFinishedRun lRun = run({"--json", "status"});
     EXPECT_EQ(lRun.mStatus, 1);
     const nlohmann::json lDocument = nlohmann::json::parse(lRun.mOutput);
     ASSERT_EQ(lDocument["gaps"].size(), 1U);
@@ -58,7 +58,7 @@ TEST_F(StatusCommand, AGapOfTheLast24HoursIs1AndAnOlderOneIsForgiven) {
 
 TEST_F(StatusCommand, NoSensorIs3AndTheHistoryIsStillRead) {
     fill();
-    const ZTSRun lRun = run({"status"});
+    const ZTSFinishedRun lRun = run({"status"});
     EXPECT_EQ(lRun.mStatus, 3);
     EXPECT_THAT(lRun.mOutput, HasSubstr("NOT COLLECTING; no sensor is running"));
     EXPECT_THAT(lRun.mOutput, HasSubstr("tavik events still works"));
@@ -67,14 +67,14 @@ TEST_F(StatusCommand, NoSensorIs3AndTheHistoryIsStillRead) {
 TEST_F(StatusCommand, ASocketThatNobodyListensOnIsNoSensor) {
     { const ZTCFakeSensor lSensor(controlPath(), ZTCFakeSensor::withState(makeLiveState())); }
     ASSERT_TRUE(exists(controlPath()));
-    const ZTSRun lRun = run({"status"});
+    const ZTSFinishedRun lRun = run({"status"});
     EXPECT_EQ(lRun.mStatus, 3);
     EXPECT_THAT(lRun.mOutput, HasSubstr("no sensor is running"));
 }
 
 TEST_F(StatusCommand, ACollectorThatDoesNotAnswerIs3WithinTheTimeLimit) {
     const ZTCFakeSensor lSensor(controlPath(), [](const nlohmann::json&) { return ""; });
-    const ZTSRun lRun = run({"status"});
+    const ZTSFinishedRun lRun = run({"status"});
     EXPECT_EQ(lRun.mStatus, 3);
     EXPECT_THAT(lRun.mOutput, HasSubstr("NOT KNOWN; the collector does not answer"));
     EXPECT_THAT(lRun.mOutput, HasSubstr("within 1.2 s"));
@@ -86,7 +86,7 @@ TEST_F(StatusCommand, AnswersThatCannotBeUsedAre3AndSaid) {
     for (const auto& [lpAnswer, lpText] : lAnswers) {
         const std::string lAnswer = lpAnswer;
         const ZTCFakeSensor lSensor(controlPath(), [lAnswer](const nlohmann::json&) { return lAnswer; });
-        const ZTSRun lRun = run({"status"});
+        const ZTSFinishedRun lRun = run({"status"});
         EXPECT_EQ(lRun.mStatus, 3);
         EXPECT_THAT(lRun.mOutput, HasSubstr(lpText));
     }
@@ -95,7 +95,7 @@ TEST_F(StatusCommand, AnswersThatCannotBeUsedAre3AndSaid) {
 TEST_F(StatusCommand, ADamagedDatabaseDoesNotKeepItFromAnswering) {
     writeFile(statePath() + "/history.db", std::string(8192, 'x'));
     const ZTCFakeSensor lSensor(controlPath(), ZTCFakeSensor::withState(makeLiveState()));
-    const ZTSRun lRun = run({"status"});
+    const ZTSFinishedRun lRun = run({"status"});
     EXPECT_EQ(lRun.mStatus, 0);
     EXPECT_THAT(lRun.mOutput, HasSubstr("  note: "));
     EXPECT_THAT(lRun.mOutput, HasSubstr("history.db"));
@@ -112,7 +112,7 @@ TEST_F(StatusCommand, MarksGoThroughTheSensor) {
         lTransaction.commit();
         return "{\"mark\":\"before update\",\"time\":\"2026-03-04T05:06:00Z\"}\n";
     });
-    const ZTSRun lRun = run({"mark", "before update"});
+    const ZTSFinishedRun lRun = run({"mark", "before update"});
     EXPECT_EQ(lRun.mStatus, 0) << lRun.mErrors;
     EXPECT_EQ(lRun.mOutput, "mark \"before update\" set at 2026-03-04 05:06:00\n");
     const nlohmann::json lDocument = runJson({"mark", "before update"});
@@ -122,7 +122,7 @@ TEST_F(StatusCommand, MarksGoThroughTheSensor) {
 }
 
 TEST_F(StatusCommand, AMarkWithoutASensorIs3) {
-    const ZTSRun lRun = run({"mark", "x"});
+    const ZTSFinishedRun lRun = run({"mark", "x"});
     EXPECT_EQ(lRun.mStatus, 3);
     EXPECT_EQ(lRun.mOutput, "");
     expectOneLine(lRun);
@@ -132,12 +132,12 @@ TEST_F(StatusCommand, CheckIsOneLineWithPerformanceDataAndAPluginsStatus) {
     store();
     {
         const ZTCFakeSensor lSensor(controlPath(), ZTCFakeSensor::withState(makeLiveState()));
-        const ZTSRun lRun = run({"check"});
+        const ZTSFinishedRun lRun = run({"check"});
         EXPECT_EQ(lRun.mStatus, 0);
         EXPECT_EQ(lRun.mOutput, "TAVIK OK - COLLECTING; nothing lost | events=0 open=0 lost=0 held=0B;;;0;262144\n");
         EXPECT_EQ(runJson({"check"})["result"], "OK");
     }
-    const ZTSRun lRun = run({"check", "--since", "1h"});
+    const ZTSFinishedRun lRun = run({"check", "--since", "1h"});
     EXPECT_EQ(lRun.mStatus, 2);
     EXPECT_THAT(lRun.mOutput, StartsWith("TAVIK CRITICAL - NOT COLLECTING; no sensor is running |"));
     EXPECT_EQ(run({"check", "--since", "nonsense"}).mStatus, 2);

@@ -20,13 +20,13 @@ ZTSChildProcessSetup TavikProgram::setup(const std::vector<std::string>& acrArgu
             .mOutputPrefix = mDirectory.path("run" + std::to_string(++mRuns))};
 }
 
-TavikProgram::ZTSRun TavikProgram::run(const std::vector<std::string>& acrArguments) {
+TavikProgram::ZTSFinishedRun TavikProgram::run(const std::vector<std::string>& acrArguments) {
     ZTCChildProcess lProcess(setup(acrArguments));
     const int lStatus = lProcess.waitForExit();
     return {lStatus, lProcess.standardOutput(), lProcess.standardError()};
 }
 
-TavikProgram::ZTSRun TavikProgram::runShell(const std::string& acrScript) {
+TavikProgram::ZTSFinishedRun TavikProgram::runShell(const std::string& acrScript) {
     ZTSChildProcessSetup lSetup = setup({"-c", acrScript, TAVIK_PROGRAM});
     lSetup.mProgram = "/bin/sh";
     lSetup.mEnvironment["PATH"] = "/usr/bin:/bin";
@@ -37,7 +37,7 @@ TavikProgram::ZTSRun TavikProgram::runShell(const std::string& acrScript) {
 
 nlohmann::json TavikProgram::runJson(std::vector<std::string> aArguments) {
     aArguments.insert(aArguments.begin(), "--json");
-    const ZTSRun lRun = run(aArguments);
+    const ZTSFinishedRun lRun = run(aArguments);
     EXPECT_EQ(lRun.mStatus, 0) << lRun.mErrors;
     EXPECT_EQ(lRun.mErrors, "");
     return nlohmann::json::parse(lRun.mOutput, nullptr, false);
@@ -72,7 +72,7 @@ void TavikProgram::fill() {
     takeIn({makeQueueFull(gcPortB, gcBase + 2 * gcMinute, gcBase + 2 * gcMinute, 7, 9)}, gcOtherLocalPort);
 }
 
-void TavikProgram::expectOneLine(const ZTSRun& acrRun) {
+void TavikProgram::expectOneLine(const ZTSFinishedRun& acrRun) {
     EXPECT_TRUE(acrRun.mErrors.starts_with("tavik: ")) << acrRun.mErrors;
     EXPECT_EQ(std::count(acrRun.mErrors.begin(), acrRun.mErrors.end(), '\n'), 1) << acrRun.mErrors;
 }

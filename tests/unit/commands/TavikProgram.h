@@ -18,16 +18,16 @@ class TavikProgram : public testing::Test {
 protected:
     TavikProgram();
 
-    struct ZTSRun {
+    struct ZTSFinishedRun {
         int mStatus;
         std::string mOutput;
         std::string mErrors;
     };
 
     ZTSChildProcessSetup setup(const std::vector<std::string>& acrArguments);
-    ZTSRun run(const std::vector<std::string>& acrArguments);
+    ZTSFinishedRun run(const std::vector<std::string>& acrArguments);
     /// The program as "$0" of a shell's script.
-    ZTSRun runShell(const std::string& acrScript);
+    ZTSFinishedRun runShell(const std::string& acrScript);
     /// Runs with --json, expects status 0, and gives the document.
     nlohmann::json runJson(std::vector<std::string> aArguments);
 
@@ -42,7 +42,7 @@ protected:
     void fill();
 
     /// That exactly one line was printed on standard error, by the program.
-    static void expectOneLine(const ZTSRun& acrRun);
+    static void expectOneLine(const ZTSFinishedRun& acrRun);
 
     const ZTCTemporaryDirectory mDirectory;
 

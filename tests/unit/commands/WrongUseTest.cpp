@@ -38,7 +38,7 @@ TEST_F(WrongUse, Is2InOneLineWithoutOutput) {
     };
     for (const std::vector<std::string>& lrLine : lLines) {
         SCOPED_TRACE(testing::PrintToString(lrLine));
-        const ZTSRun lRun = run(lrLine);
+        const ZTSFinishedRun lRun = run(lrLine);
         EXPECT_EQ(lRun.mStatus, 2);
         EXPECT_EQ(lRun.mOutput, "");
         expectOneLine(lRun);
@@ -47,7 +47,7 @@ TEST_F(WrongUse, Is2InOneLineWithoutOutput) {
 
 TEST_F(WrongUse, ABadConfigurationNamesFileLineAndKey) {
     writeFile(mDirectory.path("bad.toml"), "[collect]\nperiod = 0\nnonsense = 1\n");
-    const ZTSRun lRun = run({"--config", mDirectory.path("bad.toml"), "events"});
+    const ZTSFinishedRun lRun = run({"--config", mDirectory.path("bad.toml"), "events"});
     EXPECT_EQ(lRun.mStatus, 2);
     expectOneLine(lRun);
     EXPECT_THAT(lRun.mErrors, HasSubstr(mDirectory.path("bad.toml") + ":2: collect.period: "));
@@ -56,7 +56,7 @@ TEST_F(WrongUse, ABadConfigurationNamesFileLineAndKey) {
 
 TEST_F(WrongUse, WithoutAHistoryCommandsSaySoWith3) {
     for (const char* lpCommand : {"events", "ports"}) {
-        const ZTSRun lRun = run({lpCommand});
+        const ZTSFinishedRun lRun = run({lpCommand});
         EXPECT_EQ(lRun.mStatus, 3);
         EXPECT_EQ(lRun.mOutput, "");
         expectOneLine(lRun);
@@ -66,7 +66,7 @@ TEST_F(WrongUse, WithoutAHistoryCommandsSaySoWith3) {
 
 TEST_F(WrongUse, HelpAndVersionAre0) {
     for (const char* lpOption : {"--help", "--version"}) {
-        const ZTSRun lRun = run({lpOption});
+        const ZTSFinishedRun lRun = run({lpOption});
         EXPECT_EQ(lRun.mStatus, 0);
         EXPECT_NE(lRun.mOutput, "");
     }
@@ -74,7 +74,7 @@ TEST_F(WrongUse, HelpAndVersionAre0) {
 }
 
 TEST_F(WrongUse, OutputThatCannotBeWrittenIs4) {
-    const ZTSRun lRun = runShell("\"$0\" explain deaf > /dev/full");
+    const ZTSFinishedRun lRun = runShell("\"$0\" explain deaf > /dev/full");
     EXPECT_EQ(lRun.mStatus, 4);
     expectOneLine(lRun);
 }
