@@ -10,6 +10,8 @@
 #include <string_view>
 #include <vector>
 
+#include "sensor/client/include/NumberText.h"
+
 struct ZTSTextColumn {
     const char* mpTitle;
     bool mIsRight = false;        ///< numbers stand at the right edge
@@ -56,12 +58,6 @@ std::string cutText(const std::string& acrText, std::size_t aCharacters);
 
 /// Control characters as \xNN; UTF-8 stays, bytes that are none become \xNN.
 std::string escapeControls(std::string_view aText);
-
-/// "12,345".
-std::string formatNumber(std::uint64_t aNumber);
-
-/// "1 event", "12,345 events".
-std::string formatCount(std::uint64_t aNumber, const std::string& acrOne);
 
 /// "256 KiB", "1.5 GiB", "17 B".
 std::string formatBytes(std::uint64_t aBytes);

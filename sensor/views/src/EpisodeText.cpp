@@ -18,23 +18,6 @@ static std::string sCode(std::uint32_t aValue) {
     return aValue == 0xFFFFFFFFU ? "?" : sHex(aValue, 2);
 }
 
-/// "0-2,40" of rising numbers.
-static std::string sRanges(const std::vector<std::uint32_t>& acrNumbers) {
-    std::string lText;
-    for (std::size_t i = 0; i < acrNumbers.size();) {
-        std::size_t lLast = i;
-        while (lLast + 1 < acrNumbers.size() && acrNumbers[lLast + 1] == acrNumbers[lLast] + 1) {
-            ++lLast;
-        }
-        lText += (lText.empty() ? "" : ",") + std::to_string(acrNumbers[i]);
-        if (lLast != i) {
-            lText += (lLast == i + 1 ? "," : "-") + std::to_string(acrNumbers[lLast]);
-        }
-        i = lLast + 1;
-    }
-    return lText;
-}
-
 static std::string sCodes(const std::vector<std::uint32_t>& acrCodes) {
     std::string lText;
     for (const std::uint32_t lCode : acrCodes) {
@@ -46,7 +29,7 @@ static std::string sCodes(const std::vector<std::uint32_t>& acrCodes) {
 std::string formatLuns(const ZTSLunSet& acrLuns) {
     std::string lText = acrLuns.mIsAll ? "all" : "";
     if (!acrLuns.mNumbers.empty()) {
-        lText += (lText.empty() ? "" : " and ") + sRanges(acrLuns.mNumbers);
+        lText += (lText.empty() ? "" : " and ") + formatRanges(acrLuns.mNumbers);
     }
     return lText + (acrLuns.mHasMore ? " and more" : "");
 }

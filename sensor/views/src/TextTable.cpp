@@ -76,19 +76,6 @@ std::string escapeControls(std::string_view aText) {
     return lText;
 }
 
-std::string formatNumber(std::uint64_t aNumber) {
-    std::string lText = std::to_string(aNumber);
-    for (std::size_t i = lText.size(); i > 3;) {
-        i -= 3;
-        lText.insert(i, ",");
-    }
-    return lText;
-}
-
-std::string formatCount(std::uint64_t aNumber, const std::string& acrOne) {
-    return formatNumber(aNumber) + " " + acrOne + (aNumber == 1 ? "" : "s");
-}
-
 std::string formatBytes(std::uint64_t aBytes) {
     static constexpr std::array<const char*, 5> scUnits{" B", " KiB", " MiB", " GiB", " TiB"};
     auto lValue = static_cast<double>(aBytes);
