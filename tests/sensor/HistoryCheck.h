@@ -9,11 +9,17 @@
 /// "ok", or what SQLite says of the database in this directory.
 std::string checkIntegrity(const std::string& acrStateDirectory);
 
+/// As another version of the sensor leaves it.
+void setSchemaVersion(const std::string& acrStateDirectory, unsigned aVersion);
+
 /// The names of the files in the spool.
 std::vector<std::string> listSpool(const std::string& acrStateDirectory);
 
 /// Occurrences that the history has, those that retention took away included; 0 where there is no history yet.
 std::uint64_t countStored(const std::string& acrStateDirectory);
+
+/// Occurrences that agents refused, by the ledger.
+std::uint64_t countRefused(const std::string& acrStateDirectory);
 
 /// Fails the test unless the database is whole, the ledger's equations hold in each row, the episodes have what the
 /// ledger says, and the spool is empty.

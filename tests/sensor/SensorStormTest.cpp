@@ -114,3 +114,25 @@ TEST_F(SensorStormTest, CollectorsThatAreKilledInAStormLoseNothing) {
     expectSoundHistory(mSensor.stateDirectory());
     std::cout << lKilled << " collectors killed, " << mRefused << " events refused meanwhile\n";
 }
+
+TEST_F(SensorStormTest, AnInterleavedStormIsRefusedInPartWhereNobodyCollectsAndStoredWholeByDefault) {
+    mSensor.start();
+    // As with a long period: 20,000 records of 48 bytes and more come before somebody asks. The limit is 256 KiB.
+    const pid_t lCollector = mSensor.findCollector();
+    ASSERT_EQ(kill(lCollector, SIGSTOP), 0);
+    mSensor.simulate("storm count=20000 threads=4 seed=1");
+    ASSERT_EQ(kill(lCollector, SIGCONT), 0);
+    mSensor.waitUntilAllIsStored();
+    waitUntil([&] { return countRefused(mSensor.stateDirectory()) != 0; }, "the refusals in the ledger");
+    const std::uint64_t lRefused = countRefused(mSensor.stateDirectory());
+    EXPECT_GT(lRefused, 5000U);
+    for (unsigned i = 0; i < 100; ++i) {  // at the pace of a busy fabric: 200 events each 5 ms
+        const ZTCDeadline lNext(std::chrono::milliseconds(5));
+        mSensor.simulate("storm count=200 threads=4 seed=" + std::to_string(i));
+        waitUntil([&] { return lNext.isOver(); }, "the next turn");
+    }
+    mSensor.waitUntilAllIsStored();
+    EXPECT_EQ(mSensor.stop(), 0);
+    EXPECT_EQ(countRefused(mSensor.stateDirectory()), lRefused);
+    expectSoundHistory(mSensor.stateDirectory());
+}

@@ -1,0 +1,108 @@
+// The real sensor, whose agent or keeper is killed in a storm. ZT_SENSOR_KILL_RUNS is the number of kills of each;
+// scripts/check-sensor-kills kills many.
+#include <gtest/gtest.h>
+
+#include <atomic>
+#include <csignal>
+#include <cstdlib>
+#include <functional>
+#include <iostream>
+#include <thread>
+
+#include "sensor/store/include/History.h"
+#include "tests/sensor/HistoryCheck.h"
+#include "tests/sensor/SensorProcess.h"
+#include "tests/support/Seed.h"
+
+static unsigned sRuns() {
+    const char* const lpRuns = std::getenv("ZT_SENSOR_KILL_RUNS");
+    return lpRuns != nullptr ? static_cast<unsigned>(std::strtoul(lpRuns, nullptr, 10)) : 3;
+}
+
+/// Storms that follow each other as long as it lives, also while no agent is there that takes them.
+class ZTCEndlessStorm {
+public:
+    explicit ZTCEndlessStorm(const ZTCSensorProcess& acrSensor)
+        : mThread([this, &acrSensor] {
+              for (unsigned lRound = 0; !mIsOver; ++lRound) {
+                  try {
+                      acrSensor.simulate("storm count=500 threads=2 seed=" + std::to_string(lRound));
+                  } catch (const std::runtime_error&) {
+                      std::this_thread::yield();  // there is no agent just now
+                  }
+              }
+          }) {}
+    ~ZTCEndlessStorm() {
+        mIsOver = true;
+        mThread.join();
+    }
+    ZTCEndlessStorm(const ZTCEndlessStorm&) = delete;
+    ZTCEndlessStorm& operator=(const ZTCEndlessStorm&) = delete;
+
+private:
+    std::atomic<bool> mIsOver{false};
+    std::thread mThread;
+};
+
+class SensorKillTest : public testing::Test {
+protected:
+    std::size_t countGaps() const {
+        try {
+            return ZTCHistory(mSensor.stateDirectory()).readGaps().size();
+        } catch (const ZTCNoHistoryEx&) {
+            return 0;
+        }
+    }
+    /// Kills so many times, each at a random moment of a storm. After each kill, and at the end: all that there is, is
+    /// in the history; the kill is one gap; the equations hold.
+    void killInStorms(const std::function<void()>& acrKill) {
+        ZTCTestSeed lSeed;
+        mSensor.start();
+        for (unsigned lRun = 1; lRun <= sRuns() && !HasFailure(); ++lRun) {
+            SCOPED_TRACE("kill " + std::to_string(lRun));
+            {
+                const ZTCEndlessStorm lStorm(mSensor);
+                const ZTCDeadline lMoment(std::chrono::milliseconds(lSeed.below(400)));
+                waitUntil([&] { return lMoment.isOver(); }, "the moment of the kill");
+                acrKill();
+            }
+            mSensor.waitUntilListening();
+            waitUntil([&] { return countGaps() >= lRun; }, "the gap", ZTCDeadline(3 * gcTestPatience));
+            mSensor.waitUntilAllIsStored();
+            EXPECT_EQ(countGaps(), lRun);
+            expectSoundHistory(mSensor.stateDirectory());
+        }
+        EXPECT_EQ(mSensor.stop(), 0);
+        EXPECT_EQ(countGaps(), sRuns());
+        expectSoundHistory(mSensor.stateDirectory());
+        std::uint64_t lLost = 0;
+        const ZTCHistory lHistory(mSensor.stateDirectory());
+        for (const ZTSGap& lrGap : lHistory.readGaps()) {
+            lLost += lrGap.getOccurrences();
+        }
+        std::cout << sRuns() << " killed, " << lLost << " events known to be lost with them, "
+                  << countStored(mSensor.stateDirectory()) << " stored\n";
+    }
+
+    ZTCSensorProcess mSensor{"agent.log_level = 1\nagent.heartbeat = 1\n"};
+};
+
+TEST_F(SensorKillTest, EachKilledAgentIsOneGapWithWhatItHeldAndTheNextOneWorks) {
+    killInStorms([this] {
+        const pid_t lAgent = mSensor.findAgent();
+        ASSERT_NE(lAgent, 0);
+        ASSERT_EQ(kill(lAgent, SIGKILL), 0);
+        waitUntil([&] { return mSensor.findAgent() != 0 && mSensor.findAgent() != lAgent; }, "the next agent",
+                  ZTCDeadline(3 * gcTestPatience));
+    });
+}
+
+TEST_F(SensorKillTest, EachKilledKeeperIsOneGapAndTheNextOneWorks) {
+    killInStorms([this] {
+        const pid_t lAgent = mSensor.findAgent();
+        mSensor.process().kill();
+        mSensor.launch();
+        waitForEnd(lAgent);
+        waitUntil([&] { return mSensor.findAgent() != 0; }, "the next agent", ZTCDeadline(3 * gcTestPatience));
+    });
+}
