@@ -73,8 +73,8 @@ void sSayThatItCannotBeOpened(const ZTCLogFile& acrFile) noexcept {
                         "lines go to standard error until it can be opened");
 }
 
-/// Writes the path, made absolute, to the buffer. False, with a line on standard error, where it is none that can be
-/// used.
+/// Writes the path, made absolute, to the buffer. Where the path cannot be used: false, and a line on standard error
+/// says why.
 bool sMakeAbsolute(const char* apPath, char (&arPath)[PATH_MAX]) noexcept {
     if (apPath == nullptr || apPath[0] == '\0') {
         sSayOnStandardError("Cannot set the log file", "", "its path is empty", "the log goes on as before");

@@ -156,7 +156,7 @@ bool ZTCProcessInstanceManager::isAnInstanceRunning() {
         }
         if (sIsAtPath(lpPath, lFile.get())) {
             if (lStatus.st_uid != ::geteuid()) {
-                // Left by another user's run: what stops this process by the file goes by the owner.
+                // Left by another user's run. `-s` stops a process only if it belongs to the file's owner.
                 ClibTryGive(lFile.get(), ::geteuid());
             }
             if ((lStatus.st_mode & 07777 & ~scPidFileMode) != 0) {

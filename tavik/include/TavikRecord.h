@@ -33,7 +33,8 @@ public:
     const ZTCDateTime& getEndTime() const { return *mEndTimeStamp; }
     std::uint32_t getOccurrences() const { return mOccurences; }
 
-    /// One occurrence more, now. The count wraps at 2^32. Cannot fail, so that what goes with it is committed as one.
+    /// One occurrence more, now. The count wraps at 2^32. Cannot fail, so that the changes around it can be committed
+    /// together.
     void incrementOccurrences() noexcept;
 
     /// Occurrences, begin time, end time, scope data.

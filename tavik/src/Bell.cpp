@@ -11,7 +11,7 @@ namespace {
 
 constexpr int scHighestStandardDescriptor = 2;
 
-/// The decimal number that the whole text is; -1 where it is none.
+/// The text as a decimal number; -1 where it is not one, or more than one.
 int sReadDescriptor(const char* apText) {
     ZT_ENTRY();
     int lDescriptor = -1;

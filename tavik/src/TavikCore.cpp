@@ -215,7 +215,7 @@ void sConsolidateGenericEvents(const ZTCPointer<ZTCScopeEvent>& acrEvent, unsign
     ZT_EXIT();
 }
 
-/// Where an event goes by its pair: to the member of its kind, or, with no kind of its own, to the generic one.
+/// What consolidates the events of a pair: the member of its kind, or the generic one where the kind keeps no data.
 struct ZTSDispatch {
     unsigned char mCategory;
     unsigned char mSubcategory;

@@ -32,7 +32,7 @@ constexpr std::size_t scMaxTransparent = 8;
 ZTSFaultControl* spControl = nullptr;
 ZTSRange sProgram;
 ZTSRange sThisModule;
-/// It, and the libraries that work on behalf of whoever calls them.
+/// This module, and the libraries that only work for their callers: a call counts as that of their caller.
 ZTSRange sTransparent[scMaxTransparent];
 std::size_t sNumberOfTransparent = 0;
 

@@ -68,7 +68,7 @@ public:
 private:
     enum ZTEHostSearch : std::uint8_t { ZTHS_Allowed, ZTHS_Used };
 
-    /// One board's change that is still to be told and delivered.
+    /// One board's change that is not yet reported and delivered.
     enum ZTEBoardChange : std::uint8_t { ZTBC_Left, ZTBC_Arrived, ZTBC_Renamed };
     struct Change {
         std::uint32_t mBoard;

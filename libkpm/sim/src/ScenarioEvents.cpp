@@ -76,7 +76,7 @@ static std::uint32_t sPage(std::string_view aText, const ZTSSimScenario& acrScen
     refuseSim("pages= takes port:ID, area:ID, domain:ID, fabric or word:NUMBER, not " + quoteSimWord(aText));
 }
 
-/// The fields by which a line sets aside what its kind's callback is told.
+/// The fields that replace what the kind's callback would be given.
 static void sParseOverrides(ZTCSimLine& arLine, const ZTSSimScenario& acrScenario, ZTSSimEvent& arEvent) {
     const ZTESimDelivery lDelivery = getSimKind(arEvent.mKind).mDelivery;
     if (lDelivery == ZTSD_Temperature) {
@@ -136,7 +136,7 @@ static void sParseOverrides(ZTCSimLine& arLine, const ZTSSimScenario& acrScenari
     }
 }
 
-/// The fields by which a line says when it happens, and how often.
+/// The fields that say when a line takes effect, and how often.
 template <class Line>
 static void sTakeTimes(ZTCSimLine& arLine, Line& arHappening) {
     if (const auto lText = arLine.take("at")) {

@@ -2,7 +2,7 @@
 ///
 /// A frame is a length of four bytes in network order, then that many bytes, its body. The assembler makes no system
 /// call and asks for no byte past the frame it is assembling: first the rest of the length, then the rest of the body.
-/// The length is held against the limit before anything is allocated for it.
+/// The length is compared with the limit before anything is allocated for it.
 ///
 ///     while (lAssembler.getState() == ZTFS_Incomplete) {
 ///         lCount = read(fd, lAssembler.getSpace(), lAssembler.getWanted());
@@ -41,11 +41,10 @@ public:
     /// aCount of the wanted bytes stand at the space now. Throws ZTCInvalidEx where aCount is more than were wanted.
     void commit(Size aCount);
 
-    /// Bytes had of the frame in hand, the length's four included.
+    /// Bytes that have come of this frame, the length's 4 included.
     Size getHad() const { return mHad; }
 
-    /// Bytes that the frame in hand has as a whole, as far as is known: 4 until the length is there, then 4 more than
-    /// it says.
+    /// The size of the whole frame, the length's 4 bytes included. Before the length has come it counts as 0.
     std::uint64_t getTotal() const;
 
     /// What the length says; 0 until it is there.

@@ -14,7 +14,7 @@
 /// start command instead.
 inline constexpr Size MAX_SCOPERECORD_SIZE = 900;
 
-/// No lock of its own: guarded by the lock of whoever holds it.
+/// No lock of its own: its owner guards it.
 class ZTCScopeData {
 public:
     using ZTMadeWithItsCount = void;

@@ -1,4 +1,5 @@
-/// The lock that whoever acts as the sensor holds while it talks: a flock that the kernel drops with the process.
+/// The lock of the program that talks to the agent as its sensor: a flock, which the kernel drops when the process
+/// ends.
 #ifndef SENSOR_CLIENT_INCLUDE_CLIENTLOCK_H
 #define SENSOR_CLIENT_INCLUDE_CLIENTLOCK_H
 

@@ -1,7 +1,7 @@
 /// The one thread that writes the history.
 ///
 /// It takes what it is handed in the order of the calls, in transactions that it commits as soon as nothing more waits,
-/// and at least every second. Files of the spool are removed behind the commit. So a slow disk delays the history, and
+/// and at least every second. Files of the spool are removed after the commit. So a slow disk delays the history, and
 /// never the retrieval.
 ///
 /// When the disk is full, nothing is dropped: the work is done again, whole, until it succeeds. A damaged database is
@@ -56,7 +56,7 @@ public:
 
     /// Starts the thread. @param arSpool  outlives this object  @param aReport  called on the worker's thread
     ZTCHistoryWorker(ZTCSpool& arSpool, std::string aStateDirectory, const ZTSStoreLimits& acrLimits, Report aReport);
-    /// Ends the thread behind the transaction that it is at; what was not committed stays in the spool.
+    /// Waits for the transaction in work, and ends the thread. What was not committed stays in the spool.
     ~ZTCHistoryWorker() override;
     ZTCHistoryWorker(const ZTCHistoryWorker&) = delete;
     ZTCHistoryWorker& operator=(const ZTCHistoryWorker&) = delete;
@@ -72,7 +72,7 @@ public:
     void notePorts(std::shared_ptr<const ZTSTopology> apPorts);
     void setLimits(const ZTSStoreLimits& acrLimits);
     void setMark(std::uint64_t aTicket, const std::string& acrName, ZTCHistoryTime aTime);
-    /// A value for those who read the history; of two of one name the later holds.
+    /// Stores a value under a name, for those who read the history. A later value replaces it.
     void setValue(const std::string& acrName, const std::string& acrValue);
     /// Marks that are done since the last call.
     std::vector<ZTSMarkResult> takeMarkResults();

@@ -14,8 +14,7 @@
 ///    many bytes have come, the length says how many belong to it. So the next collector knows exactly how many bytes
 ///    are still in the FIFO for this frame, and splices those. The size is exact because room is reserved with
 ///    FALLOC_FL_KEEP_SIZE, which changes no size.
-/// 4. *In a `.frame` file.* The frame is whole. The rename from `.part` is atomic: a crash leaves one name or the
-/// other.
+/// 4. *In a `.frame` file.* The frame is whole. The rename from `.part` is atomic: a crash leaves one of the two names.
 ///    A `.part` that is already whole is renamed by the next collector.
 /// 5. *In the database.* The transaction that stores a frame's records also stores the frame's number. The file is
 ///    removed after the commit has returned. A crash between the two leaves a file whose number the database has: the

@@ -1,4 +1,4 @@
-/// The remote ports that one start of an agent was told of, and those that it is to be told of next.
+/// The remote ports that are registered with one start of an agent, and those that will be registered next.
 ///
 /// The agent keeps the first target that it was given for an FC id. So each target is registered once, and a port that
 /// comes back with another id is registered again.

@@ -39,7 +39,7 @@ private:
     std::vector<ZTSRemotePort> mRemotePorts;
 };
 
-/// A WWN from its text; nothing where it is none.
+/// A WWN from its text; nothing where the text is no WWN.
 std::optional<ZTSFcName> parseWwn(std::string_view aText);
 
 /// "10:..:01": the first and the last byte, where there is no room for more.

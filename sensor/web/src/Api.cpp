@@ -26,7 +26,7 @@ static ZTSWebResponse sError(unsigned aStatus, const std::string& acrText) {
     return sJson({{"error", acrText}}, aStatus);
 }
 
-/// Throws where a parameter is none of these: a filter that is spelled wrong must not answer with everything.
+/// Throws for a parameter of another name: a misspelled filter must not answer with everything.
 static void sCheckNames(const ZTSWebRequest& acrRequest, const std::set<std::string>& acrKnown) {
     for (const auto& [lName, lValue] : acrRequest.mParameters) {
         if (!acrKnown.contains(lName)) {

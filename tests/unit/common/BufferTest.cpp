@@ -96,7 +96,7 @@ TEST(Buffer, ReservingNeverShrinks) {
 TEST(Buffer, ASizePastFourGigabytesIsInvalidAndChangesNothing) {
     ZTCBuffer lBuffer;
     lBuffer.append("ab", 2);
-    // The length is held against the limit before any byte is touched.
+    // The length is compared with the limit before any byte is touched.
     EXPECT_THROW(lBuffer.append("x", 4294967294u), ZTCInvalidEx);
     EXPECT_EQ("ab", sText(lBuffer));
 }
