@@ -24,11 +24,17 @@ struct ZTSTimelineRequest {
 ///      "rows": [{"initiator": {…}, "remotePort": {…} or null, "kind": "queue-full",
 ///                "cells": [[column, count, spread], …]}, …],
 ///      "coverage": [{"initiator": {…}, "kind", "state", "from", "to"}, …],
-///      "runs": [{"from", "to"}, …], "gaps": […], "marks": [{"name", "time"}, …]}
+///      "runs": [{"from", "to"}, …], "gaps": […], "marks": [{"name", "time"}, …],
+///      "remotePorts": [{"wwpn", …, "vendor", "model"}, …],
+///      "links": [{"initiator": {…}, "state": "Online", "from", "to"}, …],
+///      "counters": [{"counter": "invalid_crc_count", "initiator": {…}, "remotePort": {…} or null,
+///                    "cells": [[column, rise], …]}, …]}
 ///
 /// Cells are rising by column, and only those that are not empty. A count belongs to the column in which its minute
 /// begins. `spread` is the part of the count whose records began before that minute. `coverage` holds the states other
-/// than `listening` and `no_source`: what was not listened to.
+/// than `listening` and `no_source`: what was not listened to. `remotePorts` are the targets that the host knew at the
+/// end of the range, those without events too. `links` are the states of the local ports; what was not known then is
+/// absent.
 ///
 /// Throws what ZTCHistory throws.
 nlohmann::ordered_json makeTimelineDocument(const ZTCHistory& acrHistory, const ZTSTimelineRequest& acrRequest,

@@ -7,6 +7,8 @@
 #include "sensor/views/include/EpisodeJson.h"
 #include "sensor/views/include/StatusView.h"
 #include "sensor/views/include/TimeText.h"
+#include "sensor/views/src/TimelineColumns.h"
+#include "sensor/views/src/TimelineTopology.h"
 
 using ZTCJson = nlohmann::ordered_json;
 
@@ -36,19 +38,13 @@ public:
         if (acrBucket.mFrom >= mrRequest.mTo) {
             return;
         }
-        // The bucket in which the range begins belongs to the first column.
-        const auto lOffset = std::max(acrBucket.mFrom - mrRequest.mFrom, std::chrono::microseconds(0));
-        const auto lRange = mrRequest.mTo - mrRequest.mFrom;
-        const std::size_t lColumn = static_cast<std::size_t>(static_cast<long double>(lOffset.count()) *
-                                                             static_cast<long double>(mrRequest.mColumns) /
-                                                             static_cast<long double>(lRange.count()));
         ZTSRow& lrRow =
             mRows[{sBytes(acrBucket.mInitiator.mWwpn),
                    acrBucket.mRemotePort ? sBytes(acrBucket.mRemotePort->mWwpn) : ZTCBytes8(), acrBucket.mKind}];
         lrRow.mInitiator = acrBucket.mInitiator;
         lrRow.mRemotePort = acrBucket.mRemotePort;
         lrRow.mKind = acrBucket.mKind;
-        ZTSCell& lrCell = lrRow.mCells[std::min(lColumn, mrRequest.mColumns - 1)];
+        ZTSCell& lrCell = lrRow.mCells[findColumn(mrRequest, acrBucket.mFrom)];
         lrCell.mCount += acrBucket.mOccurrences;
         lrCell.mSpread += acrBucket.mSpread;
     }
@@ -132,5 +128,6 @@ ZTCJson makeTimelineDocument(const ZTCHistory& acrHistory, const ZTSTimelineRequ
             lDocument["marks"].push_back({{"name", lrMark.mName}, {"time", toRfc3339(lrMark.mTime)}});
         }
     }
+    addTopology(lDocument, acrHistory, acrRequest, acrNames);
     return lDocument;
 }

@@ -3,11 +3,18 @@
 async function ask(path, parameters = {}) {
   const query = new URLSearchParams();
   for (const [name, value] of Object.entries(parameters)) {
-    if (value !== "" && value !== null && value !== undefined) {
-      query.append(name, value);
+    for (const one of Array.isArray(value) ? value : [value]) {
+      if (one !== "" && one !== null && one !== undefined) {
+        query.append(name, one);
+      }
     }
   }
-  const response = await fetch(`/api/v1/${path}?${query}`);
+  let response;
+  try {
+    response = await fetch(`/api/v1/${path}?${query}`);
+  } catch {
+    throw new Error("the sensor does not answer");
+  }
   const document = await response.json();
   if (!response.ok) {
     throw new Error(document.error ?? `status ${response.status}`);
@@ -15,16 +22,19 @@ async function ask(path, parameters = {}) {
   return document;
 }
 
+const time = (value) => new Date(value).toISOString();
+
 export const status = () => ask("status");
 export const ports = (parameters) => ask("ports", parameters);
 export const events = (parameters) => ask("events", parameters);
-export const timeline = (from, to, columns) =>
-  ask("timeline", { from: from.toISOString(), to: to.toISOString(), columns });
+export const paths = () => ask("paths");
+export const explain = (subject) => ask("explain", { subject });
+export const timeline = (from, to, columns) => ask("timeline", { from: time(from), to: time(to), columns });
 
-/** Calls back with every change of an episode; reconnects by itself. Returns nothing. */
+/** Calls back with every change of an episode. Reconnects by itself. */
 export function follow(onEpisode, onState) {
   const source = new EventSource("/api/v1/stream");
   source.addEventListener("episode", (event) => onEpisode(JSON.parse(event.data)));
-  source.addEventListener("open", () => onState("Live"));
-  source.addEventListener("error", () => onState("Not live: the sensor does not answer. Trying again …"));
+  source.addEventListener("open", () => onState("Live", true));
+  source.addEventListener("error", () => onState("Not live. Trying again …", false));
 }

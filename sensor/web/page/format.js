@@ -1,42 +1,47 @@
 // How values are shown. Nothing here touches the page.
 
-/** The families of kinds, with what a person thinks of first when one shows up. */
-export const families = [
-  { name: "load", light: "#b35900", dark: "#ffb066", letter: "L",
-    kinds: ["queue-full", "device-busy", "fabric-busy", "port-busy", "queue-depth"] },
-  { name: "path", light: "#8f1d5c", dark: "#ff8fc4", letter: "P",
-    kinds: ["link", "logo", "prlo", "rscn", "plogi", "adisc"] },
-  { name: "SCSI", light: "#0b5cad", dark: "#7db8f5", letter: "S",
-    kinds: ["check-condition", "lun-reset", "target-reset", "bus-reset", "fcp-read-check"] },
-  { name: "fabric", light: "#5a5a00", dark: "#d6d65c", letter: "F", kinds: ["lsrjt"] },
-  { name: "adapter", light: "#3d4148", dark: "#c3c8d0", letter: "A",
-    kinds: ["port-interrupt", "temperature", "adapter-arrival"] },
-];
-
-/** Kinds from the gravest down: a cell shows the letter of the gravest. */
-export const gravity = [
-  "bus-reset", "target-reset", "lun-reset", "fcp-read-check", "port-interrupt", "link", "logo", "prlo", "lsrjt",
-  "temperature", "check-condition", "queue-full", "device-busy", "fabric-busy", "port-busy", "queue-depth", "rscn",
-  "plogi", "adisc", "adapter-arrival",
-];
-
-export function familyOf(kind) {
-  return families.find((family) => family.kinds.includes(kind)) ?? families[families.length - 1];
-}
-
-export function gravest(kinds) {
-  return [...kinds].sort((one, other) => gravity.indexOf(one) - gravity.indexOf(other))[0];
-}
-
 export function number(value) {
   return value === null || value === undefined ? "–" : value.toLocaleString("en-US");
 }
 
-/** Local time, as short as the distance from now allows. */
+/** "once", "2 times", "1,204 times". */
+export function times(count) {
+  return count === 1 ? "once" : `${number(count)} times`;
+}
+
+export function plural(count, noun) {
+  return `${number(count)} ${noun}${count === 1 ? "" : "s"}`;
+}
+
+/** Local date and time; the date is left out where it is today's and `withDate` is false. */
 export function time(value, withDate = true) {
   const date = new Date(value);
   const clock = date.toLocaleTimeString("en-GB");
-  return withDate ? `${date.toLocaleDateString("sv-SE")} ${clock}` : clock;
+  return withDate ? `${day(date)} ${clock}` : clock;
+}
+
+export function day(value) {
+  return new Date(value).toLocaleDateString("sv-SE");
+}
+
+/** "12 Nov 09:58", with seconds where asked for. */
+export function shortTime(value, withSeconds = false) {
+  const date = new Date(value);
+  const clock = date.toLocaleTimeString("en-GB", withSeconds ? {} : { hour: "2-digit", minute: "2-digit" });
+  return `${date.getDate()} ${date.toLocaleDateString("en-GB", { month: "short" })} ${clock}`;
+}
+
+/** From a time to another; the second date is left out where it is the first's. */
+export function span(from, to) {
+  return day(from) === day(to) ? `${shortTime(from)} to ${time(to, false).slice(0, 5)}` : `${shortTime(from)} to ${shortTime(to)}`;
+}
+
+/** "40 s", "12 min", "3 h", "6 days". */
+export function duration(milliseconds) {
+  const seconds = Math.round(milliseconds / 1000);
+  const steps = [[172800, 86400, "days"], [5400, 3600, "h"], [90, 60, "min"]];
+  const [, unit, name] = steps.find(([least]) => seconds >= least) ?? [0, 1, "s"];
+  return `${Math.round(seconds / unit)} ${name}`;
 }
 
 export function portName(port) {
@@ -51,35 +56,46 @@ export function luns(set) {
   if (!set) {
     return "";
   }
-  return set.all ? "all LUNs" : set.numbers.length === 0 ? "" : `LUN ${set.numbers.join(", ")}`;
+  return set.all ? "all LUNs" : set.numbers.length === 0 ? "" : `${set.numbers.length === 1 ? "LUN" : "LUNs"} ${ranges(set.numbers)}${set.more ? " and more" : ""}`;
 }
 
-/** A table of rows of cells; a cell is a text, or {text, number}. */
-export function fillTable(table, heads, rows, empty) {
-  const make = (name, cell) => {
-    const element = document.createElement(name);
-    element.textContent = cell.text ?? cell;
-    if (cell.number) {
-      element.className = "number";
+/** Rising numbers as "0-7, 12, 14". */
+export function ranges(numbers) {
+  const texts = [];
+  for (let begin = 0; begin < numbers.length;) {
+    let end = begin;
+    while (end + 1 < numbers.length && numbers[end + 1] === numbers[end] + 1) {
+      end += 1;
     }
-    return element;
-  };
-  const head = document.createElement("thead");
-  const headRow = head.insertRow();
-  for (const cell of heads) {
-    const element = make("th", cell);
-    element.scope = "col";
-    headRow.append(element);
+    texts.push(end - begin < 2 ? numbers.slice(begin, end + 1).join(", ") : `${numbers[begin]}-${numbers[end]}`);
+    begin = end + 1;
   }
-  const body = document.createElement("tbody");
-  for (const row of rows) {
-    const line = body.insertRow();
-    row.forEach((cell) => line.append(make("td", cell)));
+  return texts.join(", ");
+}
+
+/** The codes of an episode: sense data, reasons, addresses, in the field's own words. */
+export function codes(episode) {
+  const detail = episode.detail ?? {};
+  const hex = (value) => (value === null || value === undefined ? "?" : `0x${value.toString(16).padStart(2, "0")}`);
+  const texts = [];
+  if (detail.senseKey !== undefined) {
+    texts.push(`sense key ${hex(detail.senseKey)}, ASC ${hex(detail.asc)}, ASCQ ${(detail.ascqs ?? []).map(hex).join(" ") || "?"}`);
+    if ((detail.commandCodes ?? []).length > 0) {
+      texts.push(`commands ${detail.commandCodes.map(hex).join(" ")}`);
+    }
   }
-  if (rows.length === 0) {
-    const cell = body.insertRow().insertCell();
-    cell.colSpan = heads.length;
-    cell.textContent = empty;
+  if (detail.opCode !== undefined) {
+    texts.push(`command ${hex(detail.opCode)}`);
   }
-  table.replaceChildren(head, body);
+  if (detail.originalCommand !== undefined) {
+    texts.push(`rejected command ${hex(detail.originalCommand)}`);
+  }
+  for (const reason of detail.reasons ?? []) {
+    const words = Object.entries(reason).filter(([name]) => name !== "count").map(([name, value]) => `${name} ${hex(value)}`);
+    texts.push(`${words.join(", ")} (${times(reason.count)})`);
+  }
+  if (detail.address !== undefined) {
+    texts.push(`${detail.addressFormat} ${detail.address}`);
+  }
+  return texts;
 }

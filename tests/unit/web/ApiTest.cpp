@@ -4,6 +4,8 @@
 #include <gtest/gtest.h>
 
 #include <nlohmann/json.hpp>
+#include <regex>
+#include <set>
 
 #include "sensor/metrics/include/Metrics.h"
 #include "tests/unit/store/StoreFixture.h"
@@ -137,16 +139,33 @@ TEST_F(Api, MetricsCountWhatTheHistoryHolds) {
 }
 
 TEST_F(Api, ThePageAndAllThatItLoadsComeFromThisServer) {
-    const ZTSWebResponse lPage = ask("/");
-    EXPECT_EQ(lPage.mType, "text/html; charset=utf-8");
-    EXPECT_EQ(lPage.mBody.find("http:"), std::string::npos);
-    EXPECT_EQ(lPage.mBody.find("https:"), std::string::npos);
-    for (const char* lpPath : {"/style.css", "/app.js", "/api.js", "/chart.js", "/format.js", "/timeline.js"}) {
-        const ZTSWebResponse lFile = ask(lpPath);
-        EXPECT_EQ(lFile.mStatus, 200U) << lpPath;
-        EXPECT_EQ(lFile.mBody.find("https:"), std::string::npos) << lpPath;
-        EXPECT_EQ(lFile.mBody.find("eval("), std::string::npos) << lpPath;
+    // Every file that the page names, and every module that these import.
+    static const std::regex scNamed("(?:src|href)=\"(/[^\"]+)\"|from \"\\./([^\"]+)\"");
+    std::set<std::string> lSeen;
+    std::vector<std::string> lToSee{"/"};
+    while (!lToSee.empty()) {
+        const std::string lPath = lToSee.back();
+        lToSee.pop_back();
+        if (!lSeen.insert(lPath).second) {
+            continue;
+        }
+        const ZTSWebResponse lFile = ask(lPath);
+        EXPECT_EQ(lFile.mStatus, 200U) << lPath;
+        EXPECT_EQ(lFile.mBody.find("eval("), std::string::npos) << lPath;
+        if (!lPath.starts_with("/vendor/")) {
+            EXPECT_EQ(lFile.mBody.find("http:"), std::string::npos) << lPath;
+            EXPECT_EQ(lFile.mBody.find("https:"), std::string::npos) << lPath;
+        }
+        for (std::sregex_iterator lNamed(lFile.mBody.begin(), lFile.mBody.end(), scNamed);
+             lNamed != std::sregex_iterator(); ++lNamed) {
+            lToSee.push_back((*lNamed)[1].matched ? (*lNamed)[1].str() : "/" + (*lNamed)[2].str());
+        }
     }
+    EXPECT_TRUE(lSeen.contains("/timeline.js"));
+    EXPECT_TRUE(lSeen.contains("/vendor/uPlot.js"));
+    EXPECT_EQ(ask("/").mType, "text/html; charset=utf-8");
+    EXPECT_EQ(ask("/style.css").mType, "text/css; charset=utf-8");
+    EXPECT_EQ(ask("/app.js").mType, "text/javascript; charset=utf-8");
 }
 
 // ---- the timeline ----

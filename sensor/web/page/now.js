@@ -1,0 +1,189 @@
+// The view of this moment: does Tavik collect, on which adapters, and what is wrong, the worst first.
+
+import * as api from "./api.js";
+import { makeAddress } from "./address.js";
+import { devicesOf } from "./devices.js";
+import { element, figure, fillTable, link, make } from "./dom.js";
+import { placeOf } from "./episodes.js";
+import { duration, initiatorName, number, plural, shortTime } from "./format.js";
+import { kindOf, kinds } from "./kinds.js";
+import { makeGrid } from "./grid.js";
+import { familyColor, mix, readColors, strengthOf, swatch } from "./palette.js";
+import { troubleBox } from "./troubles.js";
+import { sentenceOf } from "./words.js";
+
+const hour = 3600000;
+const mostTroubles = 8;
+const mostKinds = 3;
+const looks = new Map(); // what to look at next, by kind
+
+const code = (text) => make("code", text);
+
+// ---- open troubles ----
+
+const rank = (episode) => kinds.indexOf(kindOf(episode.kind));
+
+/** Episodes of one port and kind that several initiators see are one trouble. */
+function group(episodes) {
+  const groups = new Map();
+  for (const episode of episodes) {
+    const key = `${episode.kind} ${episode.remotePort?.wwpn ?? episode.initiator.wwpn}`;
+    groups.set(key, [...(groups.get(key) ?? []), episode]);
+  }
+  return [...groups.values()].map((members) => {
+    const seen = [...new Set(members.map((member) => initiatorName(member.initiator)))];
+    const all = members.some((member) => member.luns?.all);
+    const numbers = [...new Set(members.flatMap((member) => member.luns?.numbers ?? []))].sort((one, other) => one - other);
+    const first = members.reduce((least, member) => (member.first < least ? member.first : least), members[0].first);
+    const last = members.reduce((most, member) => (member.last > most ? member.last : most), members[0].last);
+    return { ...members[0], count: members.reduce((sum, member) => sum + member.count, 0), first, last, seen,
+      luns: members[0].luns === null ? null : { all, numbers }, initiator: { ...members[0].initiator, host: seen.join(", ") } };
+  });
+}
+
+async function lookAt(kind) {
+  if (!looks.has(kind)) {
+    looks.set(kind, api.explain(kind).then((document) => document.parts.find(({ label }) => label === "look at")?.texts ?? []).catch(() => []));
+  }
+  return looks.get(kind);
+}
+
+async function openBox(episode) {
+  const kind = kindOf(episode.kind);
+  const box = make("article", "", `trouble level-${kind.level}`);
+  box.append(make("h4", [swatch(kind.family), ` ${sentenceOf(episode)}`]));
+  const found = episode.remotePort === null ? null
+    : await devicesOf(episode.remotePort.wwpn, episode.luns?.all || !episode.luns ? null : new Set(episode.luns.numbers));
+  const names = found === null ? [] : [
+    ["Disks", found.disks], ["Multipath devices", found.multipaths], ["Mounts", found.mounts],
+  ].filter(([, values]) => values.size > 0).map(([name, values]) => `${name}: ${[...values].slice(0, 12).join(", ")}${values.size > 12 ? " …" : ""}`);
+  if (names.length > 0) {
+    box.append(make("p", names.join(". ")));
+  }
+  box.append(make("p", [`Since ${shortTime(episode.first, true)}, last ${duration(Date.now() - Date.parse(episode.last))} ago. `,
+    link("In the timeline", placeOf(episode))], "quiet"));
+  const texts = await lookAt(episode.kind);
+  if (texts.length > 0) {
+    box.append(make("details", [make("summary", "What to look at next"), ...texts.map((text) => make("p", text))]));
+  }
+  return box;
+}
+
+async function showOpen() {
+  const { episodes } = await api.events({ open: "true", limit: 2000 });
+  const troubles = group(episodes).filter((episode) => kindOf(episode.kind).level > 1)
+    .sort((one, other) => rank(one) - rank(other) || other.count - one.count);
+  const boxes = await Promise.all(troubles.slice(0, mostTroubles).map(openBox));
+  if (troubles.length > mostTroubles) {
+    boxes.push(make("p", link(`${number(troubles.length - mostTroubles)} more`, makeAddress("events", { open: "true" }))));
+  }
+  if (boxes.length === 0) {
+    boxes.push(make("p", ["No trouble goes on. ", link("See the last 24 hours", makeAddress("timeline", { range: "24h" })), "."], "calm"));
+  }
+  element("open-troubles").replaceChildren(...boxes);
+}
+
+// ---- ports ----
+
+function stateDot(state) {
+  const isGood = state === "Online";
+  return make("span", [make("span", "", `dot ${isGood ? "good" : state === null ? "unknown" : "bad"}`), ` ${state ?? "not known"}`]);
+}
+
+function showLinks(status) {
+  const kindsOf = new Map((status.kinds ?? []).map((entry) => [entry.initiator.wwpn, Object.values(entry.kinds)]));
+  const count = (wwpn, ...states) => (kindsOf.get(wwpn) ?? []).filter((value) => states.includes(value)).length;
+  fillTable(element("links"), ["Local port", "WWPN", "Link", "Speed", { text: "Listening to", number: true }, { text: "Without a source", number: true }, { text: "Deaf", number: true }],
+    (status.adapters ?? []).map((adapter) => {
+      const initiator = adapter.initiator ?? adapter;
+      const deaf = count(initiator.wwpn, "no_rights", "failed");
+      return [initiatorName(initiator), code(initiator.wwpn ?? "–"), stateDot(adapter.portState ?? null), adapter.speed ?? "–",
+        figure(plural(count(initiator.wwpn, "listening"), "kind")), figure(String(count(initiator.wwpn, "no_source"))),
+        { text: String(deaf), number: true, className: deaf > 0 ? "bad" : "" }];
+    }), "No Fibre Channel adapter is known. Is one plugged in, and is its driver loaded?");
+}
+
+/** A day at one look: a bar an hour. */
+function sparkline(cells, columns, most) {
+  const canvas = make("canvas", "", "spark");
+  canvas.width = columns * 8;
+  canvas.height = 36;
+  canvas.setAttribute("role", "img");
+  canvas.setAttribute("aria-label", `${cells.size} of ${columns} half hours with events`);
+  const context = canvas.getContext("2d");
+  const { ground, line } = readColors();
+  context.fillStyle = line;
+  context.fillRect(0, 34, canvas.width, 2);
+  for (const [column, { count, kind }] of cells) {
+    const strength = strengthOf(count, most);
+    context.fillStyle = mix(familyColor(kind.family), ground, Math.max(0.6, strength));
+    context.fillRect(column * 8, 34 - 32 * strength, 7, 32 * strength);
+  }
+  return canvas;
+}
+
+function portCell(port) {
+  const where = link(port.name ?? port.wwpn, makeAddress("timeline", { range: "24h", find: port.wwpn }));
+  return port.name === null ? where : make("span", [where, " ", make("span", port.wwpn, "quiet small")]);
+}
+
+/** The kinds of a port, the most frequent ones. */
+function mostOf(counts) {
+  const sorted = Object.entries(counts).sort(([, one], [, other]) => other - one);
+  const texts = sorted.slice(0, mostKinds).map(([kind, count]) => `${kind} ${number(count)}`);
+  return `${texts.join(", ")}${sorted.length > mostKinds ? `, ${sorted.length - mostKinds} more` : ""}`;
+}
+
+async function showPorts() {
+  const now = Date.now();
+  const grid = makeGrid(now - 24 * hour, now, 500, 10);
+  const [document, timeline] = await Promise.all([api.ports({ since: "24h", limit: 50 }), api.timeline(grid.from, grid.to, grid.columns)]);
+  const days = new Map();
+  let most = 10;
+  for (const row of timeline.rows.filter(({ remotePort }) => remotePort !== null)) {
+    const cells = days.get(row.remotePort.wwpn) ?? new Map();
+    days.set(row.remotePort.wwpn, cells);
+    for (const [column, count] of row.cells) {
+      const before = cells.get(column);
+      const kind = kindOf(row.kind);
+      cells.set(column, { count: count + (before?.count ?? 0), kind: before && kinds.indexOf(before.kind) < kinds.indexOf(kind) ? before.kind : kind });
+      most = Math.max(most, cells.get(column).count);
+    }
+  }
+  fillTable(element("ports"), ["Remote port", { text: "Events", number: true }, "Last 24 hours", "Last event", "Seen from", "Kinds"],
+    document.ports.map((port) => [
+      portCell(port.remotePort),
+      figure(number(port.count)), sparkline(days.get(port.remotePort.wwpn) ?? new Map(), grid.columns, most), shortTime(port.last),
+      port.initiators.map(initiatorName).join(", "),
+      mostOf(port.kinds)]),
+    "No remote port had an event in the last 24 hours.");
+}
+
+// ---- the view ----
+
+async function part(id, show) {
+  try {
+    await show();
+  } catch (problem) {
+    element(id).replaceChildren(make("p", `Not known: ${problem.message}.`, "quiet"));
+  }
+}
+
+export async function show() {
+  let status;
+  try {
+    status = await api.status();
+  } catch (problem) {
+    element("headline").textContent = `No answer: ${problem.message}`;
+    element("headline").className = "headline bad";
+    element("troubles").replaceChildren(make("p", ["Look on the host: ", code("systemctl status tavik"), " and ", code("tavik status"), ". The page asks again by itself."]));
+    return;
+  }
+  element("host").textContent = status.host;
+  document.title = `${status.host}: ${status.verdict.toLowerCase()} – Tavik`;
+  element("headline").textContent = status.text;
+  element("headline").className = `headline ${status.exit === 0 ? "good" : "bad"}`;
+  element("troubles").replaceChildren(...status.troubles.map(troubleBox));
+  showLinks(status);
+  await Promise.all([part("open-troubles", showOpen), part("ports", showPorts)]);
+}

@@ -1,0 +1,165 @@
+"""Every view with the demonstration's events, and everything that a person can do in the timeline."""
+from selenium.webdriver.common.keys import Keys
+
+from browser import require
+from palette import LEAST, closest
+
+TIMELINE = "#timeline;range=15m"
+
+
+def check_now(browser):
+    browser.open("#now")
+    browser.wait_text("headline", "COLLECTING")
+    browser.wait_text("ports", "queue-full")
+    browser.wait_text("live", "Live")
+    browser.wait_text("open-troubles", "queue is full")
+    require("an open trouble does not name its port", "array7 ctrl-A" in browser.text("open-troubles"))
+    require("an open trouble does not say what to look at", "What to look at next" in browser.text("open-troubles"))
+    worst = browser.run("return [...document.querySelectorAll('#open-troubles .trouble')].map((e) => e.className.includes('level-3'))")
+    require("the worst trouble does not stand first", worst == sorted(worst, reverse=True))
+
+
+def open_timeline(browser, address=TIMELINE):
+    browser.open(address)
+    browser.wait("the chart", lambda: browser.colors("chart") > 5)
+    browser.wait("the overview", lambda: browser.colors("overview") > 2)
+
+
+def check_keyboard(browser):
+    open_timeline(browser)
+    browser.keys("chart", "]")
+    first = browser.wait("a trouble", lambda: "times" in browser.text("cell-text") and browser.text("cell-text"))
+    browser.keys("chart", "]")
+    browser.wait("the next trouble", lambda: browser.text("cell-text") != first)
+    browser.keys("chart", "[")
+    browser.wait("the trouble before", lambda: browser.text("cell-text") == first)
+    for key in (Keys.ARROW_DOWN, Keys.ARROW_UP, Keys.ARROW_LEFT, Keys.ARROW_RIGHT):
+        browser.keys("chart", key)
+    browser.keys("chart", "m")
+    browser.wait("the command for a mark", lambda: "tavik mark " in browser.text("cell-text"))
+    browser.keys("chart", "[")
+    browser.keys("chart", Keys.ENTER)
+    browser.wait("the episodes of the cell", lambda: browser.find("panel-episodes").find_elements("tag name", "a"))
+    browser.wait_text("panel-explanation", "What it means")
+    browser.wait_text("panel-explanation", "Evidence")
+    require("the panel names no command", "tavik events --since" in browser.text("panel-command"))
+    require("the panel has not got the focus", browser.focus() == "panel-title")
+    require("the address does not hold the cell", ";cell=" in browser.address() and ";open=1" in browser.address())
+
+
+def check_address(browser):
+    """The same again, from the address alone."""
+    sentence = browser.text("panel-sentence")
+    title = browser.text("panel-title")
+    browser.open(browser.run("return location.hash"))
+    browser.wait("the panel again", lambda: browser.text("panel-title") == title)
+    browser.wait("the sentence again", lambda: browser.text("panel-sentence") == sentence)
+    browser.keys("panel-title", Keys.ESCAPE)
+    require("Escape does not close the panel", not browser.find("panel").is_displayed())
+    require("the chart has not got the focus back", browser.focus() == "chart")
+
+
+def check_pointer(browser):
+    open_timeline(browser, "#timeline;range=1h")
+    before = browser.text("range-text")
+    wide = browser.find("chart").size["width"]
+    browser.drag("chart", (0, 0), (wide // 4, 0))
+    browser.wait("the range of the drag", lambda: "fixed" in browser.text("range-text"))
+    require("the line across the lanes does not show", browser.find("crosshair").is_displayed())
+    browser.drag("chart", (0, 0), (wide // 4, 0), Keys.SHIFT)
+    browser.wait("the second range", lambda: browser.find("compare").is_displayed())
+    require("the address does not hold the second range", ";compare=" in browser.address())
+    address = browser.find("compare-link").get_attribute("href")
+    browser.keys("chart", Keys.BACKSPACE)
+    browser.wait("the range before", lambda: browser.text("range-text")[:8] == before[:8] and "fixed" not in browser.text("range-text"))
+    browser.keys("overview", "-")
+    browser.wait("a longer range by the overview", lambda: "fixed" in browser.text("range-text"))
+    browser.keys("chart", Keys.BACKSPACE)
+    return address[address.index("#"):]
+
+
+def check_filter(browser):
+    open_timeline(browser)
+    rows = "return document.querySelectorAll('#chart-table tbody tr').length"
+    count = browser.run(rows)
+    require("the chart's table is empty", count > 3)
+    browser.run("document.querySelector('[data-family=load]').click()")
+    browser.wait("fewer rows", lambda: browser.run(rows) < count)
+    require("the address does not hold the families", ";families=path,SCSI,fabric,adapter" in browser.address())
+    browser.run("document.querySelector('[data-family=load]').click()")
+    browser.wait("all rows", lambda: browser.run(rows) == count)
+    browser.keys("find", "no such port")
+    browser.wait_text("chart-empty", "Clear it")
+
+
+def check_live(browser, inject):
+    open_timeline(browser)
+    browser.run("document.getElementById('pause').click()")
+    browser.wait_text("pause", "Paused")
+    inject()
+    browser.wait("how many are new", lambda: "new" in browser.text("missed"))
+    browser.run("document.getElementById('missed').click()")
+    browser.wait_text("pause", "Live")
+
+
+def check_compare(browser, address):
+    browser.open("#compare")
+    browser.wait_text("compare-how", "Choose a mark")
+    browser.wait_text("compare-mark", "before-storm")
+    browser.run("const s = document.getElementById('compare-mark'); s.value = 'before-storm'; s.dispatchEvent(new Event('change'))")
+    browser.wait_text("compare-rates", "queue-full")
+    require("the address does not hold the mark", browser.address() == "#compare;mark=before-storm")
+    browser.open(address)
+    browser.wait_text("compare-spans", "After:")
+
+
+def check_events(browser):
+    browser.open("#events;kind=queue-full;since=1h")
+    browser.wait_text("events", "queue-full")
+    require("the filter lets other kinds through", "plogi" not in browser.text("events"))
+    browser.open("#events;kind=nonsense")
+    browser.wait_text("events-text", "nonsense")
+    require("a wrong filter is no message in the console", len(browser.driver.get_log("browser")) == 1)
+
+
+def check_without_sensor(browser):
+    """The first paint does not wait for data: here they never come."""
+    browser.driver.execute_cdp_cmd("Network.enable", {})
+    browser.driver.execute_cdp_cmd("Network.setBlockedURLs", {"urls": ["*/api/*"]})
+    browser.open("#now")
+    browser.wait("the first paint", lambda: browser.run("return performance.getEntriesByName('first-contentful-paint').length"))
+    browser.wait_text("headline", "No answer")
+    browser.wait_text("troubles", "systemctl status tavik")
+    browser.open("#timeline")
+    browser.wait_text("chart-problem", "does not answer")
+    browser.driver.execute_cdp_cmd("Network.setBlockedURLs", {"urls": []})
+    browser.driver.get_log("browser")
+
+
+def check_palette(browser):
+    for scheme, ground in (("light", "#ffffff"), ("dark", "#15171a")):
+        colors, pale = browser.driver.execute_async_script(
+            "const [scheme, ground, done] = arguments;"
+            "Promise.all([import('/kinds.js'), import('/palette.js')]).then(([k, p]) => done(["
+            "  Object.fromEntries(k.families.map((f) => [f.name, f[scheme]])),"
+            "  Object.fromEntries(k.families.map((f) => [f.name, p.mix(f[scheme], ground, 0.5)]))]));", scheme, ground)
+        require("there are not five families", len(colors) == 5)
+        for sort, values in (("strong", colors), ("pale", pale)):
+            distance, sight, one, other = closest(values)
+            require(f"{scheme}: {sort} cells of {one} and {other} look alike {sight} ({distance:.0f})", distance >= LEAST[sort])
+
+
+def check_demo(browser, inject):
+    check_now(browser)
+    check_keyboard(browser)
+    check_address(browser)
+    address = check_pointer(browser)
+    check_filter(browser)
+    check_live(browser, inject)
+    check_compare(browser, address)
+    browser.open("#paths")
+    browser.wait("the paths' answer", lambda: "Asking" not in browser.text("paths-text"))
+    check_palette(browser)
+    browser.check_quiet("after all views")
+    check_events(browser)
+    check_without_sensor(browser)

@@ -1,0 +1,98 @@
+"""Every view with a large history: answers in time, charts with something in them, accessible in light and dark, at all
+widths, and on paper. Keeps a picture of each."""
+from browser import require
+
+MOST_MILLISECONDS = 1000
+VIEWS = {
+    "now": ("#now", "headline", "COLLECTING"),
+    "timeline": ("#timeline;range=30d", "range-text", " to "),
+    "paths": ("#paths", "paths-text", "."),
+    "compare": ("#compare;mark=firmware-9.1", "compare-rates", "queue-full"),
+    "events": ("#events;since=30d", "events-text", "newest 1,000"),
+}
+WIDTHS = (360, 768, 1280, 2560)
+
+
+def show(browser, view):
+    address, name, part = VIEWS[view]
+    browser.open(address)
+    browser.wait_text(name, part)
+    if view == "now":
+        browser.wait("the remote ports", lambda: "array7" in browser.text("ports"))
+    if view == "timeline":
+        browser.wait("the chart", lambda: browser.colors("chart") > 20)
+        browser.wait("the overview", lambda: browser.colors("overview") > 4)
+
+
+def check_times(browser, episodes):
+    document, _ = browser.ask("/api/v1/events?limit=1")
+    number = document["episodes"][0]["episode"]
+    require(f"the history has {number} episodes, fewer than {episodes}", number >= episodes)
+    for path in ("status", "events", "ports?since=30d", "paths", "timeline?from=30d&columns=240", "timeline?from=24h&columns=100",
+                 f"explain?subject={number}"):
+        _, took = browser.ask(f"/api/v1/{path}")
+        print(f"page: {took:7.1f} ms  /api/v1/{path}", flush=True)
+        require(f"{path} took {took:.0f} ms, more than {MOST_MILLISECONDS}", took <= MOST_MILLISECONDS)
+
+
+def check_hatching(browser):
+    """Where Tavik did not run, every row is hatched: in its column no row is blank from top to bottom."""
+    show(browser, "timeline")
+    blank = browser.driver.execute_async_script(
+        "const done = arguments[0];"
+        "fetch('/api/v1/timeline?from=30d&columns=1').then((r) => r.json()).then((d) => {"
+        "  const c = document.getElementById('chart'), ratio = c.width / c.clientWidth;"
+        "  const gutter = Math.round(Math.min(240, Math.max(96, c.clientWidth * 0.2)));"
+        "  const [from, to] = [Date.parse(d.from), Date.parse(d.to)];"
+        "  const middle = (Date.parse(d.runs[0].to) + Date.parse(d.runs[1].from)) / 2;"
+        "  const x = gutter + (middle - from) / (to - from) * (c.clientWidth - gutter);"
+        "  const p = c.getContext('2d').getImageData(Math.round((x - 4) * ratio), 30 * ratio, 8 * ratio, c.height - 30 * ratio);"
+        "  let blank = 0, most = 0;"
+        "  for (let y = 0; y < p.height; ++y) { const s = new Set();"
+        "    for (let i = 0; i < p.width; ++i) { const o = 4 * (y * p.width + i); s.add(p.data[o] << 16 | p.data[o+1] << 8 | p.data[o+2]); }"
+        "    blank = s.size > 1 ? 0 : blank + 1; most = Math.max(most, blank); }"
+        "  done(most); });")
+    require(f"{blank} lines of the outage are not hatched", blank <= 6)
+
+
+def check_views(browser, checker):
+    for scheme in ("light", "dark"):
+        browser.media(scheme=scheme)
+        for view in VIEWS:
+            show(browser, view)
+            browser.check_accessible(f"{view}, {scheme}", checker)
+            browser.picture(f"{view}-{scheme}")
+            browser.check_quiet(f"{view}, {scheme}")
+    browser.media()
+
+
+def check_widths(browser):
+    for width in WIDTHS:
+        browser.resize(width)
+        for view in VIEWS:
+            show(browser, view)
+            browser.check_quiet(f"{view} at {width} pixels")
+            if width != 1280:
+                browser.picture(f"{view}-{width}")
+    browser.resize(1280)
+
+
+def check_paper(browser):
+    show(browser, "timeline")
+    require("the chart has no colors on a screen", browser.most_saturated("chart") > 60)
+    browser.media(media="print")
+    browser.wait("patterns in place of colors", lambda: browser.most_saturated("chart") <= 8)
+    require("the chart is blank on paper", browser.colors("chart") > 5)
+    require("the range's buttons are on paper", not browser.find("ranges").is_displayed())
+    browser.picture("timeline-paper")
+    browser.media()
+    browser.wait("colors again", lambda: browser.most_saturated("chart") > 60)
+
+
+def check_large(browser, checker, episodes):
+    browser.open("#now")
+    check_times(browser, episodes)
+    check_hatching(browser)
+    check_views(browser, checker)
+    check_widths(browser)
+    check_paper(browser)
