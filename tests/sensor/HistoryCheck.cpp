@@ -32,7 +32,10 @@ std::string checkIntegrity(const std::string& acrStateDirectory) {
 
 void setSchemaVersion(const std::string& acrStateDirectory, unsigned aVersion) {
     EXPECT_EQ(sExecute(acrStateDirectory, ("PRAGMA user_version = " + std::to_string(aVersion)).c_str()), "");
-    EXPECT_NE(sExecute(acrStateDirectory, "PRAGMA wal_checkpoint(TRUNCATE)"), "1");
+}
+
+unsigned getSchemaVersion(const std::string& acrStateDirectory) {
+    return static_cast<unsigned>(std::stoul(sExecute(acrStateDirectory, "PRAGMA user_version")));
 }
 
 std::vector<std::string> listSpool(const std::string& acrStateDirectory) {

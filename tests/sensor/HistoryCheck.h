@@ -11,6 +11,7 @@ std::string checkIntegrity(const std::string& acrStateDirectory);
 
 /// As another version of the sensor leaves it.
 void setSchemaVersion(const std::string& acrStateDirectory, unsigned aVersion);
+unsigned getSchemaVersion(const std::string& acrStateDirectory);
 
 /// The names of the files in the spool.
 std::vector<std::string> listSpool(const std::string& acrStateDirectory);

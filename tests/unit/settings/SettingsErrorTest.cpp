@@ -2,6 +2,7 @@
 #include <gtest/gtest.h>
 
 #include "sensor/settings/include/Settings.h"
+#include "sensor/settings/src/SettingsTable.h"
 
 using testing::ElementsAre;
 using testing::HasSubstr;
@@ -99,6 +100,28 @@ INSTANTIATE_TEST_SUITE_P(
         ZTSBadValue{"agent", "5", "wrong type: 5, must be a table: [agent]"},
         ZTSBadValue{"names", "[]", "wrong type: a list, must be a table: [names]"},
         ZTSBadValue{"warn", "{kind = \"deaf\"}", "wrong type: a table, must be tables: [[warn]]"}));
+
+TEST(SettingsErrors, EachKeyIsCheckedForItsTypeAndItsRange) {
+    std::size_t lRanges = 0;
+    for (const ZTSKey& lcrKey : settingsTable()) {
+        const std::string lKey = lcrKey.toText();
+        SCOPED_TRACE(lKey);
+        EXPECT_THAT(sErrors(lKey + " = {}\n"),
+                    ElementsAre(StartsWith("t.toml:1: " + lKey + ": wrong type: a table, must ")));
+        const std::string lDefault = std::string(lKey) + " = " + lcrKey.mpDefault + "\n";
+        EXPECT_THAT(sErrors(lDefault), testing::IsEmpty());
+        if (lcrKey.mRange.mMost == 0) {
+            continue;
+        }
+        ++lRanges;
+        for (const double lValue : {lcrKey.mRange.mLeast - 1, 2 * lcrKey.mRange.mMost}) {
+            const std::string lNumber = std::to_string(static_cast<long long>(lValue));
+            EXPECT_THAT(sErrors(lKey + " = " + lNumber + "\n"),
+                        ElementsAre(StartsWith("t.toml:1: " + lKey + ": out of range: " + lNumber + ", must be ")));
+        }
+    }
+    EXPECT_GT(lRanges, 8U);
+}
 
 TEST(SettingsErrors, AnUnknownKeyIsNamedWithThoseThatThereAre) {
     EXPECT_THAT(sErrors("[collect]\n\nperoid = 5\n"),
