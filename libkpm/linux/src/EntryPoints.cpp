@@ -49,8 +49,11 @@ static ZTSLinuxOptions sOptions() {
     if (const char* lpInstance = std::getenv("KPM_LINUX_INSTANCE"); lpInstance != nullptr) {
         lOptions.mTracePlace.mPrepared = lpInstance;
     }
-    const char* lpProbe = std::getenv("KPM_LINUX_PROBE");
-    lOptions.mTracePlace.mForcesProbe = lpProbe != nullptr && std::strcmp(lpProbe, "1") == 0;
+    if (const char* lpProbe = std::getenv("KPM_LINUX_PROBE"); lpProbe != nullptr) {
+        lOptions.mTracePlace.mProbeUse = std::strcmp(lpProbe, "1") == 0   ? ZTPU_Always
+                                         : std::strcmp(lpProbe, "0") == 0 ? ZTPU_Never
+                                                                          : ZTPU_Needed;
+    }
     return lOptions;
 }
 

@@ -61,11 +61,13 @@ void ZTCLinuxOutcomeFeed::open() {
 
 /// Where the trace has no sense data, they come by a probe, if this host grants it.
 void ZTCLinuxOutcomeFeed::openProbe() {
-    if (mpTrace->getRecordLayout().hasSense() && !mPlace.mForcesProbe) {
+    if (mpTrace->getRecordLayout().hasSense() && mPlace.mProbeUse != ZTPU_Always) {
         return;
     }
-    ZTSFeedProblem lProblem;
-    mpProbe = ZTCSenseProbe::open(mpTrace->getPath(), mPlace.mSysfsRoot, mrFiles, lProblem);
+    ZTSFeedProblem lProblem{ZTFH_NotGranted, "the probe is switched off (KPM_LINUX_PROBE=0)"};
+    if (mPlace.mProbeUse != ZTPU_Never) {
+        mpProbe = ZTCSenseProbe::open(mpTrace->getPath(), mPlace.mSysfsRoot, mrFiles, lProblem);
+    }
     if (mpProbe != nullptr) {
         mpProbe->watchHosts(mrWatcher.getHosts());
         return;

@@ -22,7 +22,14 @@ enum ZTETraceRead : std::uint8_t { ZTTR_Page, ZTTR_Empty, ZTTR_Failed };
 /// What a read of a buffer that gave nothing means: what it returned, and the error number where that is negative.
 ZTETraceRead judgeEmptyTraceRead(std::int64_t aRead, int aError);
 
-/// Where tracefs is.
+/// When sense data come by the probe.
+enum ZTEProbeUse : std::uint8_t {
+    ZTPU_Needed,  ///< where the trace has none
+    ZTPU_Always,  ///< also where the trace has them
+    ZTPU_Never
+};
+
+/// Where tracefs is, and what is used of it.
 struct ZTSTracePlace {
     /// The first is used that has instances.
     std::vector<std::string> mRoots{"/sys/kernel/tracing", "/sys/kernel/debug/tracing"};
@@ -30,8 +37,7 @@ struct ZTSTracePlace {
     std::string mPrepared{};
     /// Where /sys is: the kernel describes its types there.
     std::string mSysfsRoot = "/sys";
-    /// Sense data come by the probe even where the trace has them; for tests.
-    bool mForcesProbe = false;
+    ZTEProbeUse mProbeUse = ZTPU_Needed;
 };
 
 enum ZTETraceFilter : std::uint8_t {

@@ -73,6 +73,20 @@ TEST_F(LinuxEngineSense, WithoutWhatItNeedsCheckConditionsComeWithoutThemAndOneL
     EXPECT_EQ(mRecorder.waitFor(1), ZTCTexts{"0 check-condition 0 0 28 ffffffff ffffffff ffffffff"});
 }
 
+TEST_F(LinuxEngineSense, AProbeThatIsSwitchedOffIsNotDefinedAndOneLineSaysSo) {
+    mKernel.addTypes();
+    ZTSLinuxOptions lOptions = mKernel.options();
+    lOptions.mTracePlace.mProbeUse = ZTPU_Never;
+    start(lOptions);
+    EXPECT_EQ(mLog.count("2 check conditions come with no sense data: this kernel's trace has none, and the probe is "
+                         "switched off (KPM_LINUX_PROBE=0)"),
+              1u)
+        << mLog.all();
+    EXPECT_TRUE(mKernel.probes().empty());
+    mKernel.sendDone({.mResult = 2, .mHasSense = false});
+    EXPECT_EQ(mRecorder.waitFor(1), ZTCTexts{"0 check-condition 0 0 28 ffffffff ffffffff ffffffff"});
+}
+
 TEST_F(LinuxEngineSense, WithoutTheRightToDefineAProbeItSaysWhatWouldHelp) {
     mKernel.addTypes();
     mKernel.refuseWrites("kprobe_events", "", EACCES);
@@ -143,7 +157,7 @@ TEST_F(LinuxEngineSense, WhereTheTraceHasThemTheProbeIsUsedOnlyIfItIsForced) {
     EXPECT_TRUE(mKernel.probes().empty());
     mpEngine.reset();
     ZTSLinuxOptions lOptions = mKernel.options();
-    lOptions.mTracePlace.mForcesProbe = true;
+    lOptions.mTracePlace.mProbeUse = ZTPU_Always;
     start(lOptions);
     EXPECT_EQ(mKernel.probes(), std::vector<std::string>{mGroup});
     mKernel.sendDone({.mResult = 2, .mSenseKey = 1});

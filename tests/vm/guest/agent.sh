@@ -58,6 +58,9 @@ recorded() {
 agent_time() { cat /proc/$gAgent/task/*/schedstat | awk '{n += $1} END {printf "%.0f\n", n}'; }
 agent_wakes() { cat /proc/$gAgent/task/*/status | awk '/^voluntary_ctxt_switches/ {n += $2} END {print n}'; }
 
+# probe_hits: how often the kernel has run any probe so far.
+probe_hits() { awk '{n += $(NF - 1)} END {print n + 0}' $gTracing/kprobe_profile; }
+
 processors() { grep -c ^processor /proc/cpuinfo; }
 
 # repeated TIMES DEVICE EACH BYTE...: so many senders at once, each of which sends the command so many times.

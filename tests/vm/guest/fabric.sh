@@ -60,6 +60,7 @@ sg_of() { lun_device "$1" scsi_generic; }
 controller() { echo /sys/class/net/$1/ctlr_*; }
 set_link() { /vm/bin/ip link set "$1" "$2"; }
 
+gAnswers=/tmp/answers # what the scripted LUN has answered, one line an answer: status, sense key, asc, ascq
 gConfig=/sys/kernel/config/target
 gGroup=$gConfig/fc/$(colons $gTargetName)/tpgt_1
 gAccess=$gGroup/acls/$(colons $gInitiatorName)
@@ -78,7 +79,7 @@ backstore_scripted() {
   echo "dev_config=scripted/$1,dev_size=1048576,hw_block_size=512,nl_reply_supported=-1" >$gConfig/core/$lStore/control
   echo 1 >$gConfig/core/$lStore/enable
   lDevice=$(dirname "$(grep -l "^tcm-user/$1/" /sys/class/uio/uio*/name)")
-  scripted-target "/dev/${lDevice##*/}" "$(cat "$lDevice/maps/map0/size")" >/dev/null 2>/dev/kmsg &
+  scripted-target "/dev/${lDevice##*/}" "$(cat "$lDevice/maps/map0/size")" $gAnswers >/dev/null 2>/dev/kmsg &
   echo $lStore
 }
 

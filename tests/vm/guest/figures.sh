@@ -77,9 +77,25 @@ costs "good commands of another host" 200000 repeated 2 $(other_disk) 100000 $gG
 echo 'result & 42' >$(echo $gTracing/instances/*)/events/scsi/scsi_dispatch_cmd_done/filter
 costs "the same with no host in the filter" 200000 repeated 2 $(other_disk) 100000 $gGood
 printf '\n%-44s %9s %10s %9s %9s\n' "" events/s "us an event" came lost >&3
-storm "failed commands of the FC host" check-condition 'SCSI outcomes are lost' 8000 repeated 8 $(sg_of 1) 1000 $gPastEnd
+failed_commands() { storm "$1" check-condition 'SCSI outcomes are lost' 8000 repeated 8 $(sg_of 1) 1000 $gPastEnd; }
+failed_commands "failed commands of the FC host"
 storm "RSCNs, 2000 at once" rscn 'were passed over' 2000 rscns 2000
 unread "outcomes on one processor, agent stopped" check-condition 'SCSI outcomes are lost' 5000 on_one_processor 5000
 unread "RSCNs, agent stopped" rscn 'were passed over' 20000 rscns 20000
 stop_agent
-[ "$gAgentStatus" = 0 ]
+[ "$gAgentStatus" = 0 ] || exit 1
+
+# The probe for sense data, and none.
+for lProbe in 1 0; do
+  export KPM_LINUX_PROBE=$lProbe
+  start_agent || exit 1
+  [ $lProbe = 1 ] && lWith="with the probe" || lWith="without a probe"
+  printf '\n%-44s %9s %10s %9s %9s\n' "$lWith" commands/s "agent ms/s" wakes/s records >&3
+  lHits=$(probe_hits)
+  costs "good commands of the FC host" 40000 repeated 8 $(sg_of 0) 5000 $gGood
+  printf 'the probe was hit by %s of them\n' $(($(probe_hits) - lHits)) >&3
+  printf '%-44s %9s %10s %9s %9s\n' "" events/s "us an event" came lost >&3
+  failed_commands "failed commands of the FC host"
+  stop_agent
+  [ "$gAgentStatus" = 0 ] || exit 1
+done

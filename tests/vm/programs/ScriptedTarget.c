@@ -1,9 +1,11 @@
 /*
  * scripted-target: a disk behind the kernel's user-space backstore whose commands say how they are to be answered.
- *   scripted-target UIO-DEVICE MAP-BYTES
+ *   scripted-target UIO-DEVICE MAP-BYTES ANSWERS-FILE
  * The block address of a READ(10) is its answer: status, sense key, additional sense code, qualifier. Its group number
  * (byte 6) is how often in a row: then comes one GOOD, as the initiator repeats what was answered with busy; 0: always.
  * Status 0xFF: no answer for some seconds, then GOOD.
+ * Each answer is a line of the file, before it is given: status, sense key, additional sense code, qualifier, in
+ * decimal.
  */
 #include <errno.h>
 #include <fcntl.h>
@@ -68,7 +70,16 @@ static ZTSAnswer sAnswer(const uint8_t* apCdb) {
     }
 }
 
-static void sRespond(uint8_t* apMap, struct tcmu_cmd_entry* apEntry) {
+static void sNote(int aAnswers, const ZTSAnswer* apAnswer) {
+    char lLine[32];
+    const int lLength = snprintf(lLine, sizeof lLine, "%u %u %u %u\n", apAnswer->mStatus, apAnswer->mKey,
+                                 apAnswer->mAsc, apAnswer->mAscq);
+    if (write(aAnswers, lLine, (size_t)lLength) != lLength) {
+        fprintf(stderr, "scripted-target: an answer is not noted: %s\n", strerror(errno));
+    }
+}
+
+static void sRespond(uint8_t* apMap, struct tcmu_cmd_entry* apEntry, int aAnswers) {
     ZTSAnswer lAnswer = sAnswer(apMap + apEntry->req.cdb_off);
     size_t lCopied = 0;
     for (uint32_t lPart = 0; lPart < apEntry->req.iov_cnt; ++lPart) {
@@ -84,6 +95,7 @@ static void sRespond(uint8_t* apMap, struct tcmu_cmd_entry* apEntry) {
         poll(NULL, 0, gcUnansweredMilliseconds);
         lAnswer = scGood;
     }
+    sNote(aAnswers, &lAnswer);
     memset(&apEntry->rsp, 0, sizeof apEntry->rsp);
     apEntry->rsp.scsi_status = lAnswer.mStatus;
     if (lAnswer.mStatus == gcCheckCondition) {
@@ -95,7 +107,7 @@ static void sRespond(uint8_t* apMap, struct tcmu_cmd_entry* apEntry) {
     }
 }
 
-static void sAnswerAll(uint8_t* apMap) {
+static void sAnswerAll(uint8_t* apMap, int aAnswers) {
     struct tcmu_mailbox* lpMailbox = (struct tcmu_mailbox*)(void*)apMap;
     volatile uint32_t* lpHead = (volatile uint32_t*)(void*)(apMap + offsetof(struct tcmu_mailbox, cmd_head));
     volatile uint32_t* lpTail = (volatile uint32_t*)(void*)(apMap + offsetof(struct tcmu_mailbox, cmd_tail));
@@ -103,7 +115,7 @@ static void sAnswerAll(uint8_t* apMap) {
         struct tcmu_cmd_entry* lpEntry = (void*)(apMap + lpMailbox->cmdr_off + *lpTail);
         const uint32_t lLength = tcmu_hdr_get_len(lpEntry->hdr.len_op);
         if (tcmu_hdr_get_op(lpEntry->hdr.len_op) == TCMU_OP_CMD) {
-            sRespond(apMap, lpEntry);
+            sRespond(apMap, lpEntry, aAnswers);
         }
         __sync_synchronize();
         *lpTail = (*lpTail + lLength) % lpMailbox->cmdr_size;
@@ -111,15 +123,20 @@ static void sAnswerAll(uint8_t* apMap) {
 }
 
 int main(int aArgc, char** appArgv) {
-    if (aArgc != 3) {
-        fputs("usage: scripted-target UIO-DEVICE MAP-BYTES\n", stderr);
+    if (aArgc != 4) {
+        fputs("usage: scripted-target UIO-DEVICE MAP-BYTES ANSWERS-FILE\n", stderr);
         return 2;
+    }
+    const int lAnswers = open(appArgv[3], O_WRONLY | O_CREAT | O_APPEND | O_CLOEXEC, 0644);
+    if (lAnswers < 0) {
+        fprintf(stderr, "scripted-target: %s: %s\n", appArgv[3], strerror(errno));
+        return 1;
     }
     const int lDevice = open(appArgv[1], O_RDWR);
     const size_t lSize = strtoul(appArgv[2], NULL, 0);
     uint8_t* lpMap = lDevice < 0 ? MAP_FAILED : mmap(NULL, lSize, PROT_READ | PROT_WRITE, MAP_SHARED, lDevice, 0);
     for (uint32_t lCount = 0; lpMap != MAP_FAILED;) {
-        sAnswerAll(lpMap);
+        sAnswerAll(lpMap, lAnswers);
         if (write(lDevice, &lCount, sizeof lCount) < 0 || read(lDevice, &lCount, sizeof lCount) < 0) {
             break;
         }
