@@ -17,12 +17,16 @@ struct ZTSFaultControl {
     std::uint32_t mNth;        ///< which of its calls from the arming on, from 1
     std::int32_t mErrno;       ///< what it fails with; 0: it succeeds, short by what mCount says
     std::uint32_t mCount;      ///< with mErrno 0: the bytes that it moves; a wait ends with nothing
-    std::uint32_t mIsLasting;  ///< not 0: all the later ones fail too
+    std::uint32_t mIsLasting;  ///< not 0: the later ones fail too
+    std::uint32_t mSpan;  ///< with mIsLasting: for so many milliseconds from the first one on; 0: until the disarming
+    std::uint32_t mIsOfLibrary;  ///< not 0: calls of the kernel's library are meant, not those of the agent
 
     std::atomic<std::uint32_t> mIsArmed;
-    std::atomic<std::uint32_t> mCalls;       ///< of that name by the agent since the arming
-    std::atomic<std::uint32_t> mFired;       ///< those of them that failed
-    std::atomic<std::uint64_t> mPlace;       ///< where the first one was called from, as an offset into the program
+    std::atomic<std::uint32_t> mCalls;  ///< of that name by the agent since the arming
+    std::atomic<std::uint32_t> mFired;  ///< those of them that failed
+    std::atomic<std::uint64_t>
+        mPlace;  ///< where the first one was called from, as an offset into the program or library
+    std::atomic<std::int64_t> mFirstTime;    ///< when it was, in milliseconds of the monotonic clock
     std::atomic<std::int64_t> mLiveBlocks;   ///< of memory that the process holds
     std::atomic<std::uint32_t> mIsAttached;  ///< not 0: the agent has the interposed calls
 };

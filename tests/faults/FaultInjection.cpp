@@ -52,8 +52,11 @@ void ZTCFaultInjection::arm(const ZTSFaultPlan& acrPlan) {
     mpControl->mErrno = acrPlan.mErrno;
     mpControl->mCount = acrPlan.mCount;
     mpControl->mIsLasting = acrPlan.mIsLasting ? 1 : 0;
+    mpControl->mSpan = acrPlan.mSpan;
+    mpControl->mIsOfLibrary = acrPlan.mIsOfLibrary ? 1 : 0;
     mpControl->mCalls.store(0);
     mpControl->mFired.store(0);
     mpControl->mPlace.store(0);
+    mpControl->mFirstTime.store(0);
     mpControl->mIsArmed.store(1);
 }

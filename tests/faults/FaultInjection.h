@@ -10,11 +10,13 @@
 
 /// What is to fail, and how.
 struct ZTSFaultPlan {
-    std::string mCall;        ///< its name, or gcAllocationCall
-    unsigned mNth = 1;        ///< which one from the arming on, from 1
-    int mErrno = 0;           ///< 0: the call succeeds, short
-    unsigned mCount = 0;      ///< with mErrno 0: the bytes that it moves
-    bool mIsLasting = false;  ///< all the later ones fail too
+    std::string mCall;          ///< its name, or gcAllocationCall
+    unsigned mNth = 1;          ///< which one from the arming on, from 1
+    int mErrno = 0;             ///< 0: the call succeeds, short
+    unsigned mCount = 0;        ///< with mErrno 0: the bytes that it moves
+    bool mIsLasting = false;    ///< the later ones fail too
+    unsigned mSpan = 0;         ///< with mIsLasting: for so many milliseconds from the first one on; 0: until disarm()
+    bool mIsOfLibrary = false;  ///< calls of the kernel's library are meant, not those of the agent
 };
 
 class ZTCFaultInjection {
@@ -32,6 +34,7 @@ public:
     void arm(const ZTSFaultPlan& acrPlan);
     void disarm() { mpControl->mIsArmed.store(0); }
 
+    bool isArmed() const { return mpControl->mIsArmed.load() != 0; }
     /// Whether the planned failure came.
     bool hasFired() const { return mpControl->mFired.load() != 0; }
     /// Where from, as an offset into the agent's program.

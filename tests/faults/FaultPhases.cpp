@@ -28,23 +28,6 @@ void sStartCollecting(ZTCFaultStage& arStage) {
     arStage.agent().startScope();
 }
 
-/// The agent is started with a failure in it.
-std::function<void(ZTCFaultStage&)> sStarting(std::vector<std::string> (*apArguments)(const ZTCFaultStage&)) {
-    return [=](ZTCFaultStage& arStage) {
-        const std::vector<std::string> lArguments = apArguments(arStage);
-        arStage.arm();
-        const bool lServes = arStage.start(lArguments);
-        arStage.disarm();
-        if (!lServes) {
-            throw std::runtime_error("it does not start");
-        }
-        arStage.probe();
-        arStage.agent().startScope();
-        arStage.stop();
-        arStage.checkNextStart();
-    };
-}
-
 /// The program is run with a failure beside an agent that was started without.
 std::function<void(ZTCFaultStage&)> sRunningBeside(const char* apOption) {
     return [=](ZTCFaultStage& arStage) {
@@ -191,9 +174,10 @@ void sReopenLog(ZTCFaultStage& arStage) {
     const std::size_t lBefore = arStage.countInLog("The log file was reopened");
     arStage.arm();
     arStage.agent().process().sendSignal(SIGHUP);
-    waitUntil([&] { return arStage.countInLog("The log file was reopened") > lBefore || !arStage.isRunning(); },
-              "the log's reopening");
-    arStage.disarm();
+    const auto lIsReopened = [&] { return arStage.countInLog("The log file was reopened") > lBefore; };
+    waitUntil([&] { return lIsReopened() || arStage.faults().hasFired() || !arStage.isRunning(); },
+              "the log's reopening, or a failure");
+    arStage.endFailure();
     arStage.probe();
 }
 
@@ -257,14 +241,35 @@ std::vector<std::string> sAsDaemon(const ZTCFaultStage& acrStage) {
 
 }  // namespace
 
+std::function<void(ZTCFaultStage&)> startWithFailure(std::vector<std::string> (*apArguments)(const ZTCFaultStage&)) {
+    return [=](ZTCFaultStage& arStage) {
+        const std::vector<std::string> lArguments = apArguments(arStage);
+        arStage.arm();
+        const bool lServes = arStage.start(lArguments);
+        arStage.disarm();
+        if (!lServes) {
+            throw std::runtime_error("it does not start");
+        }
+        arStage.probe();
+        arStage.agent().startScope();
+        arStage.stop();
+        arStage.checkNextStart();
+    };
+}
+
 std::vector<ZTSFaultPhase> faultPhases() {
     const ZTCBytes lTargets =
         ZTCAgentProcess::registerTargetsRequest({{makeWwn(gcRemoteNode), makeWwn(gcRemotePort), 0x010203},
                                                  {makeWwn(gcOtherNode), makeWwn(gcOtherPort), 0x010204}});
     std::vector<ZTSFaultPhase> lPhases = {
-        {.mName = "start", .mIsInQuickRun = true, .mPrepare = sNothing, .mRun = sStarting(&sPlain)},
-        {.mName = "start as a daemon", .mIsInQuickRun = true, .mPrepare = sNothing, .mRun = sStarting(&sAsDaemon)},
-        {.mName = "start without standard streams", .mPrepare = sTakeStandardStreams, .mRun = sStarting(&sPlain)},
+        {.mName = "start", .mIsInQuickRun = true, .mPrepare = sNothing, .mRun = startWithFailure(&sPlain)},
+        {.mName = "start as a daemon",
+         .mIsInQuickRun = true,
+         .mPrepare = sNothing,
+         .mRun = startWithFailure(&sAsDaemon)},
+        {.mName = "start without standard streams",
+         .mPrepare = sTakeStandardStreams,
+         .mRun = startWithFailure(&sPlain)},
         {.mName = "a second start", .mPrepare = sNothing, .mRun = sRunningBeside("-S")},
         {.mName = "option -s", .mPrepare = sNothing, .mRun = sRunningBeside("-s")},
         {.mName = "command start",
@@ -339,5 +344,8 @@ std::vector<ZTSFaultPhase> faultPhases() {
         {.mName = "end by SIGTERM", .mIsInQuickRun = true, .mPrepare = sStartCollecting, .mRun = sEndBySignal});
     lPhases.push_back(
         {.mName = "end by shut-down", .mIsInQuickRun = true, .mPrepare = sStartCollecting, .mRun = sEndByCommand});
+    for (const ZTSFaultPhase& lcrPhase : libraryFaultPhases()) {
+        lPhases.push_back(lcrPhase);
+    }
     return lPhases;
 }

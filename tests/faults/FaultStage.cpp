@@ -20,6 +20,32 @@ static const char* const sLastWords[] = {
     "Tavik System exiting",
 };
 
+ZTCFaultStage::ZTCFaultStage(ZTEFaultLibrary aLibrary) : mFaults(mAgent) {
+    if (aLibrary == ZTEFaultLibrary::Kernel) {
+        mpKernel = std::make_unique<ZTCFakeKernel>();
+        mpKernel->addHost(0);
+        const std::string lInstance = mpKernel->tracefs() + "/instances/prepared";
+        mpKernel->make(lInstance);
+        mAgent.setEnvironment("ZT_LIBKPM_PATH", TAVIK_LINUX_LIBRARY);
+        mAgent.setEnvironment("KPM_LINUX_SYSFS", mpKernel->sysfs());
+        mAgent.setEnvironment("KPM_LINUX_TRACEFS", mpKernel->tracefs());
+        mAgent.setEnvironment("KPM_LINUX_INSTANCE", lInstance);
+    }
+}
+
+void ZTCFaultStage::plan(const ZTSFaultPlan& acrPlan) {
+    mPlan = acrPlan;
+    mPlan.mIsOfLibrary = mpKernel != nullptr;
+}
+
+void ZTCFaultStage::endFailure() {
+    if (mPlan.mSpan != 0 && mFaults.hasFired()) {
+        const ZTCDeadline lEnd(std::chrono::milliseconds(mPlan.mSpan));
+        waitUntil([&] { return lEnd.isOver(); }, "the end of the span");
+    }
+    disarm();
+}
+
 std::vector<std::string> ZTCFaultStage::arguments(const std::vector<std::string>& acrMore) const {
     std::vector<std::string> lArguments{"-D", "false", "-d", "127", "-l", mAgent.agentLogPath()};
     lArguments.insert(lArguments.end(), acrMore.begin(), acrMore.end());
@@ -44,7 +70,9 @@ bool ZTCFaultStage::connect() {
     if (mIsDaemon) {
         waitUntil([this] { return !isRunning() || mIsAdopted; }, "the end of the daemon's first process");
     }
-    mAgent.library().waitUntilOpen();  // with that, those that ended have left its queue
+    if (mpKernel == nullptr) {
+        mAgent.library().waitUntilOpen();  // with that, those that ended have left its queue
+    }
     probe();
     return true;
 }
@@ -116,7 +144,8 @@ ZTEFaultEnd ZTCFaultStage::waitForEnd() {
     }
     // Before the log code of the command line is in force, the last word is not written; and who cannot write the log
     // may have no standard error.
-    bool lHasLastWord = !mHasStandardError || !exists(mAgent.agentLogPath());
+    const bool lCannotWrite = mFaults.isArmed() && mFaults.hasFired() && mPlan.mIsLasting && mPlan.mCall == "write";
+    bool lHasLastWord = !mHasStandardError || lCannotWrite || !exists(mAgent.agentLogPath());
     for (const char* lpWord : sLastWords) {
         lHasLastWord = lHasLastWord || lText.find(lpWord) != std::string::npos;
     }

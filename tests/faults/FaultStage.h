@@ -3,12 +3,14 @@
 #define TESTS_FAULTS_FAULTSTAGE_H
 
 #include <cstdint>
+#include <memory>
 #include <stdexcept>
 #include <string>
 #include <vector>
 
 #include "tests/faults/FaultInjection.h"
 #include "tests/support/AgentProcess.h"
+#include "tests/unit/linux/FakeKernel.h"
 
 /// Something that must not be, whatever failed.
 class ZTCFinding : public std::runtime_error {
@@ -22,17 +24,28 @@ enum class ZTEFaultEnd {
     Assertion,  ///< status 1, with the line of an assertion
 };
 
+/// The adapters' library that the agent has.
+enum class ZTEFaultLibrary {
+    Scripted,  ///< the failures are of the agent's own calls
+    Kernel,    ///< the kernel's library over a kernel that is played; the failures are of the library's calls
+};
+
 class ZTCFaultStage {
 public:
-    ZTCFaultStage() : mFaults(mAgent) {}
+    explicit ZTCFaultStage(ZTEFaultLibrary aLibrary);
 
     ZTCAgentProcess& agent() { return mAgent; }
     ZTCFaultInjection& faults() { return mFaults; }
 
     // ---- the failure ----
-    void plan(const ZTSFaultPlan& acrPlan) { mPlan = acrPlan; }
+    void plan(const ZTSFaultPlan& acrPlan);
     void arm() { mFaults.arm(mPlan); }
     void disarm() { mFaults.disarm(); }
+    /// Waits until a failure that comes for a span of time comes no more, and disarms it in any case.
+    void endFailure();
+
+    /// With the kernel's library: the kernel that it sees, with host 0.
+    ZTCFakeKernel& kernel() { return *mpKernel; }
 
     // ---- the agent ----
     std::vector<std::string> arguments(const std::vector<std::string>& acrMore = {}) const;
@@ -71,6 +84,7 @@ private:
     ZTCAgentProcess mAgent{2};
     ZTCFaultInjection mFaults;
     ZTSFaultPlan mPlan;
+    std::unique_ptr<ZTCFakeKernel> mpKernel;  ///< null with the scripted library
     std::size_t mDescriptorsAtFirst = 0;
     bool mIsDaemon = false;
     bool mHasStandardStreams = true;

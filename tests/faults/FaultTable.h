@@ -4,13 +4,19 @@
 
 #include <vector>
 
+/// What a failure does to the agent.
+enum class ZTEFaultEffect {
+    Felt,      ///< it may end the agent
+    Absorbed,  ///< nobody must notice, however often it comes: the call is made again, or its result does not matter
+    Passing,   ///< the same, of a failure that the system never gives for good: it is not tried so
+};
+
 struct ZTSFaultWay {
     const char* mpCall;
     const char* mpName;
-    int mErrno;        ///< 0: it succeeds, short
-    unsigned mCount;   ///< with 0: the bytes that it moves
-    bool mIsLasting;   ///< all the later ones fail too
-    bool mIsAbsorbed;  ///< nobody must notice: the call is tried again, or its result does not matter
+    int mErrno;       ///< 0: it succeeds, short
+    unsigned mCount;  ///< with 0: the bytes that it moves
+    ZTEFaultEffect mEffect;
     bool mIsInQuickRun;
 };
 

@@ -1,5 +1,6 @@
 /// The operating-system calls of the agent, but for those that fail only when they are called wrongly. Each asks first
 /// whether it is to fail; otherwise it goes through.
+#include <dirent.h>
 #include <dlfcn.h>
 #include <poll.h>
 #include <pthread.h>
@@ -99,6 +100,7 @@ ZT_INTERPOSE(lstat, int, -1, (const char* apPath, struct stat* apStatus), (apPat
 ZT_INTERPOSE(mkdir, int, -1, (const char* apPath, mode_t aMode), (apPath, aMode))
 ZT_INTERPOSE(mkfifo, int, -1, (const char* apPath, mode_t aMode), (apPath, aMode))
 ZT_INTERPOSE(open, int, -1, (const char* apPath, int aFlags, mode_t aMode), (apPath, aFlags, aMode))
+ZT_INTERPOSE(opendir, DIR*, nullptr, (const char* apPath), (apPath))
 ZT_INTERPOSE(poll, int, -1, (struct pollfd* apFiles, nfds_t aNumber, int aTime), (apFiles, aNumber, aTime))
 ZT_INTERPOSE(rename, int, -1, (const char* apFrom, const char* apTo), (apFrom, apTo))
 ZT_INTERPOSE(setsid, pid_t, -1, (), ())

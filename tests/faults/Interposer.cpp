@@ -3,6 +3,7 @@
 #include <fcntl.h>
 #include <link.h>
 #include <sys/mman.h>
+#include <time.h>
 #include <unistd.h>
 #include <unwind.h>
 
@@ -16,6 +17,7 @@
 namespace {
 
 constexpr char scAgentName[] = "qrv-tvk";
+constexpr char scLibraryName[] = "libkpm-linux";
 
 struct ZTSRange {
     std::uintptr_t mBegin = 0;
@@ -32,11 +34,12 @@ constexpr std::size_t scMaxTransparent = 8;
 ZTSFaultControl* spControl = nullptr;
 ZTSRange sProgram;
 ZTSRange sThisModule;
+ZTSRange sLibrary;  ///< the kernel's library, once it was seen
 /// This module, and the libraries that only work for their callers: a call counts as that of their caller.
 ZTSRange sTransparent[scMaxTransparent];
 std::size_t sNumberOfTransparent = 0;
 
-int sNoteObject(dl_phdr_info* apObject, std::size_t, void* apIsFirst) {
+ZTSRange sRangeOf(const dl_phdr_info* apObject) {
     ZTSRange lRange;
     for (int lIndex = 0; lIndex < apObject->dlpi_phnum; ++lIndex) {
         const ElfW(Phdr)& lcrHeader = apObject->dlpi_phdr[lIndex];
@@ -50,6 +53,11 @@ int sNoteObject(dl_phdr_info* apObject, std::size_t, void* apIsFirst) {
             }
         }
     }
+    return lRange;
+}
+
+int sNoteObject(dl_phdr_info* apObject, std::size_t, void* apIsFirst) {
+    const ZTSRange lRange = sRangeOf(apObject);
     bool& lrIsFirst = *static_cast<bool*>(apIsFirst);
     const char* lpName = apObject->dlpi_name;
     const bool lIsThisModule = lRange.holds(reinterpret_cast<const void*>(&sNoteObject));
@@ -65,6 +73,44 @@ int sNoteObject(dl_phdr_info* apObject, std::size_t, void* apIsFirst) {
     }
     lrIsFirst = false;
     return 0;
+}
+
+int sNoteLibrary(dl_phdr_info* apObject, std::size_t, void*) {
+    if (std::strstr(apObject->dlpi_name, scLibraryName) == nullptr) {
+        return 0;
+    }
+    sLibrary = sRangeOf(apObject);
+    return 1;
+}
+
+/// The module whose calls are meant. The library is opened while the agent runs, and stays.
+const ZTSRange& sMeantModule() {
+    if (spControl->mIsOfLibrary == 0) {
+        return sProgram;
+    }
+    if (sLibrary.mEnd == 0) {
+        dl_iterate_phdr(&sNoteLibrary, nullptr);
+    }
+    return sLibrary;
+}
+
+std::int64_t sNow() {
+    timespec lTime{};
+    clock_gettime(CLOCK_MONOTONIC, &lTime);
+    return std::int64_t{lTime.tv_sec} * 1000 + lTime.tv_nsec / 1000000;
+}
+
+/// Whether this call, from 1, is one that fails.
+bool sIsMeant(std::uint32_t aCall) {
+    if (aCall == spControl->mNth) {
+        spControl->mFirstTime.store(sNow());
+        return true;
+    }
+    if (aCall < spControl->mNth || spControl->mIsLasting == 0) {
+        return false;
+    }
+    const std::int64_t lFirst = spControl->mFirstTime.load();
+    return spControl->mSpan == 0 || lFirst == 0 || sNow() < lFirst + std::int64_t{spControl->mSpan};
 }
 
 bool sIsTransparent(const void* apAddress) {
@@ -116,20 +162,17 @@ ZTSFault takeFault(const char* apCall, const void* apCaller) noexcept {
         return {};
     }
     const int lErrno = errno;
+    const ZTSRange& lrMeant = sMeantModule();
     const void* lpCaller = apCaller;
-    if (!sProgram.holds(lpCaller) && sIsTransparent(lpCaller)) {
+    if (!lrMeant.holds(lpCaller) && sIsTransparent(lpCaller)) {
         _Unwind_Backtrace(&sFindCaller, &lpCaller);
     }
     errno = lErrno;
-    if (!sProgram.holds(lpCaller)) {
-        return {};
-    }
-    const std::uint32_t lCalls = spControl->mCalls.fetch_add(1) + 1;
-    if (lCalls != spControl->mNth && (spControl->mIsLasting == 0 || lCalls < spControl->mNth)) {
+    if (!lrMeant.holds(lpCaller) || !sIsMeant(spControl->mCalls.fetch_add(1) + 1)) {
         return {};
     }
     if (spControl->mFired.fetch_add(1) == 0) {
-        spControl->mPlace.store(reinterpret_cast<std::uintptr_t>(lpCaller) - sProgram.mBegin);
+        spControl->mPlace.store(reinterpret_cast<std::uintptr_t>(lpCaller) - lrMeant.mBegin);
     }
     return {true, spControl->mErrno, spControl->mCount};
 }

@@ -11,7 +11,7 @@ struct ZTSFault {
 };
 
 /// To be asked by each interposed call, with its return address. A call counts when the agent's own program made it,
-/// itself or through the language's library.
+/// itself or through the language's library; with a plan for the kernel's library, when that made it.
 ZTSFault takeFault(const char* apCall, const void* apCaller) noexcept;
 
 /// The planned failure's errno; EINTR where none is planned.
