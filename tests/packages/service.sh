@@ -1,0 +1,130 @@
+#!/bin/sh
+# Runs where systemd has booted the tree: the service is installed, started without an adapter and over the simulated library,
+# reloaded, hung, killed, upgraded and removed. Its sandbox is in force all the time. /packages holds before/ and now/.
+set -u
+. /tests/checks.sh
+. /tests/service-checks.sh
+export DEBIAN_FRONTEND=noninteractive LC_ALL=C.UTF-8 SYSTEMD_PAGER=cat
+export KPM_SIM_SOCKET=/run/tavik/sim.sock
+lLibrary=$(echo /usr/lib/*-linux-gnu)/tavik/libkpm-sim.so
+
+step "Installing, on a host without adapters"
+expect_true "dpkg --install" dpkg --install /packages/before/tavik_*.deb /packages/before/tavik-sim_*.deb
+expect "enabled" enabled "$(systemctl is-enabled tavik)"
+expect "started by the installation" active "$(systemctl is-active tavik)"
+expect_true "says that there are no adapters" wait_until 20 has_state no-adapters
+expect "tavik status" "NOT COLLECTING; no Fibre Channel adapter was found" "$(tavik --json status | jq -r .text)"
+expect "tavik check" 0 "$(tavik check >/dev/null; echo $?)"
+expect "restarts, result" "NRestarts=0 Result=success" "$(properties NRestarts Result)"
+expect "failed units" "" "$(systemctl list-units --failed --plain --no-legend tavik.service)"
+expect_true "systemd-analyze verify" systemd-analyze verify tavik.service
+expect "what systemd does not know or ignores" "" "$(journalctl -b _PID=1 | grep 'tavik.service:[0-9]')"
+
+step "Over the simulated library"
+drop_in simulation "Environment=KPM_SIM_SCENARIO=/opt/scenario.kpm KPM_SIM_SOCKET=$KPM_SIM_SOCKET"
+install -m 644 /tests/scenario.kpm /opt/
+configure "s|^#library = .*|library = \"$lLibrary\"|"
+expect_true "restart" systemctl restart tavik
+expect "the type of the start" "Type=notify NotifyAccess=main" "$(properties Type NotifyAccess)"
+expect_true "collects" wait_until 20 is_collecting
+kpm-sim wait --timeout 20 >/dev/null
+expect_occurrences "QUEUE FULL" queue-full 1000
+expect_occurrences "check conditions" check-condition 8
+expect "the HTTP interface answers" "HTTP/1.1 200 OK" "$(http_status 127.0.0.1 9632 /healthz)"
+expect_rights
+
+step "Reloading the configuration"
+lPids=$(pids)
+configure 's|^#period = .*|period = 1.5|'
+expect_true "reload" systemctl reload tavik
+expect_true "the sensor says so" wait_until 20 said_lately "was read again; 1 changed"
+configure 's|^period = .*|period = "soon"|'
+systemctl reload tavik
+expect_true "a bad file is reported" wait_until 20 said_lately "collect.period: "
+configure 's|^period = .*|#period = 5.0|'
+expect "the same processes" "$lPids" "$(pids)"
+
+step "The log is rotated"
+lPids=$(pids)
+expect_true "logrotate" logrotate --force /etc/logrotate.d/tavik
+expect_true "the agent writes a new log" wait_until 20 test -e /var/log/tavik/qrv-tvk.log
+expect "the same processes" "$lPids" "$(pids)"
+
+step "Killed and hung"
+lAgent=$(agent_pid)
+kill -KILL "$lAgent"
+expect_true "another agent" wait_until 30 is_other_agent "$lAgent"
+expect_true "collects again" wait_until 20 is_collecting
+kpm-sim wait --timeout 20 >/dev/null
+expect_occurrences "the scenario, once more" queue-full 2000
+expect_rights
+expect "restarts by systemd" "NRestarts=0" "$(properties NRestarts)"
+drop_in watchdog "WatchdogSec=4s"
+expect_true "restart" systemctl restart tavik
+expect_true "collects" wait_until 20 is_collecting
+kpm-sim wait --timeout 20 >/dev/null
+expect_occurrences "the scenario, once more" queue-full 3000
+sleep 6 # longer than the watchdog: a sensor that is well tells it in time
+expect "restarts of a sensor that is well" "NRestarts=0" "$(properties NRestarts)"
+kill -STOP "$(keeper_pid)"
+expect_true "a sensor that hangs is replaced" wait_until 40 has_restarted
+expect_true "collects again" wait_until 40 is_collecting
+kpm-sim wait --timeout 20 >/dev/null
+expect_occurrences "the scenario, once more" queue-full 4000
+rm /etc/systemd/system/tavik.service.d/watchdog.conf
+
+step "A textfile, and an address for everybody"
+install -D -m 644 /drop-ins/textfile.conf /drop-ins/http-public.conf -t /etc/systemd/system/tavik.service.d
+mkdir -p /var/lib/prometheus/node-exporter
+configure 's|^#textfile = .*|textfile = "/var/lib/prometheus/node-exporter/tavik.prom"|
+  s|^#listen = .*|listen = "0.0.0.0:9632"|; s|^#public = .*|public = true|; s|^#hosts = .*|hosts = ["db01.example.net"]|'
+systemctl daemon-reload
+expect "systemd-analyze verify" "" "$(systemd-analyze verify tavik.service 2>&1)"
+expect_true "restart" systemctl restart tavik
+expect_true "the textfile" wait_until 20 grep -q '^tavik_agent_up 1' /var/lib/prometheus/node-exporter/tavik.prom
+expect "the file's owner" "tavik:tavik" "$(stat -c %U:%G /var/lib/prometheus/node-exporter/tavik.prom)"
+ip address add 192.0.2.1/32 dev lo
+expect "an answer on another address" "HTTP/1.1 200 OK" "$(http_status 192.0.2.1 9632 /healthz)"
+rm /etc/systemd/system/tavik.service.d/textfile.conf /etc/systemd/system/tavik.service.d/http-public.conf
+rm -r /var/lib/prometheus
+configure 's|^textfile = .*|#textfile = ""|; s|^listen = .*|#listen = "127.0.0.1:9632"|; s|^public = .*|#public = false|; s|^hosts = .*|#hosts = []|'
+systemctl daemon-reload
+systemctl restart tavik
+expect_true "collects" wait_until 20 is_collecting
+
+step "Upgrading a service that runs"
+kpm-sim wait --timeout 20 >/dev/null
+lBefore=$(occurrences queue-full)
+lPids=$(pids)
+expect_true "dpkg --install" dpkg --force-confdef --force-confold --install /packages/now/tavik_*.deb /packages/now/tavik-sim_*.deb
+expect_true "collects again" wait_until 30 is_collecting
+expect "restarted" 0 "$(echo "$lPids" | grep -cx "$(keeper_pid)")"
+kpm-sim wait --timeout 20 >/dev/null
+expect_occurrences "the history goes on" queue-full $((lBefore + 1000))
+expect "gaps, but for the kills above" "" "$(tavik --json status | jq -r '.gaps.rows[]? | select(.reason != "killed") | .reason' | sort -u | grep -v -e killed -e '^$')"
+
+step "A configuration that cannot be used"
+configure 's|^#gap = .*|gap = "never"|'
+systemctl restart tavik 2>/dev/null
+expect_true "failed, not tried again" wait_until 20 test "$(properties ActiveState NRestarts ExecMainStatus)" = "ActiveState=failed NRestarts=0 ExecMainStatus=2"
+expect_true "the reason is in the journal" said_lately "episode.gap: "
+configure 's|^gap = .*|#gap = 60|'
+expect_true "start" systemctl start tavik
+
+step "Stopping, removing, purging"
+lStart=$(date +%s)
+expect_true "stop" systemctl stop tavik
+expect_true "within twenty seconds" test $(($(date +%s) - lStart)) -le 20
+expect "the result" "ActiveState=inactive Result=success" "$(properties ActiveState Result)"
+expect "the runtime directory" "" "$(ls -d /run/tavik 2>/dev/null)"
+expect "processes" "" "$(pgrep -u tavik)"
+systemctl start tavik
+rm -r /etc/systemd/system/tavik.service.d /opt/scenario.kpm
+expect_true "purge while it runs" dpkg --purge tavik tavik-sim
+expect "processes" "" "$(pgrep -x 'tavik-sensor|tavik-collector|qrv-tvk')"
+expect "the user" "" "$(getent passwd tavik)"
+expect "files" "" "$(ls -d /etc/tavik /run/tavik /var/lib/tavik /var/log/tavik /etc/systemd/system/*/tavik.service 2>/dev/null)"
+
+journalctl -b --no-pager >/out/journal
+echo "== end"
+exit $gBad
