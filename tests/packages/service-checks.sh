@@ -30,13 +30,13 @@ status_lines() { sed -n 's/^\(CapPrm\|CapEff\|CapAmb\|CapBnd\|NoNewPrivs\|Seccom
 expect_rights() {
   lUser=$(id -u tavik)
   expect "rights of the keeper" \
-    "CapAmb=$1 CapBnd=0000000000001000 CapEff=0000000000000000 CapPrm=0000000000001000 NoNewPrivs=1 Seccomp=2 Uid=$lUser " \
+    "CapAmb=0000000000000000 CapBnd=0000000000001000 CapEff=0000000000000000 CapPrm=0000000000001000 NoNewPrivs=1 Seccomp=2 Uid=$lUser " \
     "$(status_lines "$(keeper_pid)")"
   expect "rights of the agent" \
     "CapAmb=0000000000001000 CapBnd=0000000000001000 CapEff=0000000000001000 CapPrm=0000000000001000 NoNewPrivs=1 Seccomp=2 Uid=$lUser " \
     "$(status_lines "$(agent_pid)")"
   expect "rights of the collector" \
-    "CapAmb=0000000000000000 CapBnd=$2 CapEff=0000000000000000 CapPrm=0000000000000000 NoNewPrivs=1 Seccomp=2 Uid=$lUser " \
+    "CapAmb=0000000000000000 CapBnd=0000000000001000 CapEff=0000000000000000 CapPrm=0000000000000000 NoNewPrivs=1 Seccomp=2 Uid=$lUser " \
     "$(status_lines "$(collector_pid)")"
 }
 

@@ -43,7 +43,7 @@ tavik status >/dev/null 2>&1
 expect "tavik status without a sensor" 3 $?
 
 step "Configuring"
-sed -i "s|^#library = .*|library = \"$lLibrary\"|; s|^#days = .*|days = 3650|" /etc/tavik/tavik.toml
+sed -i "s|^#library = .*|library = \"$lLibrary\"|; s|^#days = .*|days = 3650|; s|^#log_level = .*|log_level = 63|" /etc/tavik/tavik.toml
 expect "tavik-sensor --check" "" "$(tavik-sensor --check 2>&1)"
 sqlite3 /var/lib/tavik/history.db </tests/history-1.sql
 chown tavik:tavik /var/lib/tavik/history.db
@@ -70,14 +70,15 @@ stop_sensor
 step "Upgrading"
 expect_true "dpkg --install" dpkg --force-confdef --force-confold --install \
   /packages/now/tavik_*.deb /packages/now/tavik-sim_*.deb /packages/now/libkpm-dev_*.deb
-expect "our changes of the configuration" 2 "$(grep -c '^library = \|^days = ' /etc/tavik/tavik.toml)"
+expect "our changes of the configuration" 3 "$(grep -c '^library = \|^days = \|^log_level = ' /etc/tavik/tavik.toml)"
 expect "the new configuration, beside it" "#library = \"\"" "$(grep '^#library' /etc/tavik/tavik.toml.dpkg-dist)"
 expect "the history" 2000 "$(occurrences queue-full)"
 start_sensor
 kpm-sim wait --timeout 20 >/dev/null
 expect_occurrences "QUEUE FULL: 2,000 of the history, 1,000 new ones" queue-full 3000
 expect "the history's id" "$lStore" "$(store_id)"
-expect "losses and gaps" "" "$(tavik --json status | jq -r '.losses[]?, .gaps[]?')"
+expect "what is lost, dropped and refused; gaps" "0 0 0 0" \
+  "$(tavik --json status | jq -r '"\(.losses.inGaps) \(.losses.dropped) \([.losses.refused[]] | add) \(.gaps | length)"')"
 expect_true "the database is whole" test "$(sqlite3 -readonly /var/lib/tavik/history.db 'pragma integrity_check')" = ok
 stop_sensor
 

@@ -2,11 +2,16 @@
 
 #include <fcntl.h>
 #include <gtest/gtest.h>
+#include <linux/filter.h>
+#include <linux/seccomp.h>
 #include <signal.h>
+#include <sys/prctl.h>
+#include <sys/syscall.h>
 #include <sys/wait.h>
 #include <unistd.h>
 
 #include <cerrno>
+#include <cstddef>
 #include <cstring>
 #include <functional>
 #include <string>
@@ -112,6 +117,38 @@ TEST(Clib, MkdirSaysThatThePathExists) {
     } catch (const ZTCClibMkdirFailedEx& acrException) {
         EXPECT_NE(std::string(acrException.what()).find(lDirectory.path("no/such")), std::string::npos);
     }
+}
+
+#ifdef SYS_mkdir
+static constexpr unsigned scMkdir = SYS_mkdir;
+#else
+static constexpr unsigned scMkdir = SYS_mkdirat;
+#endif
+
+/// Has the kernel answer this system call with EPERM from now on, as a service manager's filters do.
+static bool sRefuseSystemCall(unsigned aNumber) {
+    sock_filter lSteps[] = {BPF_STMT(BPF_LD | BPF_W | BPF_ABS, offsetof(seccomp_data, nr)),
+                            BPF_JUMP(BPF_JMP | BPF_JEQ | BPF_K, aNumber, 0, 1),
+                            BPF_STMT(BPF_RET | BPF_K, SECCOMP_RET_ERRNO | EPERM),
+                            BPF_STMT(BPF_RET | BPF_K, SECCOMP_RET_ALLOW)};
+    const sock_fprog lProgram = {.len = 4, .filter = lSteps};
+    return prctl(PR_SET_NO_NEW_PRIVS, 1, 0, 0, 0) == 0 && prctl(PR_SET_SECCOMP, SECCOMP_MODE_FILTER, &lProgram) == 0;
+}
+
+TEST(Clib, MkdirSaysThatThePathExistsWhereAFilterRefusesTheCall) {
+    ZTCTemporaryDirectory lDirectory;
+    const int lStatus = sStatusOfChild([&] {
+        if (!sRefuseSystemCall(scMkdir)) {
+            return 2;
+        }
+        const bool lIsSeen =
+            sTextOf<ZTCExistsEx>([&] { ClibMkdir(lDirectory.path().c_str(), 03777); }) != "nothing was thrown";
+        const bool lIsRefused = sTextOf<ZTCClibMkdirFailedEx>([&] {
+                                    ClibMkdir(lDirectory.path("new").c_str(), 0700);
+                                }).find("Operation not permitted") != std::string::npos;
+        return lIsSeen && lIsRefused ? 0 : 1;
+    });
+    EXPECT_EQ(0, lStatus);
 }
 
 TEST(Clib, StatAndUtimeNameTheFileThatIsMissing) {

@@ -118,10 +118,13 @@ void ClibMkdir(const char* apPath, int aMode) {
     if (::mkdir(apPath, static_cast<::mode_t>(aMode)) == 0) {
         return;
     }
-    if (errno == EEXIST) {
+    const int lError = errno;
+    // A system call filter of a sandbox refuses by the mode alone (set-group-id), before the kernel looks at the path.
+    struct ::stat lStatus;
+    if (lError == EEXIST || (lError == EPERM && ::lstat(apPath, &lStatus) == 0)) {
         sThrowForPath<ZTCExistsEx>("Making the directory", apPath, EEXIST);
     }
-    sThrowForPath<ZTCClibMkdirFailedEx>("Making the directory", apPath, errno);
+    sThrowForPath<ZTCClibMkdirFailedEx>("Making the directory", apPath, lError);
 }
 
 void ClibMkfifo(const char* apPath, ::mode_t aMode) {
