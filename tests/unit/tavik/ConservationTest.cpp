@@ -1,6 +1,7 @@
 #include <gtest/gtest.h>
 
 #include <array>
+#include <atomic>
 #include <map>
 #include <optional>
 #include <random>
@@ -292,12 +293,18 @@ TEST_F(Conservation, WithStopsThatRaceTheEventsWhatIsNotedAsProcessedIsDelivered
         mDoScopeCollection = true;
         mLog.forget();
         ZTCTestThreads lThreads;
-        lThreads.start(scThreads, [&lSeed](unsigned aThread) {
+        std::atomic<unsigned> lUnderWay{0};
+        lThreads.start(scThreads, [&](unsigned aThread) {
             ZTCEventSource lSource(lSeed.seed(), aThread);
             for (unsigned lEvent = 0; lEvent < 300; ++lEvent) {
                 lSource.deliverOne(false);
+                ++lUnderWay;
             }
         });
+        // The first events are consolidated in any case; then the race begins.
+        while (lUnderWay < 40) {
+            std::this_thread::yield();
+        }
         ZTCDelivered lDelivered;
         while (lThreads.isRunning() && !HasFatalFailure()) {
             switch (lRandom() % 5) {

@@ -9,6 +9,7 @@
 
 #include "common/include/Log.h"
 #include "libkpm/include/ScopeEventKinds.h"
+#include "os/common/include/ProcessEvents.h"
 #include "tavik/include/TavikCore.h"
 #include "tests/support/FailingAllocation.h"
 #include "tests/unit/agentcommon/support/BufferBytes.h"
@@ -104,6 +105,27 @@ TEST_F(StatusPage, NamesTheAgentAndItsBoards) {
         EXPECT_EQ(ZTCAdaptersLibraryDouble::nodeName(lBoard).mBytes, lPage.mBoards[lBoard].mWwnn);
         EXPECT_EQ(ZTCAdaptersLibraryDouble::portName(lBoard).mBytes, lPage.mBoards[lBoard].mWwpn);
     }
+}
+
+TEST_F(StatusPage, AStopSignalIsTheReasonOfWhatGoesWrongBecauseOfIt) {
+    bringUp();
+    getStopEvent().raise();
+    mSystem->getStatusPage().setEnd(ZTSE_Other);
+    EXPECT_EQ(ZTSE_Signal, page().mEndReason);
+}
+
+TEST_F(StatusPage, AShutDownStaysTheReasonThoughAStopSignalHasCome) {
+    bringUp();
+    getStopEvent().raise();
+    mSystem->getStatusPage().setEnd(ZTSE_ShutDown);
+    EXPECT_EQ(ZTSE_ShutDown, page().mEndReason);
+}
+
+TEST_F(StatusPage, TheFirstReasonOfTheEndStays) {
+    bringUp();
+    mSystem->getStatusPage().setEnd(ZTSE_SensorGone);
+    mSystem->getStatusPage().setEnd(ZTSE_Other);
+    EXPECT_EQ(ZTSE_SensorGone, page().mEndReason);
 }
 
 TEST_F(StatusPage, EveryStartHasAnIdOfItsOwn) {
