@@ -1,0 +1,59 @@
+/// One run of a program that tells somebody of a trouble: started, watched, and ended with all that it has started.
+///
+/// No shell is between. The program gets its input as a file on standard input, so that it need not read it. What it
+/// prints is kept for the report, the end of it. It runs in a process group of its own, as the user and in the sandbox
+/// of this process, with the signals' default actions and no other descriptors.
+#ifndef SENSOR_WARNINGS_INCLUDE_HOOKPROCESS_H
+#define SENSOR_WARNINGS_INCLUDE_HOOKPROCESS_H
+
+#include <poll.h>
+#include <sys/types.h>
+
+#include <chrono>
+#include <optional>
+#include <string>
+#include <vector>
+
+#include "sensor/client/include/FileDescriptor.h"
+
+struct ZTSHookCall {
+    std::vector<std::string> mRun;          ///< program and arguments; a program without a slash is looked for in PATH
+    std::vector<std::string> mEnvironment;  ///< "NAME=value", added to this process's own without its TAVIK_ variables
+    std::string mInput;
+    std::chrono::milliseconds mTimeout{};
+};
+
+class ZTCHookProcess {
+public:
+    using ZTCTime = std::chrono::steady_clock::time_point;
+
+    /// Starts it. Throws ZTCSystemCallEx where that fails: the program is missing, may not be run, or there is no room
+    /// for a process.
+    ZTCHookProcess(const ZTSHookCall& acrCall, ZTCTime aNow);
+    /// Ends its process group, if it still runs.
+    ~ZTCHookProcess();
+    ZTCHookProcess(const ZTCHookProcess&) = delete;
+    ZTCHookProcess& operator=(const ZTCHookProcess&) = delete;
+
+    /// Adds what is to be polled.
+    void addTo(std::vector<pollfd>& arFds) const;
+    /// When step() is to be called at the latest.
+    ZTCTime getNextStep(ZTCTime aNow) const;
+    /// To be called after each poll(). Nothing: it runs. A text: it has ended, and all of its process group with it; an
+    /// empty one: it did its work, else why it counts as failed, one line.
+    std::optional<std::string> step(ZTCTime aNow);
+
+private:
+    void readOutput();
+    std::string quoteOutput() const;
+    void endGroup();
+
+    const std::chrono::milliseconds mTimeout;
+    const ZTCTime mDeadline;
+    pid_t mPid = 0;             ///< 0: it has been waited for
+    ZTCFileDescriptor mPidFd;   ///< readable when it has ended; closed where the kernel has no such descriptors
+    ZTCFileDescriptor mOutput;  ///< what it prints
+    std::string mText;          ///< the end of that
+};
+
+#endif

@@ -1,0 +1,230 @@
+#include "sensor/warnings/include/WarnSource.h"
+
+#include <algorithm>
+#include <array>
+#include <limits>
+#include <nlohmann/json.hpp>
+#include <sstream>
+
+#include "sensor/client/include/RecordJson.h"
+#include "sensor/views/include/NameBook.h"
+
+using std::chrono::minutes;
+
+static constexpr std::array<const char*, 4> scStates{"deaf", "agent-down", "disk-full", "path-lost"};
+/// The number of a gap before all gaps: their numbers begin with 1.
+static constexpr std::uint64_t scNoGap = 0;
+
+ZTCWarnSource::ZTCWarnSource(const std::vector<ZTSWarnRule>& acrRules) {
+    for (const ZTSWarnRule& lrRule : acrRules) {
+        if (const std::optional<ZTCKindKey> lKind = findKind(lrRule.mKind)) {
+            mKinds.push_back(*lKind);
+        }
+        mHasGapRule = mHasGapRule || lrRule.mKind == "gap";
+        mHasRefusedRule = mHasRefusedRule || lrRule.mKind == "refused";
+        mLongest = std::max(mLongest, lrRule.mWithin);
+    }
+}
+
+static ZTSWarnOccurrence sMake(const std::string& acrKind, const ZTSInitiator& acrInitiator, std::uint64_t aCount,
+                               ZTCHistoryTime aTime, const std::string& acrText = "") {
+    ZTSWarnOccurrence lOccurrence;
+    lOccurrence.mKind = acrKind;
+    lOccurrence.mInitiator = acrInitiator;
+    lOccurrence.mCount = aCount;
+    lOccurrence.mTime = aTime;
+    lOccurrence.mText = acrText;
+    return lOccurrence;
+}
+
+/// What tells the rows of `total` apart, beside the kind.
+static std::string sTotalName(const ZTSTotal& acrTotal) {
+    return (acrTotal.mInitiator.mWwpn ? acrTotal.mInitiator.mWwpn->toText() : std::string()) +
+           (acrTotal.mRemotePort ? acrTotal.mRemotePort->mWwpn.toText() : std::string());
+}
+
+static std::map<std::string, std::uint64_t> sReadNumbers(const std::string& acrText) {
+    const nlohmann::json lJson = nlohmann::json::parse(acrText, nullptr, false);
+    std::map<std::string, std::uint64_t> lNumbers;
+    for (const auto& [lName, lValue] : lJson.items()) {
+        if (lJson.is_object() && lValue.is_number_unsigned()) {
+            lNumbers[lName] = lValue.get<std::uint64_t>();
+        }
+    }
+    return lNumbers;
+}
+
+/// The history is new to this object: what happened lately counts, by the minute.
+void ZTCWarnSource::begin(const ZTCHistory& acrHistory, ZTCHistoryTime aNow, std::vector<ZTSWarnOccurrence>& arFound) {
+    mTotals.clear();
+    mOccurrences = mGaps = 0;
+    for (const ZTSTotal& lrTotal : acrHistory.readTotals()) {
+        mTotals[{sTotalName(lrTotal), lrTotal.mKind}] = lrTotal.mOccurrences;
+    }
+    ZTSHistoryFilter lLately;
+    lLately.mSince = aNow - mLongest;
+    lLately.mKinds = mKinds;
+    if (!mKinds.empty()) {
+        acrHistory.visitMinutes(lLately, [&](const ZTSBucket& acrBucket) {
+            arFound.push_back(sMake(getKindName(acrBucket.mKind), acrBucket.mInitiator, acrBucket.mOccurrences,
+                                    std::min(aNow, acrBucket.mFrom + minutes(1))));
+            arFound.back().mRemotePort = acrBucket.mRemotePort;
+            return true;
+        });
+    }
+    const std::string lGap = acrHistory.getValue(gcWarnGapValue);
+    if (lGap.empty()) {
+        for (const ZTSGap& lrGap : acrHistory.readGaps()) {
+            mGapSeq = lrGap.mTo < aNow - mLongest ? std::max(mGapSeq, lrGap.mSeq) : mGapSeq;
+        }
+    } else {
+        mGapSeq = scNoGap;
+        std::istringstream(lGap) >> mGapSeq;
+    }
+    const std::string lRefused = acrHistory.getValue(gcWarnRefusedValue);
+    mRefused = sReadNumbers(lRefused.empty() ? "{}" : lRefused);
+    if (mHasRefusedRule && lRefused.empty()) {
+        std::vector<ZTSWarnOccurrence> lOld;
+        readRefusals(acrHistory, aNow, lOld);
+    }
+    mStoreId = acrHistory.getStoreId();
+}
+
+std::vector<ZTSWarnOccurrence> ZTCWarnSource::read(const ZTCHistory& acrHistory, ZTCHistoryTime aNow) {
+    std::vector<ZTSWarnOccurrence> lFound;
+    if (mStoreId != acrHistory.getStoreId()) {
+        begin(acrHistory, aNow, lFound);
+    }
+    const ZTSRetrievalTotals lTotals = acrHistory.readRetrievalTotals();
+    if (!mKinds.empty() && lTotals.mOccurrences != std::exchange(mOccurrences, lTotals.mOccurrences)) {
+        readEvents(acrHistory, aNow, lFound);
+    }
+    if (mHasGapRule && lTotals.mGaps != std::exchange(mGaps, lTotals.mGaps)) {
+        readGaps(acrHistory, aNow, lFound);
+    }
+    if (mHasRefusedRule) {
+        readRefusals(acrHistory, aNow, lFound);
+    }
+    return lFound;
+}
+
+void ZTCWarnSource::readEvents(const ZTCHistory& acrHistory, ZTCHistoryTime aNow,
+                               std::vector<ZTSWarnOccurrence>& arFound) {
+    for (const ZTSTotal& lrTotal : acrHistory.readTotals()) {
+        std::uint64_t& lrLast = mTotals[{sTotalName(lrTotal), lrTotal.mKind}];
+        if (lrTotal.mOccurrences > lrLast && std::ranges::find(mKinds, lrTotal.mKind) != mKinds.end()) {
+            arFound.push_back(
+                sMake(getKindName(lrTotal.mKind), lrTotal.mInitiator, lrTotal.mOccurrences - lrLast, aNow));
+            arFound.back().mRemotePort = lrTotal.mRemotePort;
+        }
+        lrLast = lrTotal.mOccurrences;
+    }
+}
+
+void ZTCWarnSource::readGaps(const ZTCHistory& acrHistory, ZTCHistoryTime aNow,
+                             std::vector<ZTSWarnOccurrence>& arFound) {
+    std::uint64_t lLast = mGapSeq;
+    for (const ZTSGap& lrGap : acrHistory.readGaps()) {
+        if (lrGap.mSeq <= mGapSeq) {
+            continue;
+        }
+        lLast = std::max(lLast, lrGap.mSeq);
+        const std::string lLost =
+            (lrGap.mIsCountKnown ? "" : "at least ") + std::to_string(lrGap.getOccurrences()) + " events lost: ";
+        arFound.push_back(sMake("gap", lrGap.mCounts.empty() ? ZTSInitiator() : lrGap.mCounts.front().mInitiator, 1,
+                                aNow, lLost + lrGap.mReason));
+    }
+    if (lLast != std::exchange(mGapSeq, lLast)) {
+        mValues[gcWarnGapValue] = std::to_string(mGapSeq);
+    }
+}
+
+void ZTCWarnSource::readRefusals(const ZTCHistory& acrHistory, ZTCHistoryTime aNow,
+                                 std::vector<ZTSWarnOccurrence>& arFound) {
+    std::map<std::string, std::pair<ZTSInitiator, std::uint64_t>> lNow;
+    for (const ZTSLedgerRow& lrRow : acrHistory.readLedger()) {
+        auto& [lrInitiator, lrCount] = lNow[lrRow.mInitiator.mWwpn ? lrRow.mInitiator.mWwpn->toText() : "unknown"];
+        lrInitiator = lrRow.mInitiator;
+        lrCount += lrRow.getRefusedTotal();
+    }
+    nlohmann::ordered_json lNumbers = nlohmann::ordered_json::object();
+    bool lIsChanged = false;
+    for (const auto& [lName, lEntry] : lNow) {
+        std::uint64_t& lrLast = mRefused[lName];
+        if (lEntry.second > lrLast) {
+            arFound.push_back(sMake("refused", lEntry.first, lEntry.second - lrLast, aNow,
+                                    "the agent refused " + std::to_string(lEntry.second - lrLast) + " events"));
+        }
+        lIsChanged = lIsChanged || lEntry.second != lrLast;
+        lrLast = lEntry.second;
+        lNumbers[lName] = lrLast;
+    }
+    if (lIsChanged) {
+        mValues[gcWarnRefusedValue] = dumpJson(lNumbers, -1);
+    }
+}
+
+// ---- states ----
+
+bool ZTCWarnSource::isState(const std::string& acrKind) {
+    return std::ranges::find(scStates, acrKind) != scStates.end();
+}
+
+bool ZTCWarnSource::isKnown(const ZTSLiveState& acrLive, const std::string& acrKind) {
+    return (acrKind == "deaf" && acrLive.mKinds) || (acrKind == "agent-down" && acrLive.mKeeper.mState) ||
+           (acrKind == "disk-full" && acrLive.mCollector.mDisk) || (acrKind == "path-lost" && acrLive.mTroubles);
+}
+
+static std::optional<ZTSWarnOccurrence> sFindDeaf(const ZTSLiveKinds& acrKinds, ZTCHistoryTime aNow) {
+    std::string lText;
+    for (const auto& [lKind, lState] : acrKinds.getOrdered()) {
+        if (lState == "failed" || lState == "no_rights") {
+            lText += (lText.empty() ? "" : ", ") + lKind + " " + lState;
+        }
+    }
+    if (lText.empty()) {
+        return std::nullopt;
+    }
+    return sMake("deaf", acrKinds.mInitiator, 1, aNow, "events of these kinds do not reach the agent: " + lText);
+}
+
+/// A host without adapters needs no agent; one without the adapters' library does.
+static bool sIsAgentDown(const ZTSLiveState& acrLive) {
+    return acrLive.mKeeper.mState == ZTKP_WaitingToRestart ||
+           (acrLive.mKeeper.mState == ZTKP_WaitingForAdapters && acrLive.mAgent.mEndReason != "no-adapters");
+}
+
+/// The port that the trouble's subject names.
+static std::optional<ZTSRemotePort> sFindPort(const std::string& acrSubject) {
+    std::istringstream lWords(acrSubject);
+    for (std::string lWord; lWords >> lWord;) {
+        if (const std::optional<ZTSFcName> lName = parseWwn(lWord)) {
+            return ZTSRemotePort{.mWwpn = *lName, .mWwnn = {}, .mFcId = {}};
+        }
+    }
+    return std::nullopt;
+}
+
+std::vector<ZTSWarnOccurrence> ZTCWarnSource::findHolding(const ZTSLiveState& acrLive, ZTCHistoryTime aNow) {
+    std::vector<ZTSWarnOccurrence> lHolding;
+    const auto lAdd = [&](const char* apKind, const std::string& acrText) -> ZTSWarnOccurrence& {
+        return lHolding.emplace_back(sMake(apKind, ZTSInitiator(), 1, aNow, acrText));
+    };
+    for (const ZTSLiveKinds& lrKinds : acrLive.mKinds.value_or(std::vector<ZTSLiveKinds>())) {
+        if (std::optional<ZTSWarnOccurrence> lDeaf = sFindDeaf(lrKinds, aNow)) {
+            lHolding.push_back(std::move(*lDeaf));
+        }
+    }
+    if (sIsAgentDown(acrLive)) {
+        lAdd("agent-down", acrLive.mAgent.mProblem.empty() ? "the agent does not run" : acrLive.mAgent.mProblem);
+    }
+    if (acrLive.mCollector.mDisk && *acrLive.mCollector.mDisk != ZTDK_Ok) {
+        lAdd("disk-full", acrLive.mCollector.mDiskProblem);
+    }
+    for (const ZTSTroubleText& lrTrouble : acrLive.mTroubles.value_or(std::vector<ZTSTroubleText>())) {
+        if (lrTrouble.mId == "path-lost") {
+            lAdd("path-lost", lrTrouble.mSubject).mRemotePort = sFindPort(lrTrouble.mSubject);
+        }
+    }
+    return lHolding;
+}

@@ -1,0 +1,437 @@
+#include "sensor/warnings/include/Warnings.h"
+
+#include <sys/eventfd.h>
+#include <unistd.h>
+
+#include <algorithm>
+#include <cerrno>
+#include <limits>
+#include <nlohmann/json.hpp>
+#include <sstream>
+
+#include "sensor/client/include/ClientErrors.h"
+#include "sensor/client/include/RecordJson.h"
+#include "sensor/views/include/TimeText.h"
+
+using std::chrono::milliseconds;
+using std::chrono::seconds;
+using std::chrono::steady_clock;
+using ZTCJson = nlohmann::ordered_json;
+
+/// Between two looks while any trouble is known.
+static constexpr seconds scLookPeriod{1};
+/// What a process before this one has warned of is in the history. So long that is waited for.
+static constexpr seconds scHistoryPatience{10};
+/// For a test beside the timeouts of its hooks.
+static constexpr seconds scTestMargin{5};
+
+static ZTCFileDescriptor sMakeBell() {
+    ZTCFileDescriptor lBell(eventfd(0, EFD_CLOEXEC | EFD_NONBLOCK));
+    if (!lBell.isOpen()) {
+        throw ZTCSystemCallEx("cannot make an eventfd", errno);
+    }
+    return lBell;
+}
+
+static void sRing(const ZTCFileDescriptor& acrBell) {
+    const std::uint64_t lOne = 1;
+    [[maybe_unused]] const ssize_t lWritten = write(acrBell.get(), &lOne, sizeof(lOne));
+}
+
+ZTCWarnings::ZTCWarnings(ZTSWarningsSetup aSetup, const ZTSSettings& acrSettings)
+    : mSetup(std::move(aSetup)), mBell(sMakeBell()), mWakeUp(sMakeBell()), mStart(steady_clock::now()) {
+    setSettings(acrSettings);
+    mThread = std::thread([this] { run(); });
+}
+
+ZTCWarnings::~ZTCWarnings() {
+    {
+        const std::lock_guard lLock(mMutex);
+        mIsStopping = true;
+    }
+    sRing(mWakeUp);
+    mThread.join();
+}
+
+// ---- any thread ----
+
+void ZTCWarnings::setSettings(const ZTSSettings& acrSettings) {
+    {
+        const std::lock_guard lLock(mMutex);
+        mNewSettings = acrSettings;
+        mHasRules = !acrSettings.mWarnings.empty();
+        mTestTime = scTestMargin;
+        for (const ZTSWarnRule& lrRule : acrSettings.mWarnings) {
+            mTestTime += 2 * lrRule.mTimeout;  // a hook of a real trouble may run before it
+        }
+    }
+    sRing(mWakeUp);
+}
+
+void ZTCWarnings::setLive(std::string aLive) {
+    {
+        const std::lock_guard lLock(mMutex);
+        mNewLive = std::move(aLive);
+        if (!mHasRules) {
+            return;
+        }
+    }
+    sRing(mWakeUp);
+}
+
+void ZTCWarnings::openHistory() {
+    const std::lock_guard lLock(mMutex);
+    mMayRead = true;
+}
+
+milliseconds ZTCWarnings::test(std::uint64_t aTicket) {
+    milliseconds lTime{};
+    {
+        const std::lock_guard lLock(mMutex);
+        mNewTests.push_back(aTicket);
+        lTime = mTestTime;
+    }
+    sRing(mWakeUp);
+    return lTime;
+}
+
+std::vector<ZTSHookTest> ZTCWarnings::takeTests() {
+    std::uint64_t lCount = 0;
+    [[maybe_unused]] const ssize_t lRead = ::read(mBell.get(), &lCount, sizeof(lCount));
+    const std::lock_guard lLock(mMutex);
+    return std::exchange(mDoneTests, {});
+}
+
+std::string ZTCWarnings::describe() const {
+    const std::lock_guard lLock(mMutex);
+    return mDescription;
+}
+
+// ---- the thread ----
+
+void ZTCWarnings::run() {
+    applySettings();
+    while (wait()) {
+        applySettings();
+        readHistory();
+        readLive();
+        stepHooks();
+        warn();
+        beginTest();
+        startHooks();
+        save();
+        publish();
+    }
+    mHooks.clear();
+    save();
+}
+
+/// False: it is over.
+bool ZTCWarnings::wait() {
+    std::vector<pollfd> lFds{{.fd = mWakeUp.get(), .events = POLLIN, .revents = 0}};
+    const auto lNow = steady_clock::now();
+    auto lNext = mpBook->isEmpty() ? steady_clock::time_point::max() : lNow + scLookPeriod;
+    for (const ZTSHook& lrHook : mHooks) {
+        if (lrHook.mpProcess != nullptr) {
+            lrHook.mpProcess->addTo(lFds);
+            lNext = std::min(lNext, lrHook.mpProcess->getNextStep(lNow));
+        }
+    }
+    const auto lTime = std::chrono::ceil<milliseconds>(lNext - lNow).count();
+    const bool lIsEndless = lNext == steady_clock::time_point::max();
+    poll(lFds.data(), static_cast<nfds_t>(lFds.size()),
+         lIsEndless ? -1 : static_cast<int>(std::clamp<long long>(lTime, 0, 60000)));
+    std::uint64_t lCount = 0;
+    [[maybe_unused]] const ssize_t lRead = ::read(mWakeUp.get(), &lCount, sizeof(lCount));
+    const std::lock_guard lLock(mMutex);
+    return !mIsStopping;
+}
+
+void ZTCWarnings::applySettings() {
+    const std::lock_guard lLock(mMutex);
+    std::optional<ZTSSettings> lNew;
+    lNew.swap(mNewSettings);
+    if (!lNew) {
+        return;
+    }
+    const bool lIsNew = mpBook == nullptr || lNew->mWarnings != mSettings.mWarnings;
+    mSettings = std::move(*lNew);
+    if (!lIsNew) {
+        return;
+    }
+    const std::string lOpen = mpBook != nullptr ? mpBook->toText() : std::string();
+    mpBook = std::make_unique<ZTCWarnBook>(mSettings.mWarnings);
+    mpBook->load(lOpen);
+    mpSource = std::make_unique<ZTCWarnSource>(mSettings.mWarnings);
+    mProblems.assign(mSettings.mWarnings.size(), {});
+    if (mTest) {
+        mDoneTests.push_back(
+            {mTest->mTicket, dumpJson({{"error", "the settings have changed while the hooks were tested"}}, -1)});
+        mTest.reset();
+        sRing(mBell);
+    }
+}
+
+void ZTCWarnings::readHistory() {
+    {
+        const std::lock_guard lLock(mMutex);
+        if (!mMayRead) {
+            return;
+        }
+    }
+    try {
+        if (mpHistory == nullptr) {
+            mpHistory = std::make_unique<ZTCHistory>(mSetup.mStateDirectory);
+        }
+        if (!mIsLoaded) {
+            mIsLoaded = true;
+            if (!mpBook->load(mpHistory->getValue(gcWarnBookValue))) {
+                mSetup.mReport("the open troubles in the history cannot be read: they are warned of anew");
+            }
+            const std::uint64_t lBefore = std::exchange(mFailures, 0);
+            std::istringstream(mpHistory->getValue(mSetup.mFailuresValue)) >> mFailures;
+            mFailures += lBefore;
+            if (lBefore != 0) {
+                mSetup.mSetValue(mSetup.mFailuresValue, std::to_string(mFailures));
+            }
+        }
+        if (mpBook->getRules().empty()) {
+            return;
+        }
+        for (const ZTSWarnOccurrence& lrOccurrence : mpSource->read(*mpHistory, getHistoryTime())) {
+            mpBook->note(lrOccurrence);
+        }
+        for (const auto& [lName, lValue] : mpSource->takeValues()) {
+            mSetup.mSetValue(lName, lValue);
+        }
+    } catch (const ZTCStoreEx&) {
+        mpHistory.reset();  // `status` says what is wrong with it; it is opened again at the next look
+    }
+}
+
+void ZTCWarnings::readLive() {
+    std::optional<std::string> lNew;
+    {
+        const std::lock_guard lLock(mMutex);
+        lNew.swap(mNewLive);
+    }
+    if (lNew && !mpBook->getRules().empty()) {
+        mLive = readLiveState(nlohmann::json::parse(*lNew, nullptr, false));
+        mHasLive = true;
+    }
+}
+
+void ZTCWarnings::warn() {
+    if (!mIsLoaded && steady_clock::now() - mStart < scHistoryPatience) {
+        return;
+    }
+    const ZTCHistoryTime lNow = getHistoryTime();
+    if (mHasLive) {
+        mpBook->setHolding(ZTCWarnSource::findHolding(mLive, lNow));
+    }
+    std::vector<std::string> lLines;
+    mpBook->judge(
+        lNow,
+        [this](const std::string& acrKind) {
+            return ZTCWarnSource::isState(acrKind) ? ZTCWarnSource::isKnown(mLive, acrKind) : mpSource->hasRead();
+        },
+        lLines);
+    for (const std::string& lrLine : lLines) {
+        mSetup.mReport(lrLine);
+    }
+    const std::size_t lRoom = gcMostHooks - std::min(gcMostHooks, mHooks.size());
+    const ZTCNameBook lNames = makeNames();
+    for (const ZTSTrouble& lrTrouble : mpBook->takeDue(lNow, lRoom)) {
+        const ZTSWarnDocument lDocument = makeDocument(lrTrouble);
+        ZTSHook& lrHook = mHooks.emplace_back();
+        lrHook.mSettings = lDocument.mRule;
+        lrHook.mRule = lrTrouble.mRule;
+        lrHook.mInput = toHookInput(lDocument, lNames);
+        lrHook.mEnvironment = toHookEnvironment(lDocument, lNames);
+        mSetup.mReport("warning: " + describeTrouble(lDocument.mRule, lrTrouble, lNames) + "; " +
+                       lDocument.mRule.mRun.front() + " is run, and again at " + toRfc3339(lrTrouble.mNext) +
+                       " if it goes on");
+    }
+}
+
+void ZTCWarnings::beginTest() {
+    std::vector<std::uint64_t> lTickets;
+    {
+        const std::lock_guard lLock(mMutex);
+        lTickets.swap(mNewTests);
+    }
+    for (const std::uint64_t lTicket : lTickets) {
+        if (mTest) {
+            const std::lock_guard lLock(mMutex);
+            mDoneTests.push_back({lTicket, dumpJson({{"error", "the hooks are being tested already"}}, -1)});
+            sRing(mBell);
+            continue;
+        }
+        mTest = ZTSTest{lTicket, std::vector<std::optional<std::string>>(mSettings.mWarnings.size())};
+        const ZTCNameBook lNames = makeNames();
+        for (std::size_t i = 0; i < mSettings.mWarnings.size(); ++i) {
+            ZTSWarnDocument lDocument;
+            lDocument.mTrouble.mRule = i;
+            lDocument.mTrouble.mText = "a test: nothing has happened";
+            lDocument.mTrouble.mFirst = lDocument.mTrouble.mLast = getHistoryTime();
+            ZTSWarnDocument lFilled = makeDocument(lDocument.mTrouble);
+            lFilled.mIsTest = true;
+            lFilled.mEpisode.reset();
+            mHooks.push_back({.mRule = i,
+                              .mSettings = mSettings.mWarnings[i],
+                              .mTicket = lTicket,
+                              .mpProcess = nullptr,
+                              .mInput = toHookInput(lFilled, lNames),
+                              .mEnvironment = toHookEnvironment(lFilled, lNames)});
+        }
+        if (mSettings.mWarnings.empty()) {
+            endTest();
+        }
+    }
+}
+
+void ZTCWarnings::startHooks() {
+    std::size_t lRunning = 0;
+    for (auto lPlace = mHooks.begin(); lPlace != mHooks.end();) {
+        if (lPlace->mpProcess == nullptr && lRunning < gcMostHooks) {
+            const ZTSHookCall lCall{.mRun = lPlace->mSettings.mRun,
+                                    .mEnvironment = std::move(lPlace->mEnvironment),
+                                    .mInput = std::move(lPlace->mInput),
+                                    .mTimeout = lPlace->mSettings.mTimeout};
+            try {
+                lPlace->mpProcess = std::make_unique<ZTCHookProcess>(lCall, steady_clock::now());
+            } catch (const ZTCSystemCallEx& lrEx) {
+                noteEnd(*lPlace, lrEx.what());
+                lPlace = mHooks.erase(lPlace);
+                continue;
+            }
+        }
+        lRunning += lPlace->mpProcess != nullptr ? 1 : 0;
+        ++lPlace;
+    }
+}
+
+void ZTCWarnings::stepHooks() {
+    for (auto lPlace = mHooks.begin(); lPlace != mHooks.end();) {
+        const std::optional<std::string> lEnd =
+            lPlace->mpProcess != nullptr ? lPlace->mpProcess->step(steady_clock::now()) : std::nullopt;
+        if (lEnd) {
+            noteEnd(*lPlace, *lEnd);
+            lPlace = mHooks.erase(lPlace);
+        } else {
+            ++lPlace;
+        }
+    }
+}
+
+void ZTCWarnings::noteEnd(const ZTSHook& acrHook, const std::string& acrProblem) {
+    if (!acrProblem.empty()) {
+        ++mFailures;
+        if (mIsLoaded) {
+            mSetup.mSetValue(mSetup.mFailuresValue, std::to_string(mFailures));
+        }
+        mSetup.mReport("the hook " + acrHook.mSettings.mRun.front() + " for " + acrHook.mSettings.mKind +
+                       " failed: " + acrProblem + "; it is run again with the next warning");
+    }
+    const bool lIsCurrent =
+        acrHook.mRule < mSettings.mWarnings.size() && mSettings.mWarnings[acrHook.mRule] == acrHook.mSettings;
+    if (lIsCurrent) {
+        mProblems[acrHook.mRule] = acrProblem;
+    }
+    if (lIsCurrent && mTest && acrHook.mTicket == mTest->mTicket) {
+        mTest->mResults[acrHook.mRule] = acrProblem;
+        if (std::ranges::all_of(mTest->mResults, [](const auto& acrResult) { return acrResult.has_value(); })) {
+            endTest();
+        }
+    }
+}
+
+void ZTCWarnings::endTest() {
+    ZTCJson lHooks = ZTCJson::array();
+    for (std::size_t i = 0; i < mSettings.mWarnings.size(); ++i) {
+        const std::string lProblem = mTest->mResults[i].value_or("");
+        lHooks.push_back({{"kind", mSettings.mWarnings[i].mKind},
+                          {"run", mSettings.mWarnings[i].mRun},
+                          {"problem", lProblem.empty() ? ZTCJson(nullptr) : ZTCJson(lProblem)}});
+    }
+    {
+        const std::lock_guard lLock(mMutex);
+        mDoneTests.push_back({mTest->mTicket, dumpJson(ZTCJson{{"hooks", std::move(lHooks)}}, -1)});
+    }
+    mTest.reset();
+    sRing(mBell);
+}
+
+ZTCNameBook ZTCWarnings::makeNames() const {
+    ZTCNameBook lNames;
+    for (const auto& [lWwn, lName] : mSettings.mNames) {
+        if (const auto lParsed = parseWwn(lWwn)) {
+            lNames.addName(*lParsed, lName);
+        }
+    }
+    return lNames;
+}
+
+ZTSWarnDocument ZTCWarnings::makeDocument(const ZTSTrouble& acrTrouble) {
+    ZTSWarnDocument lDocument;
+    lDocument.mHost = mSetup.mHost;
+    lDocument.mRule = mpBook->getRule(acrTrouble.mRule);
+    lDocument.mTrouble = acrTrouble;
+    const std::optional<ZTCKindKey> lKind = findKind(lDocument.mRule.mKind);
+    try {
+        if (mpHistory == nullptr) {
+            return lDocument;
+        }
+        lDocument.mStoreId = mpHistory->getStoreId();
+        ZTSHistoryFilter lFilter;
+        lFilter.mLimit = 1;
+        lFilter.mKinds = {lKind.value_or(0)};
+        if (lDocument.mRule.mPer == "port" && acrTrouble.mRemotePort) {
+            lFilter.mPorts = {acrTrouble.mRemotePort->mWwpn};
+        } else if (lDocument.mRule.mPer != "host" && acrTrouble.mInitiator.mWwpn) {
+            lFilter.mInitiators = {*acrTrouble.mInitiator.mWwpn};
+        }
+        if (lKind) {
+            const std::vector<ZTSEpisode> lNewest = mpHistory->readEpisodes(lFilter);
+            lDocument.mEpisode = lNewest.empty() ? std::nullopt : std::optional(lNewest.back());
+        }
+    } catch (const ZTCStoreEx&) {
+        mpHistory.reset();
+    }
+    return lDocument;
+}
+
+void ZTCWarnings::save() {
+    const std::string lText = mpBook->toText();
+    if (mIsLoaded && lText != mSaved) {
+        mSetup.mSetValue(gcWarnBookValue, lText);
+        mSaved = lText;
+    }
+}
+
+void ZTCWarnings::publish() {
+    ZTCJson lWarnings = ZTCJson::array();
+    const ZTCNameBook lNames = makeNames();
+    for (const ZTSTrouble& lrTrouble : mpBook->getOpen()) {
+        const ZTSWarnRule& lrRule = mpBook->getRule(lrTrouble.mRule);
+        lWarnings.push_back({{"kind", lrRule.mKind},
+                             {"text", describeTrouble(lrRule, lrTrouble, lNames)},
+                             {"since", toRfc3339(lrTrouble.mFirst)},
+                             {"given", lrTrouble.mWarnings},
+                             {"next", toRfc3339(lrTrouble.mNext)}});
+    }
+    for (std::size_t i = 0; i < mProblems.size(); ++i) {
+        if (!mProblems[i].empty()) {
+            const ZTSWarnRule& lrRule = mSettings.mWarnings[i];
+            lWarnings.push_back(
+                {{"kind", "hook"},
+                 {"text", "the hook " + lrRule.mRun.front() + " for " + lrRule.mKind + " failed: " + mProblems[i]},
+                 {"since", nullptr},
+                 {"given", nullptr},
+                 {"next", nullptr}});
+        }
+    }
+    std::string lText = dumpJson(lWarnings, -1);
+    const std::lock_guard lLock(mMutex);
+    mDescription = std::move(lText);
+}
