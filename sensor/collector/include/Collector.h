@@ -17,10 +17,10 @@
 #include "sensor/collector/include/KeeperPort.h"
 #include "sensor/collector/include/Leftovers.h"
 #include "sensor/collector/include/LiveStateJson.h"
+#include "sensor/collector/include/Outputs.h"
 #include "sensor/collector/include/PortWatch.h"
 #include "sensor/collector/include/Spool.h"
 #include "sensor/link/include/Inheritance.h"
-#include "sensor/outlets/include/Outlets.h"
 #include "sensor/settings/include/Settings.h"
 
 class ZTCCollector {
@@ -51,7 +51,6 @@ private:
     void sweep(ZTCTime aNow);
     void noteHistory();
     void tellState();
-    void feedOutlets(ZTCTime aNow);
 
     std::optional<std::string> serve(std::uint64_t aTicket, const std::string& acrRequest);
     std::string describeState();
@@ -66,7 +65,7 @@ private:
     ZTCAgentQueue mAgents;
     ZTCPortWatch mPorts;
     ZTCControlServer mControl;
-    std::unique_ptr<ZTCOutlets> mpOutlets;  ///< once the database is open
+    ZTCOutputs mOutputs;
 
     bool mIsReady = false;  ///< the database is open, and what was found in the spool is handed to it
     bool mIsSwept = false;  ///< once at least
@@ -78,7 +77,6 @@ private:
     std::uint64_t mRestarts = 0;
     std::optional<ZTSLinkMessage> mKeeperState;
     std::optional<ZTCTime> mFinishBy;
-    ZTCTime mLastLive{};
     std::vector<pollfd> mFds;
 };
 

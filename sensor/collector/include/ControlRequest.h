@@ -7,7 +7,7 @@
 
 #include "sensor/collector/include/HistoryWorker.h"
 
-enum ZTEControlRequest : std::uint8_t { ZTCR_Status, ZTCR_Mark, ZTCR_Wrong };
+enum ZTEControlRequest : std::uint8_t { ZTCR_Status, ZTCR_Mark, ZTCR_WarnTest, ZTCR_Wrong };
 
 struct ZTSControlRequest {
     ZTEControlRequest mKind = ZTCR_Wrong;

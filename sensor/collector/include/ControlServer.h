@@ -41,6 +41,8 @@ public:
     void serve(ZTCTime aNow);
     /// When serve() is to be called at the latest; empty: no client is there.
     std::optional<ZTCTime> getNextDeadline() const;
+    /// A request that is put off takes so long at most, instead of gcControlPatience. To be called by the handler.
+    void allow(std::uint64_t aTicket, std::chrono::milliseconds aTime);
     /// Answers a request that was put off. Does nothing where its client has gone.
     void answer(std::uint64_t aTicket, const std::string& acrAnswer);
 
@@ -58,6 +60,8 @@ private:
     const Handler mHandler;
     std::list<ZTSClient> mClients;
     std::uint64_t mNextTicket = 1;
+    std::uint64_t mAllowedTicket = 0;  ///< of the last allow()
+    std::chrono::milliseconds mAllowedTime{};
 };
 
 #endif

@@ -29,6 +29,7 @@ struct ZTSLiveFacts {
     ZTSHistoryState mHistory;
     ZTSLosses mLosses;
     ZTSTopology mPorts;
+    std::string mWarnings = "[]";  ///< the open ones, as a JSON list
 };
 
 /// One line, without a line break.

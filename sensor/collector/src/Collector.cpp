@@ -14,18 +14,11 @@ using std::chrono::seconds;
 static constexpr seconds scSpoolPause{1};
 /// Between two sweeps of what earlier keepers and agents have left.
 static constexpr seconds scSweepPeriod{10};
-/// Between two descriptions of the live state for the outlets.
-static constexpr seconds scLivePause{1};
 /// Of an orderly end: when the agent is given up, and how long the history may take after that. Together less than
 /// gcFinishLimit.
 static constexpr seconds scFinishPatience{14};
 static constexpr seconds scHistoryPatience{4};
 static_assert(scFinishPatience + scHistoryPatience < gcFinishLimit);
-
-static std::string sHostName() {
-    std::array<char, 256> lName{};
-    return gethostname(lName.data(), lName.size() - 1) == 0 ? lName.data() : "unknown";
-}
 
 static ZTSStoreLimits sStoreLimits(const ZTSSettings& acrSettings) {
     ZTSStoreLimits lLimits;
@@ -55,7 +48,8 @@ ZTCCollector::ZTCCollector(ZTSInheritance aInheritance, const ZTSSettings& acrSe
               [](const std::string& acrLine) { logLine(acrLine); }),
       mPorts(mHistory, [](const std::string& acrLine) { logLine(acrLine); }),
       mControl(std::move(mInheritance.mControl),
-               [this](std::uint64_t aTicket, const std::string& acrRequest) { return serve(aTicket, acrRequest); }) {}
+               [this](std::uint64_t aTicket, const std::string& acrRequest) { return serve(aTicket, acrRequest); }),
+      mOutputs(mInheritance.mState, acrSettings, mHistory) {}
 
 ZTCCollector::~ZTCCollector() = default;
 
@@ -113,7 +107,7 @@ void ZTCCollector::turn(ZTCTime aNow) {
     }
     mControl.serve(aNow);
     tellState();
-    feedOutlets(aNow);
+    mOutputs.feed(aNow, [this] { return describeState(); });
     if (hasWorked() && aNow >= mKeeper.getNextLook()) {
         mKeeper.sendLook(aNow);
     }
@@ -148,6 +142,7 @@ void ZTCCollector::poll(ZTCTime aNow) {
     mFds.push_back({.fd = mHistory.getBell(), .events = POLLIN, .revents = 0});
     mFds.push_back({.fd = mAgents.getResponseFifo(), .events = POLLIN, .revents = 0});
     mFds.push_back({.fd = mAgents.getBell(), .events = POLLIN, .revents = 0});
+    mFds.push_back({.fd = mOutputs.getBell(), .events = POLLIN, .revents = 0});
     mControl.addTo(mFds);
     if (::poll(mFds.data(), static_cast<nfds_t>(mFds.size()), getPollTime(aNow)) <= 0) {
         return;
@@ -201,9 +196,7 @@ void ZTCCollector::reload(const ZTSLinkMessage& acrMessage, ZTCTime aNow) {
     }
     mSettings = lReading.mSettings;
     mHistory.setLimits(sStoreLimits(mSettings));
-    if (mpOutlets != nullptr) {
-        mpOutlets->setSettings(mSettings);
-    }
+    mOutputs.setSettings(mSettings);
     mAgents.setSettings(sSessionSettings(mSettings), aNow);
     mPorts.hurry();
 }
@@ -223,30 +216,6 @@ void ZTCCollector::tellState() {
         lText = "waiting for the agent";
     }
     mKeeper.sendText(lText);
-}
-
-/// What the outlets show is at most a second older than the last thing that happened.
-void ZTCCollector::feedOutlets(ZTCTime aNow) {
-    if (!mHistory.getState().mIsOpen) {
-        return;
-    }
-    if (mpOutlets == nullptr) {
-        // Not before: a reader that opens the database while the disk is read-only makes it read-only for the writer in
-        // the same process, too.
-        mpOutlets = std::make_unique<ZTCOutlets>(
-            ZTSOutletsSetup{.mStateDirectory = mInheritance.mState,
-                            .mHost = sHostName(),
-                            .mVersion = TAVIK_VERSION,
-                            .mSetValue = [this](const std::string& acrName,
-                                                const std::string& acrValue) { mHistory.setValue(acrName, acrValue); },
-                            .mReport = [](const std::string& acrLine) { logLine(acrLine); }},
-            mSettings);
-    }
-    if (aNow - mLastLive >= scLivePause) {
-        mLastLive = aNow;
-        mpOutlets->setLive(describeState());
-        mpOutlets->wake();
-    }
 }
 
 // ---- agents ----
@@ -300,6 +269,9 @@ void ZTCCollector::noteHistory() {
     for (const ZTSMarkResult& lrMark : mHistory.takeMarkResults()) {
         mControl.answer(lrMark.mTicket, toMarkJson(lrMark));
     }
+    for (const ZTSHookTest& lrTest : mOutputs.takeHookTests()) {
+        mControl.answer(lrTest.mTicket, lrTest.mAnswer);
+    }
 }
 
 // ---- the control socket ----
@@ -311,6 +283,9 @@ std::optional<std::string> ZTCCollector::serve(std::uint64_t aTicket, const std:
             return describeState();
         case ZTCR_Mark:
             mHistory.setMark(aTicket, lRequest.mName, getHistoryTime());
+            return std::nullopt;
+        case ZTCR_WarnTest:
+            mControl.allow(aTicket, mOutputs.testHooks(aTicket));
             return std::nullopt;
         case ZTCR_Wrong:
             break;
@@ -341,5 +316,6 @@ std::string ZTCCollector::describeState() {
     lFacts.mHistory = mHistory.getState();
     lFacts.mLosses = mAgents.getLosses(lFacts.mNow);
     lFacts.mPorts = mPorts.getPorts();
+    lFacts.mWarnings = mOutputs.describeWarnings();
     return toLiveStateJson(lFacts);
 }

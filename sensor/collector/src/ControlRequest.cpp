@@ -27,8 +27,11 @@ ZTSControlRequest parseControlRequest(const std::string& acrLine) {
     if (lRequest == "status") {
         return {.mKind = ZTCR_Status, .mName = {}, .mError = {}};
     }
+    if (lRequest == "warn-test") {
+        return {.mKind = ZTCR_WarnTest, .mName = {}, .mError = {}};
+    }
     if (lRequest != "mark") {
-        return sWrong("unknown request \"" + lRequest + "\": status and mark are known");
+        return sWrong("unknown request \"" + lRequest + "\": status, mark and warn-test are known");
     }
     if (!lJson.contains("name") || !lJson["name"].is_string()) {
         return sWrong("a mark needs a text \"name\"");

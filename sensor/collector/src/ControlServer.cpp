@@ -86,6 +86,9 @@ bool ZTCControlServer::serveClient(ZTSClient& arClient, ZTCTime aNow) {
             arClient.mOutput = *lAnswer + "\n";
         } else {
             arClient.mTicket = lTicket;
+            if (mAllowedTicket == lTicket) {
+                arClient.mDeadline = aNow + mAllowedTime;
+            }
         }
     }
 }
@@ -113,6 +116,11 @@ bool ZTCControlServer::writeTo(ZTSClient& arClient) {
         arClient.mOutput.erase(0, static_cast<std::size_t>(lCount));
     }
     return true;
+}
+
+void ZTCControlServer::allow(std::uint64_t aTicket, std::chrono::milliseconds aTime) {
+    mAllowedTicket = aTicket;
+    mAllowedTime = aTime;
 }
 
 void ZTCControlServer::answer(std::uint64_t aTicket, const std::string& acrAnswer) {

@@ -158,7 +158,8 @@ std::string toLiveStateJson(const ZTSLiveFacts& acrFacts) {
                    {"kinds", nullptr},
                    {"losses", sLosses(acrFacts.mLosses)},
                    {"paths", nullptr},
-                   {"troubles", nullptr}};
+                   {"troubles", nullptr},
+                   {"warnings", ZTCJson::parse(acrFacts.mWarnings)}};
     if (acrFacts.mpPage != nullptr) {
         lState["adapters"] = sAdapters(acrFacts);
         lState["kinds"] = sKinds(acrFacts);

@@ -35,7 +35,7 @@ struct ZTSOutletsSetup {
 
 class ZTCOutlets {
 public:
-    /// Starts the thread.
+    /// Starts the thread. The history is not touched before the first openHistory().
     ZTCOutlets(ZTSOutletsSetup aSetup, const ZTSSettings& acrSettings);
     /// Writes what is due, and ends the thread.
     ~ZTCOutlets();
@@ -44,6 +44,8 @@ public:
 
     // Any thread; none of them waits for an outlet.
     void setSettings(const ZTSSettings& acrSettings);
+    /// The database can be read from now on. Before that the outlets say that it cannot.
+    void openHistory();
     /// The running sensor's live state, as JSON in one line.
     void setLive(std::string aLive);
     /// Something new is in the history.
@@ -57,7 +59,7 @@ private:
     bool waitForWork();
     void applySettings();
     void openServer();
-    void openHistory();
+    void feedHistory();
     void feed();
     void feedStream();
     void feedNdjson();
@@ -79,6 +81,7 @@ private:
     std::optional<std::uint64_t> mStreamSeq;  ///< what the streams have; absent: nobody listens
     std::chrono::steady_clock::time_point mNextMetrics{};
     std::chrono::steady_clock::time_point mNextServer{};
+    std::string mHistoryProblem;
     std::string mServerProblem;
     std::string mNdjsonProblem;
     std::string mMetricsProblem;
@@ -88,6 +91,7 @@ private:
     std::condition_variable mWake;
     bool mIsStopping = false;
     bool mHasWork = true;
+    bool mMayRead = false;
     std::optional<ZTSSettings> mNewSettings;
     std::string mLive = "{}";
     std::map<std::string, std::string> mNames;  ///< the administrator's, for the server's thread

@@ -26,6 +26,10 @@ ZTCOutlets::ZTCOutlets(ZTSOutletsSetup aSetup, const ZTSSettings& acrSettings)
     lSources.mStateDirectory = mSetup.mStateDirectory;
     lSources.mHost = mSetup.mHost;
     lSources.mVersion = mSetup.mVersion;
+    lSources.mMayRead = [this] {
+        const std::lock_guard lLock(mMutex);
+        return mMayRead;
+    };
     lSources.mReadLive = [this] { return nlohmann::json::parse(readLive(), nullptr, false); };
     lSources.mGiveSeries = [this](ZTSMetricFacts& arFacts) { giveSeries(arFacts); };
     lSources.mAddNames = [this](ZTCNameBook& arNames) {
@@ -54,6 +58,13 @@ void ZTCOutlets::setSettings(const ZTSSettings& acrSettings) {
     const std::lock_guard lLock(mMutex);
     mNewSettings = acrSettings;
     mHasWork = true;
+    mWake.notify_all();
+}
+
+void ZTCOutlets::openHistory() {
+    const std::lock_guard lLock(mMutex);
+    mHasWork = mHasWork || !mMayRead;
+    mMayRead = true;
     mWake.notify_all();
 }
 
@@ -93,7 +104,7 @@ bool ZTCOutlets::waitForWork() {
     const bool lHasReaders = mpServer != nullptr && mpServer->hasStreams();
     std::unique_lock lLock(mMutex);
     const auto lIsDue = [this] { return mIsStopping || mHasWork; };
-    if (!mServerProblem.empty() || !mNdjsonProblem.empty()) {
+    if (!mServerProblem.empty() || !mNdjsonProblem.empty() || !mHistoryProblem.empty()) {
         mWake.wait_for(lLock, scServerPause, lIsDue);
     } else if (lHasReaders) {
         mWake.wait_for(lLock, scFeedPeriod, lIsDue);
@@ -159,11 +170,26 @@ void ZTCOutlets::openServer() {
     }
 }
 
-void ZTCOutlets::openHistory() {
-    if (mpHistory == nullptr) {
-        mpHistory = std::make_unique<ZTCHistory>(mSetup.mStateDirectory);
-        mNdjsonSeq.reset();
-        mStreamSeq.reset();
+/// What needs the history; without it nothing is lost, it comes later.
+void ZTCOutlets::feedHistory() {
+    {
+        const std::lock_guard lLock(mMutex);
+        if (!mMayRead) {
+            return;
+        }
+    }
+    try {
+        if (mpHistory == nullptr) {
+            mpHistory = std::make_unique<ZTCHistory>(mSetup.mStateDirectory);
+            mNdjsonSeq.reset();
+            mStreamSeq.reset();
+        }
+        feedStream();
+        feedNdjson();
+        report(mHistoryProblem, "", "the outlets' reading of the history");
+    } catch (const ZTCStoreEx& lrEx) {
+        mpHistory.reset();  // it may have been replaced
+        report(mHistoryProblem, std::string("the outlets cannot read the history: ") + lrEx.what(), "");
     }
 }
 
@@ -182,15 +208,9 @@ void ZTCOutlets::giveSeries(ZTSMetricFacts& arFacts) {
 }
 
 void ZTCOutlets::feed() {
-    try {
-        openHistory();
-        feedStream();
-        feedNdjson();
-        if (steady_clock::now() >= mNextMetrics) {
-            writeMetrics();
-        }
-    } catch (const ZTCStoreEx&) {
-        mpHistory.reset();  // not there yet, or replaced: `status` says what is wrong with it
+    feedHistory();
+    if (steady_clock::now() >= mNextMetrics) {
+        writeMetrics();
     }
 }
 

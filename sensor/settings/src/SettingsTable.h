@@ -46,6 +46,6 @@ struct ZTSKey {
 std::span<const ZTSKey> settingsTable();
 
 /// Whether the outputs of all [[warn]] tables exist.
-inline constexpr bool gcHasWarnOutput = false;
+inline constexpr bool gcHasWarnOutput = true;
 
 #endif

@@ -11,6 +11,7 @@
 /// Exit statuses that do not come from the table of states.
 enum ZTETavikExit : int {
     ZTTX_Done = 0,
+    ZTTX_HookFailed = 1,   ///< of warn --test
     ZTTX_WrongUse = 2,     ///< the command line or the configuration
     ZTTX_NotKnown = 3,     ///< no sensor or no history to ask
     ZTTX_LocalFailure = 4  ///< standard output cannot be written, or the like
@@ -35,6 +36,7 @@ struct ZTSTavikOptions {
     bool mIsWatch = false;
     bool mIsRecords = false;
     bool mIsFollow = false;
+    bool mIsTest = false;  ///< of warn
     std::string mSubject;  ///< of explain
     std::string mMark;
     ZTSFilterTexts mFilter;
@@ -57,5 +59,6 @@ int runPorts(const ZTSTavikOptions& acrOptions);
 int runExplain(const ZTSTavikOptions& acrOptions);
 int runCheck(const ZTSTavikOptions& acrOptions);
 int runMark(const ZTSTavikOptions& acrOptions);
+int runWarn(const ZTSTavikOptions& acrOptions);
 
 #endif

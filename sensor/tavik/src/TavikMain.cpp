@@ -87,6 +87,8 @@ static int sRun(int aCount, const char* const* appArguments) {
     lAdd("mark", "Give this moment a name, for --since and --until", runMark)
         ->add_option("NAME", lOptions.mMark, "The name; an earlier mark of that name moves")
         ->required();
+    lAdd("warn", "Run every warning's hook with a test record: 0 all did their work, 1 one failed", runWarn)
+        ->add_flag("--test", lOptions.mIsTest, "Run them now");
 
     try {
         lApp.parse(aCount, appArguments);

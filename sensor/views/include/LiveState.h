@@ -21,7 +21,9 @@
 ///      "losses": {"since": "…", "refused": {"total-limit": 0}, "dropped": 0, "library": [{"name": "…", "count": 0}]},
 ///      "paths": "96 LUNs, 8 paths each, all running",
 ///      "troubles": [{"id": "path-lost", "title": "PATH LOST", "subject": "array7 ctrl-B  50:…:34  from host8",
-///                    "status": ["…"], "action": ["…"], "see": "tavik explain 118"}]}
+///                    "status": ["…"], "action": ["…"], "see": "tavik explain 118"}],
+///      "warnings": [{"kind": "queue-full", "text": "queue-full of array7 ctrl-A: 120 within 300.0 s", "since": "…",
+///                    "given": 2, "next": "…"}]}
 ///
 /// - `keeper.state`: `starting`, `running`, `waiting-for-adapters` (also for a library: `endReason` tells them apart),
 ///   `waiting-to-restart` or `stopping`. `since`: when that state began. `nextStart`: when the agent is started next,
@@ -42,6 +44,11 @@
 /// was
 ///   judged and has none.
 ///
+/// - `warnings` are the open ones of the configuration's rules: `given` so often, `next` time if the trouble goes on. A
+///   hook that failed is one of the kind `hook` until it works again.
+///
+/// `{"request":"warn-test"}` runs every hook with a test record. The answer comes when all have ended:
+/// `{"hooks":[{"kind":"queue-full","run":["/usr/local/bin/tell"],"problem":null}]}`.
 /// `{"request":"mark","name":"before update"}` is answered by `{"mark":"before update","time":"…"}` once it is stored.
 /// A request that cannot be served is answered by `{"error":"…"}`, one line for people.
 #ifndef SENSOR_VIEWS_INCLUDE_LIVESTATE_H
@@ -157,6 +164,15 @@ struct ZTSTroubleText {
     std::string mSee;
 };
 
+/// A warning that is open.
+struct ZTSLiveWarning {
+    std::string mKind;
+    std::string mText;  ///< for people
+    std::optional<ZTCHistoryTime> mSince;
+    std::optional<std::uint64_t> mGiven;
+    std::optional<ZTCHistoryTime> mNext;
+};
+
 struct ZTSLiveState {
     std::string mStoreId;
     std::optional<ZTCHistoryTime> mNow;
@@ -169,6 +185,7 @@ struct ZTSLiveState {
     std::optional<ZTSLiveLosses> mLosses;
     std::string mPaths;
     std::optional<std::vector<ZTSTroubleText>> mTroubles;
+    std::optional<std::vector<ZTSLiveWarning>> mWarnings;
     std::vector<std::string> mProblems;  ///< members that could not be read, one line each
 };
 

@@ -252,6 +252,16 @@ static ZTSTroubleText sReadTrouble(const ZTCLiveObject& acrObject) {
     return lTrouble;
 }
 
+static ZTSLiveWarning sReadWarning(const ZTCLiveObject& acrObject) {
+    ZTSLiveWarning lWarning;
+    acrObject.read("kind", lWarning.mKind);
+    acrObject.read("text", lWarning.mText);
+    acrObject.read("since", lWarning.mSince);
+    acrObject.read("given", lWarning.mGiven);
+    acrObject.read("next", lWarning.mNext);
+    return lWarning;
+}
+
 static void sReadKeeper(const ZTCLiveObject& acrObject, ZTSLiveKeeper& arKeeper) {
     acrObject.read("pid", arKeeper.mPid);
     acrObject.read("state", arKeeper.mState, scKeeperStates);
@@ -303,5 +313,6 @@ ZTSLiveState readLiveState(const ZTCJson& acrDocument) {
     }
     lRoot.read("paths", lState.mPaths);
     lRoot.readList("troubles", lState.mTroubles, sReadTrouble);
+    lRoot.readList("warnings", lState.mWarnings, sReadWarning);
     return lState;
 }

@@ -23,6 +23,7 @@ struct ZTSApiSources {
     std::string mStateDirectory;  ///< holds the history
     std::string mHost;            ///< this host's name
     std::string mVersion;
+    std::function<bool()> mMayRead;             ///< whether the history may be opened already
     std::function<nlohmann::json()> mReadLive;  ///< the running sensor's live state; called on the server's thread
     /// Gives series of their own to ports that are new in the facts, and fills in all that have one. Called by any of
     /// those who ask for metrics.

@@ -59,6 +59,9 @@ ZTCApi::~ZTCApi() = default;
 
 const ZTCHistory& ZTCApi::openHistory() {
     if (mpHistory == nullptr) {
+        if (!mSources.mMayRead()) {
+            throw ZTCNoHistoryEx("the sensor has not opened its history yet");
+        }
         mpHistory = std::make_unique<ZTCHistory>(mSources.mStateDirectory);
     }
     return *mpHistory;

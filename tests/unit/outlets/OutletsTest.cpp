@@ -42,6 +42,7 @@ protected:
                                     mLines += acrLine + "\n";
                                 }},
             acrSettings);
+        mpOutlets->openHistory();
         return *mpOutlets;
     }
     std::string value(const std::string& acrName) {

@@ -23,6 +23,7 @@ protected:
             lSources.mStateDirectory = mDirectory.path();
             lSources.mHost = "db07";
             lSources.mVersion = "9.8.7";
+            lSources.mMayRead = [] { return true; };
             lSources.mReadLive = [this] { return mLive; };
             lSources.mGiveSeries = [this](ZTSMetricFacts& arFacts) {
                 mSeriesPorts.extend(arFacts.mTotals, mMostSeries);
