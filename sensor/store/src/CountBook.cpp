@@ -27,14 +27,22 @@ ZTCCountBook::ZTCCountBook(ZTCDatabase& arDatabase)
 
 void ZTCCountBook::clear() {
     mMinutes.clear();
+    ++mSerial;
 }
 
-void ZTCCountBook::add(const ZTSCountKey& acrKey, std::int64_t aBegin, std::int64_t aEnd, std::uint64_t aOccurrences) {
+void ZTCCountBook::add(const ZTSCountKey& acrKey, ZTSCountPlace& arPlace, std::int64_t aBegin, std::int64_t aEnd,
+                       std::uint64_t aOccurrences) {
     const std::int64_t lMinute = getSlot(aEnd, gcMinuteMicroseconds);
-    const auto [lPlace, lIsNew] = mMinutes.try_emplace({.mSlot = lMinute, .mKey = acrKey});
-    Count& lrCount = lPlace->second;
+    if (arPlace.mSerial != mSerial || arPlace.mMinute != lMinute) {
+        const auto [lPlace, lIsNew] = mMinutes.try_emplace({.mSlot = lMinute, .mKey = acrKey});
+        arPlace = {.mpCount = &lPlace->second, .mMinute = lMinute, .mSerial = mSerial};
+        if (lIsNew) {
+            lPlace->second.mLast = aEnd;
+        }
+    }
+    Count& lrCount = *arPlace.mpCount;
     lrCount.mCount += aOccurrences;
-    lrCount.mLast = lIsNew ? aEnd : std::max(lrCount.mLast, aEnd);
+    lrCount.mLast = std::max(lrCount.mLast, aEnd);
     if (aBegin != aEnd && getSlot(aBegin, gcMinuteMicroseconds) != lMinute) {
         lrCount.mSpread += aOccurrences;
         if (getSlot(aBegin, gcDayMicroseconds) != getSlot(aEnd, gcDayMicroseconds)) {
@@ -74,5 +82,5 @@ void ZTCCountBook::flush() {
     for (const auto& [lrKey, lrCount] : lDays) {
         mAddTotal.run(lrKey.mKey.mInitiator, lrKey.mKey.mKind, lrKey.mKey.mPort, lrCount.mCount, lrCount.mLast);
     }
-    mMinutes.clear();
+    clear();
 }

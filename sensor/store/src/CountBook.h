@@ -29,13 +29,30 @@ struct ZTSCountKey {
     auto operator<=>(const ZTSCountKey&) const = default;
 };
 
+/// What was counted in one slot.
+struct ZTSSlotCount {
+    std::uint64_t mCount = 0;
+    std::uint64_t mSpread = 0;     ///< of records that began before the slot
+    std::uint64_t mDaySpread = 0;  ///< of a minute: of records that began before its day
+    std::int64_t mLast = 0;
+};
+
+/// Where the last record of a key was counted: the next one of the same minute needs no search.
+struct ZTSCountPlace {
+    ZTSSlotCount* mpCount = nullptr;
+    std::int64_t mMinute = 0;
+    std::uint64_t mSerial = 0;  ///< of the book's content
+};
+
 class ZTCCountBook {
 public:
     explicit ZTCCountBook(ZTCDatabase& arDatabase);
 
     void clear();
     /// A record within one slot counts there; any other in the slot of its last time, marked as spread.
-    void add(const ZTSCountKey& acrKey, std::int64_t aBegin, std::int64_t aEnd, std::uint64_t aOccurrences);
+    /// @param arPlace  kept by the caller, one for each key
+    void add(const ZTSCountKey& acrKey, ZTSCountPlace& arPlace, std::int64_t aBegin, std::int64_t aEnd,
+             std::uint64_t aOccurrences);
     void flush();
 
 private:
@@ -48,18 +65,14 @@ private:
     struct Hash {
         std::size_t operator()(const SlotKey& acrKey) const;
     };
-    struct Count {
-        std::uint64_t mCount = 0;
-        std::uint64_t mSpread = 0;     ///< of records that began before the slot
-        std::uint64_t mDaySpread = 0;  ///< of a minute: of records that began before its day
-        std::int64_t mLast = 0;
-    };
+    using Count = ZTSSlotCount;
     using Sorted = std::vector<std::pair<SlotKey, Count>>;
 
     static Sorted makeDays(const Sorted& acrMinutes);
     static void write(const Sorted& acrSlots, ZTCStatement& arStatement);
 
     std::unordered_map<SlotKey, Count, Hash> mMinutes;
+    std::uint64_t mSerial = 1;  ///< places of earlier ones point to nothing
     ZTCStatement mAddMinute, mAddDay, mAddTotal;
 };
 

@@ -19,8 +19,10 @@ static void sSetBit(ZTCBits256& arBits, std::uint32_t aBit) {
 /// The bit field as words; bits from the count on are left out.
 static ZTCBits256 sReadBits(std::span<const std::uint8_t> aBytes, std::uint32_t aBitCount) {
     ZTCBits256 lBits{};
-    for (std::uint32_t i = 0; i < gcBitFieldBytes; ++i) {
-        lBits[i / 8] |= static_cast<std::uint64_t>(aBytes[i]) << (8 * (i % 8));
+    static_assert(sizeof(lBits) == gcBitFieldBytes);
+    std::memcpy(lBits.data(), aBytes.data(), gcBitFieldBytes);
+    if constexpr (std::endian::native == std::endian::big) {
+        std::ranges::transform(lBits, lBits.begin(), [](std::uint64_t aWord) { return __builtin_bswap64(aWord); });
     }
     for (std::uint32_t i = 0; i < 4; ++i) {
         const std::uint32_t lFirst = 64 * i;

@@ -104,8 +104,9 @@ void ZTCEpisodeBook::noteGrowth(Open& arEpisode, std::int64_t aNow) {
     }
 }
 
-void ZTCEpisodeBook::add(const ZTSEpisodeKey& acrKey, const ZTSKindShape* apShape, const ZTSRecordView& acrRecord,
-                         std::int64_t aBegin, std::int64_t aEnd, std::int64_t aNow) {
+ZTSCountPlace& ZTCEpisodeBook::add(const ZTSEpisodeKey& acrKey, const ZTSKindShape* apShape,
+                                   const ZTSRecordView& acrRecord, std::int64_t aBegin, std::int64_t aEnd,
+                                   std::int64_t aNow) {
     auto lPlace = mOpen.find(acrKey);
     if (lPlace != mOpen.end() && aBegin - lPlace->second->mLast > mGap) {
         closeAt(lPlace);
@@ -130,6 +131,7 @@ void ZTCEpisodeBook::add(const ZTSEpisodeKey& acrKey, const ZTSKindShape* apShap
         lpEpisode->mBody.add(*apShape, acrRecord.mEventData);
     }
     lpEpisode->mWindow.add(lpEpisode->mRecords++, mrCounter.mNextSeq++, acrRecord.mBytes, mRecordsPerEnd);
+    return lpEpisode->mCountPlace;
 }
 
 std::size_t ZTCEpisodeBook::close(std::int64_t aNow, const NothingHeld& acrNothingHeld) {

@@ -9,6 +9,7 @@
 #include <vector>
 
 #include "sensor/client/include/RecordView.h"
+#include "sensor/store/src/CountBook.h"
 #include "sensor/store/src/Counter.h"
 #include "sensor/store/src/Database.h"
 #include "sensor/store/src/EpisodeBody.h"
@@ -42,9 +43,9 @@ public:
     void setLimits(std::int64_t aGapMicroseconds, std::uint32_t aRecordsPerEnd);
 
     /// Adds a record to the open episode of its key, or opens one. `apShape` is null for data that do not fit. Times
-    /// are in microseconds since the epoch.
-    void add(const ZTSEpisodeKey& acrKey, const ZTSKindShape* apShape, const ZTSRecordView& acrRecord,
-             std::int64_t aBegin, std::int64_t aEnd, std::int64_t aNow);
+    /// are in microseconds since the epoch. Returns the place of the key's counts, good until the next call.
+    ZTSCountPlace& add(const ZTSEpisodeKey& acrKey, const ZTSKindShape* apShape, const ZTSRecordView& acrRecord,
+                       std::int64_t aBegin, std::int64_t aEnd, std::int64_t aNow);
 
     /// Returns how many were closed. An episode whose last event lies far ahead of the clock, which has then been set
     /// back, is closed when the gap has passed since that was first seen.
@@ -71,6 +72,7 @@ private:
         std::uint32_t mFlags = 0;
         bool mIsStored = false;
         bool mIsDirty = false;
+        ZTSCountPlace mCountPlace;
         ZTCEpisodeBody mBody;
         ZTCRecordWindow mWindow;
     };

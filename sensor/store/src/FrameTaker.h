@@ -2,6 +2,8 @@
 #ifndef SENSOR_STORE_SRC_FRAMETAKER_H
 #define SENSOR_STORE_SRC_FRAMETAKER_H
 
+#include <vector>
+
 #include "sensor/client/include/RecordView.h"
 #include "sensor/store/include/Store.h"
 #include "sensor/store/src/CountBook.h"
@@ -27,6 +29,8 @@ public:
     void visitList(std::string_view aInitiatorKey) override;
     void visitRecord(const ZTSRecordView& acrRecord) override;
 
+    /// Adds to the ledger what it has not got yet. The last call.
+    void finish();
     const ZTSTakenIn& getTakenIn() const { return mTaken; }
     std::optional<ZTEResponseOutcome> getOutcome() const { return mOutcome; }
 
@@ -40,6 +44,7 @@ private:
     std::optional<ZTEResponseOutcome> mOutcome;
     std::uint32_t mInitiator = 0;
     ZTSTakenIn mTaken;
+    std::vector<std::uint64_t> mListCounts;  ///< occurrences of this list, by row of the table of shapes
 };
 
 #endif

@@ -1,5 +1,6 @@
 #include "sensor/store/src/KindShapes.h"
 
+#include <algorithm>
 #include <array>
 #include <cstddef>
 
@@ -121,13 +122,20 @@ std::span<const ZTSKindShape> getKindShapes() {
     return scShapes;
 }
 
-const ZTSKindShape* findKindShape(ZTCKindKey aKind) {
-    for (const ZTSKindShape& lrShape : scShapes) {
-        if (lrShape.getKey() == aKind) {
-            return &lrShape;
-        }
+/// The number of each kind's row plus 1, by key; 0: no row. Asked for each record.
+static constexpr auto scRowOfKey = [] {
+    constexpr ZTCKindKey lcMost =
+        std::ranges::max(scShapes, {}, [](const ZTSKindShape& acrShape) { return acrShape.getKey(); }).getKey();
+    std::array<std::uint8_t, lcMost + 1> lRows{};
+    for (std::size_t i = 0; i < scShapes.size(); ++i) {
+        lRows[scShapes[i].getKey()] = static_cast<std::uint8_t>(i + 1);
     }
-    return nullptr;
+    return lRows;
+}();
+
+const ZTSKindShape* findKindShape(ZTCKindKey aKind) {
+    const std::size_t lRow = aKind < scRowOfKey.size() ? scRowOfKey[aKind] : 0;
+    return lRow == 0 ? nullptr : &scShapes[lRow - 1];
 }
 
 static bool sIsName(ZTEIdentityForm aForm) {

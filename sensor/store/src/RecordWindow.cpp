@@ -1,12 +1,20 @@
 #include "sensor/store/src/RecordWindow.h"
 
 #include <algorithm>
+#include <cstring>
 #include <string>
 
 /// No record of an agent comes near this: its event data have a limit of their own.
 static constexpr std::uint64_t scMostRecordBytes = 64ULL * 1024 * 1024;
 
+/// Records for which there is room from the first one on.
+static constexpr std::size_t scRoom = 16;
+
 void ZTCPendingRecords::add(std::uint64_t aSeq, std::span<const std::uint8_t> aRecord) {
+    if (mEntries.empty()) {
+        mEntries.reserve(scRoom);
+        mBytes.reserve(scRoom * aRecord.size());
+    }
     mEntries.push_back({.mSeq = aSeq, .mOffset = mBytes.size(), .mSize = aRecord.size()});
     mBytes.insert(mBytes.end(), aRecord.begin(), aRecord.end());
 }
@@ -26,16 +34,31 @@ void ZTCPendingRecords::keepLast(std::size_t aCount) {
 /// Equal bytes that end a run of different ones: fewer cost no less when they are stored with it.
 static constexpr std::size_t scRunBreak = 3;
 
+/// How many bytes from this place on are the same.
+static std::size_t sCountSame(std::span<const std::uint8_t> aOne, std::span<const std::uint8_t> aOther,
+                              std::size_t aFrom) {
+    std::size_t lPlace = aFrom;
+    for (std::uint64_t lOne, lOther; lPlace + sizeof(lOne) <= aOne.size(); lPlace += sizeof(lOne)) {
+        std::memcpy(&lOne, aOne.data() + lPlace, sizeof(lOne));
+        std::memcpy(&lOther, aOther.data() + lPlace, sizeof(lOther));
+        if (lOne != lOther) {
+            break;
+        }
+    }
+    while (lPlace < aOne.size() && aOne[lPlace] == aOther[lPlace]) {
+        ++lPlace;
+    }
+    return lPlace - aFrom;
+}
+
 /// Appends what differs. Both have the same size.
 static void sAppendDifferences(ZTCStoreBytes& arChunk, std::span<const std::uint8_t> aBefore,
                                std::span<const std::uint8_t> aRecord) {
     std::size_t lPlace = 0;
     while (lPlace < aRecord.size()) {
-        const std::size_t lStart = lPlace;
-        while (lPlace < aRecord.size() && aRecord[lPlace] == aBefore[lPlace]) {
-            ++lPlace;
-        }
-        appendVarint(arChunk, lPlace - lStart);
+        const std::size_t lSame = sCountSame(aRecord, aBefore, lPlace);
+        appendVarint(arChunk, lSame);
+        lPlace += lSame;
         if (lPlace == aRecord.size()) {
             return;
         }
@@ -56,15 +79,20 @@ ZTCStoreBytes ZTCPendingRecords::encode() const {
     ZTCStoreBytes lChunk;
     lChunk.reserve(mEntries.empty() ? 0 : 2 * mEntries.front().mSize + 16 * mEntries.size());
     std::uint64_t lSeqBefore = 0;
-    ZTCStoreBytes lBefore;
+    std::span<const std::uint8_t> lBefore;
+    ZTCStoreBytes lResized;
     for (const Entry& lrEntry : mEntries) {
         appendVarint(lChunk, lrEntry.mSeq - lSeqBefore);
         appendVarint(lChunk, lrEntry.mSize);
         lSeqBefore = lrEntry.mSeq;
-        lBefore.resize(lrEntry.mSize);
+        if (lBefore.size() != lrEntry.mSize) {
+            lResized.assign(lBefore.begin(), lBefore.end());
+            lResized.resize(lrEntry.mSize);
+            lBefore = lResized;
+        }
         const auto lRecord = std::span(mBytes).subspan(lrEntry.mOffset, lrEntry.mSize);
         sAppendDifferences(lChunk, lBefore, lRecord);
-        lBefore.assign(lRecord.begin(), lRecord.end());
+        lBefore = lRecord;
     }
     return lChunk;
 }

@@ -153,6 +153,7 @@ ZTSTakenIn ZTCStore::Implementation::takeIn(std::uint64_t aNumber, const std::st
                          aNow);
     std::size_t lUnreadBytes = 0;
     const std::optional<ZTCDecodeEx> lProblem = visitResponse(aBody, lTaker, lUnreadBytes);
+    lTaker.finish();
     ZTSTakenIn lTaken = lTaker.getTakenIn();
     const std::string lFrame = "frame " + std::to_string(aNumber) + ": ";
     if (lProblem) {
