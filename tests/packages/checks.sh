@@ -37,7 +37,8 @@ wait_until() {
   done
 }
 
-is_collecting() { tavik status; }
+# Also with losses of the last day, as after a kill.
+is_collecting() { [ "$(tavik --json status | jq .exit)" -le 1 ]; }
 # has_state STATE: the word for Tavik's state, as --json names it.
 has_state() { [ "$(tavik --json status | jq -r .state)" = "$1" ]; }
 # occurrences KIND: of the whole history.

@@ -18,7 +18,7 @@ said_lately() { journalctl -b -u tavik --since -1min | grep -q -F -- "$1"; }
 
 keeper_pid() { systemctl show -p MainPID --value tavik; }
 agent_pid() { cat /run/tavik/agent/qrv-tvk.pid; }
-collector_pid() { pgrep -x tavik-collector -P "$(keeper_pid)" || pgrep -f /libexec/tavik/tavik-collector -P "$(keeper_pid)"; }
+collector_pid() { pgrep -f /libexec/tavik/tavik-collector -P "$(keeper_pid)"; }
 pids() { pgrep -u tavik; }
 is_other_agent() { [ -s /run/tavik/agent/qrv-tvk.pid ] && [ "$(agent_pid)" != "$1" ]; }
 

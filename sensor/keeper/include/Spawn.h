@@ -34,6 +34,10 @@ struct ZTSProcess {
 /// process has one thread.
 ZTSProcess spawn(const ZTSSpawn& acrSpawn);
 
+/// Gives up the effective and the ambient capabilities of this process. The permitted ones stay, for programs that are
+/// started with ZTPV_PassOn. Does nothing as root. Throws ZTCSystemCallEx.
+void keepCapabilitiesForOthers();
+
 /// A descriptor that tells the end of any process; not open where there is no such process.
 ZTCFileDescriptor openPidFd(pid_t aPid);
 

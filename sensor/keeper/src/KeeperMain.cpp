@@ -7,6 +7,7 @@
 #include "sensor/client/include/ClientErrors.h"
 #include "sensor/keeper/include/HostWorld.h"
 #include "sensor/keeper/include/KeeperLoop.h"
+#include "sensor/keeper/include/Spawn.h"
 
 enum ZTEExitStatus { ZTEX_Done = 0, ZTEX_Failed = 1, ZTEX_BadSettings = 2 };
 
@@ -37,6 +38,7 @@ static ZTEExitStatus sRun(const std::string& acrConfigOption, bool aIsCheck) {
     if (aIsCheck) {
         return ZTEX_Done;
     }
+    keepCapabilitiesForOthers();
     const ZTCFileDescriptor lSignals = openSignals();
     ZTCHostWorld lWorld(lReading, acrConfigOption);
     return static_cast<ZTEExitStatus>(runKeeper(lWorld, lSignals));

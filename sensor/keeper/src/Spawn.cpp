@@ -123,6 +123,21 @@ ZTSProcess spawn(const ZTSSpawn& acrSpawn) {
     throw ZTCSystemCallEx("cannot start " + acrSpawn.mProgram, lErrno);
 }
 
+void keepCapabilitiesForOthers() {
+    if (geteuid() == 0) {
+        return;
+    }
+    ZTSCapabilities lOwn;
+    bool lIsDone = prctl(PR_CAP_AMBIENT, PR_CAP_AMBIENT_CLEAR_ALL, 0, 0, 0) == 0 && lOwn.get();
+    for (__user_cap_data_struct& lrWord : lOwn.mData) {
+        lrWord.effective = 0;
+    }
+    lIsDone = lIsDone && lOwn.set();
+    if (!lIsDone) {
+        throw ZTCSystemCallEx("cannot give up the effective capabilities", errno);
+    }
+}
+
 ZTCFileDescriptor openPidFd(pid_t aPid) {
     return ZTCFileDescriptor(static_cast<int>(syscall(SYS_pidfd_open, aPid, 0)));  // always close-on-exec
 }

@@ -3,7 +3,10 @@
 #include <fcntl.h>
 #include <gmock/gmock.h>
 #include <gtest/gtest.h>
+#include <linux/capability.h>
 #include <poll.h>
+#include <sys/prctl.h>
+#include <sys/syscall.h>
 #include <sys/wait.h>
 #include <unistd.h>
 
@@ -68,6 +71,44 @@ TEST_F(Spawn, PassingOnGivesTheCapabilitiesThatThisProcessHas) {
     const std::size_t lPosition = lOwn.find("CapPrm:");
     EXPECT_EQ(runShell("grep CapPrm /proc/$$/status", ZTPV_PassOn),
               lOwn.substr(lPosition, lOwn.find('\n', lPosition) + 1 - lPosition));
+}
+
+/// In a new process: what root leaves an ordinary user, all of it effective.
+static bool sBecomeOrdinaryUser() {
+    if (geteuid() != 0) {
+        return true;
+    }
+    __user_cap_header_struct lHeader{.version = _LINUX_CAPABILITY_VERSION_3, .pid = 0};
+    __user_cap_data_struct lData[_LINUX_CAPABILITY_U32S_3] = {};
+    if (prctl(PR_SET_KEEPCAPS, 1, 0, 0, 0) != 0 || setresuid(65534, 65534, 65534) != 0 ||
+        syscall(SYS_capget, &lHeader, lData) != 0) {
+        return false;
+    }
+    for (__user_cap_data_struct& lrWord : lData) {
+        lrWord.effective = lrWord.permitted;
+    }
+    return syscall(SYS_capset, &lHeader, lData) == 0 &&
+           readFile("/proc/self/status").find("CapEff:\t0000000000000000") == std::string::npos;
+}
+
+TEST_F(Spawn, CapabilitiesThatAreKeptForOthersArePermittedAndNotEffective) {
+    const pid_t lChild = fork();
+    if (lChild == 0) {
+        if (!sBecomeOrdinaryUser()) {
+            _exit(2);
+        }
+        const std::string lBefore = readFile("/proc/self/status");
+        keepCapabilitiesForOthers();
+        const std::string lAfter = readFile("/proc/self/status");
+        const std::string lPermitted = lBefore.substr(lBefore.find("CapPrm:"), 24);
+        const bool lIsDone = lAfter.find(lPermitted) != std::string::npos &&
+                             lAfter.find("CapEff:\t0000000000000000") != std::string::npos &&
+                             lAfter.find("CapAmb:\t0000000000000000") != std::string::npos;
+        _exit(lIsDone ? 0 : 1);
+    }
+    int lStatus = -1;
+    ASSERT_EQ(waitpid(lChild, &lStatus, 0), lChild);
+    EXPECT_EQ(lStatus, 0);
 }
 
 TEST_F(Spawn, OnlyTheStandardStreamsAndWhatIsHandedOnAreOpen) {
