@@ -86,6 +86,7 @@ expect_true "restart" systemctl restart tavik
 expect_true "the textfile" wait_until 20 grep -q '^tavik_agent_up 1' /var/lib/prometheus/node-exporter/tavik.prom
 expect "the file's owner" "tavik:tavik" "$(stat -c %U:%G /var/lib/prometheus/node-exporter/tavik.prom)"
 ip address add 192.0.2.1/32 dev lo
+expect_true "collects" wait_until 20 is_collecting
 expect "an answer on another address" "HTTP/1.1 200 OK" "$(http_status 192.0.2.1 9632 /healthz)"
 rm /etc/systemd/system/tavik.service.d/textfile.conf /etc/systemd/system/tavik.service.d/http-public.conf
 rm -r /var/lib/prometheus
@@ -122,7 +123,7 @@ expect "processes" "" "$(pgrep -u tavik)"
 systemctl start tavik
 rm -r /etc/systemd/system/tavik.service.d /opt/scenario.kpm
 expect_true "purge while it runs" dpkg --purge tavik tavik-sim
-expect "processes" "" "$(pgrep 'tavik-sensor|tavik-collecto|qrv-tvk')"
+expect "processes" "" "$(pgrep -f '/tavik-sensor|/tavik-collector|/qrv-tvk')"
 expect "the user" "" "$(getent passwd tavik)"
 expect "files" "" "$(ls -d /etc/tavik /run/tavik /var/lib/tavik /var/log/tavik /etc/systemd/system/*/tavik.service 2>/dev/null)"
 

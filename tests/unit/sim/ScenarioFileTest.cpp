@@ -39,10 +39,10 @@ TEST_P(ShippedScenario, Parses) {
 }
 
 INSTANTIATE_TEST_SUITE_P(Files, ShippedScenario,
-                         testing::Values<std::string>("demo.kpm", "storm.kpm", "no-adapters.kpm", "old-driver.kpm",
-                                                      "init-fails.kpm", "info-fails.kpm", "registration-fails.kpm",
-                                                      "adapters-come-and-go.kpm", "malformed-events.kpm",
-                                                      "states-and-losses.kpm"));
+                         testing::Values<std::string>("demo.kpm", "day.kpm", "storm.kpm", "no-adapters.kpm",
+                                                      "old-driver.kpm", "init-fails.kpm", "info-fails.kpm",
+                                                      "registration-fails.kpm", "adapters-come-and-go.kpm",
+                                                      "malformed-events.kpm", "states-and-losses.kpm"));
 
 TEST(ScenarioFile, TheDemoShowsEveryKindOnEveryAdapter) {
     const ZTSSimScenario lScenario = parseSimScenario(readSimFile(sShipped("demo.kpm")));
