@@ -87,6 +87,14 @@ TEST_F(AskScheduleTest, AfterABellItAsksAtLeastEverySecondUntilNothingIsHeld) {
     EXPECT_EQ(mSchedule.getNextLook(), mNow + seconds(5));
 }
 
+TEST_F(AskScheduleTest, AfterABellAQuickAnswerIsNotFollowedByARequestAtOnce) {
+    look(false);
+    mSchedule.noteBell(mNow);
+    look(true);
+    answerAfter(milliseconds(20));
+    EXPECT_EQ(mSchedule.getNextLook(), mNow + milliseconds(480));
+}
+
 TEST_F(AskScheduleTest, ABellDuringAnAnswerIsHeardAfterIt) {
     look(false);
     mSchedule.noteBell(mNow);

@@ -57,3 +57,10 @@ TEST_F(LossWindowTest, WhatIsOlderThanADayIsForgotten) {
     EXPECT_EQ(mWindow.get(mBegin + hours(26)).mSince, mBegin + hours(2));
     EXPECT_EQ(refused(mBegin + hours(50)), 0U);
 }
+
+TEST_F(LossWindowTest, WhatWasLostLateInAnHourIsNotForgottenWithTheHoursBegin) {
+    mWindow.note(page("a", 10, mBegin), mBegin + minutes(2));
+    mWindow.note(page("a", 15, mBegin), mBegin + minutes(50));
+    EXPECT_EQ(refused(mBegin + hours(24) + minutes(30)), 15U);
+    EXPECT_EQ(refused(mBegin + hours(25) + minutes(3)), 0U);
+}

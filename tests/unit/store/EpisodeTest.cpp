@@ -162,6 +162,38 @@ TEST_F(EpisodeTest, ChangesAreOneAtTheOpeningOneAMinuteWhileItGrowsAndOneAtTheCl
     EXPECT_EQ(changes(lFilter)[0].mCount, 4U);
 }
 
+TEST_F(EpisodeTest, AfterTheClockWasSetBackItsGrowthIsAChangeWithinAMinute) {
+    take({makeQueueFull(gcPortA, gcBase, gcBase)}, gcBase);
+    take({makeQueueFull(gcPortA, gcBase, gcBase)}, gcBase - gcDay);
+    ASSERT_EQ(changes().size(), 1U);
+    take({makeQueueFull(gcPortA, gcBase, gcBase)}, gcBase - gcDay + 60 * gcSecond);
+    EXPECT_EQ(changes().size(), 2U);
+}
+
+TEST_F(EpisodeTest, OfALongEpisodeExactlyTheFirstAndTheLastRecordsAreKept) {
+    mLimits.mRecordsPerEnd = 2;
+    store().setLimits(mLimits);
+    for (std::int64_t i = 0; i < 10; ++i) {
+        take({makeQueueFull(gcPortA, gcBase + i * gcSecond, gcBase + i * gcSecond)}, gcBase + i * gcSecond);
+    }
+    std::vector<std::int64_t> lSeconds;
+    for (const auto& lrRecord : records()) {
+        lSeconds.push_back((toMicroseconds(lrRecord.mFirst) - gcBase) / gcSecond);
+    }
+    EXPECT_EQ(lSeconds, (std::vector<std::int64_t>{0, 1, 8, 9}));
+}
+
+TEST_F(EpisodeTest, ALongEpisodeOfOneFrameKeepsAsManyRecordsAtItsEnd) {
+    mLimits.mRecordsPerEnd = 2;
+    store().setLimits(mLimits);
+    std::vector<ZTSTestRecord> lFrame;
+    for (std::int64_t i = 0; i < 10; ++i) {
+        lFrame.push_back(makeQueueFull(gcPortA, gcBase + i * gcSecond, gcBase + i * gcSecond));
+    }
+    take(lFrame);
+    EXPECT_EQ(records().size(), 4U);
+}
+
 TEST_F(EpisodeTest, NumbersGoOnRisingAfterARestart) {
     take({makeQueueFull(gcPortA, gcBase, gcBase)});
     const ZTSEpisode lBefore = episodes()[0];

@@ -88,6 +88,16 @@ TEST_F(RetentionTest, AClockThatJumpedTakesOneDayAnHourAlsoAcrossRestarts) {
     EXPECT_EQ(episodes().size(), 5U);
 }
 
+TEST_F(RetentionTest, AClockThatWasAheadOnceDoesNotStopTheRetentionThatFollows) {
+    mLimits.mDays = 3;
+    fill(6);
+    retire(gcBase + 4000 * gcDay);
+    ASSERT_EQ(episodes().size(), 5U);
+    closeStore();
+    retire(gcBase + 10 * gcDay);
+    EXPECT_EQ(episodes().size(), 4U);
+}
+
 TEST_F(RetentionTest, AStepDeletesAtMostAsManyRowsAsTheLimitSays) {
     mLimits.mDays = 1;
     mLimits.mStepRows = 10;

@@ -3,7 +3,11 @@
 #include <gtest/gtest.h>
 #include <signal.h>
 #include <sys/resource.h>
+#include <sys/wait.h>
 #include <unistd.h>
+
+#include <ctime>
+#include <set>
 
 #include "tests/unit/os/LogCapture.h"
 #include "tests/unit/system/ForkedProcess.h"
@@ -30,6 +34,32 @@ TEST(SignalWaiter, ASignalFromBeforeTheStartIsNotLost) {
         ZTCSignalWaiter lWaiter;
         lWaiter.start();
         return getStopEvent().waitFor(20000) ? 0 : 1;
+    });
+    EXPECT_EQ(lChild.waitForExit(), 0);
+}
+
+TEST(SignalWaiter, SignalsThatWaitAreHandedOnEachAsItIs) {
+    ZTCForkedProcess lChild([](ZTCForkedProcess&) {
+        ZTCSignalWaiter::blockSignals();
+        kill(getpid(), SIGINT);
+        kill(getpid(), SIGHUP);
+        const pid_t lHeir = fork();
+        if (lHeir == 0) {
+            sigset_t lSignals;
+            sigemptyset(&lSignals);
+            sigaddset(&lSignals, SIGTERM);
+            sigaddset(&lSignals, SIGINT);
+            sigaddset(&lSignals, SIGHUP);
+            const timespec lLong{20, 0};
+            std::multiset<int> lGot;
+            lGot.insert(sigtimedwait(&lSignals, nullptr, &lLong));
+            lGot.insert(sigtimedwait(&lSignals, nullptr, &lLong));
+            _exit(lGot == std::multiset<int>{SIGHUP, SIGINT} ? 0 : 1);
+        }
+        ZTCSignalWaiter::handOnSignals(lHeir);
+        int lStatus = -1;
+        waitpid(lHeir, &lStatus, 0);
+        return lStatus;
     });
     EXPECT_EQ(lChild.waitForExit(), 0);
 }
