@@ -92,6 +92,14 @@ TEST_F(SenseMatcher, SenseDataWrittenBeforeAnOutcomeAreNotItsOwn) {
     EXPECT_EQ(take(), "1:10") << "the same time is not before";
 }
 
+TEST_F(SenseMatcher, SenseDataOfTheTimeOfTheNextOutcomeAreThatOnes) {
+    outcome(1, 100);
+    outcome(1, 200);
+    sense(1, 200, 20);
+    EXPECT_EQ(take(), "1:20");
+    EXPECT_EQ(take(ZTCSenseMatcher::scWait), "1:-");
+}
+
 TEST_F(SenseMatcher, SenseDataOfNoOutcomeAreForgotten) {
     sense(1, 90, 9);
     EXPECT_FALSE(mMatcher.getNextTime().has_value()) << "nobody waits for it";

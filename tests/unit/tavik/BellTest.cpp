@@ -118,6 +118,17 @@ TEST_F(OpenedBell, ARingThatARetrievalOvertookDoesNotSilenceTheNextOne) {
     EXPECT_EQ(0u, takeRings());
 }
 
+TEST_F(OpenedBell, AfterRetrievalsWithoutARefusalOneRefusalRingsOnce) {
+    mBell.open(std::to_string(mDescriptor).c_str());
+    for (int i = 0; i < 5; ++i) {
+        mBell.noteRetrieval();
+    }
+    for (int i = 0; i < 3; ++i) {
+        mBell.ringForRefusal(mBell.getRetrievals());
+    }
+    EXPECT_EQ(1u, takeRings());
+}
+
 TEST_F(OpenedBell, WhatCannotBeOneIsNotUsed) {
     const int lBlocking = eventfd(0, 0);
     const int lFile = open("/dev/null", O_RDWR | O_NONBLOCK);

@@ -301,6 +301,14 @@ TEST_F(StatusPage, ThePagesBehindOneThatFindsNoMemoryFailWithIt) {
     EXPECT_LT(1u, lConsolidated.size()) << "some failures came after the first page";
 }
 
+TEST_F(StatusPage, BytesThatAreAppendedToARecordAreHeldToo) {
+    collect(1, 0xFFFFFFFF);
+    mSystem->makePendingRecord(0, 4);
+    mSystem->appendToPendingRecord(ZTCBytes(8, 0));
+    EXPECT_EQ(4u + 8, page().mHeldBytes);
+    EXPECT_EQ(1u, page().mHeldRecords);
+}
+
 TEST_F(StatusPage, ARetrievalHandsOverAllThatIsHeld) {
     collect(2);
     deliverTemperature(0);
