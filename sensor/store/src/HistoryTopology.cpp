@@ -137,11 +137,11 @@ std::vector<ZTSTopologyChange> ZTCHistory::readTopologyChanges(std::int64_t aFro
     std::vector<ZTSTopologyChange> lChanges;
     for (const auto& [lrKey, lrVersions] : lThings) {
         const ZTSThingRow* lpBefore = nullptr;
-        const auto lVanish = [&](const ZTSThingRow& acrRow) {
+        const auto lVanish = [&, &lrName = lrKey](const ZTSThingRow& acrRow) {
             if (acrRow.mTo && lIsWithin(*acrRow.mTo)) {
                 lChanges.push_back({.mTime = *acrRow.mTo,
-                                    .mThing = lrKey.first,
-                                    .mKey = lrKey.second,
+                                    .mThing = lrName.first,
+                                    .mKey = lrName.second,
                                     .mAttribute = {},
                                     .mBefore = std::string(),
                                     .mAfter = std::nullopt});

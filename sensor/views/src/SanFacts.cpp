@@ -270,8 +270,7 @@ private:
     static void addLunsOnce(ZTSSanTrouble& arTrouble, const std::vector<std::size_t>& acrLuns) {
         arTrouble.mLuns.insert(arTrouble.mLuns.end(), acrLuns.begin(), acrLuns.end());
         std::ranges::sort(arTrouble.mLuns);
-        const auto lRest = std::ranges::unique(arTrouble.mLuns);
-        arTrouble.mLuns.erase(lRest.begin(), lRest.end());
+        arTrouble.mLuns.erase(std::unique(arTrouble.mLuns.begin(), arTrouble.mLuns.end()), arTrouble.mLuns.end());
     }
 
     void addUselessPorts() {
