@@ -1,6 +1,6 @@
-// fill-history DIRECTORY EPISODES: a history of 30 days up to now, with so many episodes of two initiators and twelve
-// remote ports, an outage, a stretch in which a kind was not heard, and two marks. The same events each time; only the
-// times move with the clock.
+// fill-history DIRECTORY EPISODES SYSFS: a history of 30 days up to now, with so many episodes of two initiators and
+// twelve remote ports, an outage, a stretch in which a kind was not heard, and two marks. The same events each time;
+// only the times move with the clock.
 
 #include <algorithm>
 #include <array>
@@ -11,9 +11,11 @@
 #include <map>
 #include <random>
 #include <tuple>
+#include <utility>
 #include <vector>
 
 #include "sensor/store/include/Store.h"
+#include "sensor/topology/include/TopologyScan.h"
 #include "tests/unit/store/Frames.h"
 
 namespace {
@@ -169,6 +171,32 @@ public:
         lTransaction.commit();
     }
 
+    /// The topology of a tree that looks like sysfs. One link was down for an hour of each sixth day, and its counters
+    /// rose before. Since yesterday the remote ports have the states of the tree.
+    void noteTopology(const std::string& acrSysfs, std::int64_t aNow) {
+        ZTCPatientReader lReader;
+        ZTSTopologyRoots lRoots;
+        lRoots.mSysfs = acrSysfs;
+        ZTSTopology lTopology = scanTopology(lRoots, lReader);
+        std::vector<std::string> lStates;
+        for (ZTSTopologyRemotePort& lrPort : lTopology.mRemotePorts) {
+            lStates.push_back(std::exchange(lrPort.mState, "Online").value_or(""));
+        }
+        noteScan(mFrom, lTopology);
+        for (std::int64_t lTime = mFrom + gcDay; lTime < aNow - gcDay; lTime += 6 * gcDay) {
+            noteErrors(lTime - 60 * gcMinute, lTime);
+            lTopology.mInitiators.back().mState = "Linkdown";
+            noteScan(lTime, lTopology);
+            lTopology.mInitiators.back().mState = "Online";
+            noteScan(lTime + 60 * gcMinute, lTopology);
+        }
+        for (std::size_t i = 0; i < lStates.size(); ++i) {
+            lTopology.mRemotePorts[i].mState = lStates[i];
+        }
+        noteScan(aNow - gcDay, lTopology);
+        noteScan(aNow - gcMinute, lTopology);
+    }
+
     void end(std::int64_t aNow) {
         ZTCStoreTransaction lTransaction = mrStore.begin();
         mrStore.endRun(fromMicroseconds(aNow));
@@ -176,6 +204,26 @@ public:
     }
 
 private:
+    void noteScan(std::int64_t aTime, const ZTSTopology& acrTopology) {
+        ZTCStoreTransaction lTransaction = mrStore.begin();
+        mrStore.noteTopology(aTime, acrTopology);
+        lTransaction.commit();
+    }
+    void noteErrors(std::int64_t aFrom, std::int64_t aTo) {
+        std::vector<ZTSCounterSample> lSamples;
+        for (std::int64_t lMinute = aFrom; lMinute < aTo; lMinute += gcMinute) {
+            for (const char* lpCounter : {"invalid_crc_count", "loss_of_sync_count"}) {
+                lSamples.push_back({.mMinute = lMinute / gcMinute * gcMinute,
+                                    .mInitiator = makeName(gcInitiators[1]),
+                                    .mRemotePort = {},
+                                    .mCounter = lpCounter,
+                                    .mDifference = static_cast<std::uint64_t>(1 + (lMinute - aFrom) / gcMinute)});
+            }
+        }
+        ZTCStoreTransaction lTransaction = mrStore.begin();
+        mrStore.noteCounters(lSamples);
+        lTransaction.commit();
+    }
     void noteStates(std::int64_t aTime, ZTEKindState aRscn) {
         std::vector<ZTSKindStateNow> lStates;
         for (const std::uint64_t lInitiator : gcInitiators) {
@@ -192,7 +240,7 @@ private:
     const std::int64_t mFrom;
 };
 
-void fill(const char* apDirectory, std::uint64_t aEpisodes) {
+void fill(const char* apDirectory, std::uint64_t aEpisodes, const char* apSysfs) {
     const std::int64_t lNow = toMicroseconds(getHistoryTime()) / gcMinute * gcMinute;
     const std::int64_t lFrom = lNow - gcDays * gcDay;
     const std::int64_t lOutage = lFrom + 12 * gcDay;
@@ -202,6 +250,7 @@ void fill(const char* apDirectory, std::uint64_t aEpisodes) {
     lFiller.take(plan(aEpisodes * 2 / 5, lFrom, lOutage));
     lFiller.pause(lOutage);
     lFiller.take(plan(aEpisodes - aEpisodes * 2 / 5, lOutage + gcDay / 3, lNow - gcMinute));
+    lFiller.noteTopology(apSysfs, lNow);
     lFiller.end(lNow);
 }
 
@@ -209,14 +258,14 @@ void fill(const char* apDirectory, std::uint64_t aEpisodes) {
 
 int main(int aCount, char** apArguments) {
     std::uint64_t lEpisodes = 0;
-    if (aCount != 3 ||
+    if (aCount != 4 ||
         std::from_chars(apArguments[2], apArguments[2] + std::strlen(apArguments[2]), lEpisodes).ec != std::errc() ||
         lEpisodes < 10) {
-        std::fprintf(stderr, "fill-history DIRECTORY EPISODES: at least 10 episodes\n");
+        std::fprintf(stderr, "fill-history DIRECTORY EPISODES SYSFS: at least 10 episodes\n");
         return 2;
     }
     try {
-        fill(apArguments[1], lEpisodes);
+        fill(apArguments[1], lEpisodes, apArguments[3]);
     } catch (const std::exception& lrEx) {
         std::fprintf(stderr, "fill-history: %s\n", lrEx.what());
         return 1;

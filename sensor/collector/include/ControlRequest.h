@@ -3,6 +3,7 @@
 #define SENSOR_COLLECTOR_INCLUDE_CONTROLREQUEST_H
 
 #include <cstdint>
+#include <optional>
 #include <string>
 
 #include "sensor/collector/include/HistoryWorker.h"
@@ -11,8 +12,9 @@ enum ZTEControlRequest : std::uint8_t { ZTCR_Status, ZTCR_Mark, ZTCR_WarnTest, Z
 
 struct ZTSControlRequest {
     ZTEControlRequest mKind = ZTCR_Wrong;
-    std::string mName;   ///< of a mark
-    std::string mError;  ///< of a wrong request: one line
+    std::string mName;                      ///< of a mark
+    std::string mError;                     ///< of a wrong request: one line
+    std::optional<ZTCHistoryTime> mTime{};  ///< of a mark; absent: now
 };
 
 /// Longest name of a mark in bytes.

@@ -282,7 +282,7 @@ std::optional<std::string> ZTCCollector::serve(std::uint64_t aTicket, const std:
         case ZTCR_Status:
             return describeState();
         case ZTCR_Mark:
-            mHistory.setMark(aTicket, lRequest.mName, getHistoryTime());
+            mHistory.setMark(aTicket, lRequest.mName, lRequest.mTime.value_or(getHistoryTime()));
             return std::nullopt;
         case ZTCR_WarnTest:
             mControl.allow(aTicket, mOutputs.testHooks(aTicket));

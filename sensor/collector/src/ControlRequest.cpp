@@ -41,7 +41,14 @@ ZTSControlRequest parseControlRequest(const std::string& acrLine) {
         return sWrong("a mark's name has 1 to " + std::to_string(gcMaxMarkName) +
                       " bytes without control characters, this one has " + std::to_string(lName.size()));
     }
-    return {.mKind = ZTCR_Mark, .mName = lName, .mError = {}};
+    std::optional<ZTCHistoryTime> lTime;
+    if (lJson.contains("time")) {
+        lTime = lJson["time"].is_string() ? fromRfc3339(lJson["time"].get<std::string>()) : std::nullopt;
+        if (!lTime) {
+            return sWrong("a mark's \"time\" is a text as of RFC 3339");
+        }
+    }
+    return {.mKind = ZTCR_Mark, .mName = lName, .mError = {}, .mTime = lTime};
 }
 
 std::string toErrorJson(const std::string& acrError) {

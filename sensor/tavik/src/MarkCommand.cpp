@@ -2,6 +2,7 @@
 
 #include "sensor/tavik/src/Context.h"
 #include "sensor/tavik/src/ControlClient.h"
+#include "sensor/views/include/FilterText.h"
 #include "sensor/views/include/StatusView.h"
 #include "sensor/views/include/TextTable.h"
 #include "sensor/views/include/TimeText.h"
@@ -26,8 +27,11 @@ static void sCheckName(const std::string& acrName) {
 int runMark(const ZTSTavikOptions& acrOptions) {
     sCheckName(acrOptions.mMark);
     const ZTCContext lContext(acrOptions);
-    const ZTSControlAnswer lAnswer =
-        askSensor(lContext.getSettings().controlPath(), {{"request", "mark"}, {"name", acrOptions.mMark}}, scMarkLimit);
+    nlohmann::json lRequest{{"request", "mark"}, {"name", acrOptions.mMark}};
+    if (!acrOptions.mMarkTime.empty()) {
+        lRequest["time"] = toRfc3339(readPoint(acrOptions.mMarkTime, "--at", {}, getHistoryTime()));
+    }
+    const ZTSControlAnswer lAnswer = askSensor(lContext.getSettings().controlPath(), lRequest, scMarkLimit);
     if (lAnswer.mAnswer != ZTAN_Answered) {
         throw ZTCNotKnownEx("the mark was not set: " + lAnswer.mProblem);
     }

@@ -39,6 +39,7 @@ struct ZTSTavikOptions {
     bool mIsTest = false;  ///< of warn
     std::string mSubject;  ///< of explain
     std::string mMark;
+    std::string mMarkTime;  ///< empty: now
     ZTSFilterTexts mFilter;
 };
 

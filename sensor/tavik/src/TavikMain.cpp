@@ -84,9 +84,9 @@ static int sRun(int aCount, const char* const* appArguments) {
         ->add_option("WHAT", lOptions.mSubject, "A kind, a state, or an episode's number; without: a list");
     lAdd("check", "Report in one line for a monitoring system: 0 OK, 1 WARNING, 2 CRITICAL, 3 UNKNOWN", runCheck)
         ->add_option("--since", lOptions.mFilter.mSince, "How far back gaps and events count; default: 10m");
-    lAdd("mark", "Give this moment a name, for --since and --until", runMark)
-        ->add_option("NAME", lOptions.mMark, "The name; an earlier mark of that name moves")
-        ->required();
+    CLI::App* const lpMark = lAdd("mark", "Give this moment a name, for --since and --until", runMark);
+    lpMark->add_option("NAME", lOptions.mMark, "The name; an earlier mark of that name moves")->required();
+    lpMark->add_option("--at", lOptions.mMarkTime, "Another moment: a time, or a duration back from now");
     lAdd("warn", "Run every warning's hook with a test record: 0 all did their work, 1 one failed", runWarn)
         ->add_flag("--test", lOptions.mIsTest, "Run them now");
 

@@ -29,6 +29,7 @@ export const ports = (parameters) => ask("ports", parameters);
 export const events = (parameters) => ask("events", parameters);
 export const paths = () => ask("paths");
 export const explain = (subject) => ask("explain", { subject });
+export const diagnose = () => ask("explain");
 export const timeline = (from, to, columns) => ask("timeline", { from: time(from), to: time(to), columns });
 
 /** Calls back with every change of an episode. Reconnects by itself. */

@@ -128,10 +128,11 @@ function drawMarks(context, model, layout, colors) {
     context.lineTo(x + 7, layout.marks.y + 7);
     context.lineTo(x, layout.marks.y + 11);
     context.fill();
-    if (x >= free) {
-      const text = clip(context, mark.name, Math.max(30, layout.width - x - 14));
-      context.fillText(text, x + 10, layout.marks.y + 8);
-      free = x + 16 + context.measureText(text).width;
+    const wide = context.measureText(mark.name).width;
+    const at = x + 10 + wide < layout.width ? x + 10 : x - 4 - wide;
+    if (at >= free) {
+      context.fillText(mark.name, at, layout.marks.y + 8);
+      free = at + wide + 8;
     }
   }
 }

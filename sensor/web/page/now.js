@@ -2,10 +2,11 @@
 
 import * as api from "./api.js";
 import { makeAddress } from "./address.js";
-import { devicesOf } from "./devices.js";
+import { devicesOf, listDevices } from "./devices.js";
 import { element, figure, fillTable, link, make } from "./dom.js";
 import { placeOf } from "./episodes.js";
-import { duration, initiatorName, number, plural, shortTime } from "./format.js";
+import { duration, initiatorName, number, plural, portName, shortTime } from "./format.js";
+import { findingBox } from "./findings.js";
 import { kindOf, kinds } from "./kinds.js";
 import { makeGrid } from "./grid.js";
 import { familyColor, mix, readColors, strengthOf, swatch } from "./palette.js";
@@ -13,7 +14,8 @@ import { troubleBox } from "./troubles.js";
 import { sentenceOf } from "./words.js";
 
 const hour = 3600000;
-const mostTroubles = 8;
+const mostTroubles = 12;
+const mostDevices = 12;
 const mostKinds = 3;
 const looks = new Map(); // what to look at next, by kind
 
@@ -23,22 +25,29 @@ const code = (text) => make("code", text);
 
 const rank = (episode) => kinds.indexOf(kindOf(episode.kind));
 
-/** Episodes of one port and kind that several initiators see are one trouble. */
+const ownerOf = (episode) => episode.remotePort ?? episode.initiator;
+
+/** Episodes of one kind that several initiators see are one line. */
+function join(members) {
+  const numbers = [...new Set(members.flatMap((member) => member.luns?.numbers ?? []))].sort((one, other) => one - other);
+  const times = (name) => members.map((member) => member[name]).sort((one, other) => Date.parse(one) - Date.parse(other));
+  return { ...members[0], count: members.reduce((sum, member) => sum + member.count, 0), first: times("first")[0], last: times("last").pop(),
+    seen: [...new Set(members.map((member) => initiatorName(member.initiator)))],
+    devices: members.flatMap((member) => member.devices ?? []),
+    luns: members[0].luns === null ? null : { all: members.some((member) => member.luns?.all), numbers } };
+}
+
+/** A trouble for each port, with a line for each kind, the worst first. */
 function group(episodes) {
-  const groups = new Map();
+  const owners = new Map();
   for (const episode of episodes) {
-    const key = `${episode.kind} ${episode.remotePort?.wwpn ?? episode.initiator.wwpn}`;
-    groups.set(key, [...(groups.get(key) ?? []), episode]);
+    const key = ownerOf(episode).wwpn;
+    const kindsOf = owners.get(key) ?? new Map();
+    kindsOf.set(episode.kind, [...(kindsOf.get(episode.kind) ?? []), episode]);
+    owners.set(key, kindsOf);
   }
-  return [...groups.values()].map((members) => {
-    const seen = [...new Set(members.map((member) => initiatorName(member.initiator)))];
-    const all = members.some((member) => member.luns?.all);
-    const numbers = [...new Set(members.flatMap((member) => member.luns?.numbers ?? []))].sort((one, other) => one - other);
-    const first = members.reduce((least, member) => (member.first < least ? member.first : least), members[0].first);
-    const last = members.reduce((most, member) => (member.last > most ? member.last : most), members[0].last);
-    return { ...members[0], count: members.reduce((sum, member) => sum + member.count, 0), first, last, seen,
-      luns: members[0].luns === null ? null : { all, numbers }, initiator: { ...members[0].initiator, host: seen.join(", ") } };
-  });
+  return [...owners.values()].map((kindsOf) => [...kindsOf.values()].map(join).sort((one, other) => rank(one) - rank(other)))
+    .sort(([one], [other]) => rank(one) - rank(other) || other.count - one.count);
 }
 
 async function lookAt(kind) {
@@ -48,21 +57,18 @@ async function lookAt(kind) {
   return looks.get(kind);
 }
 
-async function openBox(episode) {
-  const kind = kindOf(episode.kind);
-  const box = make("article", "", `trouble level-${kind.level}`);
-  box.append(make("h4", [swatch(kind.family), ` ${sentenceOf(episode)}`]));
-  const found = episode.remotePort === null ? null
-    : await devicesOf(episode.remotePort.wwpn, episode.luns?.all || !episode.luns ? null : new Set(episode.luns.numbers));
-  const names = found === null ? [] : [
-    ["Disks", found.disks], ["Multipath devices", found.multipaths], ["Mounts", found.mounts],
-  ].filter(([, values]) => values.size > 0).map(([name, values]) => `${name}: ${[...values].slice(0, 12).join(", ")}${values.size > 12 ? " …" : ""}`);
-  if (names.length > 0) {
-    box.append(make("p", names.join(". ")));
+async function openBox(lines) {
+  const worst = lines[0];
+  const box = make("article", "", `trouble level-${kindOf(worst.kind).level}`);
+  const seen = worst.remotePort === null ? "" : `, seen from ${[...new Set(lines.flatMap((line) => line.seen))].join(" and ")}`;
+  box.append(make("h4", [worst.remotePort === null ? initiatorName(worst.initiator) : portName(worst.remotePort), make("span", seen, "quiet plain")]));
+  box.append(make("ul", lines.map((line) => make("li", [swatch(kindOf(line.kind).family), ` ${sentenceOf(line, false)} `,
+    make("span", `${duration(Date.now() - Date.parse(line.last))} ago. `, "quiet"), link("Timeline", placeOf(line))]))));
+  const devices = listDevices(await devicesOf(lines), mostDevices);
+  if (devices.length > 0) {
+    box.append(make("p", `${devices.map(([name, text]) => `${name}: ${text}`).join(". ")}.`));
   }
-  box.append(make("p", [`Since ${shortTime(episode.first, true)}, last ${duration(Date.now() - Date.parse(episode.last))} ago. `,
-    link("In the timeline", placeOf(episode))], "quiet"));
-  const texts = await lookAt(episode.kind);
+  const texts = await lookAt(worst.kind);
   if (texts.length > 0) {
     box.append(make("details", [make("summary", "What to look at next"), ...texts.map((text) => make("p", text))]));
   }
@@ -71,16 +77,25 @@ async function openBox(episode) {
 
 async function showOpen() {
   const { episodes } = await api.events({ open: "true", limit: 2000 });
-  const troubles = group(episodes).filter((episode) => kindOf(episode.kind).level > 1)
-    .sort((one, other) => rank(one) - rank(other) || other.count - one.count);
+  const troubles = group(episodes.filter((episode) => kindOf(episode.kind).level > 1));
+  const opened = new Set([...element("open-troubles").querySelectorAll("details[open]")].map((each) => each.parentElement.firstChild.textContent));
   const boxes = await Promise.all(troubles.slice(0, mostTroubles).map(openBox));
+  boxes.filter((box) => opened.has(box.firstChild.textContent)).forEach((box) => { box.querySelector("details").open = true; });
   if (troubles.length > mostTroubles) {
-    boxes.push(make("p", link(`${number(troubles.length - mostTroubles)} more`, makeAddress("events", { open: "true" }))));
+    boxes.push(make("p", link(`${plural(troubles.length - mostTroubles, "more port")} with trouble`, makeAddress("events", { open: "true" }))));
   }
   if (boxes.length === 0) {
     boxes.push(make("p", ["No trouble goes on. ", link("See the last 24 hours", makeAddress("timeline", { range: "24h" })), "."], "calm"));
   }
   element("open-troubles").replaceChildren(...boxes);
+}
+
+/** What the rules make of the last 24 hours. Noise and notes are not troubles. */
+async function showFindings() {
+  const { findings } = await api.diagnose();
+  const found = (findings ?? []).filter(({ severity }) => severity === "problem" || severity === "warning");
+  element("findings-title").hidden = found.length === 0;
+  element("findings").replaceChildren(...found.slice(0, mostTroubles).map(findingBox));
 }
 
 // ---- ports ----
@@ -185,5 +200,5 @@ export async function show() {
   element("headline").className = `headline ${status.exit === 0 ? "good" : "bad"}`;
   element("troubles").replaceChildren(...status.troubles.map(troubleBox));
   showLinks(status);
-  await Promise.all([part("open-troubles", showOpen), part("ports", showPorts)]);
+  await Promise.all([part("findings", showFindings), part("open-troubles", showOpen), part("ports", showPorts)]);
 }

@@ -1,11 +1,12 @@
 // The panel beside the chart: all that is known of one cell.
 
 import * as api from "./api.js";
-import { devicesOf } from "./devices.js";
+import { devicesOf, listDevices } from "./devices.js";
 import { button, copy, element, make } from "./dom.js";
 import { showEpisodes } from "./episodes.js";
 import { codes, luns, number, plural, span } from "./format.js";
 import { kinds, kindOf } from "./kinds.js";
+import { findingBox } from "./findings.js";
 import { spanOf, whyBlind } from "./model.js";
 import { describeCell, sentenceOf } from "./words.js";
 
@@ -51,15 +52,10 @@ function lunsOf(episodes) {
   return numbers;
 }
 
-async function showDevices(list, lane, episodes, mine) {
-  if (lane.type !== "port") {
-    return;
-  }
-  const found = await devicesOf(lane.key, lunsOf(episodes));
+async function showDevices(list, episodes, mine) {
+  const found = await devicesOf(episodes);
   if (mine === turn) {
-    addFact(list, "Disks", found.disks.size === 0 ? [] : [[...found.disks].join(", ")]);
-    addFact(list, "Multipath devices", found.multipaths.size === 0 ? [] : [[...found.multipaths].join(", ")]);
-    addFact(list, "Mounts", found.mounts.size === 0 ? [] : [[...found.mounts].join(", ")]);
+    listDevices(found, 40).forEach(([name, text]) => addFact(list, name, [text]));
   }
 }
 
@@ -71,7 +67,7 @@ async function showExplanation(place, episode, mine) {
   if (mine !== turn) {
     return;
   }
-  place.replaceChildren();
+  place.replaceChildren(...(document.findings ?? []).map(findingBox));
   for (const part of document.parts.filter(({ label }) => label !== "facts")) {
     place.append(make("h4", headings[part.label] ?? part.label.charAt(0).toUpperCase() + part.label.slice(1)), ...part.texts.map((text) => make("p", text)));
   }
@@ -133,7 +129,7 @@ async function fill(model, lane, column, episodes, mine) {
   addFact(facts, "Codes", [...new Set(episodes.flatMap(codes))].slice(0, 8));
   addFact(facts, "Speaks against it", doubts(model, lane, column));
   showEpisodes(element("panel-episodes"), episodes, "No episode lies in this cell.");
-  await showDevices(facts, lane, episodes, mine);
+  await showDevices(facts, episodes, mine);
   if (episodes.length > 0 && mine === turn) {
     await showExplanation(element("panel-explanation"), episodes[0], mine);
   }

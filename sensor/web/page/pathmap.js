@@ -16,7 +16,7 @@ function shape(name, attributes, text = "") {
   return made;
 }
 
-const healthOf = (paths) => (paths.every((path) => path.health === "running") ? "good" : paths.some((path) => path.health === "running") ? "some" : "bad");
+const healthOf = (paths) => (paths.every((path) => path.running === true) ? "good" : paths.some((path) => path.running === true) ? "some" : "bad");
 const words = { good: "all run", some: "some do not run", bad: "none runs" };
 
 /** Paths by a key, in the order in which the keys come. */

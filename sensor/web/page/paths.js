@@ -30,8 +30,8 @@ function stateOf(path) {
 /** One path: its disk and a dot; the state in words where it does not run. */
 function chip(path) {
   const route = `${initiatorName(path.initiator)} → ${path.remotePort ? portName(path.remotePort) : "unknown port"} → LUN ${path.lun}, ${path.address}`;
-  const runs = path.health === "running";
-  const made = make("span", [make("span", "", `dot ${runs ? "good" : path.health === "down" ? "bad" : "unknown"}`),
+  const runs = path.running === true;
+  const made = make("span", [make("span", "", `dot ${runs ? "good" : path.running === null ? "unknown" : "bad"}`),
     ` ${path.disk ?? path.address}${runs ? "" : ` ${stateOf(path)}`}`], `chip${runs ? "" : " trouble-chip"}`);
   made.title = `${route}: ${stateOf(path)}`;
   return made;
@@ -78,13 +78,13 @@ export async function open(parameters) {
     element("paths-known").hidden = true;
     return;
   }
-  units = [...answer.luns].sort((one, other) => rank(one) - rank(other) || nameOf(one).localeCompare(nameOf(other), "en", { numeric: true }));
+  units = [...(answer.luns ?? [])].sort((one, other) => rank(one) - rank(other) || nameOf(one).localeCompare(nameOf(other), "en", { numeric: true }));
   const byKey = new Map(units.flatMap((unit) => unit.paths).map((path) => [keyOf(path.initiator), path.initiator]));
   initiators = [...byKey.values()].sort((one, other) => initiatorName(one).localeCompare(initiatorName(other), "en", { numeric: true }));
   const bad = units.filter((unit) => !isWhole(unit)).length;
-  element("paths-text").textContent = units.length === 0 ? "No LUN is known: no disk of this host hangs on a Fibre Channel port."
+  element("paths-text").textContent = answer.luns === null ? "The paths are not known yet: no look at this host has been stored." : units.length === 0 ? "No LUN is known: no disk of this host hangs on a Fibre Channel port."
     : bad === 0 ? `${plural(units.length, "LUN")}, all with all their paths.` : `${plural(bad, "LUN")} of ${number(units.length)} with trouble.`;
-  element("paths-text").className = `headline ${bad === 0 ? "good" : "bad"}`;
+  element("paths-text").className = `headline ${bad > 0 ? "bad" : units.length === 0 ? "" : "good"}`;
   element("paths-known").hidden = units.length === 0;
   element("paths-troubles").replaceChildren(...(answer.troubles ?? []).map(troubleBox));
   drawMap(element("paths-map"), units);

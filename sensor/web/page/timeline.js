@@ -397,6 +397,22 @@ function startChart() {
   canvas.addEventListener("pointerleave", () => moveCrosshair(null));
 }
 
+/** The window changes, or the panel opens: drawn at once with what is there, and soon with columns that fit. */
+function watchWidth() {
+  let width = 0;
+  let pending = null;
+  new ResizeObserver(() => {
+    if (canvas.clientWidth === 0 || canvas.clientWidth === width) {
+      return;
+    }
+    width = canvas.clientWidth;
+    redraw();
+    overview.draw();
+    clearTimeout(pending);
+    pending = setTimeout(() => reload(true), 150);
+  }).observe(element("lanes"));
+}
+
 export function start(whenAddressChanges) {
   onAddress = whenAddressChanges;
   for (const [name, minutes] of presets) {
@@ -420,11 +436,7 @@ export function start(whenAddressChanges) {
     writeState();
     canvas.focus();
   });
-  let resized = null;
-  window.addEventListener("resize", () => {
-    clearTimeout(resized);
-    resized = setTimeout(() => reload(true), 150);
-  });
+  watchWidth();
   for (const query of ["(prefers-color-scheme: dark)", "print"]) {
     matchMedia(query).addEventListener("change", () => {
       fillLegend();

@@ -4,20 +4,19 @@ import { duration, initiatorName, luns, number, portName, span, times } from "./
 import { kindOf, kinds } from "./kinds.js";
 import { hasCells, spanOf, whyBlind } from "./model.js";
 
-const upper = (text) => text.charAt(0).toUpperCase() + text.slice(1);
 const rank = (name) => kinds.indexOf(kindOf(name));
 
 /** "array7 ctrl-A said that its queue is full 20,000 times". */
 export const saysOf = (kind, who, count) => kindOf(kind).says(who, times(count));
 
-/** An episode in one sentence. */
-export function sentenceOf(episode) {
+/** An episode in one sentence, with the local port that saw it where it is asked for. */
+export function sentenceOf(episode, hasHost = true) {
   const who = episode.remotePort === null ? initiatorName(episode.initiator) : portName(episode.remotePort);
-  const host = episode.remotePort === null ? "" : `, seen from ${initiatorName(episode.initiator)}`;
+  const host = !hasHost || episode.remotePort === null ? "" : `, seen from ${initiatorName(episode.initiator)}`;
   const long = Date.parse(episode.last) - Date.parse(episode.first);
   const where = luns(episode.luns);
   const lasted = long < 1000 ? "" : ` within ${duration(long)}`;
-  return `${upper(saysOf(episode.kind, who, episode.count))}${lasted}${where === "" ? "" : `, on ${where}`}${host}.`;
+  return `${saysOf(episode.kind, who, episode.count)}${lasted}${where === "" ? "" : `, on ${where}`}${host}.`;
 }
 
 /** A cell in one sentence. */
@@ -31,8 +30,8 @@ export function describeCell(model, lane, column) {
     return `${when}, ${lane.label}: ${why}.`;
   }
   const parts = [...cell.kinds].sort(([one], [other]) => rank(one) - rank(other)).map(([kind, count]) => saysOf(kind, lane.label, count));
-  const spread = cell.spread === 0 ? "" : ` ${number(cell.spread)} of them may have begun earlier (dotted edge).`;
-  return `${when}. ${parts.map(upper).join(". ")}.${spread}${blind === "" ? "" : ` Not all could be seen: ${blind}.`}`;
+  const spread = cell.spread === 0 ? "" : ` ${cell.spread === cell.count ? "They" : `${number(cell.spread)} of them`} may have begun earlier (dotted edge).`;
+  return `${when}. ${parts.join(". ")}.${spread}${blind === "" ? "" : ` Not all could be seen: ${blind}.`}`;
 }
 
 /** What all lanes together show in a column, for the line above the chart. */

@@ -10,6 +10,11 @@ TEST(ControlRequest, StatusAndMarkAreKnown) {
     const ZTSControlRequest lMark = parseControlRequest(R"({"request":"mark","name":"before update"})");
     EXPECT_EQ(lMark.mKind, ZTCR_Mark);
     EXPECT_EQ(lMark.mName, "before update");
+    EXPECT_EQ(lMark.mTime, std::nullopt);
+    const ZTSControlRequest lEarlier =
+        parseControlRequest(R"({"request":"mark","name":"x","time":"2026-03-04T05:06:00Z"})");
+    EXPECT_EQ(lEarlier.mKind, ZTCR_Mark);
+    EXPECT_EQ(lEarlier.mTime, fromMicroseconds(1772600760LL * 1000000));
 }
 
 TEST(ControlRequest, AnythingElseIsWrongInWords) {
@@ -22,6 +27,8 @@ TEST(ControlRequest, AnythingElseIsWrongInWords) {
         {R"({"request":"halt"})", "unknown request \"halt\""},
         {R"({"request":"mark"})", "\"name\""},
         {R"({"request":"mark","name":7})", "\"name\""},
+        {R"({"request":"mark","name":"x","time":"yesterday"})", "RFC 3339"},
+        {R"({"request":"mark","name":"x","time":7})", "RFC 3339"},
         {R"({"request":"mark","name":""})", "1 to 200 bytes"},
         {R"({"request":"mark","name":"a\nb"})", "control characters"},
         {R"({"request":"mark","name":")" + std::string(gcMaxMarkName + 1, 'x') + "\"}", "this one has 201"},
