@@ -37,7 +37,7 @@ async function count([from, to]) {
 }
 
 const rate = (value, seen) => (seen === 0 ? null : (value * hour) / seen);
-const rateText = (value) => (value === null ? "not seen" : value === 0 ? "0" : value < 10 ? value.toFixed(1) : number(Math.round(value)));
+const rateText = (value) => (value === null ? "not seen" : value === 0 ? "0" : value < 1 ? value.toFixed(2) : value < 10 ? value.toFixed(1) : number(Math.round(value)));
 
 /** Most changed first: new and gone ones in front of those that only grew or shrank; the worst kind where that is equal. */
 function changeOf(before, after) {

@@ -59,7 +59,23 @@ export function prepare(canvas, width, height) {
 
 const font = (size, weight = "") => `${weight} ${size}px system-ui, sans-serif`.trim();
 
+/** Cut to a width. Of a WWN the end is kept: there the ports of an array differ. */
 function clip(context, text, width) {
+  if (context.measureText(text).width <= width) {
+    return text;
+  }
+  const name = text.search(/([0-9a-f]{2}:){7}/);
+  if (name >= 0) {
+    let begin = name + 3;
+    while (begin + 6 < text.length && context.measureText(`${text.slice(0, name)}…${text.slice(begin)}`).width > width) {
+      begin += 3;
+    }
+    return cut(context, `${text.slice(0, name)}…${text.slice(begin)}`, width);
+  }
+  return cut(context, text, width);
+}
+
+function cut(context, text, width) {
   if (context.measureText(text).width <= width) {
     return text;
   }
@@ -180,12 +196,14 @@ function drawCells(context, model, layout, row, colors) {
     }
     if (wide >= 8.5) {
       const letter = context.measureText(worst.letter).width;
+      // A letter on a pattern cannot be read: it stands above it.
+      const middle = isPattern ? top + 5 : top + height / 2 + 0.5;
       if (isPattern) {
-        context.fillStyle = "#ffffff";
-        context.fillRect(x + (cellWidth - letter) / 2 - 1, top + height / 2 - 5, letter + 2, 10);
+        context.fillStyle = colors.ground;
+        context.fillRect(x + 1, top + 1, cellWidth - 2, 8);
       }
       context.fillStyle = ink;
-      context.fillText(worst.letter, x + (cellWidth - letter) / 2, top + height / 2 + 0.5);
+      context.fillText(worst.letter, x + (cellWidth - letter) / 2, middle);
     }
   }
 }
@@ -199,7 +217,7 @@ function drawLabel(context, layout, row, colors) {
   const room = layout.gutter - 12 - (isHead ? 0 : 10);
   const hasSum = sum !== "" && room - sumWidth > 60;
   context.fillStyle = lane.type === "fold" ? colors.quiet : colors.text;
-  context.fillText(clip(context, lane.label, room - (hasSum ? sumWidth + 8 : 0)), isHead ? 2 : 12, y + height / 2 + 1);
+  context.fillText(clip(context, lane.short ?? lane.label, room - (hasSum ? sumWidth + 8 : 0)), isHead ? 2 : 12, y + height / 2 + 1);
   if (hasSum) {
     context.fillStyle = colors.quiet;
     context.fillText(sum, layout.gutter - 10 - sumWidth, y + height / 2 + 1);

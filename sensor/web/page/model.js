@@ -125,6 +125,7 @@ export function makeModel(document, { filter, before, unfolded, now }) {
   const sorted = keepOrder([...groups].sort(([oneName, one], [otherName, other]) => worst(other) - worst(one) || oneName.localeCompare(otherName))
     .map(([name, members]) => ({ key: `head ${name}`, name, members })), before);
   for (const { key, name, members } of sorted) {
+    members.forEach((lane) => { lane.short = lane.label.startsWith(`${name} `) ? lane.label.slice(name.length + 1) : lane.label; });
     const loud = keep(members.filter((lane) => lane.total > 0));
     const quiet = members.filter((lane) => lane.total === 0).sort((one, other) => one.label.localeCompare(other.label));
     const head = makeLane("head", key, name, null);
