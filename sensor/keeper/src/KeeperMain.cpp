@@ -31,7 +31,6 @@ static void sPrint(const std::vector<ZTSSettingsProblem>& acrProblems) {
 static ZTEExitStatus sRun(const std::string& acrConfigOption, bool aIsCheck) {
     const ZTSSettingsReading lReading = readSettings(acrConfigOption);
     sPrint(lReading.mErrors);
-    sPrint(lReading.mNotes);
     if (!lReading.isGood()) {
         return ZTEX_BadSettings;
     }

@@ -30,6 +30,7 @@ struct ZTSMetricFacts {
     std::uint64_t mLostInGaps = 0;  ///< occurrences that all gaps are known to have cost
     std::uint64_t mAgentRestarts = 0;
     std::uint64_t mHookFailures = 0;
+    std::map<std::string, std::uint64_t> mMissed;  ///< by output: changes that retention took before it had them
     std::optional<std::uint64_t> mStoreBytes;
     std::optional<std::uint64_t> mWalBytes;
     std::string mVersion;

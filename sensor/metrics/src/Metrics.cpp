@@ -198,6 +198,12 @@ static void sAddHistory(const ZTSMetricFacts& acrFacts, std::vector<MetricFamily
         lFamily.add({}, static_cast<double>(lrCounter.mValue));
         lFamily.moveTo(arFamilies);
     }
+    ZTCFamily lMissed("tavik_output_missed_total", MetricType::Counter,
+                      "Changes of episodes that retention removed before an output had them.");
+    for (const auto& [lOutput, lCount] : acrFacts.mMissed) {
+        lMissed.add({{"output", lOutput}}, static_cast<double>(lCount));
+    }
+    lMissed.moveTo(arFamilies);
     ZTCFamily lOpen("tavik_open_episodes", MetricType::Gauge, "Episodes that go on, by kind.");
     for (const auto& [lKind, lCount] : acrFacts.mOpenEpisodes) {
         lOpen.add({{"kind", getKindName(lKind)}}, static_cast<double>(lCount));
@@ -276,6 +282,12 @@ ZTSMetricFacts readMetricFacts(const ZTCHistory& acrHistory, ZTSStatusFacts aSta
     }
     lFacts.mAgentRestarts = sStoredNumber(acrHistory, gcAgentRestartsValue);
     lFacts.mHookFailures = sStoredNumber(acrHistory, gcHookFailuresValue);
+    for (const char* const lpOutput : {"ndjson", "journal"}) {
+        if (!acrHistory.getValue(std::string("outlet.") + lpOutput + ".seq").empty()) {
+            lFacts.mMissed[lpOutput] =
+                sStoredNumber(acrHistory, (std::string("outlet.") + lpOutput + ".missed").c_str());
+        }
+    }
     lFacts.mStoreBytes = sFileSize(acrDatabasePath);
     lFacts.mWalBytes = sFileSize(acrDatabasePath + "-wal");
     return lFacts;

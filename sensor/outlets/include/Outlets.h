@@ -12,21 +12,25 @@
 #include <optional>
 #include <string>
 #include <thread>
+#include <vector>
 
 #include "sensor/metrics/include/SeriesPorts.h"
-#include "sensor/outlets/include/NdjsonFile.h"
+#include "sensor/outlets/include/ChangeOutlet.h"
+#include "sensor/outlets/include/JournalSocket.h"
 #include "sensor/settings/include/Settings.h"
 #include "sensor/store/include/History.h"
 #include "sensor/views/include/NameBook.h"
 #include "sensor/web/include/Api.h"
 
-/// The name of the stored value with the number of the last change that the JSON lines have.
-inline constexpr const char* gcNdjsonCursorValue = "ndjson.seq";
+/// Names of stored values of an outlet: the number of the last change that it has (seq), how many changes retention
+/// took before it had them (missed; the history counts them), and of how many of these it was told (told).
+std::string getOutletValue(const std::string& acrOutlet, const char* apValue);
 
 struct ZTSOutletsSetup {
     std::string mStateDirectory;
     std::string mHost;
     std::string mVersion;
+    std::string mJournalSocket = gcJournalSocketPath;
     /// Stores a value in the history, soon; called on any thread.
     std::function<void(const std::string& acrName, const std::string& acrValue)> mSetValue;
     /// A line for people; called on the outlets' thread.
@@ -55,6 +59,14 @@ public:
     unsigned getPort() const;
 
 private:
+    /// An outlet with what it has.
+    struct ZTSFedOutlet {
+        std::unique_ptr<ZTCChangeOutlet> mpOutlet;
+        std::optional<std::uint64_t> mSeq;  ///< the last change that it has; absent: to be read from the history
+        std::uint64_t mTold = 0;            ///< missed changes that it was told of
+        std::string mProblem;
+    };
+
     void run();
     bool waitForWork();
     void applySettings();
@@ -62,7 +74,10 @@ private:
     void feedHistory();
     void feed();
     void feedStream();
-    void feedNdjson();
+    void feed(ZTSFedOutlet& arOutlet);
+    void giveMissed(ZTSFedOutlet& arOutlet);
+    void makeOutlets(const ZTSSettings& acrNew);
+    bool isFailing() const;
     void writeMetrics();
     std::string toLine(const ZTSEpisode& acrEpisode, const ZTCNameBook& acrNames) const;
     ZTCNameBook makeNames() const;
@@ -76,14 +91,12 @@ private:
     // ---- of the outlets' thread ----
     ZTSSettings mSettings;
     std::unique_ptr<ZTCHistory> mpHistory;
-    std::unique_ptr<ZTCNdjsonFile> mpNdjson;
-    std::optional<std::uint64_t> mNdjsonSeq;  ///< what the file has; absent: to be read from the history
+    std::vector<ZTSFedOutlet> mOutlets;
     std::optional<std::uint64_t> mStreamSeq;  ///< what the streams have; absent: nobody listens
     std::chrono::steady_clock::time_point mNextMetrics{};
     std::chrono::steady_clock::time_point mNextServer{};
     std::string mHistoryProblem;
     std::string mServerProblem;
-    std::string mNdjsonProblem;
     std::string mMetricsProblem;
 
     // ---- guarded by mMutex ----

@@ -1,10 +1,15 @@
 #include "sensor/outlets/include/Outlets.h"
 
+#include <algorithm>
+#include <charconv>
 #include <nlohmann/json.hpp>
+#include <tuple>
 
 #include "sensor/client/include/ClientErrors.h"
 #include "sensor/client/include/RecordJson.h"
 #include "sensor/metrics/include/Metrics.h"
+#include "sensor/outlets/include/JournalOutlet.h"
+#include "sensor/outlets/include/NdjsonOutlet.h"
 #include "sensor/views/include/EpisodeJson.h"
 #include "sensor/views/include/StatusView.h"
 
@@ -104,7 +109,7 @@ bool ZTCOutlets::waitForWork() {
     const bool lHasReaders = mpServer != nullptr && mpServer->hasStreams();
     std::unique_lock lLock(mMutex);
     const auto lIsDue = [this] { return mIsStopping || mHasWork; };
-    if (!mServerProblem.empty() || !mNdjsonProblem.empty() || !mHistoryProblem.empty()) {
+    if (!mServerProblem.empty() || isFailing() || !mHistoryProblem.empty()) {
         mWake.wait_for(lLock, scServerPause, lIsDue);
     } else if (lHasReaders) {
         mWake.wait_for(lLock, scFeedPeriod, lIsDue);
@@ -136,14 +141,37 @@ void ZTCOutlets::applySettings() {
         mpServer.reset();
         mNextServer = {};
     }
-    if (mpNdjson == nullptr || lNew->mNdjsonPath != mSettings.mNdjsonPath ||
-        lNew->mNdjsonSize != mSettings.mNdjsonSize || lNew->mNdjsonKeep != mSettings.mNdjsonKeep) {
-        mpNdjson.reset();
-        if (!lNew->mNdjsonPath.empty()) {
-            mpNdjson = std::make_unique<ZTCNdjsonFile>(lNew->mNdjsonPath, lNew->mNdjsonSize, lNew->mNdjsonKeep);
-        }
-    }
+    makeOutlets(*lNew);
     mSettings = std::move(*lNew);
+}
+
+/// The table of outlets. One that goes on keeps what it has.
+void ZTCOutlets::makeOutlets(const ZTSSettings& acrNew) {
+    const bool lIsSame = mSettings.mNdjsonPath == acrNew.mNdjsonPath && mSettings.mNdjsonSize == acrNew.mNdjsonSize &&
+                         mSettings.mNdjsonKeep == acrNew.mNdjsonKeep &&
+                         mSettings.mJournalEnabled == acrNew.mJournalEnabled;
+    if (lIsSame) {
+        return;
+    }
+    std::map<std::string, std::pair<std::optional<std::uint64_t>, std::uint64_t>> lHad;
+    for (const ZTSFedOutlet& lrOutlet : mOutlets) {
+        lHad[lrOutlet.mpOutlet->getName()] = {lrOutlet.mSeq, lrOutlet.mTold};  // what is stored may be older
+    }
+    mOutlets.clear();
+    if (!acrNew.mNdjsonPath.empty()) {
+        mOutlets.emplace_back().mpOutlet =
+            std::make_unique<ZTCNdjsonOutlet>(acrNew.mNdjsonPath, acrNew.mNdjsonSize, acrNew.mNdjsonKeep);
+    }
+    if (acrNew.mJournalEnabled) {
+        mOutlets.emplace_back().mpOutlet = std::make_unique<ZTCJournalOutlet>(mSetup.mJournalSocket);
+    }
+    for (ZTSFedOutlet& lrOutlet : mOutlets) {
+        std::tie(lrOutlet.mSeq, lrOutlet.mTold) = lHad[lrOutlet.mpOutlet->getName()];
+    }
+}
+
+bool ZTCOutlets::isFailing() const {
+    return std::ranges::any_of(mOutlets, [](const ZTSFedOutlet& acrOutlet) { return !acrOutlet.mProblem.empty(); });
 }
 
 void ZTCOutlets::report(std::string& arLast, const std::string& acrProblem, const char* apOutlet) {
@@ -181,11 +209,15 @@ void ZTCOutlets::feedHistory() {
     try {
         if (mpHistory == nullptr) {
             mpHistory = std::make_unique<ZTCHistory>(mSetup.mStateDirectory);
-            mNdjsonSeq.reset();
+            for (ZTSFedOutlet& lrOutlet : mOutlets) {
+                lrOutlet.mSeq.reset();
+            }
             mStreamSeq.reset();
         }
         feedStream();
-        feedNdjson();
+        for (ZTSFedOutlet& lrOutlet : mOutlets) {
+            feed(lrOutlet);
+        }
         report(mHistoryProblem, "", "the outlets' reading of the history");
     } catch (const ZTCStoreEx& lrEx) {
         mpHistory.reset();  // it may have been replaced
@@ -250,39 +282,67 @@ void ZTCOutlets::feedStream() {
     });
 }
 
-void ZTCOutlets::feedNdjson() {
-    if (mpNdjson == nullptr) {
+static std::uint64_t sReadNumber(const std::string& acrText) {
+    std::uint64_t lNumber = 0;
+    std::from_chars(acrText.data(), acrText.data() + acrText.size(), lNumber);
+    return lNumber;
+}
+
+std::string getOutletValue(const std::string& acrOutlet, const char* apValue) {
+    return "outlet." + acrOutlet + "." + apValue;
+}
+
+/// What retention took before the outlet had it.
+void ZTCOutlets::giveMissed(ZTSFedOutlet& arOutlet) {
+    const std::string lName = arOutlet.mpOutlet->getName();
+    const std::uint64_t lMissed = sReadNumber(mpHistory->getValue(getOutletValue(lName, "missed")));
+    if (lMissed <= arOutlet.mTold) {
         return;
     }
-    if (!mNdjsonSeq) {
-        const std::string lStored = mpHistory->getValue(gcNdjsonCursorValue);
-        mNdjsonSeq = lStored.empty() ? 0 : std::stoull(lStored);
+    const std::uint64_t lNew = lMissed - arOutlet.mTold;
+    const nlohmann::ordered_json lLine{{"host", mSetup.mHost}, {"storeId", mpHistory->getStoreId()},
+                                       {"seq", nullptr},       {"kind", "missed"},
+                                       {"output", lName},      {"count", lNew}};
+    arOutlet.mpOutlet->writeMissed(lNew, dumpJson(lLine, -1));
+    mSetup.mReport("retention removed " + std::to_string(lNew) + " changes of episodes before " +
+                   arOutlet.mpOutlet->getTitle() + " had them");
+    arOutlet.mTold = lMissed;
+    mSetup.mSetValue(getOutletValue(lName, "told"), std::to_string(lMissed));
+}
+
+void ZTCOutlets::feed(ZTSFedOutlet& arOutlet) {
+    const std::string lName = arOutlet.mpOutlet->getName();
+    if (!arOutlet.mSeq) {
+        arOutlet.mSeq = sReadNumber(mpHistory->getValue(getOutletValue(lName, "seq")));
+        arOutlet.mTold = sReadNumber(mpHistory->getValue(getOutletValue(lName, "told")));
     }
     const ZTCNameBook lNames = makeNames();
     ZTSHistoryFilter lFilter;
     lFilter.mLimit = scMostChanges;
     while (true) {
-        lFilter.mAfterSeq = *mNdjsonSeq;
-        std::string lLines;
-        std::uint64_t lLast = *mNdjsonSeq;
+        lFilter.mAfterSeq = *arOutlet.mSeq;
+        std::vector<ZTSOutletChange> lChanges;
         mpHistory->visitChanges(lFilter, [&](const ZTSEpisode& acrEpisode) {
-            lLines += toLine(acrEpisode, lNames) + "\n";
-            lLast = acrEpisode.mSeq;
+            ZTSOutletChange& lrChange = lChanges.emplace_back();
+            lrChange.mEpisode = acrEpisode;
+            lrChange.mPort = acrEpisode.mRemotePort ? lNames.describe(*acrEpisode.mRemotePort) : "";
+            lrChange.mLine = toLine(acrEpisode, lNames);
             return true;
         });
-        if (lLines.empty()) {
-            return;
-        }
         try {
-            mpNdjson->append(lLines);
-            report(mNdjsonProblem, "", "the file of JSON lines");
+            giveMissed(arOutlet);
+            if (lChanges.empty()) {
+                return;
+            }
+            arOutlet.mpOutlet->write(lChanges);
+            report(arOutlet.mProblem, "", arOutlet.mpOutlet->getTitle());
         } catch (const ZTCSystemCallEx& lrEx) {
-            report(mNdjsonProblem, lrEx.what(), "the file of JSON lines");
+            report(arOutlet.mProblem, lrEx.what(), arOutlet.mpOutlet->getTitle());
             return;
         }
-        // The lines are on the disk: what is stored too late only makes them come twice.
-        mNdjsonSeq = lLast;
-        mSetup.mSetValue(gcNdjsonCursorValue, std::to_string(lLast));
+        // They are out: what is stored too late only makes them come twice.
+        arOutlet.mSeq = lChanges.back().mEpisode.mSeq;
+        mSetup.mSetValue(getOutletValue(lName, "seq"), std::to_string(*arOutlet.mSeq));
     }
 }
 
@@ -297,5 +357,6 @@ void ZTCOutlets::writeMetrics() {
         report(mMetricsProblem, "", "the metrics file");
     } catch (const ZTCSystemCallEx& lrEx) {
         report(mMetricsProblem, lrEx.what(), "the metrics file");
+        mNextMetrics = steady_clock::now() + scFeedPeriod;
     }
 }

@@ -77,7 +77,6 @@ struct ZTSSettingsProblem {
 struct ZTSSettingsReading {
     ZTSSettings mSettings;
     std::vector<ZTSSettingsProblem> mErrors;  ///< by line; where there is one the settings must not be used
-    std::vector<ZTSSettingsProblem> mNotes;   ///< keys that are right, but whose output this version does not have yet
     std::string mFile;                        ///< the path that was read, or would have been
     std::string mContent;                     ///< the text that was read
 

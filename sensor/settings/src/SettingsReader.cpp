@@ -174,7 +174,6 @@ public:
             return acrOne.mLine < acrOther.mLine;
         };
         std::stable_sort(mReading.mErrors.begin(), mReading.mErrors.end(), lIsBefore);
-        std::stable_sort(mReading.mNotes.begin(), mReading.mNotes.end(), lIsBefore);
         return std::move(mReading);
     }
 
@@ -192,11 +191,6 @@ private:
                     const std::string& acrKnown) {
         addError(acrName.source().begin.line, acrKey,
                  "unknown key: " + sValueText(acrNode) + ", must be one of " + acrKnown);
-    }
-
-    void noteWithoutOutput(unsigned aLine, const std::string& acrKey) {
-        mReading.mNotes.push_back(
-            {mReading.mFile, aLine, acrKey, "checked, but without effect: this version does not have that output yet"});
     }
 
     std::optional<ZTSFault> assign(const ZTSKey& acrKey, const toml::node& acrNode) {
@@ -249,8 +243,6 @@ private:
             mLines[lKey] = lValue.source().begin.line;
             if (const auto lFault = assign(*lRow, lValue)) {
                 addFault(lValue, lKey, *lFault);
-            } else if (!lRow->mHasOutput) {
-                noteWithoutOutput(lValue.source().begin.line, lKey);
             }
         }
     }
@@ -339,9 +331,6 @@ private:
             addError(lLine, "warn.run",
                      "names no program: " + (lrRule.mRun.empty() ? "no value" : quoted(lrRule.mRun.front())) +
                          ", must be a list that begins with " + gcProgramRule.mpRange);
-        }
-        if (!gcHasWarnOutput) {
-            noteWithoutOutput(lLine, "warn");
         }
     }
 

@@ -28,65 +28,63 @@ static constexpr double scTebibyte = scMebibyte * scMebibyte;
 std::span<const ZTSKey> settingsTable() {
     using S = ZTSSettings;
     static constexpr auto scKeys = std::to_array<ZTSKey>({
-        {"agent", "program", &S::mAgentProgram, sText(gcProgramRule), true, R"("qrv-tvk")",
+        {"agent", "program", &S::mAgentProgram, sText(gcProgramRule), R"("qrv-tvk")",
          "The agent: beside tavik-sensor, else in the sbin folder of its installation, else in PATH."},
-        {"agent", "library", &S::mAgentLibrary, sText(gcAnyRule), true, R"("")",
+        {"agent", "library", &S::mAgentLibrary, sText(gcAnyRule), R"("")",
          "The adapters' library (ZT_LIBKPM_PATH of the agent). Empty: the agent's own default."},
-        {"agent", "log", &S::mAgentLog, sText(gcPathRule), true, R"("/var/log/tavik/qrv-tvk.log")",
+        {"agent", "log", &S::mAgentLog, sText(gcPathRule), R"("/var/log/tavik/qrv-tvk.log")",
          "The agent's log, its level (the sum of: 1 halt, 2 alert, 4 critical, 8 error, 16 warning,\n"
          "32 notice, 64 info, 128 trace) and its heartbeat in whole seconds."},
-        {"agent", "log_level", &S::mAgentLogLevel, sCount(0, 255), true, "31", ""},
-        {"agent", "heartbeat", &S::mAgentHeartbeat, {ZTQ_WholeSeconds, 1, scMostOf32Bits, nullptr}, true, "60", ""},
+        {"agent", "log_level", &S::mAgentLogLevel, sCount(0, 255), "31", ""},
+        {"agent", "heartbeat", &S::mAgentHeartbeat, {ZTQ_WholeSeconds, 1, scMostOf32Bits, nullptr}, "60", ""},
 
-        {"sensor", "directory", &S::mSensorDirectory, sText(gcSocketDirectoryRule), true, R"("/run/tavik")",
+        {"sensor", "directory", &S::mSensorDirectory, sText(gcSocketDirectoryRule), R"("/run/tavik")",
          "Holds agent/ (FIFOs, pid files, status pages) and the socket control. Gone after a restart of\n"
          "the host."},
-        {"sensor", "state", &S::mSensorState, sText(gcDirectoryRule), true, R"("/var/lib/tavik")",
+        {"sensor", "state", &S::mSensorState, sText(gcDirectoryRule), R"("/var/lib/tavik")",
          "Holds the history (history.db) and the spool. Keep it."},
 
-        {"collect", "period", &S::mCollectPeriod, sSeconds(0.1, 3600), true, "5.0",
+        {"collect", "period", &S::mCollectPeriod, sSeconds(0.1, 3600), "5.0",
          "Time between two looks at the agent when little comes. When much comes, the agent rings."},
-        {"collect", "record_limit", &S::mCollectRecordLimit, sCount(0, scMostOf32Bits), true, "900",
+        {"collect", "record_limit", &S::mCollectRecordLimit, sCount(0, scMostOf32Bits), "900",
          "Largest number of bytes of event data in one record, as the start command sets it."},
 
         {"targets",
          "sysfs",
          &S::mTargetsSysfs,
          {},
-         true,
          "true",
          "Remote ports are known from /sys/class/fc_remote_ports, and from a file as of\n"
          "\"tavikctl targets\". An empty path: no file."},
-        {"targets", "file", &S::mTargetsFile, sText(gcOptionalPathRule), true, R"("")", ""},
+        {"targets", "file", &S::mTargetsFile, sText(gcOptionalPathRule), R"("")", ""},
 
-        {"history", "days", &S::mHistoryDays, sCount(1, 36500), true, "90",
+        {"history", "days", &S::mHistoryDays, sCount(1, 36500), "90",
          "What is older than these days, or beyond this size, is retired: counted in totals, then deleted."},
-        {"history", "size", &S::mHistorySize, sBytes(16 * scMebibyte, 1024 * scTebibyte), true, R"("2GiB")", ""},
-        {"history", "records", &S::mHistoryRecords, sCount(0, 1000000), true, "100",
+        {"history", "size", &S::mHistorySize, sBytes(16 * scMebibyte, 1024 * scTebibyte), R"("2GiB")", ""},
+        {"history", "records", &S::mHistoryRecords, sCount(0, 1000000), "100",
          "Raw records kept at each end of an episode."},
 
-        {"episode", "gap", &S::mEpisodeGap, sSeconds(1, 86400), true, "60",
-         "Time without an event that ends an episode."},
+        {"episode", "gap", &S::mEpisodeGap, sSeconds(1, 86400), "60", "Time without an event that ends an episode."},
 
-        {"http", "listen", &S::mHttpListen, sText(gcListenRule), true, R"("127.0.0.1:9632")",
+        {"http", "listen", &S::mHttpListen, sText(gcListenRule), R"("127.0.0.1:9632")",
          "\"ADDRESS:PORT\", \"unix:PATH\", or \"\" for off. A loopback port can be read by every local user; a\n"
          "socket by its mode. Any other address needs public = true."},
-        {"http", "public", &S::mHttpPublic, {}, true, "false", ""},
-        {"http", "hosts", &S::mHttpHosts, sText(gcHostRule), true, "[]",
+        {"http", "public", &S::mHttpPublic, {}, "false", ""},
+        {"http", "hosts", &S::mHttpHosts, sText(gcHostRule), "[]",
          "Names in the Host header that are accepted beside localhost, 127.0.0.1 and [::1]."},
 
-        {"metrics", "textfile", &S::mMetricsTextfile, sText(gcOptionalPathRule), true, R"("")",
+        {"metrics", "textfile", &S::mMetricsTextfile, sText(gcOptionalPathRule), R"("")",
          "A file for node_exporter's textfile collector. Empty: none."},
-        {"metrics", "remote_ports", &S::mMetricsRemotePorts, sCount(0, 100000), true, "500",
+        {"metrics", "remote_ports", &S::mMetricsRemotePorts, sCount(0, 100000), "500",
          "Most remote ports that get a label of their own."},
 
-        {"ndjson", "path", &S::mNdjsonPath, sText(gcStreamRule), true, R"("")",
+        {"ndjson", "path", &S::mNdjsonPath, sText(gcStreamRule), R"("")",
          "One line of JSON an episode. \"-\" is standard output, empty is none. The file is renamed at this\n"
          "size, and so many renamed ones are kept."},
-        {"ndjson", "size", &S::mNdjsonSize, sBytes(scMebibyte / 16, scTebibyte), true, R"("64MiB")", ""},
-        {"ndjson", "keep", &S::mNdjsonKeep, sCount(0, 1000), true, "5", ""},
+        {"ndjson", "size", &S::mNdjsonSize, sBytes(scMebibyte / 16, scTebibyte), R"("64MiB")", ""},
+        {"ndjson", "keep", &S::mNdjsonKeep, sCount(0, 1000), "5", ""},
 
-        {"journal", "enabled", &S::mJournalEnabled, {}, false, "false", "Episodes in the system's journal."},
+        {"journal", "enabled", &S::mJournalEnabled, {}, "false", "Episodes in the system's journal."},
     });
     return scKeys;
 }
@@ -129,9 +127,6 @@ std::string defaultSettingsFile() {
             lText += "\n[" + lSection + "]\n";
         }
         sAppendComment(lText, lcrKey.mpMeaning);
-        if (!lcrKey.mHasOutput && *lcrKey.mpMeaning != '\0') {
-            sAppendComment(lText, "Checked, but without effect: this version does not have that output yet.");
-        }
         lText += std::string("#") + lcrKey.mpName + " = " + lcrKey.mpDefault + "\n";
     }
     lText +=
@@ -143,9 +138,6 @@ std::string defaultSettingsFile() {
         "# count, within: so many events within this time (1, 60); per: \"port\", \"initiator\" or \"host\" "
         "(\"port\")\n"
         "# run: program and arguments, no shell; timeout: its process group is ended after this time (30)\n";
-    if (!gcHasWarnOutput) {
-        sAppendComment(lText, "Checked, but without effect: this version does not have that output yet.");
-    }
     lText +=
         "# [[warn]]\n"
         "# kind = \"queue-full\"\n"

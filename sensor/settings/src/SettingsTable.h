@@ -35,7 +35,6 @@ struct ZTSKey {
     const char* mpName;
     ZTSMember mMember;
     ZTSRange mRange;
-    bool mHasOutput;        ///< false: checked, but this version has no such output yet
     const char* mpDefault;  ///< as it stands in the file
     const char* mpMeaning;  ///< for the file; lines of at most 100 characters
 
@@ -44,8 +43,5 @@ struct ZTSKey {
 
 /// In the order of the file. The keys of one section stand together.
 std::span<const ZTSKey> settingsTable();
-
-/// Whether the outputs of all [[warn]] tables exist.
-inline constexpr bool gcHasWarnOutput = true;
 
 #endif

@@ -104,13 +104,40 @@ bool ZTCRetention::deleteEpisode(std::uint64_t aEpisode) {
     mRetire.run(mEpisode.number(3), mEpisode.number(0), mEpisode.number(1), mEpisode.number(2));
     mEpisode.reset();
     for (const std::uint64_t lSeq : lChanges) {
-        if (lSeq != 0) {
-            mDeleteChange.run(lSeq);
+        if (lSeq == 0) {
+            continue;
+        }
+        mDeleteChange.run(lSeq);
+        for (Output& lrOutput : mOutputs) {
+            lrOutput.mMissed += lSeq > lrOutput.mSeq ? 1 : 0;
         }
     }
     mDeleteEpisode.run(aEpisode);
     mBudget -= scOwnRows;
     return true;
+}
+
+/// Outputs keep their places as values: "outlet.NAME.seq".
+void ZTCRetention::loadCursors() {
+    mOutputs.clear();
+    ZTCStatement lRows(mrDatabase, "SELECT name, value FROM value WHERE name GLOB 'outlet.*.seq'");
+    lRows.query();
+    while (lRows.step()) {
+        const std::string lName = lRows.text(0);
+        mOutputs.push_back({.mName = lName.substr(0, lName.rfind('.')), .mSeq = lRows.number<std::uint64_t>(1)});
+    }
+}
+
+/// What an output can no longer get is counted with the deletion: "outlet.NAME.missed".
+void ZTCRetention::storeMissed() {
+    for (const Output& lrOutput : mOutputs) {
+        if (lrOutput.mMissed != 0) {
+            ZTCStatement(mrDatabase,
+                         "INSERT INTO value(name, value) VALUES (?, ?) ON CONFLICT DO UPDATE SET value = "
+                         "CAST(value AS INTEGER) + excluded.value")
+                .run(lrOutput.mName + ".missed", std::to_string(lrOutput.mMissed));
+        }
+    }
 }
 
 /// Closed episodes whose last event lies before that time, the oldest first.
@@ -171,6 +198,15 @@ void ZTCRetention::deleteOlder(std::int64_t aBefore) {
 bool ZTCRetention::step(const ZTSStoreLimits& acrLimits, std::int64_t aNow,
                         std::chrono::steady_clock::time_point aSteadyNow) {
     mBudget = std::max<std::uint32_t>(acrLimits.mStepRows, 8);
+    loadCursors();
+    const bool lHasMore = retire(acrLimits, aNow, aSteadyNow);
+    storeMissed();
+    return lHasMore;
+}
+
+/// Returns whether there is more to do at once.
+bool ZTCRetention::retire(const ZTSStoreLimits& acrLimits, std::int64_t aNow,
+                          std::chrono::steady_clock::time_point aSteadyNow) {
     if (mDayInWork || beginDay(acrLimits, aNow, aSteadyNow)) {
         const std::int64_t lEnd = (*mDayInWork + 1) * gcDayMicroseconds;
         deleteEpisodes(lEnd);

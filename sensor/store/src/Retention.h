@@ -6,6 +6,8 @@
 #include <chrono>
 #include <cstdint>
 #include <optional>
+#include <string>
+#include <vector>
 
 #include "sensor/store/include/Store.h"
 #include "sensor/store/src/Database.h"
@@ -28,11 +30,21 @@ private:
     std::optional<std::int64_t> findOldestDay();
     void deleteEpisodes(std::int64_t aBefore);
     bool deleteEpisode(std::uint64_t aEpisode);
+    void loadCursors();
+    bool retire(const ZTSStoreLimits& acrLimits, std::int64_t aNow, std::chrono::steady_clock::time_point aSteadyNow);
+    void storeMissed();
     void deleteSlots(const char* apSelect, const char* apDelete, std::int64_t aBefore);
     void deleteOlder(std::int64_t aBefore);
 
     ZTCDatabase& mrDatabase;
     std::uint32_t mBudget = 0;  ///< rows that the present step may still delete
+    /// Of an output of the history, within one step: the last change that it has, and how many later ones were deleted.
+    struct Output {
+        std::string mName;
+        std::uint64_t mSeq = 0;
+        std::uint64_t mMissed = 0;
+    };
+    std::vector<Output> mOutputs;
     std::optional<std::int64_t> mDayInWork;
     std::optional<std::chrono::steady_clock::time_point> mLastBegin;
     ZTCStatement mOldest, mEpisode, mChunks, mDeleteChunk, mDeleteChange, mDeleteEpisode, mRetire;

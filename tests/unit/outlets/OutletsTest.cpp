@@ -13,7 +13,10 @@
 
 using testing::AllOf;
 using testing::HasSubstr;
+using testing::Not;
 using testing::StartsWith;
+
+static constexpr const char* scNdjsonSeq = "outlet.ndjson.seq";
 
 /// Outlets over a history that the test fills.
 class Outlets : public ZTCStoreTest {
@@ -25,8 +28,12 @@ protected:
         lSettings.mNdjsonKeep = 2;
         return lSettings;
     }
-    ZTCOutlets& start(const ZTSSettings& acrSettings) {
+    ZTCOutlets& start(const ZTSSettings& acrSettings, bool aMayRead = true) {
         store();
+        startWithoutStore(acrSettings, aMayRead);
+        return *mpOutlets;
+    }
+    ZTCOutlets& startWithoutStore(const ZTSSettings& acrSettings, bool aMayRead = true) {
         mpOutlets = std::make_unique<ZTCOutlets>(
             ZTSOutletsSetup{.mStateDirectory = mDirectory.path(),
                             .mHost = "db07",
@@ -42,7 +49,9 @@ protected:
                                     mLines += acrLine + "\n";
                                 }},
             acrSettings);
-        mpOutlets->openHistory();
+        if (aMayRead) {
+            mpOutlets->openHistory();
+        }
         return *mpOutlets;
     }
     std::string value(const std::string& acrName) {
@@ -82,7 +91,7 @@ TEST_F(Outlets, EveryChangeOfAnEpisodeIsALineWithItsIdentity) {
     lSettings.mNdjsonPath = mDirectory.path("events.ndjson");
     takeOne();
     ZTCOutlets& lrOutlets = start(lSettings);
-    waitUntil([&] { return !value(gcNdjsonCursorValue).empty(); }, "the first line");
+    waitUntil([&] { return !value(scNdjsonSeq).empty(); }, "the first line");
     closeAt(gcBase + 10 * gcMinute);
     lrOutlets.wake();
     waitUntil([&] { return sParseLines(readFile(lSettings.mNdjsonPath)).size() == 2; }, "the second line");
@@ -102,9 +111,9 @@ TEST_F(Outlets, LinesGoOnBehindTheStoredNumberAfterARestart) {
     lSettings.mNdjsonPath = mDirectory.path("events.ndjson");
     takeOne();
     start(lSettings);
-    waitUntil([&] { return !value(gcNdjsonCursorValue).empty(); }, "the first line");
+    waitUntil([&] { return !value(scNdjsonSeq).empty(); }, "the first line");
     mpOutlets.reset();
-    inTransaction([this] { store().setValue(gcNdjsonCursorValue, value(gcNdjsonCursorValue)); });
+    inTransaction([this] { store().setValue(scNdjsonSeq, value(scNdjsonSeq)); });
     takeOne(gcQueueFull);
     start(lSettings);
     waitUntil([&] { return sParseLines(readFile(lSettings.mNdjsonPath)).size() >= 2; }, "the second line");
@@ -121,10 +130,10 @@ TEST_F(Outlets, AFileThatCannotBeWrittenIsReportedOnceAndCatchesUp) {
     ZTCOutlets& lrOutlets = start(lSettings);
     waitUntil([&] { return !lines().empty(); }, "the report");
     EXPECT_THAT(lines(), AllOf(HasSubstr("ndjson.path"), HasSubstr(lSettings.mNdjsonPath)));
-    EXPECT_EQ(value(gcNdjsonCursorValue), "");
+    EXPECT_EQ(value(scNdjsonSeq), "");
     ASSERT_EQ(mkdir(mDirectory.path("missing").c_str(), 0700), 0);
     lrOutlets.wake();
-    waitUntil([&] { return exists(lSettings.mNdjsonPath) && !value(gcNdjsonCursorValue).empty(); }, "the line");
+    waitUntil([&] { return exists(lSettings.mNdjsonPath) && !value(scNdjsonSeq).empty(); }, "the line");
     EXPECT_EQ(std::ranges::count(lines(), '\n'), 2);  // the problem, and its end
 }
 
@@ -191,4 +200,76 @@ TEST_F(Outlets, APortInUseIsReportedAndANewAddressTakesEffectWithTheSettings) {
     lrSecond.setSettings(lSettings);
     waitUntil([&] { return lrSecond.getPort() != 0; }, "the new address");
     EXPECT_THAT(ZTCHttpClient::get(lrSecond.getPort(), "/api/v1/status"), StartsWith("HTTP/1.1 200 "));
+}
+
+TEST_F(Outlets, WhatRetentionTookBeforeTheFileHadItIsALineWithTheirNumber) {
+    ZTSSettings lSettings = settings();
+    lSettings.mNdjsonPath = mDirectory.path("events.ndjson");
+    mLimits.mDays = 1;
+    takeOne();
+    start(lSettings);
+    waitUntil([&] { return !value(scNdjsonSeq).empty(); }, "the first line");
+    mpOutlets.reset();
+    inTransaction([this] { store().setValue(scNdjsonSeq, value(scNdjsonSeq)); });
+    // While it is away an episode closes, another comes and goes, and both are retired.
+    takeOne(gcQueueFull, gcBase + gcMinute);
+    closeAt(gcBase + 60 * gcMinute);
+    const std::int64_t lLater = gcBase + 10 * gcDay;
+    while (store().retireStep(fromMicroseconds(lLater), std::chrono::steady_clock::now())) {
+    }
+    ASSERT_TRUE(episodes().empty());
+    takeOne(gcLink, lLater);
+    start(lSettings);
+    waitUntil([&] { return sParseLines(readFile(lSettings.mNdjsonPath)).size() >= 3; }, "the lines");
+    mpOutlets.reset();
+    const std::vector<nlohmann::json> lLines = sParseLines(readFile(lSettings.mNdjsonPath));
+    ASSERT_EQ(lLines.size(), 3U);
+    EXPECT_EQ(lLines[1]["kind"], "missed");
+    EXPECT_EQ(lLines[1]["count"], 3);  // the end of the first, and both changes of the second
+    EXPECT_EQ(lLines[2]["kind"], "link");
+    EXPECT_EQ(value("outlet.ndjson.told"), "3");
+    EXPECT_THAT(lines(), HasSubstr("retention removed 3 changes"));
+    EXPECT_EQ(history().getValue("outlet.ndjson.missed"), "3");
+}
+
+TEST_F(Outlets, BeforeTheDatabaseIsOpenTheMetricsAreWrittenAndTheServerAnswers) {
+    ZTSSettings lSettings = settings();
+    lSettings.mMetricsTextfile = mDirectory.path("tavik.prom");
+    lSettings.mNdjsonPath = mDirectory.path("events.ndjson");
+    lSettings.mHttpListen = "127.0.0.1:0";
+    takeOne();
+    ZTCOutlets& lrOutlets = start(lSettings, false);
+    waitUntil([&] { return exists(lSettings.mMetricsTextfile) && lrOutlets.getPort() != 0; }, "file and server");
+    EXPECT_THAT(readFile(lSettings.mMetricsTextfile), Not(HasSubstr("tavik_events_total")));
+    EXPECT_THAT(ZTCHttpClient::get(lrOutlets.getPort(), "/api/v1/events"), HasSubstr("has not opened its history yet"));
+    EXPECT_FALSE(exists(lSettings.mNdjsonPath));
+    lrOutlets.openHistory();
+    waitUntil([&] { return exists(lSettings.mNdjsonPath); }, "the lines");
+    EXPECT_THAT(ZTCHttpClient::get(lrOutlets.getPort(), "/metrics"), HasSubstr("tavik_events_total"));
+}
+
+TEST_F(Outlets, AHistoryThatCannotBeReadIsReportedAndReadLater) {
+    ZTSSettings lSettings = settings();
+    lSettings.mNdjsonPath = mDirectory.path("events.ndjson");
+    takeOne();
+    closeStore();
+    ASSERT_EQ(rename(path().c_str(), (path() + ".away").c_str()), 0);
+    ZTCOutlets& lrOutlets = startWithoutStore(lSettings);
+    waitUntil([&] { return lines().find("cannot read the history") != std::string::npos; }, "the report");
+    ASSERT_EQ(rename((path() + ".away").c_str(), path().c_str()), 0);
+    lrOutlets.wake();
+    waitUntil([&] { return lines().find("works again") != std::string::npos; }, "the end of the problem");
+    EXPECT_TRUE(exists(lSettings.mNdjsonPath));
+}
+
+TEST_F(Outlets, AMetricsFileWhoseFolderIsGoneIsReportedOnceAndComesBackWithIt) {
+    ZTSSettings lSettings = settings();
+    lSettings.mMetricsTextfile = mDirectory.path("missing/tavik.prom");
+    start(lSettings);
+    waitUntil([&] { return !lines().empty(); }, "the report");
+    EXPECT_THAT(lines(), HasSubstr(lSettings.mMetricsTextfile));
+    ASSERT_EQ(mkdir(mDirectory.path("missing").c_str(), 0700), 0);
+    waitUntil([&] { return exists(lSettings.mMetricsTextfile); }, "the file", ZTCDeadline(2 * gcTestPatience));
+    mpOutlets.reset();
+    EXPECT_EQ(std::ranges::count(lines(), '\n'), 2);
 }

@@ -129,14 +129,6 @@ timeout = 10
               (ZTSWarnRule{"deaf", 7, milliseconds(300000), "host", {"tell", "-u", ""}, milliseconds(10000)}));
 }
 
-TEST(Settings, AKeyWithoutAnOutputYetIsCheckedAndSaysSo) {
-    const ZTSSettingsReading lReading = parseSettings("[collect]\nperiod = 1\n[journal]\nenabled = true\n", "t.toml");
-    EXPECT_TRUE(lReading.isGood());
-    ASSERT_EQ(lReading.mNotes.size(), 1U);
-    EXPECT_EQ(lReading.mNotes[0].toText(),
-              "t.toml:4: journal.enabled: checked, but without effect: this version does not have that output yet");
-}
-
 TEST(Settings, ListenAddressesOfThisHostNeedNoPermission) {
     for (const char* lpListen : {"", "127.0.0.1:1", "127.9.9.9:65535", "[::1]:80", "localhost:80", "unix:/run/x"}) {
         EXPECT_EQ(sRead("http.listen = \"" + std::string(lpListen) + "\"").mHttpListen, lpListen);
