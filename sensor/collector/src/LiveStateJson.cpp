@@ -157,8 +157,6 @@ std::string toLiveStateJson(const ZTSLiveFacts& acrFacts) {
                    {"adapters", nullptr},
                    {"kinds", nullptr},
                    {"losses", sLosses(acrFacts.mLosses)},
-                   {"paths", nullptr},
-                   {"troubles", nullptr},
                    {"warnings", ZTCJson::parse(acrFacts.mWarnings)}};
     if (acrFacts.mpPage != nullptr) {
         lState["adapters"] = sAdapters(acrFacts);

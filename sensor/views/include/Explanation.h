@@ -20,7 +20,7 @@ struct ZTSExplainedPart {
 };
 
 struct ZTSExplanation {
-    std::string mSubject;  ///< "kind", "state", "episode" or "topics"
+    std::string mSubject;  ///< "kind", "state", "trouble", "episode" or "topics"
     std::string mId;       ///< "queue-full", "deaf", "118"
     std::string mTitle;
     std::vector<ZTSExplainedPart> mParts;
@@ -28,7 +28,7 @@ struct ZTSExplanation {
     std::optional<ZTSEpisode> mEpisode;
 };
 
-/// A kind or a state by its name; nothing where the text is neither.
+/// A kind, a state or a trouble of the SAN by its name; nothing where the text is none of them.
 std::optional<ZTSExplanation> explainTopic(std::string_view aText);
 
 /// Everything that can be explained, a line each.

@@ -19,9 +19,6 @@
 ///      "ledger": [{"initiator": {…}, "kind": "rscn", "received": 9, "refused": {"total-limit": 0}, "consolidated": 9,
 ///                  "handedOver": 9, "held": 0, "dropped": 0}],
 ///      "losses": {"since": "…", "refused": {"total-limit": 0}, "dropped": 0, "library": [{"name": "…", "count": 0}]},
-///      "paths": "96 LUNs, 8 paths each, all running",
-///      "troubles": [{"id": "path-lost", "title": "PATH LOST", "subject": "array7 ctrl-B  50:…:34  from host8",
-///                    "status": ["…"], "action": ["…"], "see": "tavik explain 118"}],
 ///      "warnings": [{"kind": "queue-full", "text": "queue-full of array7 ctrl-A: 120 within 300.0 s", "since": "…",
 ///                    "given": 2, "next": "…"}]}
 ///
@@ -40,9 +37,6 @@
 /// the
 ///   reader takes the rows that the history holds.
 /// - `losses`: what was refused or dropped in the last 24 hours, as far back as `since` where the collector knows less.
-/// - `paths` and `troubles` come with the sensor's topology: null until then. An empty `troubles` means that the SAN
-/// was
-///   judged and has none.
 ///
 /// - `warnings` are the open ones of the configuration's rules: `given` so often, `next` time if the trouble goes on. A
 ///   hook that failed is one of the kind `hook` until it works again.
@@ -154,16 +148,6 @@ struct ZTSLiveLosses {
     std::vector<ZTSLibraryLoss> mLibrary;
 };
 
-/// A trouble with what to say of it. The lines are for people.
-struct ZTSTroubleText {
-    std::string mId;       ///< stable, for programs: "path-lost"
-    std::string mTitle;    ///< "PATH LOST"; empty for a trouble of Tavik itself
-    std::string mSubject;  ///< behind the title
-    std::vector<std::string> mStatus;
-    std::vector<std::string> mAction;
-    std::string mSee;
-};
-
 /// A warning that is open.
 struct ZTSLiveWarning {
     std::string mKind;
@@ -183,8 +167,6 @@ struct ZTSLiveState {
     std::optional<std::vector<ZTSLiveKinds>> mKinds;
     std::optional<std::vector<ZTSLiveLedgerRow>> mLedger;
     std::optional<ZTSLiveLosses> mLosses;
-    std::string mPaths;
-    std::optional<std::vector<ZTSTroubleText>> mTroubles;
     std::optional<std::vector<ZTSLiveWarning>> mWarnings;
     std::vector<std::string> mProblems;  ///< members that could not be read, one line each
 };

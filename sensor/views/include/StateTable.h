@@ -12,6 +12,7 @@
 #include <vector>
 
 #include "sensor/views/include/StatusFacts.h"
+#include "sensor/views/include/TroubleText.h"
 
 /// What a state means for the people who rely on Tavik.
 enum ZTEVerdict : std::uint8_t {
@@ -67,5 +68,8 @@ std::string formatHeadline(const ZTSStatusFacts& acrFacts, const ZTSJudgement& a
 
 /// The troubles of Tavik itself that hold, with their words. Not those of the SAN.
 std::vector<ZTSTroubleText> describeTroubles(const ZTSStatusFacts& acrFacts, const ZTSJudgement& acrJudgement);
+
+/// The troubles of the SAN that count, in words, the worst first; notices are not among them.
+std::vector<ZTSTroubleText> describeSanTroubles(const ZTSStatusFacts& acrFacts);
 
 #endif

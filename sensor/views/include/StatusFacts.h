@@ -9,6 +9,7 @@
 #include "sensor/store/include/History.h"
 #include "sensor/views/include/LiveState.h"
 #include "sensor/views/include/NameBook.h"
+#include "sensor/views/include/SanFacts.h"
 
 /// What came of asking the running sensor.
 enum ZTEAnswer : std::uint8_t {
@@ -27,6 +28,13 @@ struct ZTSLeftPage {
     std::optional<ZTCHistoryTime> mLast;  ///< its last sign of life that is known
 };
 
+/// The newest topology of the history, judged.
+struct ZTSSanView {
+    ZTSSanFacts mFacts;
+    ZTCHistoryTime mScanned;  ///< when the topology was read
+    bool mIsStale = false;    ///< files of the kernel did not answer: what they say is as of earlier
+};
+
 /// What the history says for the status.
 struct ZTSHistoryFacts {
     std::string mStoreId;
@@ -38,6 +46,7 @@ struct ZTSHistoryFacts {
     std::string mLastEventKind;
     std::uint64_t mOpenEpisodes = 0;  ///< at most gcMostOpenEpisodes are counted
     std::uint64_t mOpenPorts = 0;     ///< different remote ports of these
+    std::optional<ZTSSanView> mSan;   ///< absent: no topology has been stored
 };
 
 /// Open episodes that the status counts at most: it has to answer at once.

@@ -23,6 +23,9 @@ nlohmann::ordered_json makeStatusDocument(const ZTSStatusFacts& acrFacts);
 nlohmann::ordered_json beginDocument(const std::string& acrCommand, const std::string& acrHost,
                                      const std::string& acrStoreId);
 
+/// {"id", "title", "subject", "severity", "status", "action", "see"}; a trouble of Tavik itself has no severity.
+nlohmann::ordered_json toJson(const ZTSTroubleText& acrTrouble);
+
 /// The gap as JSON.
 nlohmann::ordered_json toJson(const ZTSGap& acrGap);
 

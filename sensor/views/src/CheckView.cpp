@@ -4,11 +4,9 @@
 #include <array>
 #include <nlohmann/json.hpp>
 
+#include "sensor/views/include/SanTroubles.h"
 #include "sensor/views/include/StatusView.h"
 #include "sensor/views/include/TextTable.h"
-
-/// The trouble of the SAN that is critical; all others are warnings.
-static constexpr std::string_view scCriticalTrouble = "lun-without-path";
 
 static constexpr std::array<const char*, 4> scWords{"OK", "WARNING", "CRITICAL", "UNKNOWN"};
 
@@ -20,16 +18,27 @@ const char* getCheckWord(ZTECheckResult aResult) {
     return scWords.at(static_cast<std::size_t>(aResult));
 }
 
-/// Adds what the SAN's troubles make of the result, where the sensor judges it.
+/// What each severity of the SAN's troubles is to a monitoring system: a notice is only said.
+static constexpr std::array<ZTECheckResult, ZTSS_Count> scSanResults{ZTCR_Ok, ZTCR_Warning, ZTCR_Critical};
+
+/// Adds what the SAN's troubles make of the result. Where Tavik itself does not collect it says so alone: what it knows
+/// of the SAN is of earlier.
 static void sAddSan(const ZTSStatusFacts& acrFacts, ZTSCheck& arCheck) {
-    if (!acrFacts.mLive || !acrFacts.mLive->mTroubles || arCheck.mResult > ZTCR_Warning) {
+    if (!acrFacts.mHistory || !acrFacts.mHistory->mSan || arCheck.mResult > ZTCR_Warning) {
         return;
     }
-    for (const ZTSTroubleText& lrTrouble : *acrFacts.mLive->mTroubles) {
-        const ZTECheckResult lResult = lrTrouble.mId == scCriticalTrouble ? ZTCR_Critical : ZTCR_Warning;
-        arCheck.mResult = std::max(arCheck.mResult, lResult);
-        arCheck.mText += "; " + lrTrouble.mTitle + " " + lrTrouble.mSubject;
+    const ZTSSanFacts& lrSan = acrFacts.mHistory->mSan->mFacts;
+    std::size_t lNotices = 0;
+    for (const ZTSSanTrouble& lrTrouble : lrSan.mTroubles) {
+        arCheck.mResult = std::max(arCheck.mResult, scSanResults.at(lrTrouble.mSeverity));
+        if (lrTrouble.mSeverity == ZTSS_Notice) {
+            ++lNotices;
+            continue;
+        }
+        const ZTSTroubleText lText = describeSanTrouble(lrTrouble, lrSan, acrFacts.mNames, acrFacts.mNow);
+        arCheck.mText += "; " + lText.mTitle + " " + lText.mSubject;
     }
+    arCheck.mText += lNotices == 0 ? "" : "; " + formatCount(lNotices, "notice") + ": tavik paths";
 }
 
 ZTSCheck makeCheck(const ZTSStatusFacts& acrFacts, std::optional<std::uint64_t> aEvents) {

@@ -6,6 +6,7 @@
 #include "sensor/views/include/EpisodeJson.h"
 #include "sensor/views/include/EpisodeText.h"
 #include "sensor/views/include/KindTexts.h"
+#include "sensor/views/include/SanTroubles.h"
 #include "sensor/views/include/TextTable.h"
 #include "sensor/views/include/TimeText.h"
 
@@ -29,9 +30,24 @@ static ZTSExplanation sExplainState(const ZTSStateRow& acrRow) {
     return lExplanation;
 }
 
+static ZTSExplanation sExplainTrouble(const ZTSSanTroubleRow& acrRow) {
+    ZTSExplanation lExplanation;
+    lExplanation.mSubject = "trouble";
+    lExplanation.mId = acrRow.mpId;
+    lExplanation.mTitle = acrRow.mpTitle;
+    lExplanation.mParts = {{"means", {acrRow.mpMeans}},
+                           {"usual causes", {acrRow.mpCauses}},
+                           {"look at", {acrRow.mpLookAt}},
+                           {"action", {getSanAction(acrRow)}}};
+    return lExplanation;
+}
+
 std::optional<ZTSExplanation> explainTopic(std::string_view aText) {
     if (const ZTSStateRow* const lpRow = findState(aText)) {
         return sExplainState(*lpRow);
+    }
+    if (const ZTSSanTroubleRow* const lpRow = findSanTrouble(aText)) {
+        return sExplainTrouble(*lpRow);
     }
     if (const ZTSKindText* const lpText = findKindText(aText)) {
         ZTSExplanation lExplanation;
@@ -48,16 +64,20 @@ std::optional<ZTSExplanation> explainTopic(std::string_view aText) {
 ZTSExplanation explainTopics() {
     ZTSExplanation lExplanation;
     lExplanation.mSubject = "topics";
-    lExplanation.mTitle = "tavik explain KIND, STATE or EPISODE (a number of tavik events)";
+    lExplanation.mTitle = "tavik explain KIND, STATE, TROUBLE or EPISODE (a number of tavik events)";
     ZTSExplainedPart lStates{"states", {}};
     for (const ZTSStateRow& lrRow : getStateTable()) {
         lStates.mTexts.emplace_back(lrRow.mpId);
+    }
+    ZTSExplainedPart lTroubles{"troubles", {}};
+    for (const ZTSSanTroubleRow& lrRow : getSanTroubleTable()) {
+        lTroubles.mTexts.emplace_back(lrRow.mpId);
     }
     ZTSExplainedPart lKinds{"kinds", {}};
     for (const ZTSKindText& lrText : getKindTexts()) {
         lKinds.mTexts.push_back(lrText.mKind);
     }
-    lExplanation.mParts = {std::move(lStates), std::move(lKinds)};
+    lExplanation.mParts = {std::move(lStates), std::move(lTroubles), std::move(lKinds)};
     return lExplanation;
 }
 

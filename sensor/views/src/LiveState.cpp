@@ -241,17 +241,6 @@ static ZTSLiveLosses sReadLosses(const ZTCLiveObject& acrObject) {
     return lLosses;
 }
 
-static ZTSTroubleText sReadTrouble(const ZTCLiveObject& acrObject) {
-    ZTSTroubleText lTrouble;
-    acrObject.read("id", lTrouble.mId);
-    acrObject.read("title", lTrouble.mTitle);
-    acrObject.read("subject", lTrouble.mSubject);
-    acrObject.read("status", lTrouble.mStatus);
-    acrObject.read("action", lTrouble.mAction);
-    acrObject.read("see", lTrouble.mSee);
-    return lTrouble;
-}
-
 static ZTSLiveWarning sReadWarning(const ZTCLiveObject& acrObject) {
     ZTSLiveWarning lWarning;
     acrObject.read("kind", lWarning.mKind);
@@ -311,8 +300,6 @@ ZTSLiveState readLiveState(const ZTCJson& acrDocument) {
     if (lRoot.has("losses")) {
         lState.mLosses = sReadLosses(lRoot.object("losses"));
     }
-    lRoot.read("paths", lState.mPaths);
-    lRoot.readList("troubles", lState.mTroubles, sReadTrouble);
     lRoot.readList("warnings", lState.mWarnings, sReadWarning);
     return lState;
 }

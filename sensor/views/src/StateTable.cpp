@@ -3,6 +3,7 @@
 #include <algorithm>
 #include <array>
 
+#include "sensor/views/include/SanTroubles.h"
 #include "sensor/views/include/TextTable.h"
 #include "sensor/views/include/TimeText.h"
 
@@ -560,6 +561,13 @@ static ZTCLines sSplitLines(std::string_view aText) {
         aText.remove_prefix(std::min(lEnd + 1, aText.size()));
     }
     return lLines;
+}
+
+std::vector<ZTSTroubleText> describeSanTroubles(const ZTSStatusFacts& acrFacts) {
+    if (!acrFacts.mHistory || !acrFacts.mHistory->mSan) {
+        return {};
+    }
+    return describeSanTroubles(acrFacts.mHistory->mSan->mFacts, acrFacts.mNames, acrFacts.mNow, ZTSS_Warning);
 }
 
 std::vector<ZTSTroubleText> describeTroubles(const ZTSStatusFacts& acrFacts, const ZTSJudgement& acrJudgement) {

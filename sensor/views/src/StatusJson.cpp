@@ -2,6 +2,7 @@
 #include <nlohmann/json.hpp>
 
 #include "sensor/views/include/EpisodeJson.h"
+#include "sensor/views/include/SanTroubles.h"
 #include "sensor/views/include/StatusView.h"
 #include "sensor/views/include/TimeText.h"
 
@@ -43,16 +44,22 @@ ZTCJson toJson(const ZTSGap& acrGap) {
             {"counts", std::move(lCounts)}};
 }
 
-static ZTCJson sTrouble(const ZTSTroubleText& acrTrouble) {
-    return {
-        {"id", acrTrouble.mId},         {"title", sText(acrTrouble.mTitle)}, {"subject", sText(acrTrouble.mSubject)},
-        {"status", acrTrouble.mStatus}, {"action", acrTrouble.mAction},      {"see", sText(acrTrouble.mSee)}};
+ZTCJson toJson(const ZTSTroubleText& acrTrouble) {
+    ZTCJson lTrouble{
+        {"id", acrTrouble.mId}, {"title", sText(acrTrouble.mTitle)}, {"subject", sText(acrTrouble.mSubject)}};
+    if (!acrTrouble.mSeverity.empty()) {
+        lTrouble["severity"] = acrTrouble.mSeverity;
+    }
+    lTrouble["status"] = acrTrouble.mStatus;
+    lTrouble["action"] = acrTrouble.mAction;
+    lTrouble["see"] = sText(acrTrouble.mSee);
+    return lTrouble;
 }
 
 static ZTCJson sTroubles(const std::vector<ZTSTroubleText>& acrTroubles) {
     ZTCJson lTroubles = ZTCJson::array();
     for (const ZTSTroubleText& lrTrouble : acrTroubles) {
-        lTroubles.push_back(sTrouble(lrTrouble));
+        lTroubles.push_back(toJson(lrTrouble));
     }
     return lTroubles;
 }
@@ -223,8 +230,11 @@ ZTCJson makeStatusDocument(const ZTSStatusFacts& acrFacts) {
     lDocument["kinds"] = lIsLive ? sKinds(acrFacts.mLive->mKinds) : ZTCJson(nullptr);
     sAddHistory(acrFacts, lDocument);
     lDocument["lastEvent"] = {{"time", sTime(lLast.mTime)}, {"kind", sText(lLast.mKind)}};
-    lDocument["paths"] = lIsLive ? sText(acrFacts.mLive->mPaths) : ZTCJson(nullptr);
-    lDocument["san"] = lIsLive && acrFacts.mLive->mTroubles ? sTroubles(*acrFacts.mLive->mTroubles) : ZTCJson(nullptr);
+    const bool lHasSan = acrFacts.mHistory && acrFacts.mHistory->mSan;
+    lDocument["paths"] = lHasSan ? ZTCJson(summarizePaths(acrFacts.mHistory->mSan->mFacts)) : ZTCJson(nullptr);
+    lDocument["san"] =
+        lHasSan ? sTroubles(describeSanTroubles(acrFacts.mHistory->mSan->mFacts, acrFacts.mNames, acrFacts.mNow))
+                : ZTCJson(nullptr);
     lDocument["unknown"] = listUnknown(acrFacts);
     return lDocument;
 }

@@ -1,6 +1,7 @@
 #include <algorithm>
 #include <array>
 
+#include "sensor/views/include/SanTroubles.h"
 #include "sensor/views/include/StatusView.h"
 #include "sensor/views/include/TextTable.h"
 #include "sensor/views/include/TimeText.h"
@@ -12,6 +13,8 @@ static constexpr std::size_t scTextColumn = scLabelWidth + 2;
 static constexpr std::size_t scRightMargin = 3;
 /// Adapters that get a line each; of more only the number is shown.
 static constexpr std::size_t scMostLinks = 4;
+/// Troubles of the SAN that are shown in full, at most.
+static constexpr std::size_t scMostSanTroubles = 4;
 /// From this width of a line on there is room for whole WWPNs.
 static constexpr std::size_t scWholeWwpnWidth = 97;
 /// Without an event for this long it counts as quiet.
@@ -33,7 +36,8 @@ public:
 
     std::string build() {
         const std::vector<ZTSTroubleText> lTroubles = describeTroubles(mrFacts, mJudgement);
-        const bool lHasSanTroubles = mrFacts.mLive && mrFacts.mLive->mTroubles && !mrFacts.mLive->mTroubles->empty();
+        const std::vector<ZTSTroubleText> lSanTroubles = describeSanTroubles(mrFacts);
+        const bool lHasSanTroubles = !lSanTroubles.empty();
         addHead();
         addState(!lHasSanTroubles);
         for (const ZTSTroubleText& lrTrouble : lTroubles) {
@@ -45,7 +49,7 @@ public:
             addQuiet();
         }
         if (mJudgement.isCollecting() && (lTroubles.empty() || lHasSanTroubles)) {
-            addSan();
+            addSan(lSanTroubles);
         }
         if (!mJudgement.isCollecting()) {
             addData();
@@ -170,9 +174,13 @@ private:
         return lText;
     }
 
+    const ZTSSanView* findSan() const {
+        return mrFacts.mHistory && mrFacts.mHistory->mSan ? &*mrFacts.mHistory->mSan : nullptr;
+    }
+
     void addPaths() {
-        if (mrFacts.mLive && !mrFacts.mLive->mPaths.empty()) {
-            add("paths", mrFacts.mLive->mPaths);
+        if (const ZTSSanView* const lpSan = findSan()) {
+            add("paths", summarizePaths(lpSan->mFacts));
         }
     }
 
@@ -205,23 +213,44 @@ private:
         return (aHeld == 0 ? "0" : formatBytes(aHeld)) + " of " + formatBytes(aLimit);
     }
 
-    void addSan() {
-        if (mrFacts.mLive && mrFacts.mLive->mTroubles) {
-            const std::vector<ZTSTroubleText>& lrTroubles = *mrFacts.mLive->mTroubles;
-            add("SAN", lrTroubles.empty() ? "no trouble" : formatCount(lrTroubles.size(), "trouble"));
-            addSanTroubles(lrTroubles);
-        } else if (mrFacts.mHistory) {
-            const ZTSHistoryFacts& lrHistory = *mrFacts.mHistory;
-            const bool lIsMore = lrHistory.mOpenEpisodes == gcMostOpenEpisodes;
-            add("SAN", lrHistory.mOpenEpisodes == 0
-                           ? "no open episode: tavik events shows what was"
-                           : (lIsMore ? "at least " : "") + formatCount(lrHistory.mOpenEpisodes, "open episode") +
-                                 ", " + formatCount(lrHistory.mOpenPorts, "remote port") + ": tavik events --open");
+    void addSan(const std::vector<ZTSTroubleText>& acrTroubles) {
+        if (!acrTroubles.empty()) {
+            add("SAN", formatCount(acrTroubles.size(), "trouble"));
+            addSanTroubles(acrTroubles);
+            return;
+        }
+        std::vector<std::string> lParts;
+        if (const ZTSSanView* const lpSan = findSan()) {
+            const std::size_t lNotices = lpSan->mFacts.mTroubles.size();
+            lParts.push_back("no trouble" + (lNotices == 0 ? std::string()
+                                                           : "; " + formatCount(lNotices, "notice") + ": tavik paths"));
+        }
+        const std::string lOpen = describeOpenEpisodes();
+        if (!lOpen.empty()) {
+            lParts.push_back(lOpen);
+        }
+        for (std::size_t i = 0; i < lParts.size(); ++i) {
+            add(i == 0 ? "SAN" : "", lParts[i]);
         }
     }
 
+    /// "3 open episodes, 1 remote port: tavik events --open". Empty where there is nothing to say.
+    std::string describeOpenEpisodes() const {
+        if (!mrFacts.mHistory) {
+            return {};
+        }
+        const ZTSHistoryFacts& lrHistory = *mrFacts.mHistory;
+        if (lrHistory.mOpenEpisodes == 0) {
+            return lrHistory.mSan ? "" : "no open episode: tavik events shows what was";
+        }
+        const bool lIsMore = lrHistory.mOpenEpisodes == gcMostOpenEpisodes;
+        return (lIsMore ? "at least " : "") + formatCount(lrHistory.mOpenEpisodes, "open episode") + ", " +
+               formatCount(lrHistory.mOpenPorts, "remote port") + ": tavik events --open";
+    }
+
     void addSanTroubles(const std::vector<ZTSTroubleText>& acrTroubles) {
-        for (std::size_t i = 0; i < acrTroubles.size(); ++i) {
+        const std::size_t lShown = acrTroubles.size() <= scMostSanTroubles ? acrTroubles.size() : scMostSanTroubles - 1;
+        for (std::size_t i = 0; i < lShown; ++i) {
             const std::string lNumber = "[" + std::to_string(i + 1) + "] ";
             const std::string lTitle = cutText(escapeControls(acrTroubles[i].mTitle), mLineWidth - lNumber.size());
             const std::string lSubject = "   " + escapeControls(acrTroubles[i].mSubject);
@@ -229,6 +258,9 @@ private:
             mText += cutText(lSubject, mLineWidth - std::min(mLineWidth, lNumber.size() + countCharacters(lTitle)));
             mText += "\n";
             addTrouble(acrTroubles[i]);
+        }
+        if (lShown < acrTroubles.size()) {
+            mText += "and " + formatNumber(acrTroubles.size() - lShown) + " more: tavik paths --trouble\n";
         }
     }
 

@@ -45,11 +45,58 @@ TEST_F(CheckView, WhatCannotBeDeterminedIsUnknownAndHasNoFigures) {
     EXPECT_EQ(makeCheckDocument(lCheck, lFacts)["lost"], nullptr);
 }
 
-TEST_F(CheckView, TheSansTroublesCountWhereTheSensorJudgesThem) {
+TEST_F(CheckView, ReducedRedundancyIsAWarningAndALunWithoutAPathIsCritical) {
+    ZTSTopology lSan = makeSan({});
+    losePort(lSan, "rport-8:0-1");
+    ZTSStatusFacts lFacts = makeHealthyFacts();
+    lFacts.mNames.addName(wwnOf("50:06:01:60:00:00:01:01"), "array7 | ctrl-B");
+    setSan(lFacts, lSan);
+    EXPECT_EQ(makeCheck(lFacts, 0).mResult, ZTCR_Warning);
+    EXPECT_THAT(formatCheck(makeCheck(lFacts, 0)),
+                HasSubstr("nothing lost; PATH LOST array7 / ctrl-B  50:06:01:60:00:00:01:01  from host8 |"));
+    lSan.mPaths.erase(lSan.mPaths.begin() + 1, lSan.mPaths.end());
+    lSan.mPaths.at(0).mState = "offline";
+    setSan(lFacts, lSan);
+    EXPECT_EQ(makeCheck(lFacts, 0).mResult, ZTCR_Critical);
+    EXPECT_THAT(makeCheck(lFacts, 0).mText, HasSubstr("; NO PATH mpath0"));
+}
+
+TEST_F(CheckView, ASingleInitiatorByDesignIsOk) {
+    ZTSStatusFacts lFacts = makeHealthyFacts();
+    setSan(lFacts, makeSan({.mHosts = 1, .mPortsOfAHost = 1}));
+    EXPECT_EQ(makeCheck(lFacts, 0).mResult, ZTCR_Ok);
+    EXPECT_EQ(makeCheck(lFacts, 0).mText, "COLLECTING; nothing lost");
+}
+
+TEST_F(CheckView, APortThatContributesNoPathIsOnlyNamed) {
+    ZTSTopology lSan = makeSan({});
+    lSan.mRemotePorts.push_back(lSan.mRemotePorts[0]);
+    lSan.mRemotePorts.back().mName = "rport-7:0-9";
+    lSan.mRemotePorts.back().mWwpn = wwnOf("50:06:01:60:00:00:00:99");
+    ZTSStatusFacts lFacts = makeHealthyFacts();
+    setSan(lFacts, lSan);
+    EXPECT_EQ(makeCheck(lFacts, 0).mResult, ZTCR_Ok);
+    EXPECT_EQ(makeCheck(lFacts, 0).mText, "COLLECTING; nothing lost; 1 notice: tavik paths");
+}
+
+TEST_F(CheckView, APortThatFlapsIsAWarningAlsoWhileItIsThere) {
+    ZTSSanPast lPast;
+    lPast.mStates["rport-7:0-0"].mChanges = gcFlappingChanges;
+    ZTSStatusFacts lFacts = makeHealthyFacts();
+    setSan(lFacts, makeSan({}), lPast);
+    EXPECT_EQ(makeCheck(lFacts, 0).mResult, ZTCR_Warning);
+    lPast.mStates["rport-7:0-0"].mChanges = gcFlappingChanges - 1;
+    setSan(lFacts, makeSan({}), lPast);
+    EXPECT_EQ(makeCheck(lFacts, 0).mResult, ZTCR_Ok);
+}
+
+TEST_F(CheckView, AQuietHostAndOneWithoutATopologyAreOk) {
     nlohmann::json lLive = makeHealthyJson();
-    lLive["troubles"] = {{{"id", "path-lost"}, {"title", "PATH LOST"}, {"subject", "a|b"}}};
-    EXPECT_EQ(resultOf(lLive), ZTCR_Warning);
-    EXPECT_THAT(formatCheck(makeCheck(makeFacts(lLive), 0)), HasSubstr("nothing lost; PATH LOST a/b |"));
-    lLive["troubles"].push_back({{"id", "lun-without-path"}, {"title", "NO PATH"}});
-    EXPECT_EQ(resultOf(lLive), ZTCR_Critical);
+    lLive["collector"]["lastEvent"] = nullptr;
+    ZTSStatusFacts lFacts = makeFacts(lLive);
+    EXPECT_EQ(makeCheck(lFacts, 0).mResult, ZTCR_Ok);
+    lFacts.mHistory->mSan.reset();
+    EXPECT_EQ(makeCheck(lFacts, 0).mResult, ZTCR_Ok);
+    setSan(lFacts, {});
+    EXPECT_EQ(makeCheck(lFacts, 0).mResult, ZTCR_Ok);
 }

@@ -19,18 +19,17 @@ TEST(LiveState, EveryMemberIsRead) {
     EXPECT_EQ(lState.mAgent.mLimitBytes, 262144U);
     EXPECT_EQ(lState.mCollector.mDisk, ZTDK_Ok);
     EXPECT_EQ(lState.mCollector.mLastEventKind, "rscn");
-    ASSERT_TRUE(lState.mAdapters && lState.mKinds && lState.mLosses && lState.mTroubles);
+    ASSERT_TRUE(lState.mAdapters && lState.mKinds && lState.mLosses);
     EXPECT_EQ(lState.mAdapters->at(1).mPortState, "Online");
     EXPECT_EQ(lState.mKinds->at(0).mStates.at("rscn"), "listening");
     EXPECT_EQ(lState.mLosses->mRefused.at("total-limit"), 0U);
-    EXPECT_TRUE(lState.mTroubles->empty());
     EXPECT_FALSE(lState.mLedger);
 }
 
 TEST(LiveState, AnEmptyAnswerLeavesEverythingUnknown) {
     const ZTSLiveState lState = readLiveState(nlohmann::json::object());
     EXPECT_TRUE(lState.mProblems.empty());
-    EXPECT_FALSE(lState.mAgent.mIsRunning || lState.mAdapters || lState.mKinds || lState.mLosses || lState.mTroubles);
+    EXPECT_FALSE(lState.mAgent.mIsRunning || lState.mAdapters || lState.mKinds || lState.mLosses);
 }
 
 TEST(LiveState, MembersOfAWrongTypeAreUnknownAndNamed) {
@@ -42,14 +41,12 @@ TEST(LiveState, MembersOfAWrongTypeAreUnknownAndNamed) {
     lLive["adapters"][0]["wwpn"] = "10:00";
     lLive["kinds"][0]["kinds"]["rscn"] = 1;
     lLive["losses"] = 0;
-    lLive["troubles"] = {{{"status", {1}}}};
     const ZTSLiveState lState = readLiveState(lLive);
     EXPECT_FALSE(lState.mAgent.mPid || lState.mAgent.mHeldBytes || lState.mKeeper.mState || lState.mLosses);
-    EXPECT_THAT(lState.mProblems,
-                testing::UnorderedElementsAre(HasSubstr("agent.pid"), HasSubstr("agent.heldBytes"),
-                                              HasSubstr("keeper.state"), HasSubstr("collector.lastAsked"),
-                                              HasSubstr("adapters[0].wwpn"), HasSubstr("kinds[0].kinds.rscn"),
-                                              HasSubstr("losses"), HasSubstr("troubles[0].status")));
+    EXPECT_THAT(lState.mProblems, testing::UnorderedElementsAre(
+                                      HasSubstr("agent.pid"), HasSubstr("agent.heldBytes"), HasSubstr("keeper.state"),
+                                      HasSubstr("collector.lastAsked"), HasSubstr("adapters[0].wwpn"),
+                                      HasSubstr("kinds[0].kinds.rscn"), HasSubstr("losses")));
 }
 
 TEST(LiveState, SomethingElseThanAnObjectIsNamed) {

@@ -27,27 +27,74 @@ TEST_F(StatusText, AHealthyHostShowsItsLinksItsPathsAndHowQuietItIs) {
 )");
 }
 
-TEST_F(StatusText, TroublesOfTheSanAreNumberedWithStatusActionAndSee) {
-    nlohmann::json lLive = makeHealthyJson();
-    const nlohmann::json lTrouble{{"id", "path-lost"},
-                                  {"title", "PATH LOST"},
-                                  {"subject", "array7 ctrl-B  50:06:01:68:3b:a0:12:34  from host8"},
-                                  {"status",
-                                   {"Not Present since 09:57:40. 40 LUNs run on 7 of 8 paths; I/O goes on.",
-                                    "host8 still reaches its 3 other ports: not its cable."}},
-                                  {"action", {"Look at ctrl-B's port on the array and switch, then at its zone."}},
-                                  {"see", "tavik explain 118"}};
-    lLive["troubles"] = {lTrouble, lTrouble};
-    const std::string lBlock = R"( PATH LOST   array7 ctrl-B  50:06:01:68:3b:a0:12:34  from host8
+/// The healthy host, whose second initiator has lost a port 6 minutes ago.
+static ZTSStatusFacts sWithoutAPort() {
+    const ZTSTopology lBefore = makeSan({.mLuns = 40});
+    ZTSTopology lSan = lBefore;
+    removePort(lSan, "rport-8:0-1");
+    ZTSSanPast lPast{.mEarlier = {lBefore}};
+    lPast.mStates["rport-8:0-1"] = {.mSince = timeOf("2026-11-21T09:57:40+01:00"), .mChanges = 1};
+    ZTSStatusFacts lFacts = makeHealthyFacts();
+    lFacts.mNames.addName(wwnOf("50:06:01:60:00:00:01:01"), "array7 ctrl-B");
+    setSan(lFacts, lSan, lPast);
+    return lFacts;
+}
+
+TEST_F(StatusText, ATroubleOfTheSanHasStatusActionAndSee) {
+    EXPECT_EQ(format(sWithoutAPort()),
+              R"(  host: db07                                              2026-11-21 10:04:12
+ state: COLLECTING; nothing lost
+   SAN: 1 trouble
+[1] PATH LOST   array7 ctrl-B  50:06:01:60:00:00:01:01  from host8
 status: Not Present since 09:57:40. 40 LUNs run on 7 of 8 paths; I/O goes on.
         host8 still reaches its 3 other ports: not its cable.
-action: Look at ctrl-B's port on the array and switch, then at its zone.
-   see: tavik explain 118
-)";
-    EXPECT_EQ(format(makeFacts(lLive)), R"(  host: db07                                              2026-11-21 10:04:12
+action: Look at array7 ctrl-B on the array and the switch, then at its zone.
+   see: tavik explain path-lost
+)");
+}
+
+TEST_F(StatusText, SeveralTroublesOfTheSanAreNumberedTheWorstFirst) {
+    ZTSTopology lSan = makeSan({.mHosts = 1, .mPortsOfAHost = 2, .mLuns = 40});
+    losePort(lSan, "rport-7:0-1");
+    ZTSStatusFacts lFacts = makeHealthyFacts();
+    setSan(lFacts, lSan);
+    EXPECT_EQ(format(lFacts), R"(  host: db07                                              2026-11-21 10:04:12
  state: COLLECTING; nothing lost
    SAN: 2 troubles
-[1])" + lBlock + "[2]" + lBlock);
+[1] REDUNDANCY LOST   40 LUNs
+status: mpath0 (/data/0), mpath1 (/data/1), mpath2 (/data/2) and 37 more are
+        down to one path, initiator or remote port.
+        40 LUNs run on 1 of 2 paths; I/O goes on.
+action: Mend the cause before the next fault;  tavik paths --trouble
+   see: tavik explain redundancy-lost
+[2] PATH LOST   50:06:01:60:00:00:00:01  from host7
+status: Blocked. 40 LUNs run on 1 of 2 paths; I/O goes on.
+        host7 still reaches its other port: not its cable.
+action: Look at 50:06:01:60:00:00:00:01 on the array and the switch, then at
+        its zone.
+   see: tavik explain path-lost
+)");
+}
+
+TEST_F(StatusText, ManyTroublesOfTheSanAreCutToAFew) {
+    ZTSTopology lSan = makeSan({.mPortsOfAHost = 8});
+    for (const char* lpPort : {"0", "1", "2", "3", "4"}) {
+        losePort(lSan, std::string("rport-7:0-") + lpPort);
+    }
+    ZTSStatusFacts lFacts = makeHealthyFacts();
+    setSan(lFacts, lSan);
+    const std::string lText = format(lFacts);
+    EXPECT_THAT(lText, HasSubstr("   SAN: 5 troubles\n"));
+    EXPECT_THAT(lText, HasSubstr("\nand 2 more: tavik paths --trouble\n"));
+}
+
+TEST_F(StatusText, ANoticeOfTheSanIsNoTrouble) {
+    ZTSTopology lSan = makeSan({});
+    lSan.mInitiators.push_back({.mHost = "host9", .mState = "Linkdown"});
+    ZTSStatusFacts lFacts = makeHealthyFacts();
+    setSan(lFacts, lSan);
+    EXPECT_THAT(format(lFacts), HasSubstr(" paths: 4 LUNs, 8 paths each, all running\n"));
+    EXPECT_THAT(format(lFacts), HasSubstr("   SAN: no trouble; 1 notice: tavik paths\n"));
 }
 
 TEST_F(StatusText, ADeafSensorNamesWhatItDoesNotHearAndWhy) {
@@ -154,21 +201,23 @@ TEST_F(StatusText, UnknownFiguresAreLeftOutAndNamedInsteadOfBeingZero) {
     lLive["collector"] = nullptr;
     lLive["losses"] = nullptr;
     lLive["adapters"] = nullptr;
-    lLive["troubles"] = nullptr;
     lLive["agent"].erase("heldBytes");
-    const std::string lText = format(makeFacts(lLive));
+    ZTSStatusFacts lFacts = makeFacts(lLive);
+    lFacts.mHistory->mSan.reset();
+    const std::string lText = format(lFacts);
     EXPECT_THAT(lText, HasSubstr(" quiet: no event yet\n"));
     EXPECT_THAT(lText, HasSubstr(" links: host7  10:..:01  -  listening"));
     EXPECT_THAT(lText, HasSubstr("  note: the sensor did not say what was refused in the last 24 h\n"));
     EXPECT_THAT(lText, HasSubstr("   SAN: no open episode"));
 }
 
-TEST_F(StatusText, OpenEpisodesAreCountedWhereNobodyJudgesTheSan) {
-    nlohmann::json lLive = makeHealthyJson();
-    lLive["troubles"] = nullptr;
-    ZTSStatusFacts lFacts = makeFacts(lLive);
+TEST_F(StatusText, OpenEpisodesAreCountedAlsoWhereThePathsHaveNoTrouble) {
+    ZTSStatusFacts lFacts = makeHealthyFacts();
     lFacts.mHistory->mOpenEpisodes = 3;
     lFacts.mHistory->mOpenPorts = 1;
+    EXPECT_THAT(format(lFacts),
+                HasSubstr("   SAN: no trouble\n        3 open episodes, 1 remote port: tavik events --open\n"));
+    lFacts.mHistory->mSan.reset();
     EXPECT_THAT(format(lFacts), HasSubstr("   SAN: 3 open episodes, 1 remote port: tavik events --open\n"));
 }
 
@@ -206,7 +255,7 @@ TEST_F(StatusText, ColorStandsAroundTheVerdictAlone) {
 }
 
 TEST_F(StatusText, TextsFromElsewhereCannotSteerTheTerminal) {
-    nlohmann::json lLive = makeHealthyJson();
-    lLive["paths"] = "\x1b[2Jgone";
-    EXPECT_THAT(format(makeFacts(lLive)), HasSubstr(" paths: \\x1b[2Jgone\n"));
+    ZTSStatusFacts lFacts = sWithoutAPort();
+    lFacts.mNames.addName(wwnOf("50:06:01:60:00:00:01:01"), "\x1b[2Jgone");
+    EXPECT_THAT(format(lFacts), HasSubstr("] PATH LOST   \\x1b[2Jgone  50:06"));
 }

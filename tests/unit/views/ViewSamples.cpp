@@ -70,9 +70,7 @@ nlohmann::json makeHealthyJson() {
              {{{"wwpn", lOne}, {"host", "host7"}, {"portState", "Online"}},
               {{"wwpn", lTwo}, {"host", "host8"}, {"portState", "Online"}}}},
             {"kinds", {sKinds("host7", lOne), sKinds("host8", lTwo)}},
-            {"losses", {{"since", "2026-11-20T10:04:12+01:00"}, {"refused", {{"total-limit", 0}}}, {"dropped", 0}}},
-            {"paths", "96 LUNs, 8 paths each, all running"},
-            {"troubles", nlohmann::json::array()}};
+            {"losses", {{"since", "2026-11-20T10:04:12+01:00"}, {"refused", {{"total-limit", 0}}}, {"dropped", 0}}}};
 }
 
 ZTSStatusFacts makeFacts(const nlohmann::json& acrLive) {
@@ -85,7 +83,14 @@ ZTSStatusFacts makeFacts(const nlohmann::json& acrLive) {
     lFacts.mHistory->mStoreId = "00112233445566778899aabbccddeeff";
     lFacts.mHistory->mLastRun = ZTSRun{
         .mFrom = timeOf("2026-11-14T08:12:00+01:00"), .mTo = timeOf("2026-11-21T10:04:00+01:00"), .mIsOpen = true};
+    setSan(lFacts, makeSan({.mLuns = 96}));
     return lFacts;
+}
+
+void setSan(ZTSStatusFacts& arFacts, const ZTSTopology& acrTopology, const ZTSSanPast& acrPast) {
+    arFacts.mHistory->mSan = ZTSSanView{.mFacts = findSanFacts(acrTopology, acrPast),
+                                        .mScanned = arFacts.mNow,
+                                        .mIsStale = !acrTopology.mBlocked.empty()};
 }
 
 ZTSStatusFacts makeHealthyFacts() {
