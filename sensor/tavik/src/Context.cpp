@@ -48,6 +48,9 @@ ZTCNameBook ZTCContext::makeNames(const ZTCHistory* apHistory) const {
         for (const ZTSRemotePort& lrPort : apHistory->readRemotePorts()) {
             lNames.addRemotePort(lrPort);
         }
+        if (const auto lStored = apHistory->readTopology(toMicroseconds(getHistoryTime()))) {
+            addPorts(lNames, lStored->mTopology);
+        }
     }
     return lNames;
 }

@@ -40,6 +40,9 @@ struct ZTSTavikOptions {
     std::string mSubject;  ///< of explain
     std::string mMark;
     std::string mMarkTime;  ///< empty: now
+    std::string mAt;  ///< of paths
+    bool mIsTroubleOnly = false;
+    bool mIsEachPath = false;
     ZTSFilterTexts mFilter;
 };
 
@@ -57,6 +60,7 @@ void writeDocument(const nlohmann::ordered_json& acrDocument);
 int runStatus(const ZTSTavikOptions& acrOptions);
 int runEvents(const ZTSTavikOptions& acrOptions);
 int runPorts(const ZTSTavikOptions& acrOptions);
+int runPaths(const ZTSTavikOptions& acrOptions);
 int runExplain(const ZTSTavikOptions& acrOptions);
 int runCheck(const ZTSTavikOptions& acrOptions);
 int runMark(const ZTSTavikOptions& acrOptions);

@@ -34,10 +34,7 @@ static void sEndWithReader() {
     sigprocmask(SIG_UNBLOCK, &lPipe, nullptr);
 }
 
-static void sAddFilter(CLI::App& arCommand, ZTSFilterTexts& arFilter) {
-    arCommand.add_option("--since", arFilter.mSince, "From a time, a duration back from now, or a mark's name on");
-    arCommand.add_option("--until", arFilter.mUntil, "Up to a time, a duration back from now, or a mark's name");
-    arCommand.add_option("--kind", arFilter.mKinds, "Of this kind; may be repeated")->expected(1)->take_all();
+static void sAddPorts(CLI::App& arCommand, ZTSFilterTexts& arFilter) {
     arCommand.add_option("--port", arFilter.mPorts, "Of this remote port: WWPN or name; may be repeated")
         ->expected(1)
         ->take_all();
@@ -45,6 +42,13 @@ static void sAddFilter(CLI::App& arCommand, ZTSFilterTexts& arFilter) {
         .add_option("--initiator", arFilter.mInitiators, "Of this adapter port: WWPN, name or hostN; may be repeated")
         ->expected(1)
         ->take_all();
+}
+
+static void sAddFilter(CLI::App& arCommand, ZTSFilterTexts& arFilter) {
+    arCommand.add_option("--since", arFilter.mSince, "From a time, a duration back from now, or a mark's name on");
+    arCommand.add_option("--until", arFilter.mUntil, "Up to a time, a duration back from now, or a mark's name");
+    arCommand.add_option("--kind", arFilter.mKinds, "Of this kind; may be repeated")->expected(1)->take_all();
+    sAddPorts(arCommand, arFilter);
 }
 
 /// Parses the line and runs its command.
@@ -80,8 +84,18 @@ static int sRun(int aCount, const char* const* appArguments) {
     lpEvents->add_flag("--records", lOptions.mIsRecords, "The raw records that are kept of them");
     lpEvents->add_flag("--follow", lOptions.mIsFollow, "Then print what comes, until interrupted");
     sAddFilter(*lAdd("ports", "List remote ports by how many events they had", runPorts), lOptions.mFilter);
-    lAdd("explain", "Say what a kind, a state or an episode means, and what to look at", runExplain)
-        ->add_option("WHAT", lOptions.mSubject, "A kind, a state, or an episode's number; without: a list");
+    CLI::App* const lpPaths = lAdd("paths", "List LUNs with their paths, and what is wrong with them", runPaths);
+    sAddPorts(*lpPaths, lOptions.mFilter);
+    lpPaths
+        ->add_option("--lun", lOptions.mFilter.mLuns,
+                     "This LUN: number, wwid, multipath device or disk; may be repeated")
+        ->expected(1)
+        ->take_all();
+    lpPaths->add_option("--at", lOptions.mAt, "As it was at a time, a duration back from now, or a mark");
+    lpPaths->add_flag("--trouble", lOptions.mIsTroubleOnly, "Only LUNs that lack a path");
+    lpPaths->add_flag("--each", lOptions.mIsEachPath, "A line for each path, not only for those with a trouble");
+    lAdd("explain", "Say what a kind, a state, a trouble or an episode means, and what to look at", runExplain)
+        ->add_option("WHAT", lOptions.mSubject, "A kind, a state, a trouble, or an episode's number; without: a list");
     lAdd("check", "Report in one line for a monitoring system: 0 OK, 1 WARNING, 2 CRITICAL, 3 UNKNOWN", runCheck)
         ->add_option("--since", lOptions.mFilter.mSince, "How far back gaps and events count; default: 10m");
     CLI::App* const lpMark = lAdd("mark", "Give this moment a name, for --since and --until", runMark);

@@ -9,7 +9,7 @@
 #include "sensor/store/include/History.h"
 #include "sensor/views/include/LiveState.h"
 #include "sensor/views/include/NameBook.h"
-#include "sensor/views/include/SanFacts.h"
+#include "sensor/views/include/SanView.h"
 
 /// What came of asking the running sensor.
 enum ZTEAnswer : std::uint8_t {
@@ -26,13 +26,6 @@ struct ZTSLeftPage {
     bool mIsAgentAlive = false;           ///< its process runs on, without a sensor
     bool mHasEndedInOrder = false;        ///< the agent itself noted why it ended
     std::optional<ZTCHistoryTime> mLast;  ///< its last sign of life that is known
-};
-
-/// The newest topology of the history, judged.
-struct ZTSSanView {
-    ZTSSanFacts mFacts;
-    ZTCHistoryTime mScanned;  ///< when the topology was read
-    bool mIsStale = false;    ///< files of the kernel did not answer: what they say is as of earlier
 };
 
 /// What the history says for the status.
@@ -91,6 +84,9 @@ struct ZTSLastEvent {
 };
 
 ZTSLastEvent findLastEvent(const ZTSStatusFacts& acrFacts);
+
+/// A topology that is older than this, while the sensor runs, is not as of now.
+inline constexpr std::chrono::minutes gcScanSpan{5};
 
 /// One line for each thing that could not be learned.
 std::vector<std::string> listUnknown(const ZTSStatusFacts& acrFacts);

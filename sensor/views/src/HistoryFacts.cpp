@@ -31,5 +31,6 @@ ZTSHistoryFacts readHistoryFacts(const ZTCHistory& acrHistory, ZTCHistoryTime aN
         return true;
     });
     lFacts.mOpenPorts = lPorts.size();
+    lFacts.mSan = readSan(acrHistory, aNow);
     return lFacts;
 }

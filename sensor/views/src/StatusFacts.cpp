@@ -1,5 +1,8 @@
 #include "sensor/views/include/StatusFacts.h"
 
+#include "sensor/views/include/TextTable.h"
+#include "sensor/views/include/TimeText.h"
+
 ZTSLossSum sumLosses(const ZTSStatusFacts& acrFacts) {
     ZTSLossSum lSum;
     if (acrFacts.mHistory) {
@@ -42,6 +45,13 @@ std::vector<std::string> listUnknown(const ZTSStatusFacts& acrFacts) {
     };
     lAdd(!acrFacts.mHistory && !acrFacts.mHistoryProblem.empty(), acrFacts.mHistoryProblem);
     lAdd(acrFacts.mAnswer == ZTAN_NoSensor && !acrFacts.mPageProblem.empty(), acrFacts.mPageProblem);
+    if (acrFacts.mLive && acrFacts.mHistory && acrFacts.mHistory->mSan) {
+        const ZTSSanView& lrSan = *acrFacts.mHistory->mSan;
+        lAdd(lrSan.mIsStale, "the paths are not whole: " + formatCount(lrSan.mFacts.mBlocked, "file") +
+                                 " of /sys did not answer; of them earlier values are shown");
+        lAdd(acrFacts.mNow - lrSan.mScanned > gcScanSpan,
+             "the paths were last read at " + formatShortTime(lrSan.mScanned, acrFacts.mNow));
+    }
     if (acrFacts.mLive) {
         const ZTSLiveState& lrLive = *acrFacts.mLive;
         lUnknown.insert(lUnknown.end(), lrLive.mProblems.begin(), lrLive.mProblems.end());

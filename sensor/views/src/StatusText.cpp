@@ -5,12 +5,8 @@
 #include "sensor/views/include/StatusView.h"
 #include "sensor/views/include/TextTable.h"
 #include "sensor/views/include/TimeText.h"
+#include "sensor/views/src/PageText.h"
 
-/// Labels stand at the right edge of a column of this width, followed by ": ".
-static constexpr std::size_t scLabelWidth = 6;
-static constexpr std::size_t scTextColumn = scLabelWidth + 2;
-/// Left free at the right edge, so that a quoted or indented copy still fits.
-static constexpr std::size_t scRightMargin = 3;
 /// Adapters that get a line each; of more only the number is shown.
 static constexpr std::size_t scMostLinks = 4;
 /// Troubles of the SAN that are shown in full, at most.
@@ -20,7 +16,6 @@ static constexpr std::size_t scWholeWwpnWidth = 97;
 /// Without an event for this long it counts as quiet.
 static constexpr std::chrono::minutes scQuietSpan{1};
 
-static constexpr const char* scBold = "1";
 static constexpr const char* scGreen = "1;32";
 static constexpr const char* scYellow = "1;33";
 static constexpr const char* scRed = "1;31";
@@ -29,10 +24,7 @@ static constexpr const char* scRed = "1;31";
 class ZTCStatusText {
 public:
     ZTCStatusText(const ZTSStatusFacts& acrFacts, const ZTSTextStyle& acrStyle)
-        : mrFacts(acrFacts),
-          mrStyle(acrStyle),
-          mLineWidth(std::max(acrStyle.mWidth, scTextColumn + scRightMargin + 20) - scRightMargin),
-          mJudgement(judge(acrFacts)) {}
+        : mrFacts(acrFacts), mPage(acrStyle), mJudgement(judge(acrFacts)) {}
 
     std::string build() {
         const std::vector<ZTSTroubleText> lTroubles = describeTroubles(mrFacts, mJudgement);
@@ -41,7 +33,7 @@ public:
         addHead();
         addState(!lHasSanTroubles);
         for (const ZTSTroubleText& lrTrouble : lTroubles) {
-            addTrouble(lrTrouble);
+            mPage.addTrouble(lrTrouble);
         }
         if (mJudgement.isCollecting() && lTroubles.empty() && !lHasSanTroubles) {
             addLinks();
@@ -55,45 +47,19 @@ public:
             addData();
         }
         for (const std::string& lrText : listUnknown(mrFacts)) {
-            add("note", lrText);
+            mPage.add("note", lrText);
         }
-        return std::move(mText);
+        return mPage.take();
     }
 
 private:
-    std::string paint(const std::string& acrText, const char* apColor) const {
-        return mrStyle.mHasColor ? "\x1b[" + std::string(apColor) + "m" + acrText + "\x1b[0m" : acrText;
-    }
-
-    /// A line whose parts are as wide as they look; nothing is wrapped.
-    void addRaw(const std::string& acrLabel, const std::string& acrText) {
-        const std::string lPadding(scLabelWidth - std::min(scLabelWidth, acrLabel.size()), ' ');
-        mText += (acrLabel.empty() ? std::string(scTextColumn, ' ') : lPadding + acrLabel + ": ") + acrText + "\n";
-    }
-
-    /// A paragraph, wrapped; a line that has columns and fits stays as it is.
-    void add(const std::string& acrLabel, const std::string& acrText) {
-        const std::string lText = escapeControls(acrText);
-        const std::size_t lRoom = mLineWidth - scTextColumn;
-        const bool lFits = countCharacters(lText) <= lRoom;
-        bool lIsFirst = true;
-        for (const std::string& lrLine : lFits ? std::vector<std::string>{lText} : wrapText(lText, lRoom)) {
-            addRaw(lIsFirst ? acrLabel : "", lrLine);
-            lIsFirst = false;
-        }
-    }
-
-    void addParagraphs(const std::string& acrLabel, const std::vector<std::string>& acrTexts) {
-        for (std::size_t i = 0; i < acrTexts.size(); ++i) {
-            add(i == 0 ? acrLabel : "", acrTexts[i]);
-        }
-    }
-
     void addHead() {
         const std::string lTime = formatDateTime(mrFacts.mNow);
-        const std::string lHost = cutText(escapeControls(mrFacts.mHost), mLineWidth - scTextColumn - lTime.size() - 1);
-        const std::size_t lUsed = scTextColumn + countCharacters(lHost) + lTime.size();
-        addRaw("host", lHost + std::string(mLineWidth - std::min(mLineWidth - 1, lUsed), ' ') + lTime);
+        const std::string lHost =
+            cutText(escapeControls(mrFacts.mHost), mPage.getLineWidth() - ZTCPageText::scTextColumn - lTime.size() - 1);
+        const std::size_t lUsed = ZTCPageText::scTextColumn + countCharacters(lHost) + lTime.size();
+        mPage.addRaw(
+            "host", lHost + std::string(mPage.getLineWidth() - std::min(mPage.getLineWidth() - 1, lUsed), ' ') + lTime);
     }
 
     void addState(bool aHasSince) {
@@ -103,13 +69,8 @@ private:
                                                                 : scYellow;
         const std::string lWord = getVerdictWord(lVerdict);
         const std::string lRest = formatHeadline(mrFacts, mJudgement, aHasSince).substr(lWord.size());
-        addRaw("state", paint(lWord, lpColor) + cutText(lRest, mLineWidth - scTextColumn - lWord.size()));
-    }
-
-    void addTrouble(const ZTSTroubleText& acrTrouble) {
-        addParagraphs("status", acrTrouble.mStatus);
-        addParagraphs("action", acrTrouble.mAction);
-        add("see", acrTrouble.mSee);
+        mPage.addRaw("state", mPage.paint(lWord, lpColor) +
+                                  cutText(lRest, mPage.getLineWidth() - ZTCPageText::scTextColumn - lWord.size()));
     }
 
     /// The adapters with their kinds counted by state.
@@ -122,9 +83,9 @@ private:
         std::vector<std::array<std::string, 4>> lRows;
         for (std::size_t i = 0; i < lShown; ++i) {
             const ZTSInitiator& lrInitiator = lrKinds[i].mInitiator;
-            const std::string lWwpn = !lrInitiator.mWwpn              ? "-"
-                                      : mLineWidth < scWholeWwpnWidth ? abbreviateWwn(*lrInitiator.mWwpn)
-                                                                      : lrInitiator.mWwpn->toText();
+            const std::string lWwpn = !lrInitiator.mWwpn                        ? "-"
+                                      : mPage.getLineWidth() < scWholeWwpnWidth ? abbreviateWwn(*lrInitiator.mWwpn)
+                                                                                : lrInitiator.mWwpn->toText();
             lRows.push_back({lrInitiator.mHost, lWwpn, findPortState(lrInitiator), countKinds(lrKinds[i])});
         }
         std::array<std::size_t, 3> lWidths{};
@@ -141,10 +102,10 @@ private:
                 }
                 lLine += lRows[i][j] + std::string(lWidths[j] - countCharacters(lRows[i][j]) + 2, ' ');
             }
-            add(i == 0 ? "links" : "", lLine + lRows[i][3]);
+            mPage.add(i == 0 ? "links" : "", lLine + lRows[i][3]);
         }
         if (lShown < lrKinds.size()) {
-            add("", "and " + std::to_string(lrKinds.size() - lShown) + " more: tavik --json status");
+            mPage.add("", "and " + std::to_string(lrKinds.size() - lShown) + " more: tavik --json status");
         }
     }
 
@@ -180,7 +141,7 @@ private:
 
     void addPaths() {
         if (const ZTSSanView* const lpSan = findSan()) {
-            add("paths", summarizePaths(lpSan->mFacts));
+            mPage.add("paths", summarizePaths(lpSan->mFacts));
         }
     }
 
@@ -205,7 +166,7 @@ private:
             lText += (lText.empty() ? "" : "; ") + lrPart;
         }
         const bool lIsQuiet = !lLast.mTime || mrFacts.mNow - *lLast.mTime >= scQuietSpan;
-        add(lIsQuiet ? "quiet" : "events", lText);
+        mPage.add(lIsQuiet ? "quiet" : "events", lText);
     }
 
     /// "0 of 256 KiB": the first without a unit where it is nothing.
@@ -215,8 +176,8 @@ private:
 
     void addSan(const std::vector<ZTSTroubleText>& acrTroubles) {
         if (!acrTroubles.empty()) {
-            add("SAN", formatCount(acrTroubles.size(), "trouble"));
-            addSanTroubles(acrTroubles);
+            mPage.add("SAN", formatCount(acrTroubles.size(), "trouble"));
+            mPage.addNumbered(acrTroubles, scMostSanTroubles);
             return;
         }
         std::vector<std::string> lParts;
@@ -230,7 +191,7 @@ private:
             lParts.push_back(lOpen);
         }
         for (std::size_t i = 0; i < lParts.size(); ++i) {
-            add(i == 0 ? "SAN" : "", lParts[i]);
+            mPage.add(i == 0 ? "SAN" : "", lParts[i]);
         }
     }
 
@@ -248,22 +209,6 @@ private:
                formatCount(lrHistory.mOpenPorts, "remote port") + ": tavik events --open";
     }
 
-    void addSanTroubles(const std::vector<ZTSTroubleText>& acrTroubles) {
-        const std::size_t lShown = acrTroubles.size() <= scMostSanTroubles ? acrTroubles.size() : scMostSanTroubles - 1;
-        for (std::size_t i = 0; i < lShown; ++i) {
-            const std::string lNumber = "[" + std::to_string(i + 1) + "] ";
-            const std::string lTitle = cutText(escapeControls(acrTroubles[i].mTitle), mLineWidth - lNumber.size());
-            const std::string lSubject = "   " + escapeControls(acrTroubles[i].mSubject);
-            mText += lNumber + paint(lTitle, scBold);
-            mText += cutText(lSubject, mLineWidth - std::min(mLineWidth, lNumber.size() + countCharacters(lTitle)));
-            mText += "\n";
-            addTrouble(acrTroubles[i]);
-        }
-        if (lShown < acrTroubles.size()) {
-            mText += "and " + formatNumber(acrTroubles.size() - lShown) + " more: tavik paths --trouble\n";
-        }
-    }
-
     /// Up to when the history is complete.
     void addData() {
         if (!mrFacts.mHistory) {
@@ -275,15 +220,13 @@ private:
         if (lrHistory.mLastRun && (!lMayLack || !lComplete)) {
             lComplete = std::max(lComplete.value_or(lrHistory.mLastRun->mTo), lrHistory.mLastRun->mTo);
         }
-        add("data", (lComplete ? "complete to " + formatShortTime(*lComplete, mrFacts.mNow) + "; " : "") +
-                        "tavik events still works");
+        mPage.add("data", (lComplete ? "complete to " + formatShortTime(*lComplete, mrFacts.mNow) + "; " : "") +
+                              "tavik events still works");
     }
 
     const ZTSStatusFacts& mrFacts;
-    const ZTSTextStyle& mrStyle;
-    const std::size_t mLineWidth;
+    ZTCPageText mPage;
     const ZTSJudgement mJudgement;
-    std::string mText;
 };
 
 std::string formatStatus(const ZTSStatusFacts& acrFacts, const ZTSTextStyle& acrStyle) {

@@ -10,6 +10,7 @@
 #include "sensor/views/include/EpisodeJson.h"
 #include "sensor/views/include/Explanation.h"
 #include "sensor/views/include/FilterText.h"
+#include "sensor/views/include/PathsView.h"
 #include "sensor/views/include/StatusView.h"
 #include "sensor/views/include/Timeline.h"
 #include "sensor/web/src/PageFiles.h"
@@ -35,6 +36,14 @@ static void sCheckNames(const ZTSWebRequest& acrRequest, const std::set<std::str
     }
 }
 
+static bool sReadFlag(const ZTSWebRequest& acrRequest, const std::string& acrName) {
+    const std::string lText = acrRequest.get(acrName);
+    if (!lText.empty() && lText != "true" && lText != "false") {
+        throw ZTCBadFilterEx(acrName + " is true or false, not \"" + lText + "\"");
+    }
+    return lText == "true";
+}
+
 static ZTSFilterTexts sFilterTexts(const ZTSWebRequest& acrRequest) {
     sCheckNames(acrRequest, {"since", "until", "kind", "port", "initiator", "lun", "limit", "open"});
     ZTSFilterTexts lTexts;
@@ -45,11 +54,7 @@ static ZTSFilterTexts sFilterTexts(const ZTSWebRequest& acrRequest) {
     lTexts.mInitiators = acrRequest.getAll("initiator");
     lTexts.mLuns = acrRequest.getAll("lun");
     lTexts.mLimit = acrRequest.get("limit");
-    const std::string lOpen = acrRequest.get("open");
-    if (!lOpen.empty() && lOpen != "true" && lOpen != "false") {
-        throw ZTCBadFilterEx("open is true or false, not \"" + lOpen + "\"");
-    }
-    lTexts.mIsOpenOnly = lOpen == "true";
+    lTexts.mIsOpenOnly = sReadFlag(acrRequest, "open");
     return lTexts;
 }
 
@@ -75,6 +80,9 @@ ZTCNameBook ZTCApi::makeNames(const ZTCHistory& acrHistory) const {
     }
     for (const ZTSRemotePort& lrPort : acrHistory.readRemotePorts()) {
         lNames.addRemotePort(lrPort);
+    }
+    if (const auto lStored = acrHistory.readTopology(toMicroseconds(getHistoryTime()))) {
+        addPorts(lNames, lStored->mTopology);
     }
     return lNames;
 }
@@ -125,6 +133,9 @@ ZTSWebResponse ZTCApi::answerKnown(const ZTSWebRequest& acrRequest) {
     }
     if (lrPath == "/api/v1/ports") {
         return sJson(makePorts(acrRequest));
+    }
+    if (lrPath == "/api/v1/paths") {
+        return sJson(makePaths(acrRequest));
     }
     if (lrPath == "/api/v1/explain") {
         return sJson(makeExplanation(acrRequest));
@@ -192,6 +203,26 @@ ZTCJson ZTCApi::makePorts(const ZTSWebRequest& acrRequest) {
         }
     }
     return lDocument;
+}
+
+ZTCJson ZTCApi::makePaths(const ZTSWebRequest& acrRequest) {
+    sCheckNames(acrRequest, {"at", "port", "initiator", "lun", "trouble"});
+    const ZTCHistory& lrHistory = openHistory();
+    const ZTCHistoryTime lNow = getHistoryTime();
+    const std::string lAt = acrRequest.get("at");
+    ZTSFilterTexts lTexts;
+    lTexts.mPorts = acrRequest.getAll("port");
+    lTexts.mInitiators = acrRequest.getAll("initiator");
+    lTexts.mLuns = acrRequest.getAll("lun");
+    ZTSPathsRequest lRequest;
+    lRequest.mTime = lAt.empty() ? lNow : readPoint(lAt, "at", lrHistory.readMarks(), lNow);
+    const std::optional<ZTSSanView> lView = readSan(lrHistory, lRequest.mTime);
+    ZTCNameBook lNames = makeNames(lrHistory);
+    if (lView) {
+        addPorts(lNames, lView->mTopology);
+    }
+    lRequest.mFilter = readPathsFilter(lTexts, lNames, sReadFlag(acrRequest, "trouble"));
+    return makePathsDocument(lView ? &*lView : nullptr, lRequest, lNames, mSources.mHost, lrHistory.getStoreId());
 }
 
 ZTCJson ZTCApi::makeExplanation(const ZTSWebRequest& acrRequest) {

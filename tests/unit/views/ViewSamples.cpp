@@ -88,7 +88,8 @@ ZTSStatusFacts makeFacts(const nlohmann::json& acrLive) {
 }
 
 void setSan(ZTSStatusFacts& arFacts, const ZTSTopology& acrTopology, const ZTSSanPast& acrPast) {
-    arFacts.mHistory->mSan = ZTSSanView{.mFacts = findSanFacts(acrTopology, acrPast),
+    arFacts.mHistory->mSan = ZTSSanView{.mTopology = acrTopology,
+                                        .mFacts = findSanFacts(acrTopology, acrPast),
                                         .mScanned = arFacts.mNow,
                                         .mIsStale = !acrTopology.mBlocked.empty()};
 }

@@ -1,0 +1,31 @@
+/// The topology of the history at a time, judged by what was there before.
+#ifndef SENSOR_VIEWS_INCLUDE_SANVIEW_H
+#define SENSOR_VIEWS_INCLUDE_SANVIEW_H
+
+#include <array>
+#include <chrono>
+#include <optional>
+
+#include "sensor/store/include/History.h"
+#include "sensor/views/include/NameBook.h"
+#include "sensor/views/include/SanFacts.h"
+
+struct ZTSSanView {
+    ZTSTopology mTopology;
+    ZTSSanFacts mFacts;
+    ZTCHistoryTime mScanned;  ///< when the topology was read
+    bool mIsStale = false;    ///< files of the kernel did not answer: what they say is as of earlier
+};
+
+/// The moments that redundancy is measured by: what was there then is expected to be there now. After the longest of
+/// them what is left counts as the new state.
+inline constexpr std::array<std::chrono::hours, 3> gcEarlierMoments{std::chrono::hours(1), std::chrono::hours(24),
+                                                                    std::chrono::hours(7 * 24)};
+
+/// Absent: no topology was stored by then. Throws what ZTCHistory throws.
+std::optional<ZTSSanView> readSan(const ZTCHistory& acrHistory, ZTCHistoryTime aTime);
+
+/// Adds the ports of a topology to what names can stand for: they may never have had an event.
+void addPorts(ZTCNameBook& arNames, const ZTSTopology& acrTopology);
+
+#endif
