@@ -41,6 +41,17 @@ static void sAddSan(const ZTSStatusFacts& acrFacts, ZTSCheck& arCheck) {
     arCheck.mText += lNotices == 0 ? "" : "; " + formatCount(lNotices, "notice") + ": tavik paths";
 }
 
+/// Adds the open warnings of the configuration's rules.
+static void sAddWarnings(const ZTSStatusFacts& acrFacts, ZTSCheck& arCheck) {
+    if (!acrFacts.mLive || !acrFacts.mLive->mWarnings || acrFacts.mLive->mWarnings->empty()) {
+        return;
+    }
+    const std::vector<ZTSLiveWarning>& lrWarnings = *acrFacts.mLive->mWarnings;
+    arCheck.mResult = arCheck.mResult == ZTCR_Ok ? ZTCR_Warning : arCheck.mResult;
+    arCheck.mText += "; open warning: " + lrWarnings.front().mText;
+    arCheck.mText += lrWarnings.size() == 1 ? "" : " and " + formatNumber(lrWarnings.size() - 1) + " more";
+}
+
 ZTSCheck makeCheck(const ZTSStatusFacts& acrFacts, std::optional<std::uint64_t> aEvents) {
     const ZTSJudgement lJudgement = judge(acrFacts);
     const ZTSStateRow& lrWorst = lJudgement.getWorst();
@@ -48,6 +59,7 @@ ZTSCheck makeCheck(const ZTSStatusFacts& acrFacts, std::optional<std::uint64_t> 
     lCheck.mResult = lrWorst.mIsWithoutFc ? ZTCR_Ok : scResults.at(lrWorst.mVerdict);
     lCheck.mText = formatHeadline(acrFacts, lJudgement, false);
     sAddSan(acrFacts, lCheck);
+    sAddWarnings(acrFacts, lCheck);
     lCheck.mEvents = aEvents;
     if (acrFacts.mHistory) {
         lCheck.mOpenEpisodes = acrFacts.mHistory->mOpenEpisodes;

@@ -12,6 +12,7 @@
 
 #include "sensor/store/include/History.h"
 #include "sensor/views/include/LiveState.h"
+#include "sensor/views/include/SanFacts.h"
 #include "sensor/warnings/include/WarnBook.h"
 
 /// Names of stored values: how far gaps and refusals were counted, so that none is missed over a restart.
@@ -29,10 +30,11 @@ public:
     /// Values to be stored since the last call, by name.
     std::map<std::string, std::string> takeValues() { return std::exchange(mValues, {}); }
 
-    /// The states that hold: deaf, agent-down, disk-full, path-lost.
-    static std::vector<ZTSWarnOccurrence> findHolding(const ZTSLiveState& acrLive, ZTCHistoryTime aNow);
-    /// Whether the live state says whether a state of that kind holds; false for what is no state.
-    static bool isKnown(const ZTSLiveState& acrLive, const std::string& acrKind);
+    /// The states that hold: deaf, agent-down, disk-full, path-lost. @param apSan  null: the paths are not known
+    static std::vector<ZTSWarnOccurrence> findHolding(const ZTSLiveState& acrLive, const ZTSSanFacts* apSan,
+                                                      ZTCHistoryTime aNow);
+    /// Whether it is known whether a state of that kind holds; false for what is no state.
+    static bool isKnown(const ZTSLiveState& acrLive, const ZTSSanFacts* apSan, const std::string& acrKind);
     /// Whether a kind is one of these states.
     static bool isState(const std::string& acrKind);
 

@@ -86,6 +86,7 @@ private:
     bool wait();
     void applySettings();
     void readHistory();
+    void readSanFacts();
     void readLive();
     void warn();
     void beginTest();
@@ -109,6 +110,8 @@ private:
     std::unique_ptr<ZTCWarnSource> mpSource;
     std::unique_ptr<ZTCHistory> mpHistory;
     ZTSLiveState mLive;
+    std::optional<ZTSSanFacts> mSan;  ///< absent: no rule asks for it, or it is not known
+    std::chrono::steady_clock::time_point mNextSan{};
     bool mHasLive = false;
     bool mIsLoaded = false;  ///< the open troubles of the process before this one are in the book
     std::string mSaved;

@@ -170,9 +170,9 @@ bool ZTCWarnSource::isState(const std::string& acrKind) {
     return std::ranges::find(scStates, acrKind) != scStates.end();
 }
 
-bool ZTCWarnSource::isKnown(const ZTSLiveState& acrLive, const std::string& acrKind) {
+bool ZTCWarnSource::isKnown(const ZTSLiveState& acrLive, const ZTSSanFacts* apSan, const std::string& acrKind) {
     return (acrKind == "deaf" && acrLive.mKinds) || (acrKind == "agent-down" && acrLive.mKeeper.mState) ||
-           (acrKind == "disk-full" && acrLive.mCollector.mDisk) || (acrKind == "path-lost" && acrLive.mTroubles);
+           (acrKind == "disk-full" && acrLive.mCollector.mDisk) || (acrKind == "path-lost" && apSan != nullptr);
 }
 
 static std::optional<ZTSWarnOccurrence> sFindDeaf(const ZTSLiveKinds& acrKinds, ZTCHistoryTime aNow) {
@@ -194,18 +194,20 @@ static bool sIsAgentDown(const ZTSLiveState& acrLive) {
            (acrLive.mKeeper.mState == ZTKP_WaitingForAdapters && acrLive.mAgent.mEndReason != "no-adapters");
 }
 
-/// The port that the trouble's subject names.
-static std::optional<ZTSRemotePort> sFindPort(const std::string& acrSubject) {
-    std::istringstream lWords(acrSubject);
-    for (std::string lWord; lWords >> lWord;) {
-        if (const std::optional<ZTSFcName> lName = parseWwn(lWord)) {
-            return ZTSRemotePort{.mWwpn = *lName, .mWwnn = {}, .mFcId = {}};
-        }
+/// "Not Present, from host7 and host8": what is known of a lost port or link.
+static std::string sDescribeLost(const ZTSSanTrouble& acrTrouble) {
+    std::string lHosts;
+    for (const ZTSInitiator& lrInitiator : acrTrouble.mInitiators) {
+        lHosts += (lHosts.empty() ? "" : " and ") + lrInitiator.mHost;
     }
-    return std::nullopt;
+    const std::string lState = acrTrouble.mState.empty() ? "not Online" : acrTrouble.mState;
+    return acrTrouble.mRemotePorts.empty()
+               ? "the link of " + lHosts + ": " + lState
+               : acrTrouble.mRemotePorts.front().mWwpn.toText() + " from " + lHosts + ": " + lState;
 }
 
-std::vector<ZTSWarnOccurrence> ZTCWarnSource::findHolding(const ZTSLiveState& acrLive, ZTCHistoryTime aNow) {
+std::vector<ZTSWarnOccurrence> ZTCWarnSource::findHolding(const ZTSLiveState& acrLive, const ZTSSanFacts* apSan,
+                                                          ZTCHistoryTime aNow) {
     std::vector<ZTSWarnOccurrence> lHolding;
     const auto lAdd = [&](const char* apKind, const std::string& acrText) -> ZTSWarnOccurrence& {
         return lHolding.emplace_back(sMake(apKind, ZTSInitiator(), 1, aNow, acrText));
@@ -221,9 +223,14 @@ std::vector<ZTSWarnOccurrence> ZTCWarnSource::findHolding(const ZTSLiveState& ac
     if (acrLive.mCollector.mDisk && *acrLive.mCollector.mDisk != ZTDK_Ok) {
         lAdd("disk-full", acrLive.mCollector.mDiskProblem);
     }
-    for (const ZTSTroubleText& lrTrouble : acrLive.mTroubles.value_or(std::vector<ZTSTroubleText>())) {
-        if (lrTrouble.mId == "path-lost") {
-            lAdd("path-lost", lrTrouble.mSubject).mRemotePort = sFindPort(lrTrouble.mSubject);
+    for (const ZTSSanTrouble& lrTrouble : apSan != nullptr ? apSan->mTroubles : std::vector<ZTSSanTrouble>()) {
+        const bool lIsLost = lrTrouble.mKind == ZTST_PathLost || lrTrouble.mKind == ZTST_LinkDown;
+        if (lIsLost && lrTrouble.mSeverity >= ZTSS_Warning) {
+            ZTSWarnOccurrence& lrHolding = lAdd("path-lost", sDescribeLost(lrTrouble));
+            lrHolding.mInitiator = lrTrouble.mInitiators.empty() ? ZTSInitiator() : lrTrouble.mInitiators.front();
+            if (!lrTrouble.mRemotePorts.empty()) {
+                lrHolding.mRemotePort = lrTrouble.mRemotePorts.front();
+            }
         }
     }
     return lHolding;

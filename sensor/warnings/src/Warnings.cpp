@@ -11,6 +11,7 @@
 
 #include "sensor/client/include/ClientErrors.h"
 #include "sensor/client/include/RecordJson.h"
+#include "sensor/views/include/SanView.h"
 #include "sensor/views/include/TimeText.h"
 
 using std::chrono::milliseconds;
@@ -20,6 +21,8 @@ using ZTCJson = nlohmann::ordered_json;
 
 /// Between two looks while any trouble is known.
 static constexpr seconds scLookPeriod{1};
+/// Between two looks at the paths.
+static constexpr seconds scSanPeriod{10};
 /// What a process before this one has warned of is in the history. So long that is waited for.
 static constexpr seconds scHistoryPatience{10};
 /// For a test beside the timeouts of its hooks.
@@ -198,6 +201,7 @@ void ZTCWarnings::readHistory() {
         if (mpBook->getRules().empty()) {
             return;
         }
+        readSanFacts();
         for (const ZTSWarnOccurrence& lrOccurrence : mpSource->read(*mpHistory, getHistoryTime())) {
             mpBook->note(lrOccurrence);
         }
@@ -206,6 +210,17 @@ void ZTCWarnings::readHistory() {
         }
     } catch (const ZTCStoreEx&) {
         mpHistory.reset();  // `status` says what is wrong with it; it is opened again at the next look
+    }
+}
+
+/// The paths, where a rule asks for them: not at every look, since a large host has thousands.
+void ZTCWarnings::readSanFacts() {
+    const auto lIsPaths = [](const ZTSWarnRule& acrRule) { return acrRule.mKind == "path-lost"; };
+    const auto lNow = steady_clock::now();
+    if (std::ranges::any_of(mpBook->getRules(), lIsPaths) && lNow >= mNextSan) {
+        mNextSan = lNow + scSanPeriod;
+        std::optional<ZTSSanView> lView = readSan(*mpHistory, getHistoryTime());
+        mSan = lView ? std::optional(std::move(lView->mFacts)) : std::nullopt;
     }
 }
 
@@ -227,13 +242,14 @@ void ZTCWarnings::warn() {
     }
     const ZTCHistoryTime lNow = getHistoryTime();
     if (mHasLive) {
-        mpBook->setHolding(ZTCWarnSource::findHolding(mLive, lNow));
+        mpBook->setHolding(ZTCWarnSource::findHolding(mLive, mSan ? &*mSan : nullptr, lNow));
     }
     std::vector<std::string> lLines;
     mpBook->judge(
         lNow,
         [this](const std::string& acrKind) {
-            return ZTCWarnSource::isState(acrKind) ? ZTCWarnSource::isKnown(mLive, acrKind) : mpSource->hasRead();
+            return ZTCWarnSource::isState(acrKind) ? ZTCWarnSource::isKnown(mLive, mSan ? &*mSan : nullptr, acrKind)
+                                                   : mpSource->hasRead();
         },
         lLines);
     for (const std::string& lrLine : lLines) {

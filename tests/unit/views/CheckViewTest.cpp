@@ -100,3 +100,17 @@ TEST_F(CheckView, AQuietHostAndOneWithoutATopologyAreOk) {
     setSan(lFacts, {});
     EXPECT_EQ(makeCheck(lFacts, 0).mResult, ZTCR_Ok);
 }
+
+TEST_F(CheckView, AnOpenWarningOfARuleIsAWarning) {
+    nlohmann::json lLive = makeHealthyJson();
+    lLive["warnings"] = nlohmann::json::array();
+    EXPECT_EQ(resultOf(lLive), ZTCR_Ok);
+    lLive["warnings"].push_back({{"kind", "queue-full"}, {"text", "queue-full of array7: 120 within 300.0 s"}});
+    lLive["warnings"].push_back({{"kind", "rscn"}, {"text", "rscn: 10 within 60.0 s"}});
+    const ZTSCheck lCheck = makeCheck(makeFacts(lLive), 0);
+    EXPECT_EQ(lCheck.mResult, ZTCR_Warning);
+    EXPECT_EQ(lCheck.mText,
+              "COLLECTING; nothing lost; open warning: queue-full of array7: 120 within 300.0 s and 1 more");
+    lLive["agent"]["running"] = false;
+    EXPECT_EQ(resultOf(lLive), ZTCR_Critical);
+}

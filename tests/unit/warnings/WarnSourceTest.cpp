@@ -45,7 +45,7 @@ protected:
     static ZTSLiveState live(const char* apText) { return readLiveState(nlohmann::json::parse(apText)); }
     static std::vector<std::string> holding(const ZTSLiveState& acrLive) {
         std::vector<std::string> lKinds;
-        for (const ZTSWarnOccurrence& lrState : ZTCWarnSource::findHolding(acrLive, ZTCHistoryTime{})) {
+        for (const ZTSWarnOccurrence& lrState : ZTCWarnSource::findHolding(acrLive, nullptr, ZTCHistoryTime{})) {
             lKinds.push_back(lrState.mKind + ": " + lrState.mText);
         }
         return lKinds;
@@ -123,7 +123,7 @@ TEST_F(WarnSource, NothingHoldsWhereNothingIsKnown) {
     EXPECT_THAT(holding(live("{}")), IsEmpty());
     for (const char* const lpKind : {"deaf", "agent-down", "disk-full", "path-lost"}) {
         EXPECT_TRUE(ZTCWarnSource::isState(lpKind));
-        EXPECT_FALSE(ZTCWarnSource::isKnown(live("{}"), lpKind));
+        EXPECT_FALSE(ZTCWarnSource::isKnown(live("{}"), nullptr, lpKind));
     }
     EXPECT_FALSE(ZTCWarnSource::isState("gap"));
 }
@@ -153,12 +153,22 @@ TEST_F(WarnSource, AFullAndAReadOnlyDiskHold) {
     EXPECT_THAT(holding(live(R"({"collector": {"disk": "ok"}})")), IsEmpty());
 }
 
-TEST_F(WarnSource, ALostPathHoldsForThePortThatItNames) {
-    const ZTSLiveState lLive = live(R"({"troubles": [
-        {"id": "path-lost", "title": "PATH LOST", "subject": "array7 ctrl-B  50:06:01:68:3b:a0:12:34  from host8"},
-        {"id": "other", "subject": ""}]})");
-    const std::vector<ZTSWarnOccurrence> lFound = ZTCWarnSource::findHolding(lLive, mNow);
-    ASSERT_EQ(lFound.size(), 1U);
-    ASSERT_TRUE(lFound[0].mRemotePort);
-    EXPECT_EQ(lFound[0].mRemotePort->mWwpn, makeName(gcPortB));
+TEST_F(WarnSource, ALostPortAndADownLinkHoldButNoticesDoNot) {
+    ZTSSanFacts lSan;
+    const ZTSInitiator lInitiator{.mWwpn = {}, .mWwnn = {}, .mHost = "host8"};
+    lSan.mTroubles.push_back({.mKind = ZTST_PathLost,
+                              .mSeverity = ZTSS_Warning,
+                              .mInitiators = {lInitiator},
+                              .mRemotePorts = {ZTSRemotePort{makeName(gcPortB), {}, {}}},
+                              .mState = "Not Present"});
+    lSan.mTroubles.push_back(
+        {.mKind = ZTST_LinkDown, .mSeverity = ZTSS_Warning, .mInitiators = {lInitiator}, .mState = "Linkdown"});
+    lSan.mTroubles.push_back({.mKind = ZTST_LinkDown, .mSeverity = ZTSS_Notice, .mInitiators = {lInitiator}});
+    lSan.mTroubles.push_back({.mKind = ZTST_UselessPort, .mSeverity = ZTSS_Warning});
+    const std::vector<ZTSWarnOccurrence> lFound = ZTCWarnSource::findHolding(live("{}"), &lSan, mNow);
+    ASSERT_EQ(lFound.size(), 2U);
+    EXPECT_EQ(lFound[0].mRemotePort.value().mWwpn, makeName(gcPortB));
+    EXPECT_EQ(lFound[1].mInitiator.mHost, "host8");
+    EXPECT_TRUE(ZTCWarnSource::isKnown(live("{}"), &lSan, "path-lost"));
+    EXPECT_FALSE(ZTCWarnSource::isKnown(live("{}"), nullptr, "path-lost"));
 }
