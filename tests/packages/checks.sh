@@ -31,7 +31,7 @@ expect_true() {
 wait_until() {
   lEnd=$(($(date +%s) + $1 + 1))
   shift
-  until "$@" >/dev/null 2>&1; do
+  until "$@" 2>/dev/null; do
     [ "$(date +%s)" -lt $lEnd ] || return 1
     sleep 0.2
   done
