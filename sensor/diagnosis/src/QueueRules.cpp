@@ -60,11 +60,48 @@ static std::vector<std::string> sDepths(const ZTCEvidenceIndex& acrEvidence, con
     return lTexts;
 }
 
+/// Adds the changes of queue depth that the driver made meanwhile at the same ports.
+static ZTCEpisodes sWithDepthChanges(const ZTCEvidenceIndex& acrEvidence, const ZTCEpisodes& acrEpisodes) {
+    ZTCEpisodes lAll = acrEpisodes;
+    for (const ZTSEpisode* lpChange : acrEvidence.of("queue-depth")) {
+        const bool lBelongs = std::ranges::any_of(acrEpisodes, [lpChange](const ZTSEpisode* apFull) {
+            return lpChange->mRemotePort && lpChange->mRemotePort->mWwpn == apFull->mRemotePort->mWwpn &&
+                   lpChange->mInitiator.mWwpn == apFull->mInitiator.mWwpn && areTogether(*lpChange, *apFull);
+        });
+        if (lBelongs) {
+            lAll.push_back(lpChange);
+        }
+    }
+    return lAll;
+}
+
+/// "The driver changed queue depths 12 times, down to 16." of the changes among the episodes; empty: there is none.
+static std::string sDescribeChanges(const ZTCEpisodes& acrEpisodes) {
+    std::uint64_t lChanges = 0;
+    std::uint32_t lLeast = UINT32_MAX;
+    for (const ZTSEpisode* lpEpisode : acrEpisodes) {
+        if (getKindName(lpEpisode->mKind) == "queue-depth") {
+            lChanges += lpEpisode->mCount;
+            for (const ZTSReasonCount& lrDepth : lpEpisode->mDetail.mReasons) {
+                lLeast = std::min(lLeast, lrDepth.mValue);
+            }
+        }
+    }
+    return lChanges == 0 ? std::string()
+                         : "The driver changed queue depths " + formatCount(lChanges, "time") +
+                               (lLeast == UINT32_MAX ? "." : ", down to " + formatNumber(lLeast) + ".");
+}
+
 /// "20,000 QUEUE FULL answers on LUNs 0-11, seen by host7."
 static void sAddSeen(const ZTCEvidenceIndex& acrEvidence, const ZTCEpisodes& acrEpisodes, ZTSFinding& arFinding) {
     const ZTSLunSet lLuns = unionOfLuns(acrEpisodes);
-    arFinding.mSeen.push_back(formatCount(arFinding.mOccurrences, "QUEUE FULL answer") + " on " + describeLuns(lLuns) +
-                              ", seen by " + joinNames(acrEvidence.namesOf(arFinding.mInitiators)) + ".");
+    arFinding.mSeen.push_back(formatCount(countOccurrences(acrEpisodes), "QUEUE FULL answer") + " on " +
+                              describeLuns(lLuns) + ", seen by " +
+                              joinNames(acrEvidence.namesOf(arFinding.mInitiators)) + ".");
+    const std::string lChanges = sDescribeChanges(sWithDepthChanges(acrEvidence, acrEpisodes));
+    if (!lChanges.empty()) {
+        arFinding.mSeen.push_back(lChanges);
+    }
     for (const ZTSRemotePort& lrPort : arFinding.mRemotePorts) {
         const std::vector<std::string> lDepths = sDepths(acrEvidence, lrPort, lLuns);
         arFinding.mSeen.insert(arFinding.mSeen.end(), lDepths.begin(), lDepths.end());
@@ -78,7 +115,7 @@ void lookForPortOverload(const ZTCEvidenceIndex& acrEvidence, const ZTSRule& acr
         lrAll.insert(lrAll.end(), lrRun.begin(), lrRun.end());
     }
     for (const auto& [lPort, lrEpisodes] : lByPort) {
-        ZTSFinding lFinding = beginFinding(acrEvidence, acrRule, lrEpisodes);
+        ZTSFinding lFinding = beginFinding(acrEvidence, acrRule, sWithDepthChanges(acrEvidence, lrEpisodes));
         sAddSeen(acrEvidence, lrEpisodes, lFinding);
         const std::vector<ZTSInitiator> lSilent =
             acrEvidence.findOtherUsers(lFinding.mRemotePorts.front(), lFinding.mInitiators);
@@ -104,7 +141,8 @@ void lookForLunOverload(const ZTCEvidenceIndex& acrEvidence, const ZTSRule& acrR
     for (const auto& [lKey, lrEpisodes] : lByLun) {
         const ZTSLunSet lLuns = unionOfLuns(lrEpisodes);
         const std::string lPorts = joinNames(acrEvidence.namesOf(acrEvidence.remotePortsOf(lrEpisodes)));
-        ZTSFinding lFinding = beginFinding(acrEvidence, acrRule, lrEpisodes, describeLuns(lLuns) + " of " + lPorts);
+        ZTSFinding lFinding = beginFinding(acrEvidence, acrRule, sWithDepthChanges(acrEvidence, lrEpisodes),
+                                           describeLuns(lLuns) + " of " + lPorts);
         sAddSeen(acrEvidence, lrEpisodes, lFinding);
         if (lFinding.mRemotePorts.size() > 1) {
             lFinding.mSeen.push_back("The same behind " + formatNumber(lFinding.mRemotePorts.size()) +

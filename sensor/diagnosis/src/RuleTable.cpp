@@ -114,7 +114,8 @@ static constexpr std::array scRules{
             .mpAgainst = "It comes again and again: then two hosts or two controllers fight over the LUN.",
             .mpMeans = "A parameter of the LUN is another than before: its size, its reservations, or which "
                        "controller it prefers. After a change on the array or in a cluster that is normal.",
-            .mpNext = "2A/06: the preferred paths moved. See which are active now: multipath -ll\n"
+            .mpNext = "2A/06: the preferred paths moved. See which are active now:\n"
+                      "multipath -ll\n"
                       "2A/09: the size changed. Scan the devices again, then grow the file system.\n"
                       "2A/03 to 2A/05: look at the cluster that uses the LUN.\n"
                       "tavik events --port {wwpn} --kind check-condition --since 24h",
@@ -144,7 +145,8 @@ static constexpr std::array scRules{
                        "worked on.",
             .mpNext = "Look at the switch's log and uptime.\n"
                       "Ask whether other hosts on it lost their links.\n"
-                      "Check that every LUN has paths again: tavik paths",
+                      "Check that every LUN has paths again:\n"
+                      "tavik paths",
             .mpKinds = "link rscn",
             .mpLook = lookForSwitchTrouble},
     ZTSRule{.mpId = "zoning-changed",
@@ -157,7 +159,8 @@ static constexpr std::array scRules{
             .mpMeans = "The fabric told the ports to look anew, and several logged out and in again. That is what an "
                        "activated zone set does.",
             .mpNext = "Compare the time with the change calendar and with the switch's log.\n"
-                      "Check that no port is missing: tavik ports;  tavik paths\n"
+                      "Check that no port is missing:\n"
+                      "tavik ports;  tavik paths\n"
                       "tavik events --initiator {initiator} --since 24h",
             .mpKinds = "rscn logo plogi link",
             .mpLook = lookForZoning},
@@ -169,7 +172,8 @@ static constexpr std::array scRules{
             .mpAgainst = "The node has only ports on this fabric, and its zone was changed.",
             .mpMeans = "All ports of one storage controller went and came back together: it restarted or failed over.",
             .mpNext = "Look at the array's event log: firmware update, or a fault?\n"
-                      "Check that the paths are all back and which are active: multipath -ll\n"
+                      "Check that the paths are all back and which are active:\n"
+                      "multipath -ll\n"
                       "tavik events --initiator {initiator} --since 24h",
             .mpKinds = "rscn logo plogi link check-condition",
             .mpLook = lookForFailover},
@@ -204,8 +208,10 @@ static constexpr std::array scRules{
             .mpAgainst = "The target was busy or full before the first reset.",
             .mpMeans = "This host gave up waiting for commands and reset the LUN; the target was busy because it had "
                        "to clean up. So the resets are the cause of the busy answers and not their consequence.",
-            .mpNext = "Find what was slow before the first reset: sudo journalctl -k --grep 'timing out|abort'\n"
-                      "Look at the command time-out: grep . /sys/block/sd*/device/timeout\n"
+            .mpNext = "Find what was slow before the first reset:\n"
+                      "sudo journalctl -k --grep 'timing out|abort'\n"
+                      "Look at the command time-out:\n"
+                      "grep . /sys/block/sd*/device/timeout\n"
                       "tavik events --port {wwpn} --since 24h",
             .mpKinds = "lun-reset device-busy queue-full",
             .mpLook = lookForHostTimeouts},

@@ -2,6 +2,7 @@
 
 #include "sensor/tavik/src/Context.h"
 #include "sensor/tavik/src/Terminal.h"
+#include "sensor/views/include/DiagnosisView.h"
 #include "sensor/views/include/Explanation.h"
 
 static void sPrint(const ZTSTavikOptions& acrOptions, const ZTCContext& acrContext, const std::string& acrStoreId,
@@ -9,7 +10,7 @@ static void sPrint(const ZTSTavikOptions& acrOptions, const ZTCContext& acrConte
     if (acrOptions.mIsJson) {
         writeDocument(makeExplainDocument(acrExplanation, acrContext.getHost(), acrStoreId, acrNames));
     } else {
-        writeOutput(formatExplanation(acrExplanation, getPageStyle()));
+        writeOutput(formatExplanation(acrExplanation, getPageStyle(), getHistoryTime()));
     }
 }
 
@@ -22,10 +23,39 @@ static std::string sStoreId(const ZTCContext& acrContext) {
     }
 }
 
+/// What a stretch of time means: the last day unless it is given.
+static int sExplainTime(const ZTSTavikOptions& acrOptions, const ZTCContext& acrContext) {
+    const std::unique_ptr<ZTCHistory> lpHistory = acrContext.openHistory();
+    const ZTCHistoryTime lNow = getHistoryTime();
+    const ZTSFilterTexts& lrTexts = acrOptions.mFilter;
+    const std::vector<ZTSMark> lMarks = lpHistory->readMarks();
+    const ZTCHistoryTime lTo = lrTexts.mUntil.empty() ? lNow : readPoint(lrTexts.mUntil, "--until", lMarks, lNow);
+    const ZTCHistoryTime lFrom =
+        lrTexts.mSince.empty() ? lTo - gcDiagnosisSpan : readPoint(lrTexts.mSince, "--since", lMarks, lNow);
+    if (lTo <= lFrom) {
+        throw ZTCBadFilterEx("--until has to be later than --since");
+    }
+    const ZTCNameBook lNames = acrContext.makeNames(lpHistory.get());
+    const ZTSDiagnosis lDiagnosis = diagnoseWindow(*lpHistory, lNames, lFrom, lTo);
+    if (acrOptions.mIsJson) {
+        writeDocument(makeDiagnosisDocument(lDiagnosis, acrContext.getHost(), lpHistory->getStoreId(), lNames));
+    } else {
+        writeOutput(formatDiagnosis(lDiagnosis, getPageStyle(), acrOptions.mIsAll, lNow));
+    }
+    return ZTTX_Done;
+}
+
 int runExplain(const ZTSTavikOptions& acrOptions) {
     const ZTCContext lContext(acrOptions);
     const std::string& lrSubject = acrOptions.mSubject;
-    if (const auto lTopic = lrSubject.empty() ? explainTopics() : explainTopic(lrSubject)) {
+    if (lrSubject.empty()) {
+        return sExplainTime(acrOptions, lContext);
+    }
+    if (!acrOptions.mFilter.mSince.empty() || !acrOptions.mFilter.mUntil.empty() || acrOptions.mIsAll) {
+        throw ZTCWrongUseEx("--since, --until and --all choose what tavik explain looks at without \"" + lrSubject +
+                            "\"; with it they mean nothing");
+    }
+    if (const auto lTopic = explainTopic(lrSubject)) {
         sPrint(acrOptions, lContext, sStoreId(lContext), *lTopic, ZTCNameBook());
         return ZTTX_Done;
     }

@@ -37,6 +37,7 @@ struct ZTSTavikOptions {
     bool mIsRecords = false;
     bool mIsFollow = false;
     bool mIsTest = false;  ///< of warn
+    bool mIsAll = false;   ///< of explain
     std::string mSubject;  ///< of explain
     std::string mMark;
     std::string mMarkTime;  ///< empty: now

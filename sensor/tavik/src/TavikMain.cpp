@@ -94,8 +94,12 @@ static int sRun(int aCount, const char* const* appArguments) {
     lpPaths->add_option("--at", lOptions.mAt, "As it was at a time, a duration back from now, or a mark");
     lpPaths->add_flag("--trouble", lOptions.mIsTroubleOnly, "Only LUNs that lack a path");
     lpPaths->add_flag("--each", lOptions.mIsEachPath, "A line for each path, not only for those with a trouble");
-    lAdd("explain", "Say what a kind, a state, a trouble or an episode means, and what to look at", runExplain)
-        ->add_option("WHAT", lOptions.mSubject, "A kind, a state, a trouble, or an episode's number; without: a list");
+    CLI::App* const lpExplain = lAdd("explain", "Say what the last day meant, and what to look at next", runExplain);
+    lpExplain->add_option("WHAT", lOptions.mSubject,
+                          "A kind, state, trouble or rule (topics: a list), or an episode's number");
+    lpExplain->add_option("--since", lOptions.mFilter.mSince, "From a time, a duration back, or a mark; default: 24h");
+    lpExplain->add_option("--until", lOptions.mFilter.mUntil, "Up to a time, a duration back from now, or a mark");
+    lpExplain->add_flag("--all", lOptions.mIsAll, "What is harmless, too");
     lAdd("check", "Report in one line for a monitoring system: 0 OK, 1 WARNING, 2 CRITICAL, 3 UNKNOWN", runCheck)
         ->add_option("--since", lOptions.mFilter.mSince, "How far back gaps and events count; default: 10m");
     CLI::App* const lpMark = lAdd("mark", "Give this moment a name, for --since and --until", runMark);

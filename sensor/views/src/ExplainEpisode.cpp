@@ -1,5 +1,6 @@
 #include <charconv>
 
+#include "sensor/views/include/DiagnosisView.h"
 #include "sensor/views/include/Explanation.h"
 #include "sensor/views/include/FilterText.h"
 
@@ -35,7 +36,8 @@ static std::uint64_t sRequireNumber(const std::string& acrText) {
     const auto lNumber = sParseNumber(acrText);
     if (!lNumber) {
         throw ZTCBadFilterEx("\"" + acrText +
-                             "\" is not a kind, a state or the number of an episode: tavik explain lists them");
+                             "\" is not a kind, a state, a rule or the number of an episode: tavik explain topics "
+                             "lists them");
     }
     return *lNumber;
 }
@@ -50,5 +52,6 @@ ZTSExplanation explainEpisode(const std::string& acrNumber, const ZTCHistory& ac
     if (!lEpisode) {
         throw ZTCBadFilterEx("the history has no episode " + acrNumber + ": tavik events shows those that it has");
     }
-    return explainEpisode(*lEpisode, sEvidence(acrHistory, *lEpisode), acrNames, aNow);
+    return explainEpisode(*lEpisode, sEvidence(acrHistory, *lEpisode),
+                          diagnoseEpisode(acrHistory, acrNames, *lEpisode, aNow), acrNames, aNow);
 }

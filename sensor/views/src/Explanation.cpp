@@ -1,8 +1,11 @@
 #include "sensor/views/include/Explanation.h"
 
 #include <algorithm>
+#include <array>
 #include <nlohmann/json.hpp>
+#include <sstream>
 
+#include "sensor/views/include/DiagnosisView.h"
 #include "sensor/views/include/EpisodeJson.h"
 #include "sensor/views/include/EpisodeText.h"
 #include "sensor/views/include/KindTexts.h"
@@ -42,29 +45,38 @@ static ZTSExplanation sExplainTrouble(const ZTSSanTroubleRow& acrRow) {
     return lExplanation;
 }
 
-std::optional<ZTSExplanation> explainTopic(std::string_view aText) {
-    if (const ZTSStateRow* const lpRow = findState(aText)) {
-        return sExplainState(*lpRow);
+/// The rule's steps, with words where a finding has names.
+static std::vector<std::string> sStepsOf(const ZTSRule& acrRule) {
+    static constexpr std::array<std::array<const char*, 2>, 4> scPlaces{
+        {{"{port}", "the port"}, {"{wwpn}", "WWPN"}, {"{initiator}", "INITIATOR"}, {"{host}", "hostN"}}};
+    std::vector<std::string> lSteps;
+    std::istringstream lLines(acrRule.mpNext);
+    for (std::string lLine; std::getline(lLines, lLine);) {
+        for (const auto& [lpPlace, lpWord] : scPlaces) {
+            for (std::size_t lAt = lLine.find(lpPlace); lAt != std::string::npos; lAt = lLine.find(lpPlace)) {
+                lLine.replace(lAt, std::string_view(lpPlace).size(), lpWord);
+            }
+        }
+        lSteps.push_back(std::move(lLine));
     }
-    if (const ZTSSanTroubleRow* const lpRow = findSanTrouble(aText)) {
-        return sExplainTrouble(*lpRow);
-    }
-    if (const ZTSKindText* const lpText = findKindText(aText)) {
-        ZTSExplanation lExplanation;
-        lExplanation.mSubject = "kind";
-        lExplanation.mId = lpText->mKind;
-        lExplanation.mTitle = lpText->mTitle;
-        lExplanation.mParts = sPartsOfKind(*lpText);
-        lExplanation.mParts.push_back({"counting", {lpText->mConsolidation}});
-        return lExplanation;
-    }
-    return std::nullopt;
+    return lSteps;
 }
 
-ZTSExplanation explainTopics() {
+static ZTSExplanation sExplainRule(const ZTSRule& acrRule) {
+    ZTSExplanation lExplanation;
+    lExplanation.mSubject = "rule";
+    lExplanation.mId = acrRule.mpId;
+    lExplanation.mTitle = acrRule.mpTitle;
+    lExplanation.mParts = {{"looks for", {acrRule.mpWanted}}, {"means", {acrRule.mpMeans}},
+                           {"unless", {acrRule.mpAgainst}},   {"look at", sStepsOf(acrRule)},
+                           {"kinds", {acrRule.mpKinds}},      {"severity", {getSeverityName(acrRule.mSeverity)}}};
+    return lExplanation;
+}
+
+static ZTSExplanation sExplainTopics() {
     ZTSExplanation lExplanation;
     lExplanation.mSubject = "topics";
-    lExplanation.mTitle = "tavik explain KIND, STATE, TROUBLE or EPISODE (a number of tavik events)";
+    lExplanation.mTitle = "tavik explain KIND, STATE, TROUBLE, RULE or EPISODE (a number of tavik events)";
     ZTSExplainedPart lStates{"states", {}};
     for (const ZTSStateRow& lrRow : getStateTable()) {
         lStates.mTexts.emplace_back(lrRow.mpId);
@@ -77,8 +89,37 @@ ZTSExplanation explainTopics() {
     for (const ZTSKindText& lrText : getKindTexts()) {
         lKinds.mTexts.push_back(lrText.mKind);
     }
-    lExplanation.mParts = {std::move(lStates), std::move(lTroubles), std::move(lKinds)};
+    ZTSExplainedPart lRules{"rules", {}};
+    for (const ZTSRule& lrRule : getRules()) {
+        lRules.mTexts.emplace_back(lrRule.mpId);
+    }
+    lExplanation.mParts = {std::move(lStates), std::move(lTroubles), std::move(lKinds), std::move(lRules)};
     return lExplanation;
+}
+
+std::optional<ZTSExplanation> explainTopic(std::string_view aText) {
+    if (aText == "topics") {
+        return sExplainTopics();
+    }
+    if (const ZTSStateRow* const lpRow = findState(aText)) {
+        return sExplainState(*lpRow);
+    }
+    if (const ZTSSanTroubleRow* const lpRow = findSanTrouble(aText)) {
+        return sExplainTrouble(*lpRow);
+    }
+    if (const ZTSRule* const lpRule = findRule(aText)) {
+        return sExplainRule(*lpRule);
+    }
+    if (const ZTSKindText* const lpText = findKindText(aText)) {
+        ZTSExplanation lExplanation;
+        lExplanation.mSubject = "kind";
+        lExplanation.mId = lpText->mKind;
+        lExplanation.mTitle = lpText->mTitle;
+        lExplanation.mParts = sPartsOfKind(*lpText);
+        lExplanation.mParts.push_back({"counting", {lpText->mConsolidation}});
+        return lExplanation;
+    }
+    return std::nullopt;
 }
 
 static std::vector<std::string> sFactsOf(const ZTSEpisode& acrEpisode, const ZTCNameBook& acrNames,
@@ -104,7 +145,7 @@ static std::vector<std::string> sFactsOf(const ZTSEpisode& acrEpisode, const ZTC
 }
 
 ZTSExplanation explainEpisode(const ZTSEpisode& acrEpisode, std::vector<std::uint64_t> aEvidence,
-                              const ZTCNameBook& acrNames, ZTCHistoryTime aNow) {
+                              std::vector<ZTSFinding> aFindings, const ZTCNameBook& acrNames, ZTCHistoryTime aNow) {
     const ZTSKindText* const lpText = findKindText(getKindName(acrEpisode.mKind));
     ZTSExplanation lExplanation;
     lExplanation.mSubject = "episode";
@@ -118,6 +159,7 @@ ZTSExplanation explainEpisode(const ZTSEpisode& acrEpisode, std::vector<std::uin
     }
     lExplanation.mEvidence = std::move(aEvidence);
     lExplanation.mEpisode = acrEpisode;
+    lExplanation.mFindings = std::move(aFindings);
     return lExplanation;
 }
 
@@ -132,7 +174,7 @@ static void sAddLines(std::string& arText, const std::string& acrIndent, const s
     }
 }
 
-std::string formatExplanation(const ZTSExplanation& acrExplanation, const ZTSTextStyle& acrStyle) {
+std::string formatExplanation(const ZTSExplanation& acrExplanation, const ZTSTextStyle& acrStyle, ZTCHistoryTime aNow) {
     static constexpr std::size_t scLeastWidth = 24;
     static constexpr std::size_t scMostWidth = 100;
     static constexpr std::size_t scMostEvidence = 20;
@@ -164,6 +206,12 @@ std::string formatExplanation(const ZTSExplanation& acrExplanation, const ZTSTex
         lText += "\n" + lPaint("evidence") + "\n";
         sAddLines(lText, "  ", "Records " + lNumbers + ": tavik events --records", lWidth);
     }
+    if (!acrExplanation.mFindings.empty()) {
+        lText += "\n" + lPaint("part of") + "\n";
+    }
+    for (std::size_t i = 0; i < acrExplanation.mFindings.size(); ++i) {
+        lText += formatFinding(acrExplanation.mFindings[i], i + 1, acrStyle, aNow).substr(i == 0 ? 1 : 0);
+    }
     return lText;
 }
 
@@ -179,5 +227,9 @@ ZTCJson makeExplainDocument(const ZTSExplanation& acrExplanation, const std::str
     }
     lDocument["evidence"] = acrExplanation.mEvidence;
     lDocument["episode"] = acrExplanation.mEpisode ? toJson(*acrExplanation.mEpisode, acrNames) : ZTCJson(nullptr);
+    lDocument["findings"] = ZTCJson::array();
+    for (const ZTSFinding& lrFinding : acrExplanation.mFindings) {
+        lDocument["findings"].push_back(toJson(lrFinding, acrNames));
+    }
     return lDocument;
 }

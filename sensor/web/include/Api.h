@@ -42,8 +42,8 @@ public:
     /// Paths: / and the other files of the page, /healthz, /metrics, /api/v1/status, /api/v1/events, /api/v1/ports,
     /// /api/v1/paths, /api/v1/explain, /api/v1/timeline, /api/v1/stream. The parameters are the commands' options:
     /// since, until, kind, port, initiator, lun, limit, open; paths: port, initiator, lun, at, trouble; explain:
-    /// subject; timeline: from, to, columns. A parameter that is wrong or unknown gets 400 and a document with the
-    /// member `error`; a path that is not there 404; a history that cannot be read 503.
+    /// subject, or since and until; timeline: from, to, columns. A parameter that is wrong or unknown gets 400 and a
+    /// document with the member `error`; a path that is not there 404; a history that cannot be read 503.
     ZTSWebResponse answer(const ZTSWebRequest& acrRequest);
 
 private:

@@ -7,6 +7,7 @@
 
 #include "sensor/client/include/RecordJson.h"
 #include "sensor/metrics/include/Metrics.h"
+#include "sensor/views/include/DiagnosisView.h"
 #include "sensor/views/include/EpisodeJson.h"
 #include "sensor/views/include/Explanation.h"
 #include "sensor/views/include/FilterText.h"
@@ -226,13 +227,27 @@ ZTCJson ZTCApi::makePaths(const ZTSWebRequest& acrRequest) {
 }
 
 ZTCJson ZTCApi::makeExplanation(const ZTSWebRequest& acrRequest) {
-    sCheckNames(acrRequest, {"subject"});
+    sCheckNames(acrRequest, {"subject", "since", "until"});
     const std::string lSubject = acrRequest.get("subject");
     const ZTCHistory& lrHistory = openHistory();
     const ZTCNameBook lNames = makeNames(lrHistory);
-    const auto lTopic = lSubject.empty() ? explainTopics() : explainTopic(lSubject);
-    return makeExplainDocument(lTopic ? *lTopic : explainEpisode(lSubject, lrHistory, lNames, getHistoryTime()),
-                               mSources.mHost, lrHistory.getStoreId(), lNames);
+    const ZTCHistoryTime lNow = getHistoryTime();
+    if (!lSubject.empty()) {
+        sCheckNames(acrRequest, {"subject"});
+        const auto lTopic = explainTopic(lSubject);
+        return makeExplainDocument(lTopic ? *lTopic : explainEpisode(lSubject, lrHistory, lNames, lNow), mSources.mHost,
+                                   lrHistory.getStoreId(), lNames);
+    }
+    const std::vector<ZTSMark> lMarks = lrHistory.readMarks();
+    const std::string lSince = acrRequest.get("since");
+    const std::string lUntil = acrRequest.get("until");
+    const ZTCHistoryTime lTo = lUntil.empty() ? lNow : readPoint(lUntil, "until", lMarks, lNow);
+    const ZTCHistoryTime lFrom = lSince.empty() ? lTo - gcDiagnosisSpan : readPoint(lSince, "since", lMarks, lNow);
+    if (lTo <= lFrom) {
+        throw ZTCBadFilterEx("until has to be later than since");
+    }
+    return makeDiagnosisDocument(diagnoseWindow(lrHistory, lNames, lFrom, lTo), mSources.mHost, lrHistory.getStoreId(),
+                                 lNames);
 }
 
 ZTCJson ZTCApi::makeTimeline(const ZTSWebRequest& acrRequest) {

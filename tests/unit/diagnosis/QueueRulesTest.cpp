@@ -88,6 +88,20 @@ TEST(QueueRules, QueueDepthsOfTheTopologyAreShown) {
         ElementsAre(HasSubstr("QUEUE FULL"), "Queue depth at host7: 32 for each of 4 LUNs, 128 commands in all."));
 }
 
+TEST(QueueRules, ChangesOfQueueDepthMeanwhileBelongToIt) {
+    ZTCSampleEvidence lEvidence;
+    lEvidence.addLuns("queue-full", 7, 100, 1, {0, 1, 2, 3});
+    lEvidence.addLuns("queue-depth", 7, 110, 1, {0}).mDetail.mReasons = {
+        {.mValue = 8, .mExplanation = 0, .mCount = 1}, {.mValue = 16, .mExplanation = 0, .mCount = 1}};
+    lEvidence.evidence().mEpisodes.back().mCount = 2;
+    lEvidence.addLuns("queue-depth", 7, 500, 1, {0});  // much later
+    lEvidence.addLuns("queue-depth", 7, 110, 2, {0});  // another port
+    const ZTSFinding lFinding = lEvidence.find("port-overload").at(0);
+    EXPECT_THAT(lFinding.mEpisodes, ElementsAre(1U, 2U));
+    EXPECT_THAT(lFinding.mSeen, ElementsAre(HasSubstr("1 QUEUE FULL answer on"),
+                                            "The driver changed queue depths 2 times, down to 8."));
+}
+
 TEST(QueueRules, ASilentInitiatorOfTheSamePortSpeaksAgainstOverload) {
     ZTCSampleEvidence lEvidence;
     lEvidence.addInitiator(7, 1);
