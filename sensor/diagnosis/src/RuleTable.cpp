@@ -75,7 +75,7 @@ static constexpr std::array scRules{
             .mSeverity = ZTSV_Problem,
             .mpTitle = "DEVICE REPORTS A DEFECT",
             .mpWanted = "Check conditions with sense key 03 (medium error) or 04 (hardware error).",
-            .mpAgainst = "Nothing: the device says so itself.",
+            .mpAgainst = "The device's own log knows nothing of it.",
             .mpMeans = "The device could not read or write its medium, or its hardware has a fault. It is not the "
                        "path.",
             .mpNext = "Look at the array's or drive's own event log; hand the codes to its support.\n"
