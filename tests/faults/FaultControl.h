@@ -7,6 +7,8 @@
 #include <cstdint>
 
 inline constexpr char gcFaultFileVariable[] = "ZT_FAULTS_FILE";
+/// Names the program whose calls fail; without it the agent is meant. A sensor's processes share their environment.
+inline constexpr char gcFaultProgramVariable[] = "ZT_FAULTS_PROGRAM";
 
 /// The one name that stands for several calls: malloc, calloc, realloc and what is built on them.
 inline constexpr char gcAllocationCall[] = "allocation";

@@ -9,8 +9,7 @@
 #include <new>
 #include <stdexcept>
 
-ZTCFaultInjection::ZTCFaultInjection(ZTCAgentProcess& arAgent)
-    : mrAgent(arAgent), mPath(arAgent.agentLogPath() + ".faults") {
+ZTCFaultSwitch::ZTCFaultSwitch(std::string aPath) : mPath(std::move(aPath)) {
     const int lFile = open(mPath.c_str(), O_RDWR | O_CREAT | O_EXCL | O_CLOEXEC, 0600);
     void* lpMapped = MAP_FAILED;
     if (lFile >= 0 && ftruncate(lFile, sizeof(ZTSFaultControl)) == 0) {
@@ -24,24 +23,31 @@ ZTCFaultInjection::ZTCFaultInjection(ZTCAgentProcess& arAgent)
         throw std::runtime_error("cannot map " + mPath + ": " + std::strerror(lErrno));
     }
     mpControl = new (lpMapped) ZTSFaultControl{};
-
-    arAgent.setEnvironment("LD_PRELOAD", TAVIK_INTERPOSER);
-    attach();
 }
 
-ZTCFaultInjection::~ZTCFaultInjection() {
+ZTCFaultSwitch::~ZTCFaultSwitch() {
     munmap(mpControl, sizeof(*mpControl));
 }
 
+std::map<std::string, std::string> ZTCFaultSwitch::getEnvironment(const std::string& acrProgram) const {
+    return {{"LD_PRELOAD", TAVIK_INTERPOSER}, {gcFaultFileVariable, mPath}, {gcFaultProgramVariable, acrProgram}};
+}
+
+ZTCFaultInjection::ZTCFaultInjection(ZTCAgentProcess& arAgent)
+    : ZTCFaultSwitch(arAgent.agentLogPath() + ".faults"), mrAgent(arAgent) {
+    mrAgent.setEnvironment("LD_PRELOAD", TAVIK_INTERPOSER);
+    attach();
+}
+
 void ZTCFaultInjection::attach() {
-    mrAgent.setEnvironment(gcFaultFileVariable, mPath);
+    mrAgent.setEnvironment(gcFaultFileVariable, getPath());
 }
 
 void ZTCFaultInjection::detach() {
     mrAgent.unsetEnvironment(gcFaultFileVariable);
 }
 
-void ZTCFaultInjection::arm(const ZTSFaultPlan& acrPlan) {
+void ZTCFaultSwitch::arm(const ZTSFaultPlan& acrPlan) {
     disarm();
     if (acrPlan.mCall.size() >= sizeof(mpControl->mCall)) {
         throw std::runtime_error("no call has so long a name: " + acrPlan.mCall);

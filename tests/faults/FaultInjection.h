@@ -1,8 +1,10 @@
-/// Makes one of the agent's operating-system calls fail. Made before the agent starts: it puts the interposed calls in.
+/// Makes one of a program's operating-system calls fail. Made before the program starts: it puts the interposed calls
+/// in.
 #ifndef TESTS_FAULTS_FAULTINJECTION_H
 #define TESTS_FAULTS_FAULTINJECTION_H
 
 #include <cstdint>
+#include <map>
 #include <string>
 
 #include "tests/faults/FaultControl.h"
@@ -19,17 +21,18 @@ struct ZTSFaultPlan {
     bool mIsOfLibrary = false;  ///< calls of the kernel's library are meant, not those of the agent
 };
 
-class ZTCFaultInjection {
+/// What a program needs in its environment to have the interposed calls, and the switch for them.
+class ZTCFaultSwitch {
 public:
-    explicit ZTCFaultInjection(ZTCAgentProcess& arAgent);
-    ~ZTCFaultInjection();
-    ZTCFaultInjection(const ZTCFaultInjection&) = delete;
-    ZTCFaultInjection& operator=(const ZTCFaultInjection&) = delete;
+    /// @param aPath  of the file that the processes share; it is made
+    explicit ZTCFaultSwitch(std::string aPath);
+    ~ZTCFaultSwitch();
+    ZTCFaultSwitch(const ZTCFaultSwitch&) = delete;
+    ZTCFaultSwitch& operator=(const ZTCFaultSwitch&) = delete;
 
-    /// Whether an agent that is started from now on has them; one made with this object has, until it is told
-    /// otherwise.
-    void attach();
-    void detach();
+    const std::string& getPath() const { return mPath; }
+    /// @param acrProgram  whose calls may fail; what it starts has the environment too, and nothing fails there
+    std::map<std::string, std::string> getEnvironment(const std::string& acrProgram) const;
 
     void arm(const ZTSFaultPlan& acrPlan);
     void disarm() { mpControl->mIsArmed.store(0); }
@@ -45,9 +48,21 @@ public:
     bool isAttached() const { return mpControl->mIsAttached.load() != 0; }
 
 private:
-    ZTCAgentProcess& mrAgent;
-    std::string mPath;
+    const std::string mPath;
     ZTSFaultControl* mpControl = nullptr;
+};
+
+class ZTCFaultInjection : public ZTCFaultSwitch {
+public:
+    explicit ZTCFaultInjection(ZTCAgentProcess& arAgent);
+
+    /// Whether an agent that is started from now on has them; one made with this object has, until it is told
+    /// otherwise.
+    void attach();
+    void detach();
+
+private:
+    ZTCAgentProcess& mrAgent;
 };
 
 #endif

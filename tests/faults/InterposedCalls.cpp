@@ -1,10 +1,11 @@
-/// The operating-system calls of the agent, but for those that fail only when they are called wrongly. Each asks first
+/// The operating-system calls of the agent and of the sensor's programs, but for those that fail only when they are called wrongly. Each asks first
 /// whether it is to fail; otherwise it goes through.
 #include <dirent.h>
 #include <dlfcn.h>
 #include <poll.h>
 #include <pthread.h>
 #include <signal.h>
+#include <sys/socket.h>
 #include <sys/stat.h>
 #include <sys/syscall.h>
 #include <sys/types.h>
@@ -87,12 +88,16 @@ using ZTPThreadProcedure = void* (*)(void*);
 
 // clang-format off
 ZT_INTERPOSE(dlopen, void*, nullptr, (const char* apPath, int aMode), (apPath, aMode))
+ZT_INTERPOSE(accept4, int, -1, (int aSocket, struct sockaddr* apAddress, socklen_t* apSize, int aFlags), (aSocket, apAddress, apSize, aFlags))
 ZT_INTERPOSE(dup2, int, -1, (int aFrom, int aTo), (aFrom, aTo))
 ZT_INTERPOSE(eventfd, int, -1, (unsigned aValue, int aFlags), (aValue, aFlags))
+ZT_INTERPOSE(fallocate, int, -1, (int aFile, int aMode, off_t aFrom, off_t aSize), (aFile, aMode, aFrom, aSize))
 ZT_INTERPOSE(flock, int, -1, (int aFile, int aOperation), (aFile, aOperation))
 ZT_INTERPOSE(fork, pid_t, -1, (), ())
 ZT_INTERPOSE(fstat, int, -1, (int aFile, struct stat* apStatus), (aFile, apStatus))
+ZT_INTERPOSE(fsync, int, -1, (int aFile), (aFile))
 ZT_INTERPOSE(ftruncate, int, -1, (int aFile, off_t aSize), (aFile, aSize))
+ZT_INTERPOSE(futimens, int, -1, (int aFile, const struct timespec* apTimes), (aFile, apTimes))
 ZT_INTERPOSE(getcwd, char*, nullptr, (char* apPath, std::size_t aSize), (apPath, aSize))
 ZT_INTERPOSE(ioctl, int, -1, (int aFile, unsigned long aRequest, void* apArgument), (aFile, aRequest, apArgument))
 ZT_INTERPOSE(kill, int, -1, (pid_t aProcess, int aSignal), (aProcess, aSignal))
@@ -101,11 +106,18 @@ ZT_INTERPOSE(mkdir, int, -1, (const char* apPath, mode_t aMode), (apPath, aMode)
 ZT_INTERPOSE(mkfifo, int, -1, (const char* apPath, mode_t aMode), (apPath, aMode))
 ZT_INTERPOSE(open, int, -1, (const char* apPath, int aFlags, mode_t aMode), (apPath, aFlags, aMode))
 ZT_INTERPOSE(opendir, DIR*, nullptr, (const char* apPath), (apPath))
+ZT_INTERPOSE(pipe2, int, -1, (int* apEnds, int aFlags), (apEnds, aFlags))
 ZT_INTERPOSE(poll, int, -1, (struct pollfd* apFiles, nfds_t aNumber, int aTime), (apFiles, aNumber, aTime))
+ZT_INTERPOSE(recvmsg, ssize_t, -1, (int aSocket, struct msghdr* apMessage, int aFlags), (aSocket, apMessage, aFlags))
 ZT_INTERPOSE(rename, int, -1, (const char* apFrom, const char* apTo), (apFrom, apTo))
+ZT_INTERPOSE(sendmsg, ssize_t, -1, (int aSocket, const struct msghdr* apMessage, int aFlags), (aSocket, apMessage, aFlags))
 ZT_INTERPOSE(setsid, pid_t, -1, (), ())
 ZT_INTERPOSE(signalfd, int, -1, (int aFile, const sigset_t* apSignals, int aFlags), (aFile, apSignals, aFlags))
+ZT_INTERPOSE(socketpair, int, -1, (int aFamily, int aType, int aProtocol, int* apEnds), (aFamily, aType, aProtocol, apEnds))
+ZT_INTERPOSE(splice, ssize_t, -1, (int aFrom, off_t* apFrom, int aTo, off_t* apTo, std::size_t aSize, unsigned aFlags), (aFrom, apFrom, aTo, apTo, aSize, aFlags))
 ZT_INTERPOSE(stat, int, -1, (const char* apPath, struct stat* apStatus), (apPath, apStatus))
+ZT_INTERPOSE(tee, ssize_t, -1, (int aFrom, int aTo, std::size_t aSize, unsigned aFlags), (aFrom, aTo, aSize, aFlags))
+ZT_INTERPOSE(timerfd_settime, int, -1, (int aTimer, int aFlags, const struct itimerspec* apNew, struct itimerspec* apOld), (aTimer, aFlags, apNew, apOld))
 ZT_INTERPOSE(unlink, int, -1, (const char* apPath), (apPath))
 ZT_INTERPOSE(utimensat, int, -1, (int aDirectory, const char* apPath, const struct timespec* apTimes, int aFlags), (aDirectory, apPath, apTimes, aFlags))
 

@@ -135,7 +135,8 @@ _Unwind_Reason_Code sFindCaller(_Unwind_Context* apContext, void* apCaller) {
     const char* lpPath = std::getenv(gcFaultFileVariable);
     const char* lpName = std::strrchr(program_invocation_name, '/');
     lpName = lpName != nullptr ? lpName + 1 : program_invocation_name;
-    if (lpPath == nullptr || std::strcmp(lpName, scAgentName) != 0) {
+    const char* const lpMeant = std::getenv(gcFaultProgramVariable);
+    if (lpPath == nullptr || std::strcmp(lpName, lpMeant != nullptr ? lpMeant : scAgentName) != 0) {
         return;
     }
     bool lIsFirst = true;

@@ -91,6 +91,7 @@ private:
         ZTCPagePointer mpPage;
         std::chrono::steady_clock::time_point mSince;
         bool mIsSynced = false;
+        unsigned mTries = 0;  ///< that failed because the file could not be read
     };
     struct ZTSPageJob {
         ZTCPagePointer mpPage;

@@ -23,8 +23,9 @@ public:
     ZTCHistoryWriter& operator=(const ZTCHistoryWriter&) = delete;
 
     /// Takes a file of the spool in, unless the database has it, and the page. The file stays. One that cannot be read
-    /// is set aside, with a gap. Returns the records that were taken in; nothing where none could be.
-    std::optional<std::uint64_t> takeIn(const ZTSSpoolEntry& acrEntry, const ZTCPagePointer& acrPage);
+    /// throws ZTCSpoolTroubleEx; where it is gone, and at the last try, it is set aside instead, with a gap. Returns
+    /// the records that were taken in; nothing where none could be.
+    std::optional<std::uint64_t> takeIn(const ZTSSpoolEntry& acrEntry, const ZTCPagePointer& acrPage, bool aIsLastTry);
     /// A look at the running agent's page.
     void notePage(const ZTCPagePointer& acrPage);
     /// Of an agent whose files are all taken in.

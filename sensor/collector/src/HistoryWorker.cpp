@@ -16,6 +16,9 @@ static constexpr milliseconds scLongestTransaction{500};
 /// A frame that waits longer than this is synced itself.
 static constexpr seconds scLongestUnsynced{1};
 static constexpr seconds scRetryPause{1};
+/// After so many tries, a pause between them, a file that cannot be read is given up: the others must not wait for
+/// ever.
+static constexpr unsigned scReadTries = 10;
 static constexpr seconds scUpkeepPeriod{60};
 static constexpr seconds scCheckpointPeriod{1};
 
@@ -373,9 +376,14 @@ void ZTCHistoryWorker::closeRun() {
 // ---- each within the batch's transaction ----
 
 void ZTCHistoryWorker::store(ZTSFrameJob& arJob) {
-    if (const std::optional<std::uint64_t> lRecords = mpWriter->takeIn(arJob.mEntry, arJob.mpPage)) {
-        ++mBatchFrames;
-        mBatchRecords += *lRecords;
+    try {
+        if (const auto lRecords = mpWriter->takeIn(arJob.mEntry, arJob.mpPage, arJob.mTries >= scReadTries)) {
+            ++mBatchFrames;
+            mBatchRecords += *lRecords;
+        }
+    } catch (const ZTCSpoolTroubleEx&) {
+        ++arJob.mTries;
+        throw;
     }
 }
 

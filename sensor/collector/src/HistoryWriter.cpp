@@ -1,6 +1,7 @@
 #include "sensor/collector/include/HistoryWriter.h"
 
 #include <algorithm>
+#include <cerrno>
 #include <cstdio>
 #include <sstream>
 
@@ -48,7 +49,8 @@ void ZTCHistoryWriter::setAside(const ZTSSpoolName& acrName, const std::string& 
     mrStore.noteGap(lGap);
 }
 
-std::optional<std::uint64_t> ZTCHistoryWriter::takeIn(const ZTSSpoolEntry& acrEntry, const ZTCPagePointer& acrPage) {
+std::optional<std::uint64_t> ZTCHistoryWriter::takeIn(const ZTSSpoolEntry& acrEntry, const ZTCPagePointer& acrPage,
+                                                      bool aIsLastTry) {
     const ZTSSpoolName& lrName = acrEntry.mName;
     std::optional<std::uint64_t> lRecords;
     if (!mrStore.hasFrame(lrName.mNumber)) {
@@ -56,6 +58,9 @@ std::optional<std::uint64_t> ZTCHistoryWriter::takeIn(const ZTSSpoolEntry& acrEn
         try {
             lBytes = mrSpool.read(lrName);
         } catch (const ZTCSpoolTroubleEx& lrEx) {
+            if (!aIsLastTry && lrEx.getErrno() != ENOENT) {
+                throw;
+            }
             setAside(lrName, lrEx.what());
             return std::nullopt;
         }

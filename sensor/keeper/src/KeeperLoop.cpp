@@ -128,6 +128,7 @@ private:
                 }
                 mKeeper.handleMessage(aNow, lMessage);
             } catch (const ZTCClientEx& lcrEx) {
+                mrWorld.getLink().close();  // a collector whose keeper is gone ends by itself
                 mKeeper.handleBrokenLink(aNow, lcrEx.what());
                 return;
             }

@@ -116,8 +116,11 @@ ZTSProcess spawn(const ZTSSpawn& acrSpawn) {
             return lProcess;
         }
         lErrno = errno;
-        kill(lProcess.mPid, SIGKILL);
+    } else if (lRead < 0) {
+        lErrno = errno;
     }
+    // Where it has ended by itself this changes nothing. Otherwise it runs, and cannot be watched.
+    kill(lProcess.mPid, SIGKILL);
     while (waitpid(lProcess.mPid, nullptr, 0) < 0 && errno == EINTR) {
     }
     throw ZTCSystemCallEx("cannot start " + acrSpawn.mProgram, lErrno);
