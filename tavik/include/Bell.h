@@ -48,9 +48,11 @@ public:
 
     /// Rings if noteHeld has found that it is time.
     void ringIfDue() noexcept {
+        ZT_ENTRY();
         if (mIsDue.load(std::memory_order_relaxed)) [[unlikely]] {
             ringDue();
         }
+        ZT_EXIT();
     }
 
     /// The number of retrievals so far, to be asked for before the bytes held are looked at.

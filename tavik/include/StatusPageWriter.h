@@ -93,7 +93,9 @@ public:
 private:
     /// Adds to a counter that has one writer at a time.
     static void add(std::atomic<std::uint64_t>& arCounter, std::uint64_t aNumber) noexcept {
+        ZT_ENTRY();
         arCounter.store(arCounter.load(std::memory_order_relaxed) + aNumber, std::memory_order_relaxed);
+        ZT_EXIT();
     }
     static std::int64_t getMicroseconds(const ZTCDateTime& acrTime) noexcept {
         return static_cast<std::int64_t>(acrTime.getSecondsSinceEpoch() * 1000000 +

@@ -176,7 +176,12 @@ public:
     void clearPrevScopeData() ZT_REQUIRES(mPrevDataLock);
 
     /// Whether the pending record stays strictly below the per-record limit with so many bytes more.
-    bool canAddEventDataPerRecord(unsigned int aLength) ZT_REQUIRES(mPrevDataLock);
+    bool canAddEventDataPerRecord(unsigned int aLength) ZT_REQUIRES(mPrevDataLock) {
+        ZT_ENTRY();
+        const std::uint64_t lWanted = std::uint64_t{mPrevScopeData->getEventDataSize()} + aLength;
+        ZT_EXIT();
+        return lWanted < mMaxScopeEventDataSize;
+    }
 
     /// Adds bytes and an occurrence to the pending record. Throws ZTCNoMemoryEx and changes nothing then.
     void appendEventData(unsigned char* apData, unsigned int aLength) ZT_REQUIRES(mPrevDataLock);
@@ -185,7 +190,9 @@ public:
     void incrementOccurences() ZT_REQUIRES(mPrevDataLock) {
         ZT_ENTRY();
         mPrevScopeRecord->incrementOccurrences();
-        countOccurrence();
+        if (mpPrevRow != nullptr) {
+            countOccurrence();
+        }
         ZT_EXIT();
     }
 
@@ -206,12 +213,10 @@ private:
     void destroyOutputIpc();
     void filePrevScopeRecord() ZT_REQUIRES(mPrevDataLock);
 
-    /// Counts the latest occurrence of the pending record on the page.
+    /// Counts the latest occurrence of the pending record in its row of the page, which there is.
     void countOccurrence() noexcept ZT_REQUIRES(mPrevDataLock) {
         ZT_ENTRY();
-        if (mpPrevRow != nullptr) {
-            ZTCStatusPageWriter::countConsolidated(*mpPrevRow, mPrevScopeRecord->getEndTime());
-        }
+        ZTCStatusPageWriter::countConsolidated(*mpPrevRow, mPrevScopeRecord->getEndTime());
         ZT_EXIT();
     }
 

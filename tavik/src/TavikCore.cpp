@@ -30,12 +30,19 @@ public:
     ZTCEventOutcome(unsigned int aBoardId, unsigned int aCategory, unsigned int aSubcategory)
         : mBoardId(aBoardId),
           mCategory(static_cast<unsigned char>(aCategory)),
-          mSubcategory(static_cast<unsigned char>(aSubcategory)) {}
+          mSubcategory(static_cast<unsigned char>(aSubcategory)) {
+        ZT_ENTRY();
+        ZT_EXIT();
+    }
 
     void setEvents(unsigned int aEvents) { mUndecided = aEvents; }
 
     /// The system has consolidated and counted one.
-    void noteConsolidated() { --mUndecided; }
+    void noteConsolidated() {
+        ZT_ENTRY();
+        --mUndecided;
+        ZT_EXIT();
+    }
 
     /// What is still undecided is refused.
     void refuse(ZTEStatusRefusal aReason) noexcept {
@@ -484,7 +491,7 @@ void sProcessScopeEvent(const ZTCCallbackEventData* apEventData, ZTCEventOutcome
 }
 
 /// Why an event is not admitted, as the text of a notice that is given the board id; null where it is admitted.
-const char* sFindRefusal(unsigned int aBoardId, const char* apBadBoardText, ZTCEventOutcome& arOutcome) {
+inline const char* sFindRefusal(unsigned int aBoardId, const char* apBadBoardText, ZTCEventOutcome& arOutcome) {
     ZT_ENTRY();
     if (!mDoScopeCollection) {
         arOutcome.refuse(ZTSR_CollectionOff);
@@ -561,14 +568,14 @@ void ScopeCb_Generic(unsigned int aBoardId, HBA_wwn aWwn, unsigned int aCategory
         if (lpRefusal != nullptr) {
             ZT_LOG_NOTICE(lpRefusal, aBoardId);
         } else {
-            ZT_event lEvent{};
-            if (apEvent != nullptr) {
-                std::memcpy(&lEvent, apEvent, sizeof lEvent);
-            }
             ZTSEventBytes lBytes{nullptr, 0};
-            if (lEvent.zt_evt_payload != nullptr) {
-                lBytes = sTakeEventBytes(lEvent.zt_evt_payload, lEvent.zt_evt_size);
-                ZT_TRACE_MSG("Data = %p", static_cast<void*>(lBytes.mpData));
+            if (apEvent != nullptr) {
+                ZT_event lEvent;
+                std::memcpy(&lEvent, apEvent, sizeof lEvent);
+                if (lEvent.zt_evt_payload != nullptr) {
+                    lBytes = sTakeEventBytes(lEvent.zt_evt_payload, lEvent.zt_evt_size);
+                    ZT_TRACE_MSG("Data = %p", static_cast<void*>(lBytes.mpData));
+                }
             }
             const ZTCCallbackEventData lEventData(aBoardId, aWwn.wwn, aCategory, aSubcategory, lBytes.mpData,
                                                   lBytes.mLength);

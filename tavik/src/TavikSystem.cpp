@@ -32,11 +32,14 @@ constexpr char scRuntimeDir[] = "/tmp";
 // Hexadecimal 0x777 is octal 3567: set-group-id and sticky; owner r-x, group rw-, others rwx. The umask applies.
 constexpr int scRuntimeDirMode = 0x777;
 
-/// Who changes the total holds the lock, so that nobody comes in between; its readers without the lock need no order.
-inline void sAddToTotal(std::atomic<std::uint32_t>& arTotal, unsigned int aBytes) noexcept {
+/// Returns the new total. Its writers hold the lock, so none comes in between; its readers without the lock need no
+/// order.
+inline std::uint32_t sAddToTotal(std::atomic<std::uint32_t>& arTotal, unsigned int aBytes) noexcept {
     ZT_ENTRY();
-    arTotal.store(arTotal.load(std::memory_order_relaxed) + aBytes, std::memory_order_relaxed);
+    const std::uint32_t lTotal = arTotal.load(std::memory_order_relaxed) + aBytes;
+    arTotal.store(lTotal, std::memory_order_relaxed);
     ZT_EXIT();
+    return lTotal;
 }
 
 void sCreateRtdir() {
@@ -499,13 +502,6 @@ bool ZTCTavikSystem::isTotalLimitOnScopeDataReached() {
     return lIsReached;
 }
 
-bool ZTCTavikSystem::canAddEventDataPerRecord(unsigned int aLength) {
-    ZT_ENTRY();
-    const std::uint64_t lWanted = std::uint64_t{mPrevScopeData->getEventDataSize()} + aLength;
-    ZT_EXIT();
-    return lWanted < mMaxScopeEventDataSize;
-}
-
 void ZTCTavikSystem::filePrevScopeRecord() {
     ZT_ENTRY();
     if (mRecordsMap.hasKey(mPrevBoardId)) {
@@ -531,13 +527,13 @@ void ZTCTavikSystem::setPrevScopeData(unsigned int aBoardId, ZTCPointer<ZTCScope
     mPrevScopeRecord = lRecord;
     mPrevBoardId = aBoardId;
     mPrevScopeDataSet = true;
-    sAddToTotal(mTotalEventDataSize, arData->getEventDataSize());
+    const std::uint32_t lTotal = sAddToTotal(mTotalEventDataSize, arData->getEventDataSize());
     mpPrevRow = mStatusPage.findRow(aBoardId, arData->getCategory(), arData->getSubcategory());
-    countOccurrence();
     if (mpPrevRow != nullptr) {
-        mStatusPage.countRecord(getTotalEventDataSize());
+        countOccurrence();
+        mStatusPage.countRecord(lTotal);
     }
-    mBell.noteHeld(getTotalEventDataSize());
+    mBell.noteHeld(lTotal);
     ZT_EXIT();
 }
 
@@ -554,11 +550,11 @@ void ZTCTavikSystem::appendEventData(unsigned char* apData, unsigned int aLength
     ZT_ENTRY();
     mPrevScopeData->appendEventData(apData, aLength);
     mPrevScopeRecord->incrementOccurrences();
-    sAddToTotal(mTotalEventDataSize, aLength);
-    countOccurrence();
+    const std::uint32_t lTotal = sAddToTotal(mTotalEventDataSize, aLength);
     if (mpPrevRow != nullptr) {
-        mStatusPage.setHeldBytes(getTotalEventDataSize());
+        countOccurrence();
+        mStatusPage.setHeldBytes(lTotal);
     }
-    mBell.noteHeld(getTotalEventDataSize());
+    mBell.noteHeld(lTotal);
     ZT_EXIT();
 }
