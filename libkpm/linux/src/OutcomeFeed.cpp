@@ -302,9 +302,9 @@ void ZTCLinuxOutcomeFeed::handle(const ZTSScsiOutcome& acrOutcome) {
     lData.zt_scsi_generic_rport = lPort;
     lData.zt_scsi_generic_lun = acrOutcome.mLun;
     const bool lIsFull = acrOutcome.mStatus == ZTLSS_TaskSetFull;
+    mrDelivery.deliverScope(*lBoard, lrLocal, lIsFull ? gcLinuxQueueFull : gcLinuxDeviceBusy, &lData, sizeof lData);
     if (lIsFull) {
         mrDepths.noteQueueFull({acrOutcome.mHost, acrOutcome.mChannel, acrOutcome.mTarget, acrOutcome.mLun},
                                ZTCLinuxQueueDepths::Clock::now());
     }
-    mrDelivery.deliverScope(*lBoard, lrLocal, lIsFull ? gcLinuxQueueFull : gcLinuxDeviceBusy, &lData, sizeof lData);
 }

@@ -13,6 +13,7 @@
 #include "sensor/client/include/FcName.h"
 #include "sensor/settings/include/Quantities.h"
 #include "sensor/settings/include/Settings.h"
+#include "sensor/settings/src/SettingsSyntax.h"
 #include "sensor/settings/src/SettingsTable.h"
 
 static constexpr const char* scWrongType = "wrong type";
@@ -159,6 +160,10 @@ public:
     ZTSSettingsReading read() {
         for (const ZTSKey& lcrKey : settingsTable()) {
             readDefault(lcrKey);
+        }
+        if (const auto lLine = findLineWithBareCharacter(mReading.mContent)) {
+            addError(*lLine, "syntax", "a character beyond ASCII that is neither in quotes nor in a comment");
+            return std::move(mReading);
         }
         const toml::parse_result lResult = toml::parse(mReading.mContent);
         if (!lResult) {

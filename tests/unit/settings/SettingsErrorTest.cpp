@@ -147,6 +147,24 @@ TEST(SettingsErrors, ABrokenFileIsNamedWithTheLineAndTheReason) {
     EXPECT_THAT(sErrors("a = \"\xFF\"\n"), ElementsAre(StartsWith("t.toml:1: syntax: ")));
 }
 
+TEST(SettingsErrors, ACharacterBeyondAsciiIsRefusedOutsideOfQuotesAndCommentsAlone) {
+    const char* const lpRefused =
+        "t.toml:3: syntax: a character beyond ASCII that is neither in quotes nor in a comment";
+    for (const char* lpBare : {"é = 1", "[agent\xEF\xBB\xBB]", "log = \"\" Ж", R"(x = 'a\' あ)", R"(x = """"a"""" é)",
+                               "x = \"a\né\"", "\xEF\xBB\xBF"}) {
+        const std::string lText = std::string("\n") + (std::string(lpBare).find('\n') == std::string::npos ? "\n" : "");
+        EXPECT_THAT(sErrors(lText + lpBare + "\n"), ElementsAre(lpRefused)) << lpBare;
+    }
+    EXPECT_THAT(sErrors("\xEF\xBB\xBF# é \"\n"
+                        R"([names]
+"50:06:01:60:3b:a0:12:34" = "caf\"é" # é
+"50:06:01:60:3b:a0:12:35" = 'é'
+"50:06:01:60:3b:a0:12:36" = '''é'"é''' # é
+"50:06:01:60:3b:a0:12:37" = """é\"""é""""
+)"),
+                ElementsAre());
+}
+
 TEST(SettingsErrors, ListenAddressesThatCannotBeUsed) {
     for (const char* lpListen : {"9632", "127.0.0.1", "127.0.0.1:0", "127.0.0.1:65536", "127.0.0.1:x", "::1:80",
                                  "db07:80", "unix:", "unix:run/x", ":80"}) {
