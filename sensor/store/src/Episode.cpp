@@ -12,12 +12,12 @@ std::string getKindName(ZTCKindKey aKind) {
 }
 
 std::optional<ZTCKindKey> findKind(std::string_view aName) {
-    for (const ZTSScopeEventKind& lrKind : gcScopeEventKinds) {
-        if (aName == lrKind.mpName) {
-            return makeKindKey(lrKind.mDeliveredCategory, lrKind.mDeliveredSubcategory);
-        }
+    const std::optional<std::size_t> lIndex = findKindIndex(aName);
+    if (!lIndex) {
+        return std::nullopt;
     }
-    return std::nullopt;
+    const ZTSScopeEventKind& lrKind = gcScopeEventKinds[*lIndex];
+    return makeKindKey(lrKind.mDeliveredCategory, lrKind.mDeliveredSubcategory);
 }
 
 const char* getPhaseName(ZTEPhase aPhase) {
