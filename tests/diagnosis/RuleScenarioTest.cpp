@@ -37,7 +37,6 @@ static void sBuildSan(const ZTCFakeSysfs& acrTree) {
         acrTree.addRemotePort(7, lPort, lPort);
     }
     acrTree.addRemotePort(8, 0, 0);
-    acrTree.addRemotePort(8, 4, 4);
 }
 
 class RuleScenario : public testing::TestWithParam<std::string> {

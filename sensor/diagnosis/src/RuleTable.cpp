@@ -13,7 +13,7 @@ static constexpr std::array scRules{
             .mpMeans = "The target port has one queue for all its LUNs, and it is full. The hosts together send more "
                        "commands than the port can hold. I/O is delayed, and drivers lower their queue depths.",
             .mpNext = "Look at the load of {port} on the array, and at how many hosts share it.\n"
-                      "Lower the queue depth of its LUNs here, or spread them over more ports:\n"
+                      "Lower the queue depth of its LUNs, or spread them over more ports:\n"
                       "tavik paths\n"
                       "tavik events --port {wwpn} --since 24h",
             .mpKinds = "queue-full queue-depth port-busy",
@@ -80,7 +80,7 @@ static constexpr std::array scRules{
                        "path.",
             .mpNext = "Look at the array's or drive's own event log; hand the codes to its support.\n"
                       "Make sure that the data of these LUNs are in a backup.\n"
-                      "tavik events --port {wwpn} --kind check-condition --since 24h",
+                      "tavik events --port {wwpn} --kind check-condition",
             .mpKinds = "check-condition",
             .mpLook = lookForDeviceErrors},
     ZTSRule{.mpId = "target-restarted",
@@ -90,7 +90,7 @@ static constexpr std::array scRules{
             .mpAgainst = "This host itself reset the LUN or the target just before.",
             .mpMeans = "The target was switched on, restarted or reset, or the session with it was lost. Commands "
                        "that it held are gone and were repeated.",
-            .mpNext = "Look for a restart or a failover in the log of {port}'s array at that time.\n"
+            .mpNext = "Look for a restart or a failover in the array's log at that time.\n"
                       "Without maintenance: ask its support.\n"
                       "tavik events --port {wwpn} --since 24h",
             .mpKinds = "check-condition lun-reset target-reset bus-reset",
@@ -118,7 +118,7 @@ static constexpr std::array scRules{
                       "multipath -ll\n"
                       "2A/09: the size changed. Scan the devices again, then grow the file system.\n"
                       "2A/03 to 2A/05: look at the cluster that uses the LUN.\n"
-                      "tavik events --port {wwpn} --kind check-condition --since 24h",
+                      "tavik events --port {wwpn} --kind check-condition",
             .mpKinds = "check-condition",
             .mpLook = lookForChangedParameters},
     ZTSRule{.mpId = "link-unstable",
