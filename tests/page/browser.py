@@ -111,6 +111,9 @@ class Browser:
     def keys(self, name, *keys):
         self.find(name).send_keys(*keys)
 
+    def hover(self, name, place):
+        ActionChains(self.driver).move_to_element_with_offset(self.find(name), *place).perform()
+
     def drag(self, name, begin, end, key=None):
         """With the mouse, from one place of an element to another; each is [x, y] from its middle."""
         element = self.find(name)

@@ -55,7 +55,7 @@ function lunsOf(episodes) {
 async function showDevices(list, episodes, mine) {
   const found = await devicesOf(episodes);
   if (mine === turn) {
-    listDevices(found, 40).forEach(([name, text]) => addFact(list, name, [text]));
+    listDevices(found, 12).forEach(([name, text]) => addFact(list, name, [text]));
   }
 }
 

@@ -28,6 +28,7 @@ let cursor = null; // {key, column}
 let drag = null; // {from, to, isOther}
 let missed = 0; // changes while the right edge is not now
 let loading = 0; // counts questions: only the newest answer is shown
+let isRangeNew = false; // since the last answer that was shown
 const before = [];
 const unfolded = new Set();
 let onAddress = () => {};
@@ -88,6 +89,8 @@ export async function reload(isNew = false) {
     return;
   }
   loading += 1;
+  isRangeNew = isRangeNew || isNew;
+  canvas.setAttribute("aria-busy", "true");
   const turn = loading;
   const now = Date.now();
   const [from, to] = bounds();
@@ -100,11 +103,12 @@ export async function reload(isNew = false) {
       return;
     }
     const at = cursor && model && spanOf(model, cursor.column)[0];
-    model = makeModel(document, { filter, before: isNew ? null : model, unfolded, now });
+    model = makeModel(document, { filter, before: isRangeNew ? null : model, unfolded, now });
     cursor = cursor && laneOf(cursor.key) ? { key: cursor.key, column: Math.min(model.columns - 1, Math.max(0, columnOf(model, at))) } : null;
     element("chart-problem").hidden = true;
   } catch (problem) {
     element("chart-problem").hidden = false;
+    canvas.setAttribute("aria-busy", "false");
     element("chart-problem").textContent = `No timeline: ${problem.message}. Look at tavik status; the page asks again.`;
     return;
   }
@@ -112,7 +116,9 @@ export async function reload(isNew = false) {
   drawCounters(model, width);
   fillTable();
   showEmpty();
-  if (isNew) {
+  canvas.setAttribute("aria-busy", "false");
+  if (isRangeNew) {
+    isRangeNew = false;
     overview.load(now).catch(() => {}); // the chart has said what is wrong
   }
 }
@@ -155,7 +161,8 @@ function showRange(from, to) {
 
 function showEmpty() {
   const isFiltered = filter.families !== null || filter.text !== "";
-  element("chart-empty").hidden = model.total > 0;
+  const isFound = filter.text === "" || model.lanes.some(({ type }) => type === "port" || type === "fold");
+  element("chart-empty").hidden = model.total > 0 && isFound;
   element("chart-empty").textContent = isFiltered ? "Nothing in this range passes the filter. Clear it to see the rest."
     : model.blind.some((stretch) => stretch.isTotal) ? "No event in this range. Where it is hatched, Tavik could not see: look at a longer range."
       : "No event in this range: nothing happened. Look at a longer range for older events.";
