@@ -6,7 +6,7 @@ MOST_MILLISECONDS = 1000
 VIEWS = {
     "now": ("#now", "headline", "COLLECTING"),
     "timeline": ("#timeline;range=30d", "range-text", " to "),
-    "paths": ("#paths", "paths-text", "."),
+    "paths": ("#paths", "paths-text", "with trouble"),
     "compare": ("#compare;mark=firmware-9.1", "compare-rates", "queue-full"),
     "events": ("#events;since=30d", "events-text", "newest 1,000"),
 }
@@ -19,6 +19,9 @@ def show(browser, view):
     browser.wait_text(name, part)
     if view == "now":
         browser.wait("the remote ports", lambda: "array7" in browser.text("ports"))
+    if view == "paths":
+        browser.wait("the drawing", lambda: browser.run("return document.querySelectorAll('#paths-map .route').length") > 20)
+        require("a path with trouble is not marked", browser.run("return document.querySelectorAll('.trouble-chip').length") > 0)
     if view == "timeline":
         browser.wait("the chart", lambda: browser.colors("chart") > 20)
         browser.wait("the overview", lambda: browser.colors("overview") > 4)

@@ -27,15 +27,23 @@ const time = (value) => new Date(value).toISOString();
 export const status = () => ask("status");
 export const ports = (parameters) => ask("ports", parameters);
 export const events = (parameters) => ask("events", parameters);
-export const paths = () => ask("paths");
+/** @param at  a moment; without it: now */
+export const paths = (at) => ask("paths", { at: at === undefined ? "" : time(at) });
 export const explain = (subject) => ask("explain", { subject });
 export const diagnose = () => ask("explain");
 export const timeline = (from, to, columns) => ask("timeline", { from: time(from), to: time(to), columns });
 
-/** Calls back with every change of an episode. Reconnects by itself. */
+/** Calls back with every change of an episode. Reconnects by itself. A page that is left may be kept by the browser for the
+ *  way back: it gives its connection up, for there are only a few to one server. */
 export function follow(onEpisode, onState) {
-  const source = new EventSource("/api/v1/stream");
-  source.addEventListener("episode", (event) => onEpisode(JSON.parse(event.data)));
-  source.addEventListener("open", () => onState("Live", true));
-  source.addEventListener("error", () => onState("Not live. Trying again …", false));
+  let source = null;
+  const open = () => {
+    source = new EventSource("/api/v1/stream");
+    source.addEventListener("episode", (event) => onEpisode(JSON.parse(event.data)));
+    source.addEventListener("open", () => onState("Live", true));
+    source.addEventListener("error", () => onState("Not live. Trying again …", false));
+  };
+  window.addEventListener("pagehide", () => source.close());
+  window.addEventListener("pageshow", (event) => event.persisted && open());
+  open();
 }

@@ -2,6 +2,7 @@
 
 import * as api from "./api.js";
 import { makeAddress, readSpan, writeAddress, writeSpan } from "./address.js";
+import { findChanges } from "./changes.js";
 import { element, figure, fillTable, link } from "./dom.js";
 import { kindCell } from "./episodes.js";
 import { duration, initiatorName, number, plural, portName, span } from "./format.js";
@@ -9,6 +10,7 @@ import { kindOf, kinds } from "./kinds.js";
 import { findBlind } from "./model.js";
 
 const hour = 3600000;
+const mostChanges = 200;
 const longest = 30 * 24 * hour;
 
 let spans = null; // [[from, to], [from, to]]: before, after
@@ -75,6 +77,24 @@ function showRates([before, after]) {
     "Nothing happened in either range. Choose longer ones.");
 }
 
+/** The paths as they were at the end of either range. */
+async function showChanges() {
+  const place = element("compare-changes");
+  try {
+    const [before, after] = await Promise.all(spans.map(([, to]) => api.paths(Math.min(to, Date.now()))));
+    if (before.luns === null || after.luns === null) {
+      fillTable(place, ["What"], [], `The paths of ${before.luns === null ? "before" : "after"} are not known: no look at this host was stored by then.`);
+      return;
+    }
+    const changes = findChanges(before.luns, after.luns);
+    fillTable(place, ["What", "At the end of before", "At the end of after"], changes.slice(0, mostChanges).map((change) => [change.what, change.before, change.after]),
+      "No port, path or mount is different.");
+    element("compare-more").textContent = changes.length > mostChanges ? `${number(changes.length - mostChanges)} more differences are not shown.` : "";
+  } catch (problem) {
+    fillTable(place, ["What"], [], `Not known: ${problem.message}.`);
+  }
+}
+
 function showSpans() {
   const texts = ["Before", "After"].map((name, index) => `${name}: ${span(...spans[index])} (${duration(spans[index][1] - spans[index][0])})`);
   element("compare-spans").textContent = texts.join(" · ");
@@ -108,6 +128,7 @@ async function show(markName) {
       writeAddress("compare", mark && !location.hash.includes("a=") ? { mark: mark.name } : { a: writeSpan(spans[0]), b: writeSpan(spans[1]) });
       showSpans();
       showRates(await Promise.all(spans.map(count)));
+      await showChanges();
     }
   } catch (problem) {
     element("compare-sum").textContent = `Not known: ${problem.message}.`;
