@@ -38,6 +38,7 @@ public:
 
 private:
     void storePage(const ZTCPagePointer& acrPage);
+    void storeLibraryLosses(const ZTSStatusSnapshot& acrPage);
     void noteSeen(const std::string& acrGeneration);
     void countStart(const std::string& acrGeneration);
     void noteEnded(const std::string& acrGeneration);

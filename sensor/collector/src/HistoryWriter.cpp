@@ -3,6 +3,8 @@
 #include <algorithm>
 #include <cerrno>
 #include <cstdio>
+#include <map>
+#include <nlohmann/json.hpp>
 #include <sstream>
 
 #include "sensor/collector/include/PageCounts.h"
@@ -35,7 +37,40 @@ void ZTCHistoryWriter::closeEpisodes() {
 void ZTCHistoryWriter::storePage(const ZTCPagePointer& acrPage) {
     const std::vector<ZTSPageCounts> lCounts = toPageCounts(*acrPage);
     mrStore.noteLedger(acrPage->mStartId, lCounts);
+    storeLibraryLosses(*acrPage);
     mpPage = acrPage;
+}
+
+/// The library counts from its start on; the history over all starts. Pages of one agent come in order, and those of
+/// the next behind them.
+void ZTCHistoryWriter::storeLibraryLosses(const ZTSStatusSnapshot& acrPage) {
+    if (acrPage.mLosses.empty()) {
+        return;
+    }
+    const std::string lStored = mrStore.getValue(gcLibraryLossesValue);
+    nlohmann::json lValue = nlohmann::json::parse(lStored, nullptr, false);
+    if (!lValue.is_object()) {
+        lValue = nlohmann::json::object();
+    }
+    if (lValue.value("generation", "") != acrPage.mStartId) {
+        lValue["generation"] = acrPage.mStartId;
+        lValue["last"] = nlohmann::json::object();
+    }
+    std::map<std::string, std::uint64_t> lNow;
+    for (const ZTSStatusLossCopy& lrLoss : acrPage.mLosses) {
+        lNow[lrLoss.mName] += lrLoss.mTotal;
+    }
+    for (const auto& [lName, lCount] : lNow) {
+        nlohmann::json& lrTotal = lValue["total"][lName];
+        const std::uint64_t lLast = lValue["last"].value(lName, std::uint64_t{0});
+        lrTotal = (lrTotal.is_number() ? lrTotal.get<std::uint64_t>() : 0) + (lCount > lLast ? lCount - lLast : 0);
+        lValue["last"][lName] = std::max(lCount, lLast);
+    }
+    // A name has any bytes: what is no UTF-8 is replaced.
+    const std::string lText = lValue.dump(-1, ' ', false, nlohmann::json::error_handler_t::replace);
+    if (lText != lStored) {
+        mrStore.setValue(gcLibraryLossesValue, lText);
+    }
 }
 
 void ZTCHistoryWriter::setAside(const ZTSSpoolName& acrName, const std::string& acrReason) {

@@ -19,6 +19,9 @@
 /// Names of stored values that count over restarts: decimal numbers, absent = 0. The collector raises them.
 inline constexpr const char* gcAgentRestartsValue = "metrics.agent_restarts";
 inline constexpr const char* gcHookFailuresValue = "metrics.hook_failures";
+/// Name of the stored value with what the adapters' library lost: {"generation", "last", "total"}, the latter two
+/// numbers by name. `last` is what the agent of that start has counted so far.
+inline constexpr const char* gcLibraryLossesValue = "metrics.library_losses";
 
 /// All that the metrics are made of.
 struct ZTSMetricFacts {
@@ -27,6 +30,7 @@ struct ZTSMetricFacts {
     std::vector<ZTSRemotePort> mRemotePorts;  ///< with what is known of them, for tavik_remote_port_info
     ZTCSeriesPorts mSeriesPorts;
     std::map<ZTCKindKey, std::uint64_t> mOpenEpisodes;
+    std::map<std::string, std::uint64_t> mLostByLibrary;  ///< by the library's name for the loss, of all agents
     std::uint64_t mLostInGaps = 0;  ///< occurrences that all gaps are known to have cost
     std::uint64_t mAgentRestarts = 0;
     std::uint64_t mHookFailures = 0;

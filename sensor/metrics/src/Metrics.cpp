@@ -5,6 +5,7 @@
 
 #include <algorithm>
 #include <charconv>
+#include <nlohmann/json.hpp>
 #include <sstream>
 
 #include "sensor/views/include/StateTable.h"
@@ -98,17 +99,15 @@ static void sAddRefusals(const std::vector<ZTSLedgerRow>& acrLedger, std::vector
 static void sAddLosses(const ZTSMetricFacts& acrFacts, std::vector<MetricFamily>& arFamilies) {
     ZTCFamily lLost("tavik_lost_events_total", MetricType::Counter,
                     "Events that are known to be lost, by where: dropped by the agent, lost with a process that was "
-                    "killed (gap), or the name of a loss that the adapters' library counts since its start.");
+                    "killed (gap), or the name of a loss that the adapters' library counts.");
     std::uint64_t lDropped = 0;
     for (const ZTSLedgerRow& lrRow : acrFacts.mStatus.mHistory->mLedger) {
         lDropped += lrRow.mDropped;
     }
     lLost.add({{"source", "dropped"}}, static_cast<double>(lDropped));
     lLost.add({{"source", "gap"}}, static_cast<double>(acrFacts.mLostInGaps));
-    if (acrFacts.mStatus.mLive && acrFacts.mStatus.mLive->mLosses) {
-        for (const ZTSLibraryLoss& lrLoss : acrFacts.mStatus.mLive->mLosses->mLibrary) {
-            lLost.add({{"source", lrLoss.mName}}, static_cast<double>(lrLoss.mCount));
-        }
+    for (const auto& [lName, lCount] : acrFacts.mLostByLibrary) {
+        lLost.add({{"source", lName}}, static_cast<double>(lCount));
     }
     lLost.moveTo(arFamilies);
 }
@@ -263,6 +262,17 @@ static std::uint64_t sStoredNumber(const ZTCHistory& acrHistory, const char* apN
     return lNumber;
 }
 
+static std::map<std::string, std::uint64_t> sReadLibraryLosses(const ZTCHistory& acrHistory) {
+    const nlohmann::json lStored = nlohmann::json::parse(acrHistory.getValue(gcLibraryLossesValue), nullptr, false);
+    std::map<std::string, std::uint64_t> lLosses;
+    if (lStored.is_object() && lStored.contains("total")) {
+        for (const auto& [lName, lCount] : lStored["total"].items()) {
+            lLosses[lName] = lCount.is_number_unsigned() ? lCount.get<std::uint64_t>() : 0;
+        }
+    }
+    return lLosses;
+}
+
 ZTSMetricFacts readMetricFacts(const ZTCHistory& acrHistory, ZTSStatusFacts aStatus,
                                const std::string& acrDatabasePath) {
     ZTSMetricFacts lFacts;
@@ -280,6 +290,7 @@ ZTSMetricFacts readMetricFacts(const ZTCHistory& acrHistory, ZTSStatusFacts aSta
     for (const ZTSGap& lrGap : acrHistory.readGaps()) {
         lFacts.mLostInGaps += lrGap.getOccurrences();
     }
+    lFacts.mLostByLibrary = sReadLibraryLosses(acrHistory);
     lFacts.mAgentRestarts = sStoredNumber(acrHistory, gcAgentRestartsValue);
     lFacts.mHookFailures = sStoredNumber(acrHistory, gcHookFailuresValue);
     for (const char* const lpOutput : {"ndjson", "journal"}) {
