@@ -8,8 +8,8 @@ cd "$gRoot"
 # What each step builds with, as Debian's package names.
 gCompilerPackages=(g++ gcc cmake ninja-build ccache)
 gClientPackages=(libcli11-dev nlohmann-json3-dev)
-gSensorPackages=(libsqlite3-dev libtomlplusplus-dev libmicrohttpd-dev prometheus-cpp-dev)
-gTestPackages=(libgtest-dev libgmock-dev)
+gSensorPackages=(libarchive-dev libsqlite3-dev libtomlplusplus-dev libmicrohttpd-dev prometheus-cpp-dev)
+gTestPackages=(libgtest-dev libgmock-dev python3 python3-pyte)
 gBenchPackages=(libbenchmark-dev prometheus-cpp-dev libspdlog-dev python3)
 gClangPackages=(clang libclang-rt-14-dev llvm)
 gCoveragePackages=(gcovr python3)

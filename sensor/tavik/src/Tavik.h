@@ -41,7 +41,10 @@ struct ZTSTavikOptions {
     std::string mSubject;  ///< of explain
     std::string mMark;
     std::string mMarkTime;  ///< empty: now
-    std::string mAt;  ///< of paths
+    std::string mFrom;      ///< of diff, as the next
+    std::string mTo;
+    std::string mOutput;  ///< of report
+    std::string mAt;      ///< of paths
     bool mIsTroubleOnly = false;
     bool mIsEachPath = false;
     ZTSFilterTexts mFilter;
@@ -61,6 +64,8 @@ void writeDocument(const nlohmann::ordered_json& acrDocument);
 int runStatus(const ZTSTavikOptions& acrOptions);
 int runEvents(const ZTSTavikOptions& acrOptions);
 int runPorts(const ZTSTavikOptions& acrOptions);
+int runDiff(const ZTSTavikOptions& acrOptions);
+int runReport(const ZTSTavikOptions& acrOptions);
 int runPaths(const ZTSTavikOptions& acrOptions);
 int runExplain(const ZTSTavikOptions& acrOptions);
 int runCheck(const ZTSTavikOptions& acrOptions);

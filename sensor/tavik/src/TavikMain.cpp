@@ -108,6 +108,13 @@ static int sRun(int aCount, const char* const* appArguments) {
     lAdd("warn", "Run every warning's hook with a test record: 0 all did their work, 1 one failed", runWarn)
         ->add_flag("--test", lOptions.mIsTest, "Run them now");
 
+    CLI::App* const lpDiff = lAdd("diff", "Say what is different between two moments: 0 same, 1 different", runDiff);
+    lpDiff->add_option("FROM", lOptions.mFrom,
+                       "A mark, a time, or a duration back from now; default: the last mark, else 24h");
+    lpDiff->add_option("TO", lOptions.mTo, "The same; default: now");
+    lAdd("report", "Write an archive for support", runReport)
+        ->add_option("-o,--output", lOptions.mOutput, "The file; default: tavik-report-HOST-TIME.tar.gz");
+
     try {
         lApp.parse(aCount, appArguments);
     } catch (const CLI::CallForVersion& lrVersion) {

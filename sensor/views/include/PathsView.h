@@ -12,10 +12,10 @@
 
 /// Which units: several values of one field mean or, several fields mean and, an empty field means all.
 struct ZTSPathsFilter {
-    std::vector<ZTSFcName> mPorts;       ///< with a path through one of these remote ports
-    std::vector<ZTSFcName> mInitiators;  ///< and from one of these local ports
-    std::vector<std::string> mLuns;      ///< a number; a wwid; a name of the multipath device or a disk
-    bool mIsTroubleOnly = false;         ///< with a path that does not run, or that is missing
+    std::vector<ZTSFcName> mPorts{};       ///< with a path through one of these remote ports
+    std::vector<ZTSFcName> mInitiators{};  ///< and from one of these local ports
+    std::vector<std::string> mLuns{};      ///< a number; a wwid; a name of the multipath device or a disk
+    bool mIsTroubleOnly = false;           ///< with a path that does not run, or that is missing
 };
 
 /// Throws ZTCBadFilterEx for a port that nobody knows.
@@ -24,8 +24,8 @@ ZTSPathsFilter readPathsFilter(const ZTSFilterTexts& acrTexts, const ZTCNameBook
 bool matches(const ZTSSanLun& acrLun, const ZTSPathsFilter& acrFilter);
 
 struct ZTSPathsRequest {
-    ZTSPathsFilter mFilter;
-    ZTCHistoryTime mTime;      ///< the moment that is shown
+    ZTSPathsFilter mFilter{};
+    ZTCHistoryTime mTime{};    ///< the moment that is shown
     bool mIsEachPath = false;  ///< as text: a line for each path, not only for those with a trouble
 };
 
