@@ -53,6 +53,8 @@ public:
     bool isEmpty() const { return mpSession == nullptr && mWaiting.empty(); }
     /// The page of the running agent, read now, or of the last one; null: not known.
     ZTCPagePointer readPage();
+    /// As of the last look; null: not known.
+    const ZTCPagePointer& getPage() const { return mpLastPage; }
     std::optional<ZTCHistoryTime> getLastAsked() const { return mLastAsked; }
     ZTSLosses getLosses(ZTCHistoryTime aNow) { return mLosses.get(aNow); }
 

@@ -20,6 +20,7 @@
 #include "sensor/collector/include/Outputs.h"
 #include "sensor/collector/include/PortWatch.h"
 #include "sensor/collector/include/Spool.h"
+#include "sensor/collector/include/TopologyWatch.h"
 #include "sensor/link/include/Inheritance.h"
 #include "sensor/settings/include/Settings.h"
 
@@ -27,7 +28,7 @@ class ZTCCollector {
 public:
     using ZTCTime = std::chrono::steady_clock::time_point;
 
-    /// Starts the worker of the history.
+    /// Starts the worker of the history and the watch of the topology.
     ZTCCollector(ZTSInheritance aInheritance, const ZTSSettings& acrSettings);
     ~ZTCCollector();
     ZTCCollector(const ZTCCollector&) = delete;
@@ -63,6 +64,7 @@ private:
     ZTCHistoryWorker mHistory;
     ZTCLeftovers mLeftovers;
     ZTCAgentQueue mAgents;
+    ZTCTopologyWatch mTopology;
     ZTCPortWatch mPorts;
     ZTCControlServer mControl;
     ZTCOutputs mOutputs;

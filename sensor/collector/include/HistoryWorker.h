@@ -7,7 +7,8 @@
 /// When the disk is full, nothing is dropped: the work is done again, whole, until it succeeds. A damaged database is
 /// set aside and the work goes into a new one.
 ///
-/// All public functions may be called from one other thread. None of them waits for the disk, but for finish().
+/// The functions of the two sinks may be called by any thread, all others by one. None of them waits for the disk, but
+/// for finish().
 #ifndef SENSOR_COLLECTOR_INCLUDE_HISTORYWORKER_H
 #define SENSOR_COLLECTOR_INCLUDE_HISTORYWORKER_H
 
@@ -23,6 +24,7 @@
 
 #include "sensor/collector/include/HistorySink.h"
 #include "sensor/collector/include/HistoryWriter.h"
+#include "sensor/collector/include/TopologyWatch.h"
 #include "sensor/store/include/Store.h"
 #include "sensor/topology/include/Topology.h"
 
@@ -50,7 +52,7 @@ struct ZTSMarkResult {
     std::string mError;  ///< empty: it is stored
 };
 
-class ZTCHistoryWorker : public ZTCHistorySink {
+class ZTCHistoryWorker : public ZTCHistorySink, public ZTCTopologySink {
 public:
     using Report = std::function<void(const std::string& acrLine)>;
 
@@ -66,10 +68,15 @@ public:
     void notePage(ZTCPagePointer apPage) override;
     void endAgent(ZTSEndedAgent aAgent) override;
 
+    // ---- ZTCTopologySink ----
+    void notePorts(std::shared_ptr<const ZTSTopology> apPorts) override;
+    /// Of scans that wait for the disk the last one says it all.
+    void noteTopology(ZTCHistoryTime aTime, std::shared_ptr<const ZTSTopology> apTopology) override;
+    void noteCounters(std::vector<ZTSCounterSample> aSamples) override;
+
     /// An agent that another process of this kind saw last, and that nobody has heard of since. Does nothing when it is
     /// one that runs, or when there is none.
     void endForgottenAgents(const std::string& acrRunningGeneration);
-    void notePorts(std::shared_ptr<const ZTSTopology> apPorts);
     void setLimits(const ZTSStoreLimits& acrLimits);
     void setMark(std::uint64_t aTicket, const std::string& acrName, ZTCHistoryTime aTime);
     /// Stores a value under a name, for those who read the history. A later value replaces it.
@@ -102,6 +109,10 @@ private:
     struct ZTSPortsJob {
         std::shared_ptr<const ZTSTopology> mpPorts;
     };
+    struct ZTSTopologyJob {};  ///< what is to be stored is in mTopology
+    struct ZTSCountersJob {
+        std::vector<ZTSCounterSample> mSamples;
+    };
     struct ZTSMarkJob {
         ZTSMarkResult mMark;
     };
@@ -109,8 +120,12 @@ private:
         std::string mName;
         std::string mValue;
     };
-    using ZTCJob =
-        std::variant<ZTSFrameJob, ZTSPageJob, ZTSEndedAgent, ZTSForgottenJob, ZTSPortsJob, ZTSMarkJob, ZTSValueJob>;
+    using ZTCJob = std::variant<ZTSFrameJob, ZTSPageJob, ZTSEndedAgent, ZTSForgottenJob, ZTSPortsJob, ZTSTopologyJob,
+                                ZTSCountersJob, ZTSMarkJob, ZTSValueJob>;
+    struct ZTSScan {
+        ZTCHistoryTime mTime;
+        std::shared_ptr<const ZTSTopology> mpTopology;
+    };
 
     void submit(ZTCJob aJob);
     void run();
@@ -129,6 +144,8 @@ private:
     void store(ZTSEndedAgent& arAgent);
     void store(ZTSForgottenJob& arJob);
     void store(ZTSPortsJob& arJob);
+    void store(ZTSTopologyJob& arJob);
+    void store(ZTSCountersJob& arJob);
     void store(ZTSMarkJob& arJob);
     void store(ZTSValueJob& arJob);
 
@@ -156,6 +173,8 @@ private:
     mutable std::mutex mMutex;
     std::condition_variable mWake;
     std::deque<ZTCJob> mQueue;
+    ZTSScan mScan;               ///< the last one
+    bool mIsScanQueued = false;  ///< a job for it is in the queue
     ZTSStoreLimits mLimits;
     bool mHasNewLimits = false;
     bool mIsStopping = false;   ///< end at once

@@ -10,6 +10,7 @@
 #include "sensor/collector/include/HistorySink.h"
 #include "sensor/collector/include/HistoryWorker.h"
 #include "sensor/collector/include/LossWindow.h"
+#include "sensor/collector/include/TopologyWatch.h"
 #include "sensor/link/include/Link.h"
 #include "sensor/topology/include/Topology.h"
 
@@ -30,6 +31,7 @@ struct ZTSLiveFacts {
     ZTSLosses mLosses;
     ZTSTopology mPorts;
     std::string mWarnings = "[]";  ///< the open ones, as a JSON list
+    ZTSTopologyState mTopology;
 };
 
 /// One line, without a line break.

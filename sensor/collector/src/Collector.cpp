@@ -46,7 +46,8 @@ ZTCCollector::ZTCCollector(ZTSInheritance aInheritance, const ZTSSettings& acrSe
                  [](const std::string& acrLine) { logLine(acrLine); }),
       mAgents(mKeeper, mSpool, mHistory, mInheritance.mDirectory + "/agent", sSessionSettings(acrSettings),
               [](const std::string& acrLine) { logLine(acrLine); }),
-      mPorts(mHistory, [](const std::string& acrLine) { logLine(acrLine); }),
+      mTopology(mHistory, makeTopologyWatchSetup()),
+      mPorts(mTopology, [](const std::string& acrLine) { logLine(acrLine); }),
       mControl(std::move(mInheritance.mControl),
                [this](std::uint64_t aTicket, const std::string& acrRequest) { return serve(aTicket, acrRequest); }),
       mOutputs(mInheritance.mState, acrSettings, mHistory) {}
@@ -68,6 +69,7 @@ int ZTCCollector::run() {
         logLine("the keeper is gone: ending");
         turn(std::chrono::steady_clock::now());
     }
+    mTopology.stop();
     if (!mHistory.finish(scHistoryPatience)) {
         logLine("not everything could be stored in time: it stays in " + mSpool.getFolder() + " for the next start");
     }
@@ -102,8 +104,11 @@ void ZTCCollector::turn(ZTCTime aNow) {
         if (mPorts.scan(mSettings, aNow)) {
             mAgents.setTargets(mPorts.getTargets(), aNow);
         }
-        mAgents.run(aNow);
-        sweep(aNow);
+        if (mPorts.isReady()) {
+            mAgents.run(aNow);
+            mPorts.noteEvents(mAgents.getPage());
+            sweep(aNow);
+        }
     }
     mControl.serve(aNow);
     tellState();
@@ -143,13 +148,16 @@ void ZTCCollector::poll(ZTCTime aNow) {
     mFds.push_back({.fd = mAgents.getResponseFifo(), .events = POLLIN, .revents = 0});
     mFds.push_back({.fd = mAgents.getBell(), .events = POLLIN, .revents = 0});
     mFds.push_back({.fd = mOutputs.getBell(), .events = POLLIN, .revents = 0});
+    mFds.push_back({.fd = mTopology.getBell(), .events = POLLIN, .revents = 0});
     mControl.addTo(mFds);
     if (::poll(mFds.data(), static_cast<nfds_t>(mFds.size()), getPollTime(aNow)) <= 0) {
         return;
     }
-    if (mFds[1].revents != 0) {
-        std::uint64_t lCount = 0;
-        [[maybe_unused]] const ssize_t lRead = read(mHistory.getBell(), &lCount, sizeof(lCount));
+    for (const std::size_t lBell : {1U, 5U}) {
+        if (mFds[lBell].revents != 0) {
+            std::uint64_t lCount = 0;
+            [[maybe_unused]] const ssize_t lRead = read(mFds[lBell].fd, &lCount, sizeof(lCount));
+        }
     }
     mAgents.noteResponseEvents(mFds[2].revents);
     mAgents.noteBellEvents(mFds[3].revents, std::chrono::steady_clock::now());
@@ -317,5 +325,6 @@ std::string ZTCCollector::describeState() {
     lFacts.mLosses = mAgents.getLosses(lFacts.mNow);
     lFacts.mPorts = mPorts.getPorts();
     lFacts.mWarnings = mOutputs.describeWarnings();
+    lFacts.mTopology = mTopology.getState();
     return toLiveStateJson(lFacts);
 }

@@ -86,6 +86,21 @@ void ZTCHistoryWorker::notePorts(std::shared_ptr<const ZTSTopology> apPorts) {
     submit(ZTSPortsJob{std::move(apPorts)});
 }
 
+void ZTCHistoryWorker::noteTopology(ZTCHistoryTime aTime, std::shared_ptr<const ZTSTopology> apTopology) {
+    {
+        const std::lock_guard lLock(mMutex);
+        mScan = {.mTime = aTime, .mpTopology = std::move(apTopology)};
+        if (std::exchange(mIsScanQueued, true)) {
+            return;
+        }
+    }
+    submit(ZTSTopologyJob{});
+}
+
+void ZTCHistoryWorker::noteCounters(std::vector<ZTSCounterSample> aSamples) {
+    submit(ZTSCountersJob{std::move(aSamples)});
+}
+
 void ZTCHistoryWorker::setLimits(const ZTSStoreLimits& acrLimits) {
     const std::lock_guard lLock(mMutex);
     mLimits = acrLimits;
@@ -401,6 +416,26 @@ void ZTCHistoryWorker::store(ZTSForgottenJob& arJob) {
 
 void ZTCHistoryWorker::store(ZTSPortsJob& arJob) {
     mpWriter->notePorts(arJob.mpPorts);
+}
+
+void ZTCHistoryWorker::store(ZTSTopologyJob& /*arJob*/) {
+    ZTSScan lScan;
+    {
+        const std::lock_guard lLock(mMutex);
+        lScan = mScan;
+        mIsScanQueued = false;
+    }
+    if (!mpStore->noteTopology(toMicroseconds(lScan.mTime), *lScan.mpTopology)) {
+        // The rest is for a later transaction, behind the frames that wait.
+        const std::lock_guard lLock(mMutex);
+        if (!std::exchange(mIsScanQueued, true)) {
+            mQueue.emplace_back(ZTSTopologyJob{});
+        }
+    }
+}
+
+void ZTCHistoryWorker::store(ZTSCountersJob& arJob) {
+    mpStore->noteCounters(arJob.mSamples);
 }
 
 void ZTCHistoryWorker::store(ZTSMarkJob& arJob) {

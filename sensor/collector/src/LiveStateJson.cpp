@@ -147,6 +147,14 @@ static ZTCJson sLosses(const ZTSLosses& acrLosses) {
             {"library", lLibrary}};
 }
 
+static ZTCJson sTopology(const ZTSTopologyState& acrState) {
+    return {
+        {"scanned", acrState.mScanned ? sTime(*acrState.mScanned) : ZTCJson(nullptr)},
+        {"ageSeconds", acrState.mAge ? ZTCJson(static_cast<double>(acrState.mAge->count()) / 1000) : ZTCJson(nullptr)},
+        {"stale", acrState.mIsStale},
+        {"blocked", acrState.mBlocked}};
+}
+
 std::string toLiveStateJson(const ZTSLiveFacts& acrFacts) {
     ZTCJson lState{{"schema", "tavik.live/1"},
                    {"storeId", sText(acrFacts.mHistory.mStoreId)},
@@ -157,6 +165,7 @@ std::string toLiveStateJson(const ZTSLiveFacts& acrFacts) {
                    {"adapters", nullptr},
                    {"kinds", nullptr},
                    {"losses", sLosses(acrFacts.mLosses)},
+                   {"topology", sTopology(acrFacts.mTopology)},
                    {"warnings", ZTCJson::parse(acrFacts.mWarnings)}};
     if (acrFacts.mpPage != nullptr) {
         lState["adapters"] = sAdapters(acrFacts);

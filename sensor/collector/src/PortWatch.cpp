@@ -1,34 +1,39 @@
 #include "sensor/collector/include/PortWatch.h"
 
 #include <algorithm>
-#include <cstdlib>
+#include <array>
 #include <iterator>
+#include <string_view>
 
-/// Between two looks at the ports in sysfs and in the targets' file.
+#include "sensor/client/include/ClientErrors.h"
+
+/// Between two looks at the targets' file.
 static constexpr std::chrono::seconds scScanPeriod{10};
+/// How long the first agent waits for the ports: it keeps the first target that it was given for an FC id.
+static constexpr std::chrono::seconds scPortsPatience{1};
 
-static std::string sSysfsRoot() {
-    const char* const lpRoot = std::getenv(gcSysfsVariable);
-    return lpRoot != nullptr && *lpRoot != '\0' ? lpRoot : "/sys";
-}
+/// Kinds that say that ports, paths or queue depths are no longer what they were.
+static constexpr std::array<std::string_view, 7> scTellingKinds = {"rscn", "link",  "queue-depth",    "logo",
+                                                                   "prlo", "plogi", "adapter-arrival"};
 
-ZTCPortWatch::ZTCPortWatch(ZTCHistoryWorker& arHistory, Report aReport)
-    : mrHistory(arHistory),
-      mReport(std::move(aReport)),
-      mSysfsRoot(sSysfsRoot()),
-      mpPorts(std::make_shared<ZTSTopology>()) {}
+ZTCPortWatch::ZTCPortWatch(ZTCTopologyWatch& arTopology, Report aReport)
+    : mrTopology(arTopology), mReport(std::move(aReport)), mpPorts(std::make_shared<ZTSTopology>()) {}
 
 bool ZTCPortWatch::scan(const ZTSSettings& acrSettings, ZTCTime aNow) {
-    if (aNow < mNextScan) {
+    const std::shared_ptr<const ZTSTopology> lpPorts = mrTopology.getPorts();
+    const bool lIsNew = lpPorts != nullptr && lpPorts != mpPorts;
+    mReadyBy = mReadyBy.value_or(aNow + scPortsPatience);
+    if (!mIsReady && lpPorts == nullptr && aNow < *mReadyBy) {
+        mNextScan = *mReadyBy;
         return false;
     }
-    mNextScan = aNow + scScanPeriod;
-    auto lpPorts = std::make_shared<ZTSTopology>(scanPorts(mSysfsRoot, mReader));
-    if (*lpPorts != *mpPorts) {
-        mpPorts = lpPorts;
-        mrHistory.notePorts(lpPorts);
+    if (mIsReady && !lIsNew && aNow < mNextScan) {
+        return false;
     }
-    mTargets = acrSettings.mTargetsSysfs ? toTargets(*lpPorts) : std::vector<ZTSTargetPort>();
+    mIsReady = true;
+    mNextScan = aNow + scScanPeriod;
+    mpPorts = lpPorts != nullptr ? lpPorts : mpPorts;
+    mTargets = acrSettings.mTargetsSysfs ? toTargets(*mpPorts) : std::vector<ZTSTargetPort>();
     try {
         std::ranges::copy(readTargetFile(acrSettings.mTargetsFile), std::back_inserter(mTargets));
         mTargetFileProblem.clear();
@@ -39,4 +44,23 @@ bool ZTCPortWatch::scan(const ZTSSettings& acrSettings, ZTCTime aNow) {
         }
     }
     return true;
+}
+
+void ZTCPortWatch::noteEvents(const std::shared_ptr<const ZTSStatusSnapshot>& acrPage) {
+    if (acrPage == nullptr || acrPage == mpPage) {
+        return;
+    }
+    mpPage = acrPage;
+    std::int64_t lLast = 0;
+    for (const ZTSStatusBoardCopy& lrBoard : acrPage->mBoards) {
+        for (std::size_t i = 0; i < lrBoard.mRows.size(); ++i) {
+            if (std::ranges::find(scTellingKinds, getStatusRowName(i)) != scTellingKinds.end()) {
+                lLast = std::max(lLast, lrBoard.mRows[i].mLastEvent);
+            }
+        }
+    }
+    if (lLast != mLastEvent) {
+        mLastEvent = lLast;
+        mrTopology.hurry();
+    }
 }

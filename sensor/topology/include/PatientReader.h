@@ -8,6 +8,7 @@
 
 #include <chrono>
 #include <cstddef>
+#include <cstdint>
 #include <memory>
 #include <optional>
 #include <string>
@@ -32,12 +33,16 @@ public:
     /// file cannot be read or blocks. One thread at a time calls it.
     std::vector<std::optional<std::string>> readAll(std::vector<std::string> aPaths);
 
+    /// Files that readAll() was asked for so far.
+    std::uint64_t countFiles() const { return mFiles; }
+
     /// The files that block now: asked for in some call of readAll(), and no answer has come.
     std::vector<std::string> getBlockedPaths() const;
 
 private:
     struct ZTSBlocked;
     std::chrono::milliseconds mPatience;
+    std::uint64_t mFiles = 0;
     std::shared_ptr<ZTSBlocked> mpBlocked;
 };
 

@@ -61,6 +61,7 @@ std::vector<std::string> ZTCPatientReader::getBlockedPaths() const {
 
 std::vector<std::optional<std::string>> ZTCPatientReader::readAll(std::vector<std::string> aPaths) {
     const auto lpReading = std::make_shared<ZTSReading>();
+    mFiles += aPaths.size();
     lpReading->mTexts.resize(aPaths.size());
     lpReading->mPaths = std::move(aPaths);
     const std::size_t lCount = lpReading->mPaths.size();

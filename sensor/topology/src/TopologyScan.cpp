@@ -1,38 +1,20 @@
 #include "sensor/topology/include/TopologyScan.h"
 
-#include <dirent.h>
 #include <sys/stat.h>
 #include <unistd.h>
 
 #include <algorithm>
 #include <array>
-#include <charconv>
 #include <climits>
 #include <deque>
 #include <functional>
 #include <set>
 
 #include "sensor/topology/src/MountTable.h"
+#include "sensor/topology/src/SysfsFiles.h"
 
 /// Devices on devices: a bound for trees that lead in a circle.
 static constexpr std::size_t scMostHolders = 256;
-
-/// The names in a directory, sorted; none where it cannot be read.
-static std::vector<std::string> sList(const std::string& acrPath) {
-    std::vector<std::string> lNames;
-    DIR* lpDirectory = opendir(acrPath.c_str());
-    if (lpDirectory == nullptr) {
-        return lNames;
-    }
-    while (const dirent* lpEntry = readdir(lpDirectory)) {
-        if (lpEntry->d_name[0] != '.') {
-            lNames.emplace_back(lpEntry->d_name);
-        }
-    }
-    closedir(lpDirectory);
-    std::ranges::sort(lNames);
-    return lNames;
-}
 
 static std::string sReadLink(const std::string& acrPath) {
     std::array<char, PATH_MAX> lTarget;
@@ -47,20 +29,6 @@ static std::string sComponent(const std::string& acrPath, const std::string& acr
         return {};
     }
     return acrPath.substr(lStart + 1, acrPath.find('/', lStart + 1) - lStart - 1);
-}
-
-template <typename Number>
-static std::optional<Number> sNumber(std::string_view aText, int aBase = 10) {
-    if (aText.starts_with("0x")) {
-        aText.remove_prefix(2);
-        aBase = 16;
-    }
-    Number lNumber{};
-    const auto [lpEnd, lError] = std::from_chars(aText.data(), aText.data() + aText.size(), lNumber, aBase);
-    if (lError != std::errc() || lpEnd != aText.data() + aText.size()) {
-        return std::nullopt;
-    }
-    return lNumber;
 }
 
 // ---- attributes: collected first, read in one go, then each put into its place ----
@@ -86,7 +54,7 @@ public:
     /// A world wide name. All ones, and zero, are what the kernel shows before the port has a name.
     void addName(std::string aPath, std::optional<ZTSFcName>& arPlace) {
         add(std::move(aPath), [&arPlace](const std::string& acrText) {
-            const auto lValue = sNumber<std::uint64_t>(acrText, 16);
+            const auto lValue = parseAttribute<std::uint64_t>(acrText, 16);
             if (!lValue || *lValue == 0 || *lValue == UINT64_MAX) {
                 return;
             }
@@ -101,7 +69,7 @@ public:
     /// An FC id. 0 is what the kernel shows while there is none.
     void addFcId(std::string aPath, std::optional<std::uint32_t>& arPlace) {
         add(std::move(aPath), [&arPlace](const std::string& acrText) {
-            const auto lValue = sNumber<std::uint32_t>(acrText, 16);
+            const auto lValue = parseAttribute<std::uint32_t>(acrText, 16);
             if (lValue && *lValue != 0 && *lValue <= 0xFFFFFFU) {
                 arPlace = lValue;
             }
@@ -109,7 +77,8 @@ public:
     }
 
     void addCount(std::string aPath, std::optional<std::uint32_t>& arPlace) {
-        add(std::move(aPath), [&arPlace](const std::string& acrText) { arPlace = sNumber<std::uint32_t>(acrText); });
+        add(std::move(aPath),
+            [&arPlace](const std::string& acrText) { arPlace = parseAttribute<std::uint32_t>(acrText); });
     }
 
     void fulfil(ZTCPatientReader& arReader) {
@@ -128,7 +97,7 @@ private:
 
 static void sFindInitiators(const std::string& acrSysfs, ZTSTopology& arTopology, ZTCWishes& arWishes) {
     const std::string lClass = acrSysfs + "/class/fc_host/";
-    for (const std::string& lrHost : sList(lClass)) {
+    for (const std::string& lrHost : listDirectory(lClass)) {
         arTopology.mInitiators.push_back({.mHost = lrHost});
     }
     for (ZTSTopologyInitiator& lrPort : arTopology.mInitiators) {
@@ -146,7 +115,7 @@ static void sFindInitiators(const std::string& acrSysfs, ZTSTopology& arTopology
 
 static void sFindRemotePorts(const std::string& acrSysfs, ZTSTopology& arTopology, ZTCWishes& arWishes) {
     const std::string lClass = acrSysfs + "/class/fc_remote_ports/";
-    for (const std::string& lrName : sList(lClass)) {
+    for (const std::string& lrName : listDirectory(lClass)) {
         // "rport-HOST:CHANNEL-NUMBER"
         const std::size_t lStart = lrName.find('-') + 1;
         arTopology.mRemotePorts.push_back(
@@ -165,10 +134,10 @@ static void sFindRemotePorts(const std::string& acrSysfs, ZTSTopology& arTopolog
 
 static void sFindPaths(const std::string& acrSysfs, ZTSTopology& arTopology, ZTCWishes& arWishes) {
     const std::string lClass = acrSysfs + "/class/scsi_device/";
-    for (const std::string& lrAddress : sList(lClass)) {
+    for (const std::string& lrAddress : listDirectory(lClass)) {
         const std::string lRemotePort = sComponent(sReadLink(lClass + lrAddress), "rport-");
         const std::string lLun = lrAddress.substr(lrAddress.rfind(':') + 1);
-        const auto lNumber = sNumber<std::uint64_t>(lLun);
+        const auto lNumber = parseAttribute<std::uint64_t>(lLun);
         if (lRemotePort.empty() || !lNumber) {
             continue;  // not behind a remote port
         }
@@ -184,7 +153,7 @@ static void sFindPaths(const std::string& acrSysfs, ZTSTopology& arTopology, ZTC
         arWishes.addText(lDevice + "wwid", lrPath.mWwid);
         arWishes.addText(lDevice + "state", lrPath.mState);
         arWishes.addCount(lDevice + "queue_depth", lrPath.mQueueDepth);
-        const std::vector<std::string> lDisks = sList(lDevice + "block");
+        const std::vector<std::string> lDisks = listDirectory(lDevice + "block");
         if (!lDisks.empty()) {
             lrPath.mDisk = lDisks.front();
         }
@@ -195,7 +164,7 @@ static void sFindPaths(const std::string& acrSysfs, ZTSTopology& arTopology, ZTC
 class ZTCHolders {
 public:
     explicit ZTCHolders(const std::string& acrSysfs) : mBlock(acrSysfs + "/class/block/") {
-        for (std::string& lrDevice : sList(mBlock)) {
+        for (std::string& lrDevice : listDirectory(mBlock)) {
             mDevices.insert(std::move(lrDevice));
         }
     }
@@ -221,7 +190,7 @@ private:
     const std::vector<std::string>& findDirect(const std::string& acrDevice) {
         const auto [lPlace, lIsNew] = mDirect.try_emplace(acrDevice);
         if (lIsNew) {
-            lPlace->second = sList(mBlock + acrDevice + "/holders");
+            lPlace->second = listDirectory(mBlock + acrDevice + "/holders");
             // A partition has its disk's name in front: "sdc" and "sdc1", "nvme0n1" and "nvme0n1p1".
             for (auto lOther = mDevices.upper_bound(acrDevice);
                  lOther != mDevices.end() && lOther->starts_with(acrDevice); ++lOther) {
@@ -255,7 +224,7 @@ static void sFindMappings(const std::string& acrSysfs, ZTSTopology& arTopology, 
         const std::string lPath = acrSysfs + "/class/block/" + lrDevice;
         ZTSTopologyMapping& lrMapping = arTopology.mMappings[lrDevice];
         lrMapping.mDevice = lrDevice;
-        lrMapping.mSlaves = sList(lPath + "/slaves");
+        lrMapping.mSlaves = listDirectory(lPath + "/slaves");
         arWishes.addText(lPath + "/dm/name", lrMapping.mName);
         arWishes.addText(lPath + "/dm/uuid", lrMapping.mUuid);
     }

@@ -186,7 +186,12 @@ TEST(TopologyScan, EveryLunOfALargeHostLeadsToItsDiskItsMultipathDeviceAndItsMou
         lTree.addMapping(lLun, "mpath" + lNumber, "mpath-" + lNumber, lDisks);
         lTree.mount("dm-" + lNumber, "/data/" + lNumber);
     }
-    const ZTSTopology lTopology = sScan(lTree);
+    ZTCPatientReader lReader;
+    const ZTSTopology lTopology = scanTopology(lTree.roots(), lReader);
+    // A few files for each thing, each once, however many lead to it.
+    constexpr unsigned scPorts = scHosts * scPortsOfAHost;
+    constexpr unsigned scPaths = scHosts * scLuns;
+    EXPECT_LE(lReader.countFiles(), 8 * scHosts + 6 * scPorts + (5 + 1) * scPaths + (2 + 1) * scLuns);
     EXPECT_EQ(lTopology.mInitiators.size(), scHosts);
     EXPECT_EQ(lTopology.mRemotePorts.size(), scHosts * scPortsOfAHost);
     ASSERT_EQ(lTopology.mPaths.size(), scLuns * scHosts);

@@ -1,0 +1,265 @@
+#include "sensor/collector/include/TopologyWatch.h"
+
+#include <sys/eventfd.h>
+#include <unistd.h>
+
+#include <algorithm>
+#include <cerrno>
+#include <condition_variable>
+#include <cstdlib>
+#include <mutex>
+
+#include "sensor/client/include/ClientErrors.h"
+#include "sensor/client/include/FileDescriptor.h"
+#include "sensor/topology/include/CounterDifferences.h"
+
+using std::chrono::milliseconds;
+using ZTCTime = std::chrono::steady_clock::time_point;
+
+/// How long the end waits for a scan that is under way.
+static constexpr std::chrono::seconds scStopPatience{1};
+static constexpr std::chrono::microseconds scMinute = std::chrono::minutes(1);
+
+ZTSTopologyWatchSetup makeTopologyWatchSetup() {
+    ZTSTopologyWatchSetup lSetup;
+    const char* const lpRoot = std::getenv(gcSysfsVariable);
+    if (lpRoot != nullptr && *lpRoot != '\0') {
+        lSetup.mRoots.mSysfs = lpRoot;
+    }
+    return lSetup;
+}
+
+/// All that the thread touches. It is shared with it, since the thread may outlive the watch.
+class ZTCTopologyWatch::Thread {
+public:
+    Thread(ZTCTopologySink& arSink, ZTSTopologyWatchSetup aSetup)
+        : mSetup(std::move(aSetup)),
+          mReader(mSetup.mPatience),
+          mBell(eventfd(0, EFD_CLOEXEC | EFD_NONBLOCK)),
+          mpSink(&arSink) {
+        if (!mBell.isOpen()) {
+            throw ZTCSystemCallEx("cannot make an eventfd", errno);
+        }
+    }
+
+    void run();
+    bool stop();
+    void hurry();
+    std::shared_ptr<const ZTSTopology> getPorts() const;
+    std::shared_ptr<const ZTSTopology> getTopology() const;
+    ZTSTopologyState getState() const;
+    int getBell() const { return mBell.get(); }
+
+private:
+    bool wait();
+    ZTCTime getNext() const;
+    void scanWhole();
+    void turn();
+    void publishPorts(const ZTSTopology& acrPorts);
+    void sampleCounters();
+    std::int64_t getMinute() const { return mSetup.mClock().time_since_epoch() / scMinute; }
+
+    // ---- constant after construction, or with a lock of its own ----
+    const ZTSTopologyWatchSetup mSetup;
+    ZTCPatientReader mReader;
+    const ZTCFileDescriptor mBell;
+
+    // ---- of the thread ----
+    ZTCCounterDifferences mDifferences;
+    std::optional<std::int64_t> mLastMinute;
+    ZTCTime mNextPorts{};
+    ZTCTime mNextWhole{};
+    ZTCTime mLastWhole{};
+
+    // ---- guarded by mMutex ----
+    mutable std::mutex mMutex;
+    std::condition_variable mChanged;
+    ZTCTopologySink* mpSink;  ///< null: stopped
+    bool mIsHurried = false;
+    bool mIsOver = false;
+    std::shared_ptr<const ZTSTopology> mpPorts;
+    std::shared_ptr<const ZTSTopology> mpTopology;
+    std::optional<ZTCHistoryTime> mScanned;
+    ZTCTime mScannedAt{};
+};
+
+void ZTCTopologyWatch::Thread::run() {
+    do {
+        try {
+            turn();
+        } catch (const std::exception&) {
+            // No memory, or no thread for a file that blocks. What is due is tried again at its next time, and the age
+            // of the last scan tells.
+            mLastMinute = getMinute();
+        }
+    } while (wait());
+    const std::lock_guard lLock(mMutex);
+    mIsOver = true;
+    mChanged.notify_all();
+}
+
+/// All that is due. What throws is not due again at once.
+void ZTCTopologyWatch::Thread::turn() {
+    const ZTCTime lNow = std::chrono::steady_clock::now();
+    if (lNow >= mNextPorts) {
+        mNextPorts = lNow + mSetup.mPortsPeriod;
+        publishPorts(scanPorts(mSetup.mRoots.mSysfs, mReader));
+    }
+    if (lNow >= mNextWhole) {
+        mNextWhole = lNow + mSetup.mWholePeriod;
+        scanWhole();
+    }
+    sampleCounters();
+}
+
+ZTCTime ZTCTopologyWatch::Thread::getNext() const {
+    const std::chrono::microseconds lIntoMinute(toMicroseconds(mSetup.mClock()) % scMinute.count());
+    const ZTCTime lMinuteEnd = std::chrono::steady_clock::now() + (scMinute - lIntoMinute);
+    return std::min({mNextPorts, mNextWhole, lMinuteEnd});
+}
+
+/// Until something is due. False: the thread is to end.
+bool ZTCTopologyWatch::Thread::wait() {
+    std::unique_lock lLock(mMutex);
+    if (!mIsHurried && mpSink != nullptr) {
+        mChanged.wait_until(lLock, getNext(), [this] { return mIsHurried || mpSink == nullptr; });
+    }
+    if (mIsHurried) {
+        mIsHurried = false;
+        mNextWhole = std::min(mNextWhole, mLastWhole + mSetup.mHurryPause);
+    }
+    return mpSink != nullptr;
+}
+
+void ZTCTopologyWatch::Thread::scanWhole() {
+    const auto lpTopology = std::make_shared<const ZTSTopology>(scanTopology(mSetup.mRoots, mReader));
+    const ZTCHistoryTime lTime = mSetup.mClock();
+    mLastWhole = std::chrono::steady_clock::now();
+    mNextWhole = mLastWhole + mSetup.mWholePeriod;
+    mNextPorts = mLastWhole + mSetup.mPortsPeriod;
+    publishPorts(*lpTopology);
+    const std::lock_guard lLock(mMutex);
+    mpTopology = lpTopology;
+    mScanned = lTime;
+    mScannedAt = mLastWhole;
+    if (mpSink != nullptr) {
+        mpSink->noteTopology(lTime, lpTopology);
+    }
+}
+
+/// What is new with the ports is a reason to look at everything.
+void ZTCTopologyWatch::Thread::publishPorts(const ZTSTopology& acrPorts) {
+    const std::lock_guard lLock(mMutex);
+    if (mpPorts != nullptr && mpPorts->mInitiators == acrPorts.mInitiators &&
+        mpPorts->mRemotePorts == acrPorts.mRemotePorts) {
+        return;
+    }
+    auto lpPorts = std::make_shared<ZTSTopology>();
+    lpPorts->mInitiators = acrPorts.mInitiators;
+    lpPorts->mRemotePorts = acrPorts.mRemotePorts;
+    mIsHurried = mIsHurried || mpPorts != nullptr;
+    mpPorts = lpPorts;
+    if (mpSink != nullptr) {
+        mpSink->notePorts(std::move(lpPorts));
+    }
+    const std::uint64_t lOne = 1;
+    [[maybe_unused]] const ssize_t lWritten = write(mBell.get(), &lOne, sizeof(lOne));
+}
+
+/// A difference belongs to the minute that has just ended.
+void ZTCTopologyWatch::Thread::sampleCounters() {
+    const std::int64_t lMinute = getMinute();
+    if (mLastMinute == lMinute) {
+        return;
+    }
+    mLastMinute = lMinute;
+    std::vector<ZTSCounterSample> lSamples;
+    for (ZTSCounterReading& lrRise : mDifferences.take(scanCounters(mSetup.mRoots.mSysfs, *getPorts(), mReader))) {
+        lSamples.push_back({.mMinute = (lMinute - 1) * scMinute.count(),
+                            .mInitiator = lrRise.mInitiator,
+                            .mRemotePort = lrRise.mRemotePort,
+                            .mCounter = std::move(lrRise.mName),
+                            .mDifference = lrRise.mValue});
+    }
+    const std::lock_guard lLock(mMutex);
+    if (mpSink != nullptr && !lSamples.empty()) {
+        mpSink->noteCounters(std::move(lSamples));
+    }
+}
+
+void ZTCTopologyWatch::Thread::hurry() {
+    const std::lock_guard lLock(mMutex);
+    mIsHurried = true;
+    mChanged.notify_all();
+}
+
+/// Whether the thread is at its end.
+bool ZTCTopologyWatch::Thread::stop() {
+    std::unique_lock lLock(mMutex);
+    mpSink = nullptr;
+    mChanged.notify_all();
+    return mChanged.wait_for(lLock, scStopPatience, [this] { return mIsOver; });
+}
+
+std::shared_ptr<const ZTSTopology> ZTCTopologyWatch::Thread::getPorts() const {
+    const std::lock_guard lLock(mMutex);
+    return mpPorts;
+}
+
+std::shared_ptr<const ZTSTopology> ZTCTopologyWatch::Thread::getTopology() const {
+    const std::lock_guard lLock(mMutex);
+    return mpTopology;
+}
+
+ZTSTopologyState ZTCTopologyWatch::Thread::getState() const {
+    ZTSTopologyState lState;
+    lState.mBlocked = mReader.getBlockedPaths();
+    const std::lock_guard lLock(mMutex);
+    lState.mScanned = mScanned;
+    if (mScanned) {
+        lState.mAge = std::chrono::duration_cast<milliseconds>(std::chrono::steady_clock::now() - mScannedAt);
+    }
+    lState.mIsStale = !mScanned || *lState.mAge > mSetup.mStaleAfter || !lState.mBlocked.empty();
+    return lState;
+}
+
+// ---- the owner's side ----
+
+ZTCTopologyWatch::ZTCTopologyWatch(ZTCTopologySink& arSink, ZTSTopologyWatchSetup aSetup)
+    : mpThread(std::make_shared<Thread>(arSink, std::move(aSetup))),
+      mRunner([lpThread = mpThread] { lpThread->run(); }) {}
+
+ZTCTopologyWatch::~ZTCTopologyWatch() {
+    stop();
+}
+
+void ZTCTopologyWatch::stop() {
+    if (!mRunner.joinable()) {
+        return;
+    }
+    if (mpThread->stop()) {
+        mRunner.join();
+    } else {
+        mRunner.detach();
+    }
+}
+
+void ZTCTopologyWatch::hurry() {
+    mpThread->hurry();
+}
+
+std::shared_ptr<const ZTSTopology> ZTCTopologyWatch::getPorts() const {
+    return mpThread->getPorts();
+}
+
+std::shared_ptr<const ZTSTopology> ZTCTopologyWatch::getTopology() const {
+    return mpThread->getTopology();
+}
+
+ZTSTopologyState ZTCTopologyWatch::getState() const {
+    return mpThread->getState();
+}
+
+int ZTCTopologyWatch::getBell() const {
+    return mpThread->getBell();
+}
