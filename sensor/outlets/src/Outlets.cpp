@@ -248,6 +248,9 @@ void ZTCOutlets::feed() {
 
 ZTCNameBook ZTCOutlets::makeNames() const {
     ZTCNameBook lNames;
+    if (mpHistory != nullptr) {
+        lNames.setTopology(readTopologyOf(*mpHistory));
+    }
     for (const auto& [lWwn, lName] : mSettings.mNames) {
         if (const auto lParsed = parseWwn(lWwn)) {
             lNames.addName(*lParsed, lName);

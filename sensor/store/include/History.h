@@ -110,6 +110,9 @@ public:
 
     /// The topology as it was at a time; absent where none was stored by then, or retention has taken it.
     std::optional<ZTSStoredTopology> readTopology(std::int64_t aTime) const;
+    /// Makes of the topology at `aFrom`, as readTopology() gave it, that at `aTo`, which is not before: in as much time
+    /// as there are changes between the two.
+    void advanceTopology(ZTSStoredTopology& arStored, std::int64_t aFrom, std::int64_t aTo) const;
     /// What changed later than `aFrom` and not later than `aTo`, by time, then thing and key. What the first scan of
     /// all found did not appear then, so it is no change.
     std::vector<ZTSTopologyChange> readTopologyChanges(std::int64_t aFrom, std::int64_t aTo) const;

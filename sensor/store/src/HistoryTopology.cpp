@@ -33,22 +33,28 @@ static std::vector<std::string> sLines(const std::string& acrText) {
     return lLines;
 }
 
+/// The scan that a time belongs to. False: there was none by then.
+static bool sReadScan(ZTCDatabase& arDatabase, std::int64_t aTime, ZTSStoredTopology& arStored) {
+    ZTCStatement lScan(arDatabase, HistoryQueries::gcScan);
+    if (!lScan.query(aTime).step()) {
+        return false;
+    }
+    arStored.mScanned = std::min(lScan.number(0), aTime);
+    arStored.mTopology.mBlocked = sLines(lScan.text(1));
+    arStored.mIsStale = !arStored.mTopology.mBlocked.empty();
+    return true;
+}
+
 std::optional<ZTSStoredTopology> ZTCHistory::readTopology(std::int64_t aTime) const {
     ZTCDatabase& lrDatabase = mpImplementation->mDatabase;
     ZTSStoredTopology lStored;
     // One transaction for all, so that a thing that changes meanwhile is seen exactly once.
     lrDatabase.execute("BEGIN");
     try {
-        ZTCStatement lScan(lrDatabase, HistoryQueries::gcScan);
-        if (!lScan.query(aTime).step()) {
-            lScan.reset();
+        if (!sReadScan(lrDatabase, aTime, lStored)) {
             lrDatabase.execute("COMMIT");
             return std::nullopt;
         }
-        lStored.mScanned = std::min(lScan.number(0), aTime);
-        lStored.mTopology.mBlocked = sLines(lScan.text(1));
-        lStored.mIsStale = !lStored.mTopology.mBlocked.empty();
-        lScan.reset();
         for (const char* const lpSql : {HistoryQueries::gcOpenThings, HistoryQueries::gcEndedThings}) {
             ZTCStatement lRows(lrDatabase, lpSql);
             lRows.query(aTime);
@@ -64,6 +70,42 @@ std::optional<ZTSStoredTopology> ZTCHistory::readTopology(std::int64_t aTime) co
     }
     sortTopology(lStored.mTopology);
     return lStored;
+}
+
+void ZTCHistory::advanceTopology(ZTSStoredTopology& arStored, std::int64_t aFrom, std::int64_t aTo) const {
+    ZTCDatabase& lrDatabase = mpImplementation->mDatabase;
+    bool lIsNew = false;
+    std::size_t lRowCount = 0;
+    lrDatabase.execute("BEGIN");
+    try {
+        sReadScan(lrDatabase, aTo, arStored);
+        // First all that ended meanwhile, then all that began and is still there: of several versions one is left.
+        ZTCStatement lEnded(lrDatabase, HistoryQueries::gcThingsEnded);
+        lEnded.query(aFrom, aTo, gcMostTopologyVersions);
+        while (lEnded.step()) {
+            ++lRowCount;
+            removeThing(arStored.mTopology, static_cast<ZTETopologyThing>(lEnded.number(1)), lEnded.text(2));
+        }
+        ZTCStatement lBegun(lrDatabase, HistoryQueries::gcThingsBegun);
+        lBegun.query(aFrom, aTo, gcMostTopologyVersions);
+        while (lBegun.step()) {
+            ++lRowCount;
+            if (lBegun.isNull(5) || lBegun.number(5) > aTo) {
+                addThing(arStored.mTopology, static_cast<ZTETopologyThing>(lBegun.number(1)), lBegun.text(2),
+                         lBegun.blob(3));
+                lIsNew = true;
+            }
+        }
+        lrDatabase.execute("COMMIT");
+    } catch (...) {
+        lrDatabase.rollBack();
+        throw;
+    }
+    if (lRowCount >= gcMostTopologyVersions) {
+        arStored = readTopology(aTo).value_or(ZTSStoredTopology());  // not all changes were looked at
+    } else if (lIsNew) {
+        sortTopology(arStored.mTopology);
+    }
 }
 
 /// As changes show lists: the database has line breaks.

@@ -328,6 +328,30 @@ void addThing(ZTSTopology& arTopology, ZTETopologyThing aThing, const std::strin
     }
 }
 
+void removeThing(ZTSTopology& arTopology, ZTETopologyThing aThing, const std::string& acrKey) {
+    switch (aThing) {
+        case ZTTT_Initiator:
+            std::erase_if(arTopology.mInitiators, [&](const auto& acrPort) { return acrPort.mHost == acrKey; });
+            break;
+        case ZTTT_RemotePort:
+            std::erase_if(arTopology.mRemotePorts, [lName = acrKey.substr(0, acrKey.find(' '))](const auto& acrPort) {
+                return acrPort.mName == lName;
+            });
+            break;
+        case ZTTT_Path:
+            std::erase_if(arTopology.mPaths, [&](const auto& acrPath) { return acrPath.mAddress == acrKey; });
+            break;
+        case ZTTT_Mapping:
+            arTopology.mMappings.erase(acrKey);
+            break;
+        case ZTTT_Mount:
+            arTopology.mMounts.erase(acrKey);
+            break;
+        default:
+            break;
+    }
+}
+
 void sortTopology(ZTSTopology& arTopology) {
     std::ranges::sort(arTopology.mInitiators, {}, &ZTSTopologyInitiator::mHost);
     std::ranges::sort(arTopology.mRemotePorts, {}, &ZTSTopologyRemotePort::mName);

@@ -31,6 +31,9 @@ std::vector<ZTSThing> toThings(const ZTSTopology& acrTopology);
 void addThing(ZTSTopology& arTopology, ZTETopologyThing aThing, const std::string& acrKey,
               std::span<const std::uint8_t> aBody);
 
+/// Takes a thing out; nothing where it is not there.
+void removeThing(ZTSTopology& arTopology, ZTETopologyThing aThing, const std::string& acrKey);
+
 /// As a scan sorts.
 void sortTopology(ZTSTopology& arTopology);
 

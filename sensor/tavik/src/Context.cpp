@@ -42,6 +42,7 @@ ZTCNameBook ZTCContext::makeNames(const ZTCHistory* apHistory) const {
         }
     }
     if (apHistory != nullptr) {
+        lNames.setTopology(readTopologyOf(*apHistory));
         for (const ZTSInitiator& lrInitiator : apHistory->readInitiators()) {
             lNames.addInitiator(lrInitiator);
         }
@@ -74,6 +75,7 @@ ZTSStatusFacts ZTCContext::gatherFacts() const {
         lFacts.mHistoryProblem = lrEx.what();
     }
     lFacts.mNames = makeNames(lpHistory.get());
+    lFacts.mNames.setTopology(nullptr);  // the history ends here
     if (lFacts.mAnswer == ZTAN_NoSensor) {
         addLeftPage(lFacts);
     }

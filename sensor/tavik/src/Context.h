@@ -23,7 +23,8 @@ public:
 
     /// The history, read-only. Throws what ZTCHistory throws.
     std::unique_ptr<ZTCHistory> openHistory() const;
-    /// The names of the settings, and the ports that the history knows. @param apHistory  null: none
+    /// The names of the settings, and the ports and the topology that the history knows. @param apHistory  null: none;
+    /// otherwise it outlives the names
     ZTCNameBook makeNames(const ZTCHistory* apHistory) const;
     /// Asks the sensor and reads the history. Never throws for what it meets: what is not known is in the facts.
     ZTSStatusFacts gatherFacts() const;

@@ -2,6 +2,7 @@
 #ifndef SENSOR_VIEWS_INCLUDE_NAMEBOOK_H
 #define SENSOR_VIEWS_INCLUDE_NAMEBOOK_H
 
+#include <functional>
 #include <map>
 #include <optional>
 #include <string>
@@ -9,14 +10,29 @@
 #include <vector>
 
 #include "sensor/store/include/Episode.h"
+#include "sensor/store/include/History.h"
+#include "sensor/topology/include/Topology.h"
 
-/// Names of ports and nodes, and the ports that are known. Filled once, then only read; by any thread.
+/// The topology as it was at a time; null: not known. Lives until the next call.
+using ZTCTopologyAt = std::function<const ZTSTopology*(ZTCHistoryTime aTime)>;
+
+/// Reads it from a history, which outlives the result. Cheap where times rise. The first scan of all counts for events
+/// of up to a minute before it.
+ZTCTopologyAt readTopologyOf(const ZTCHistory& acrHistory);
+
+/// Names of ports and nodes, and the ports that are known. Filled once, then only read; by any thread, or with a
+/// topology by the one that may use its history.
 class ZTCNameBook {
 public:
     /// The administrator's name of a port or a node.
     void addName(const ZTSFcName& acrWwn, const std::string& acrName) { mNames[acrWwn.mBytes] = acrName; }
     void addInitiator(const ZTSInitiator& acrInitiator) { mInitiators.push_back(acrInitiator); }
     void addRemotePort(const ZTSRemotePort& acrPort) { mRemotePorts.push_back(acrPort); }
+
+    void setTopology(ZTCTopologyAt aTopology) { mTopology = std::move(aTopology); }
+
+    /// What hung on the ports at that time; null: not known. Lives until the next call.
+    const ZTSTopology* findTopology(ZTCHistoryTime aTime) const { return mTopology ? mTopology(aTime) : nullptr; }
 
     /// The name of the port, else that of its node; empty: it has none.
     std::string findName(const std::optional<ZTSFcName>& acrWwpn, const std::optional<ZTSFcName>& acrWwnn) const;
@@ -26,9 +42,10 @@ public:
     /// The name of a local port, else hostN, else its WWPN; "unknown adapter" without one.
     std::string describe(const ZTSInitiator& acrInitiator) const;
 
-    /// WWPNs of the remote ports that a WWPN, or a name of a port or node, stands for. Empty: nothing has that name.
+    /// WWPNs of the remote ports that a WWPN, a name of a port or node, or the kernel's "rport-7:0-3" of now stands
+    /// for. Empty: nothing has that name.
     std::vector<ZTSFcName> findRemotePorts(std::string_view aText) const;
-    /// The same for local ports; "host7" too.
+    /// The same for local ports; "host7" and a symbolic name too.
     std::vector<ZTSFcName> findInitiators(std::string_view aText) const;
 
 private:
@@ -37,6 +54,7 @@ private:
     std::map<std::array<std::uint8_t, 8>, std::string> mNames;
     std::vector<ZTSInitiator> mInitiators;
     std::vector<ZTSRemotePort> mRemotePorts;
+    ZTCTopologyAt mTopology;
 };
 
 /// A WWN from its text; nothing where the text is no WWN.

@@ -6,6 +6,7 @@
 
 #include "libkpm/include/ScopeEventKinds.h"
 #include "sensor/client/include/RecordJson.h"
+#include "sensor/views/include/EpisodePlace.h"
 #include "sensor/views/include/TimeText.h"
 
 using ZTCJson = nlohmann::ordered_json;
@@ -42,6 +43,34 @@ ZTCJson toJson(const std::optional<ZTSRemotePort>& acrPort, const ZTCNameBook& a
             {"wwnn", sWwn(acrPort->mWwnn)},
             {"fcId", acrPort->mFcId ? ZTCJson(sFcAddress(*acrPort->mFcId)) : ZTCJson(nullptr)},
             {"name", sText(acrNames.findName(acrPort->mWwpn, acrPort->mWwnn))}};
+}
+
+static ZTCJson sOptional(const std::optional<std::string>& acrText) {
+    return acrText ? ZTCJson(*acrText) : ZTCJson(nullptr);
+}
+
+/// With the kernel's name of then.
+static ZTCJson sPortOf(const ZTSPlace& acrPlace, const ZTCNameBook& acrNames) {
+    ZTCJson lPort = toJson(acrPlace.mRemotePort, acrNames);
+    if (!lPort.is_null()) {
+        lPort["rport"] = sOptional(acrPlace.mRport);
+    }
+    return lPort;
+}
+
+static ZTCJson sDevices(const std::vector<ZTSPlaceDevice>& acrDevices) {
+    ZTCJson lList = ZTCJson::array();
+    for (const ZTSPlaceDevice& lrDevice : acrDevices) {
+        lList.push_back({{"lun", lrDevice.mLun},
+                         {"address", lrDevice.mAddress},
+                         {"vendor", sOptional(lrDevice.mVendor)},
+                         {"model", sOptional(lrDevice.mModel)},
+                         {"wwid", sOptional(lrDevice.mWwid)},
+                         {"disk", sOptional(lrDevice.mDisk)},
+                         {"multipath", sOptional(lrDevice.mMultipath)},
+                         {"mounts", lrDevice.mMounts}});
+    }
+    return lList;
 }
 
 static ZTCJson sLuns(const std::optional<ZTSLunSet>& acrLuns) {
@@ -128,17 +157,26 @@ static ZTCJson sDetail(const ZTSEpisode& acrEpisode) {
 }
 
 ZTCJson toJson(const ZTSEpisode& acrEpisode, const ZTCNameBook& acrNames) {
+    const ZTSPlace lPlace = findPlace(acrEpisode, acrNames);
+    ZTCJson lDetail = sDetail(acrEpisode);
+    if (lPlace.mAffected) {
+        lDetail["ports"] = ZTCJson::array();
+        for (const ZTSRemotePort& lrPort : *lPlace.mAffected) {
+            lDetail["ports"].push_back(toJson(std::optional(lrPort), acrNames));
+        }
+    }
     return {{"seq", acrEpisode.mSeq},
             {"episode", acrEpisode.mEpisode},
             {"phase", getPhaseName(acrEpisode.mPhase)},
             {"kind", getKindName(acrEpisode.mKind)},
-            {"initiator", toJson(acrEpisode.mInitiator)},
-            {"remotePort", toJson(acrEpisode.mRemotePort, acrNames)},
+            {"initiator", toJson(lPlace.mInitiator)},
+            {"remotePort", sPortOf(lPlace, acrNames)},
             {"count", acrEpisode.mCount},
             {"first", toRfc3339(acrEpisode.mFirst)},
             {"last", toRfc3339(acrEpisode.mLast)},
             {"luns", sLuns(acrEpisode.mDetail.mLuns)},
-            {"detail", sDetail(acrEpisode)}};
+            {"devices", acrEpisode.mDetail.mLuns && lPlace.mRport ? sDevices(lPlace.mDevices) : ZTCJson(nullptr)},
+            {"detail", std::move(lDetail)}};
 }
 
 /// The time that the agent's clock showed, whatever its local fields say.
@@ -149,11 +187,13 @@ static ZTCHistoryTime sTime(const ZTSReceivedTime& acrTime) {
 
 ZTCJson toJson(const ZTSStoredRecord& acrRecord, const ZTCNameBook& acrNames) {
     ZTCJson lRaw = ::toJson(acrRecord.mRecord);
+    const ZTSPlace lPlace =
+        findPlace(acrRecord.mInitiator, acrRecord.mRemotePort, sTime(acrRecord.mRecord.mBegin), acrNames);
     return {{"seq", acrRecord.mSeq},
             {"episode", acrRecord.mEpisode},
             {"kind", getKindName(acrRecord.mKind)},
-            {"initiator", toJson(acrRecord.mInitiator)},
-            {"remotePort", toJson(acrRecord.mRemotePort, acrNames)},
+            {"initiator", toJson(lPlace.mInitiator)},
+            {"remotePort", sPortOf(lPlace, acrNames)},
             {"count", acrRecord.mRecord.mOccurrences},
             {"first", toRfc3339(sTime(acrRecord.mRecord.mBegin))},
             {"last", toRfc3339(sTime(acrRecord.mRecord.mEnd))},
@@ -164,17 +204,23 @@ ZTCJson toJson(const ZTSStoredRecord& acrRecord, const ZTCNameBook& acrNames) {
 }
 
 ZTCJson toJson(const ZTSPortSummary& acrPort, const ZTCNameBook& acrNames) {
+    const ZTSPortView lView = findPortView(acrPort, acrNames);
     ZTCJson lInitiators = ZTCJson::array();
-    for (const ZTSInitiator& lrInitiator : acrPort.mInitiators) {
+    for (const ZTSInitiator& lrInitiator : lView.mInitiators) {
         lInitiators.push_back(toJson(lrInitiator));
+    }
+    ZTCJson lRports = ZTCJson::array();
+    for (const ZTSTopologyRemotePort& lrPort : lView.mRports) {
+        lRports.push_back({{"rport", lrPort.mName}, {"host", lrPort.mHost}, {"state", sOptional(lrPort.mState)}});
     }
     ZTCJson lKinds = ZTCJson::object();
     for (const ZTSPortSummary::Count& lrCount : acrPort.mCounts) {
         lKinds[getKindName(lrCount.mKind)] = lrCount.mOccurrences;
     }
     return {{"remotePort", toJson(std::optional(acrPort.mPort), acrNames)},
-            {"state", nullptr},
+            {"state", sText(lView.mState)},
             {"initiators", std::move(lInitiators)},
+            {"rports", std::move(lRports)},
             {"count", acrPort.mOccurrences},
             {"kinds", std::move(lKinds)},
             {"last", toRfc3339(acrPort.mLastEvent)}};

@@ -5,6 +5,7 @@
 #include <cstdio>
 
 #include "sensor/client/include/RecordTable.h"
+#include "sensor/views/include/EpisodePlace.h"
 #include "sensor/views/include/TimeText.h"
 
 static std::string sHex(std::uint32_t aValue, int aDigits) {
@@ -111,11 +112,24 @@ ZTCTextTable makeEpisodeTable(std::size_t aWidth) {
             aWidth};
 }
 
+/// What an episode holds, the disks behind its LUNs, and how many ports an area or domain has.
+static std::string sDetailWithNames(const ZTSEpisode& acrEpisode, const ZTSPlace& acrPlace) {
+    std::string lText = formatDetail(acrEpisode);
+    const std::string lDevices = formatDevices(acrPlace.mDevices);
+    lText += lDevices.empty() ? "" : (lText.empty() ? "" : "; ") + lDevices;
+    if (acrPlace.mAffected) {
+        lText += "; " + std::to_string(acrPlace.mAffected->size()) +
+                 (acrPlace.mAffected->size() == 1 ? " known port" : " known ports");
+    }
+    return lText;
+}
+
 void addRow(ZTCTextTable& arTable, const ZTSEpisode& acrEpisode, const ZTCNameBook& acrNames, ZTCHistoryTime aNow) {
+    const ZTSPlace lPlace = findPlace(acrEpisode, acrNames);
     arTable.addRow({std::to_string(acrEpisode.mEpisode), formatShortTime(acrEpisode.mLast, aNow),
                     acrEpisode.isOpen() ? "open" : "closed", formatNumber(acrEpisode.mCount),
-                    getKindName(acrEpisode.mKind), acrNames.describe(acrEpisode.mInitiator),
-                    describePort(acrEpisode.mRemotePort, acrNames), formatDetail(acrEpisode)});
+                    getKindName(acrEpisode.mKind), acrNames.describe(lPlace.mInitiator),
+                    describePort(lPlace.mRemotePort, acrNames), sDetailWithNames(acrEpisode, lPlace)});
 }
 
 ZTCTextTable makeRecordTable(std::size_t aWidth) {
@@ -142,6 +156,7 @@ void addRow(ZTCTextTable& arTable, const ZTSStoredRecord& acrRecord, const ZTCNa
 ZTCTextTable makePortTable(std::size_t aWidth) {
     return {{{.mpTitle = "REMOTE PORT"},
              {.mpTitle = "NAME", .mDropOrder = 2},
+             {.mpTitle = "STATE", .mDropOrder = 4},
              {.mpTitle = "COUNT", .mIsRight = true},
              {.mpTitle = "LAST"},
              {.mpTitle = "INITIATORS", .mDropOrder = 1},
@@ -150,8 +165,9 @@ ZTCTextTable makePortTable(std::size_t aWidth) {
 }
 
 void addRow(ZTCTextTable& arTable, const ZTSPortSummary& acrPort, const ZTCNameBook& acrNames, ZTCHistoryTime aNow) {
+    const ZTSPortView lView = findPortView(acrPort, acrNames);
     std::string lInitiators;
-    for (const ZTSInitiator& lrInitiator : acrPort.mInitiators) {
+    for (const ZTSInitiator& lrInitiator : lView.mInitiators) {
         lInitiators += (lInitiators.empty() ? "" : ",") + acrNames.describe(lrInitiator);
     }
     std::vector<ZTSPortSummary::Count> lCounts = acrPort.mCounts;
@@ -163,6 +179,7 @@ void addRow(ZTCTextTable& arTable, const ZTSPortSummary& acrPort, const ZTCNameB
         lKinds += (lKinds.empty() ? "" : ", ") + getKindName(lrCount.mKind) + " " + formatNumber(lrCount.mOccurrences);
     }
     const std::string lName = acrNames.findName(acrPort.mPort.mWwpn, acrPort.mPort.mWwnn);
-    arTable.addRow({acrPort.mPort.mWwpn.toText(), lName.empty() ? "-" : lName, formatNumber(acrPort.mOccurrences),
+    arTable.addRow({acrPort.mPort.mWwpn.toText(), lName.empty() ? "-" : lName,
+                    lView.mState.empty() ? "-" : lView.mState, formatNumber(acrPort.mOccurrences),
                     formatShortTime(acrPort.mLastEvent, aNow), lInitiators, lKinds});
 }

@@ -1,6 +1,7 @@
 #include "sensor/views/include/NameBook.h"
 
 #include <algorithm>
+#include <memory>
 
 #include "sensor/client/include/ClientErrors.h"
 
@@ -15,6 +16,31 @@ std::optional<ZTSFcName> parseWwn(std::string_view aText) {
 std::string abbreviateWwn(const ZTSFcName& acrWwn) {
     const std::string lText = acrWwn.toText();
     return lText.substr(0, 2) + ":..:" + lText.substr(lText.size() - 2);
+}
+
+/// What hung on the ports at the time that was asked for last.
+struct ZTSTopologyCursor {
+    std::optional<ZTSStoredTopology> mStored;
+    std::int64_t mTime = 0;
+};
+
+ZTCTopologyAt readTopologyOf(const ZTCHistory& acrHistory) {
+    static constexpr std::chrono::minutes scBeforeTheFirst(1);
+    return [&acrHistory, lpCursor = std::make_shared<ZTSTopologyCursor>()](ZTCHistoryTime aTime) {
+        const std::int64_t lTime = toMicroseconds(aTime);
+        if (!lpCursor->mStored || lTime < lpCursor->mTime) {
+            lpCursor->mTime = lTime;
+            lpCursor->mStored = acrHistory.readTopology(lTime);
+            if (!lpCursor->mStored) {
+                lpCursor->mTime = toMicroseconds(aTime + scBeforeTheFirst);
+                lpCursor->mStored = acrHistory.readTopology(lpCursor->mTime);
+            }
+        } else if (lTime > lpCursor->mTime) {
+            acrHistory.advanceTopology(*lpCursor->mStored, lpCursor->mTime, lTime);
+            lpCursor->mTime = lTime;
+        }
+        return lpCursor->mStored ? &lpCursor->mStored->mTopology : nullptr;
+    };
 }
 
 std::string ZTCNameBook::findName(const std::optional<ZTSFcName>& acrWwpn,
@@ -73,6 +99,13 @@ std::vector<ZTSFcName> ZTCNameBook::findRemotePorts(std::string_view aText) cons
             sAddOnce(lWwpns, lrPort.mWwpn);
         }
     }
+    if (const ZTSTopology* const lpNow = findTopology(getHistoryTime())) {
+        for (const ZTSTopologyRemotePort& lrPort : lpNow->mRemotePorts) {
+            if (lrPort.mWwpn && (lrPort.mName == aText || sContains(lNamed, lrPort.mWwnn))) {
+                sAddOnce(lWwpns, *lrPort.mWwpn);
+            }
+        }
+    }
     return lWwpns;
 }
 
@@ -85,6 +118,13 @@ std::vector<ZTSFcName> ZTCNameBook::findInitiators(std::string_view aText) const
     for (const ZTSInitiator& lrInitiator : mInitiators) {
         if (lrInitiator.mWwpn && (lrInitiator.mHost == aText || sContains(lNamed, lrInitiator.mWwnn))) {
             sAddOnce(lWwpns, *lrInitiator.mWwpn);
+        }
+    }
+    if (const ZTSTopology* const lpNow = findTopology(getHistoryTime())) {
+        for (const ZTSTopologyInitiator& lrPort : lpNow->mInitiators) {
+            if (lrPort.mWwpn && (lrPort.mHost == aText || lrPort.mSymbolicName == aText)) {
+                sAddOnce(lWwpns, *lrPort.mWwpn);
+            }
         }
     }
     return lWwpns;

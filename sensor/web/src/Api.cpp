@@ -76,6 +76,7 @@ const ZTCHistory& ZTCApi::openHistory() {
 ZTCNameBook ZTCApi::makeNames(const ZTCHistory& acrHistory) const {
     ZTCNameBook lNames;
     mSources.mAddNames(lNames);
+    lNames.setTopology(readTopologyOf(acrHistory));
     for (const ZTSInitiator& lrInitiator : acrHistory.readInitiators()) {
         lNames.addInitiator(lrInitiator);
     }

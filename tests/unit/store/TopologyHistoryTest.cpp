@@ -234,6 +234,29 @@ TEST_F(TopologyHistoryTest, AThingThatGoesAndComesBackIsThereTwice) {
     EXPECT_EQ(at(gcBase + 2 * scSecond), sTopology());
 }
 
+TEST_F(TopologyHistoryTest, StepsThroughTimeLeadWhereAReadingOfThatTimeLeads) {
+    ZTSTopology lNow = sTopology();
+    for (int i = 0; i < 40; ++i) {
+        // Things change, go, come back, and come back changed.
+        lNow.mPaths = i % 3 == 0 ? std::vector<ZTSTopologyPath>() : sTopology().mPaths;
+        if (!lNow.mPaths.empty()) {
+            lNow.mPaths[0].mQueueDepth = static_cast<std::uint32_t>(i);
+        }
+        lNow.mRemotePorts[0].mWwpn = i % 5 < 3 ? sWwn("50:00:00:00:00:00:00:34") : sWwn("50:00:00:00:00:00:00:35");
+        lNow.mInitiators[0].mState = i % 2 == 0 ? "Online" : "Linkdown";
+        lNow.mMappings = i % 4 == 0 ? decltype(lNow.mMappings)() : sTopology().mMappings;
+        lNow.mMounts = i % 7 == 0 ? decltype(lNow.mMounts)() : sTopology().mMounts;
+        note(gcBase + i * scSecond, lNow);
+    }
+    for (const int lStep : {1, 2, 7, 39}) {
+        ZTSStoredTopology lStored = history().readTopology(gcBase).value();
+        for (int i = lStep; i < 40; i += lStep) {
+            history().advanceTopology(lStored, gcBase + (i - lStep) * scSecond, gcBase + i * scSecond);
+            ASSERT_EQ(lStored.mTopology, at(gcBase + i * scSecond)) << lStep << " " << i;
+        }
+    }
+}
+
 TEST_F(TopologyHistoryTest, CountersAreKeptAMinuteAndPort) {
     const ZTSFcName lInitiator = sWwn("10:00:00:00:00:00:00:01");
     const ZTSFcName lPort = sWwn("50:00:00:00:00:00:00:34");

@@ -19,9 +19,10 @@ TEST_F(EpisodeJson, AnEpisodeHasTheMembersThatEveryOutputShares) {
     EXPECT_EQ(toJson(makeQueueFullEpisode(), mNames).dump(),
               R"({"seq":41,"episode":12,"phase":"closed","kind":"queue-full",)"
               R"("initiator":{"wwpn":"10:00:00:00:c9:00:00:01","wwnn":"20:00:00:00:c9:00:00:01","host":"host7"},)"
-              R"("remotePort":{"wwpn":"50:06:01:60:3b:a0:12:34","wwnn":null,"fcId":"010200","name":"array7 ctrl-A"},)"
+              R"("remotePort":{"wwpn":"50:06:01:60:3b:a0:12:34","wwnn":null,"fcId":"010200","name":"array7 ctrl-A",)"
+              R"("rport":null},)"
               R"("count":20000,"first":"2026-11-21T09:58:03.555216+01:00","last":"2026-11-21T09:58:40.000000+01:00",)"
-              R"("luns":{"all":false,"numbers":[0,1,40]},"detail":{}})");
+              R"("luns":{"all":false,"numbers":[0,1,40]},"devices":null,"detail":{}})");
 }
 
 TEST_F(EpisodeJson, SenseDataStandInTheDetail) {
@@ -115,6 +116,6 @@ TEST_F(EpisodeJson, APortsRowCountsByKindWithTheMostFirst) {
     addRow(lTable, lPort, mNames, timeOf("2026-11-21T10:04:12+01:00"));
     EXPECT_THAT(
         lTable.takeText(),
-        HasSubstr("50:06:01:60:3b:a0:12:34  array7 ctrl-A  20,004  20 Nov 09:58  host7       queue-full 20,000, "
+        HasSubstr("50:06:01:60:3b:a0:12:34  array7 ctrl-A  -      20,004  20 Nov 09:58  host7       queue-full 20,000, "
                   "logo 4\n"));
 }
