@@ -48,9 +48,11 @@ static std::vector<ZTSCommonLoss> sCommonLosses(const ZTCEvidenceIndex& acrEvide
         lByFabric[lFabric ? std::optional(lFabric->mBytes) : std::nullopt].push_back(lrInitiator);
     }
     std::vector<ZTSCommonLoss> lLosses;
-    for (const auto& [lFabric, lrInitiators] : lByFabric) {
+    for (const auto& lrGroup : lByFabric) {
+        const std::optional<ZTCWwnBytes>& lrFabric = lrGroup.first;
+        const std::vector<ZTSInitiator>& lrInitiators = lrGroup.second;
         // An initiator without a fabric may belong to any: only where none has one do they count as one group.
-        const bool lIsUsable = lFabric || lByFabric.size() == 1;
+        const bool lIsUsable = lrFabric || lByFabric.size() == 1;
         const bool lAreAllDown = std::ranges::all_of(lrInitiators, [&](const ZTSInitiator& acrInitiator) {
             return sIsAmong(acrEvidence, acrInitiator, acrMoment);
         });
@@ -58,8 +60,8 @@ static std::vector<ZTSCommonLoss> sCommonLosses(const ZTCEvidenceIndex& acrEvide
             continue;
         }
         ZTSCommonLoss lLoss;
-        if (lFabric) {
-            lLoss.mFabric = ZTSFcName{*lFabric};
+        if (lrFabric) {
+            lLoss.mFabric = ZTSFcName{*lrFabric};
         }
         std::ranges::copy_if(acrMoment, std::back_inserter(lLoss.mEpisodes), [&](const ZTSEpisode* apEpisode) {
             return std::ranges::any_of(lrInitiators, [&](const ZTSInitiator& acrInitiator) {

@@ -92,7 +92,8 @@ void lookForHostTimeouts(const ZTCEvidenceIndex& acrEvidence, const ZTSRule& acr
             }
         }
     }
-    for (const auto& [lPair, lrEpisodes] : lByPair) {
+    for (const auto& lrPair : lByPair) {
+        const ZTCEpisodes& lrEpisodes = lrPair.second;
         ZTSFinding lFinding = beginFinding(acrEvidence, acrRule, lrEpisodes);
         lFinding.mSeen.push_back(sDescribeRun(acrEvidence, lrEpisodes) + ", on " +
                                  describeLuns(unionOfLuns(lrEpisodes)) + "; the resets came first.");
