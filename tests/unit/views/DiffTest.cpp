@@ -136,7 +136,7 @@ TEST_F(DiffOfAHistory, ATargetThatIsGoneIsADifferenceWithItsPathsInOneRow) {
     const std::string lText = format(lDiff);
     EXPECT_THAT(lText, HasSubstr("  mark \"before update\"\n"));
     EXPECT_THAT(lText, HasSubstr("  diff: DIFFERENT: 5 states, 0 rates\n"));
-    EXPECT_THAT(lText, HasSubstr("\nremote port  array7 ctrl-B from host8            Online   Not Present\n"));
+    EXPECT_THAT(lText, HasSubstr("\nremote port  array7 ctrl-B from host8        Online   Not Present\n"));
     EXPECT_THAT(lText, HasSubstr("\npath         4 LUNs by host8, array7 ctrl-B  running  -\n")) << lText;
     const nlohmann::ordered_json lDocument = makeDiffDocument(lDiff, mNames, "db07", "id");
     EXPECT_EQ(lDocument["schema"], "tavik.diff/1");
