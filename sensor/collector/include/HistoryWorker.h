@@ -42,6 +42,8 @@ struct ZTSHistoryState {
     std::uint64_t mTakenRecords = 0;
     ZTCHistoryTime mLastTaken;  ///< when the last of them was committed; the epoch: none
     std::uint64_t mOpenEpisodes = 0;
+    std::string mGeneration;  ///< of the agent whose page was stored last and that has not ended; empty: none
+    std::shared_ptr<const std::vector<ZTSPageCounts>> mpOthers;  ///< what all other agents counted; null: not known
 };
 
 /// A mark that was asked for, and what came of it.
@@ -135,6 +137,7 @@ private:
     void work(std::deque<ZTCJob>& arBatch);
     void storeBatch(std::deque<ZTCJob>& arBatch);
     void settle(std::deque<ZTCJob>& arBatch, std::size_t aCount);
+    void noteGeneration();
     void syncWaiting(std::deque<ZTCJob>& arBatch);
     void upkeep();
     void closeRun();

@@ -33,6 +33,8 @@ public:
     /// Agents that were seen running, of which nobody has heard since.
     void endForgottenAgents(const std::string& acrRunningGeneration);
     void notePorts(std::shared_ptr<const ZTSTopology> apPorts);
+    /// The agent whose page was stored last, and that has not ended since; empty: none.
+    std::string getGeneration() const { return mpPage != nullptr ? mpPage->mStartId : std::string(); }
     /// Those that are over, by the last page.
     void closeEpisodes();
 

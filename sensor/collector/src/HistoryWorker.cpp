@@ -219,6 +219,7 @@ void ZTCHistoryWorker::beginRun() {
     mState.mIsOpen = true;
     mState.mStoreId = mpStore->getStoreId();
     mState.mLastFrame = mpStore->getLastFrame();
+    mState.mpOthers = nullptr;
 }
 
 /// Adds what waits to the batch; waits for something where the batch is empty. False: the thread is to end.
@@ -314,6 +315,7 @@ void ZTCHistoryWorker::storeBatch(std::deque<ZTCJob>& arBatch) {
 /// Behind the commit: removes what is stored from the spool and from the batch.
 void ZTCHistoryWorker::settle(std::deque<ZTCJob>& arBatch, std::size_t aCount) {
     const std::size_t lOpenEpisodes = mpStore->countOpenEpisodes();
+    noteGeneration();
     {
         const std::lock_guard lLock(mMutex);
         mState.mTakenFrames += mBatchFrames;
@@ -340,6 +342,21 @@ void ZTCHistoryWorker::settle(std::deque<ZTCJob>& arBatch, std::size_t aCount) {
         arBatch.pop_front();
     }
     ring();
+}
+
+/// What other agents counted changes only when this one begins or ends.
+void ZTCHistoryWorker::noteGeneration() {
+    const std::string lGeneration = mpWriter->getGeneration();
+    {
+        const std::lock_guard lLock(mMutex);
+        if (mState.mpOthers != nullptr && mState.mGeneration == lGeneration) {
+            return;
+        }
+    }
+    auto lpOthers = std::make_shared<const std::vector<ZTSPageCounts>>(mpStore->sumCountsOfOthers(lGeneration));
+    const std::lock_guard lLock(mMutex);
+    mState.mGeneration = lGeneration;
+    mState.mpOthers = std::move(lpOthers);
 }
 
 /// A power cut must not cost more than the last second: what has to wait longer is written to the disk as it is.

@@ -1,9 +1,11 @@
 #include "sensor/collector/include/LiveStateJson.h"
 
 #include <algorithm>
+#include <map>
 #include <nlohmann/json.hpp>
 
 #include "sensor/client/include/RecordJson.h"
+#include "sensor/collector/include/PageCounts.h"
 #include "sensor/views/include/TimeText.h"
 
 using ZTCJson = nlohmann::ordered_json;
@@ -136,6 +138,56 @@ static ZTCJson sKinds(const ZTSLiveFacts& acrFacts) {
     return lList;
 }
 
+/// The totals of all agents, the running one's up to now. Null where it is not known which of them the history has.
+static ZTCJson sLedger(const ZTSLiveFacts& acrFacts) {
+    const ZTSHistoryState& lrHistory = acrFacts.mHistory;
+    const bool lIsRunning = acrFacts.mpPage != nullptr && acrFacts.mpPage->mStartId == lrHistory.mGeneration;
+    if (lrHistory.mpOthers == nullptr || (!lIsRunning && !lrHistory.mGeneration.empty())) {
+        return nullptr;
+    }
+    std::map<std::pair<std::string, ZTCKindKey>, ZTSPageCounts> lRows;
+    const auto lAdd = [&lRows](const ZTSPageCounts& acrCounts) {
+        ZTSPageCounts& lrRow = lRows[{acrCounts.mWwpn ? acrCounts.mWwpn->toText() : "", acrCounts.mKind}];
+        lrRow.mWwpn = acrCounts.mWwpn;
+        lrRow.mWwnn = acrCounts.mWwnn ? acrCounts.mWwnn : lrRow.mWwnn;
+        lrRow.mKind = acrCounts.mKind;
+        lrRow.mReceived += acrCounts.mReceived;
+        for (std::size_t i = 0; i < lrRow.mRefused.size(); ++i) {
+            lrRow.mRefused[i] += acrCounts.mRefused[i];
+        }
+        lrRow.mConsolidated += acrCounts.mConsolidated;
+        lrRow.mHandedOver += acrCounts.mHandedOver;
+        lrRow.mHeld += acrCounts.mHeld;
+        lrRow.mDropped += acrCounts.mDropped;
+    };
+    std::ranges::for_each(*lrHistory.mpOthers, lAdd);
+    if (lIsRunning) {
+        std::ranges::for_each(toPageCounts(*acrFacts.mpPage), lAdd);
+    }
+    ZTCJson lLedger = ZTCJson::array();
+    for (const auto& [lrKey, lrRow] : lRows) {
+        ZTCJson lRefused = ZTCJson::object();
+        for (std::size_t i = 0; i < lrRow.mRefused.size(); ++i) {
+            lRefused[getRefusalName(static_cast<ZTERefusal>(i))] = lrRow.mRefused[i];
+        }
+        ZTCJson lInitiator{{"wwpn", nullptr}, {"wwnn", nullptr}, {"host", nullptr}};
+        if (lrRow.mWwpn && lrRow.mWwnn) {
+            lInitiator = sInitiator(lrRow.mWwpn->mBytes, lrRow.mWwnn->mBytes, acrFacts.mPorts);
+        } else if (lrRow.mWwpn) {
+            lInitiator["wwpn"] = lrRow.mWwpn->toText();
+        }
+        lLedger.push_back({{"initiator", lInitiator},
+                           {"kind", getKindName(lrRow.mKind)},
+                           {"received", lrRow.mReceived},
+                           {"refused", lRefused},
+                           {"consolidated", lrRow.mConsolidated},
+                           {"handedOver", lrRow.mHandedOver},
+                           {"held", lrRow.mHeld},
+                           {"dropped", lrRow.mDropped}});
+    }
+    return lLedger;
+}
+
 static ZTCJson sLosses(const ZTSLosses& acrLosses) {
     ZTCJson lLibrary = ZTCJson::array();
     for (const auto& [lrName, lCount] : acrLosses.mLibrary) {
@@ -164,6 +216,7 @@ std::string toLiveStateJson(const ZTSLiveFacts& acrFacts) {
                    {"collector", sCollector(acrFacts)},
                    {"adapters", nullptr},
                    {"kinds", nullptr},
+                   {"ledger", sLedger(acrFacts)},
                    {"losses", sLosses(acrFacts.mLosses)},
                    {"topology", sTopology(acrFacts.mTopology)},
                    {"warnings", ZTCJson::parse(acrFacts.mWarnings)}};

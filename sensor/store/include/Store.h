@@ -154,6 +154,8 @@ public:
                   const std::string& acrReason);
     /// Whether endAgent() was called for it. Needs no transaction.
     bool hasEnded(const std::string& acrGeneration) const;
+    /// The counts of all agents but this one, by initiator and kind.
+    std::vector<ZTSPageCounts> sumCountsOfOthers(const std::string& acrGeneration) const;
     /// A gap of another sort. Where it names a generation, it is written once for each pair of reason and generation.
     /// Returns whether it was written.
     bool noteGap(const ZTSGap& acrGap);

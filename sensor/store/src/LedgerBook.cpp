@@ -44,6 +44,32 @@ bool ZTCLedgerBook::hasEnded(const std::string& acrName) {
     return lFind.query(acrName).step() && lFind.number(0) != 0;
 }
 
+std::vector<ZTSPageCounts> ZTCLedgerBook::sumOthers(const std::string& acrName) {
+    std::vector<ZTSPageCounts> lSums;
+    ZTCStatement lRows(mrDatabase,
+                       "SELECT initiator, kind, sum(received), sum(collectionOff), sum(totalLimit), sum(unknownBoard), "
+                       "sum(noList), sum(tooShort), sum(unknownKind), sum(failed), sum(consolidated), sum(handedOver), "
+                       "sum(held), sum(dropped) FROM ledger WHERE generation <> "
+                       "ifnull((SELECT id FROM generation WHERE name = ?), -1) GROUP BY initiator, kind");
+    lRows.query(acrName);
+    while (lRows.step()) {
+        const ZTSInitiator& lrInitiator = mrNames.getInitiator(lRows.number<std::uint32_t>(0));
+        ZTSPageCounts& lrSum = lSums.emplace_back();
+        lrSum.mWwpn = lrInitiator.mWwpn;
+        lrSum.mWwnn = lrInitiator.mWwnn;
+        lrSum.mKind = lRows.number<ZTCKindKey>(1);
+        lrSum.mReceived = lRows.number<std::uint64_t>(2);
+        for (int i = 0; i < ZTRF_Count; ++i) {
+            lrSum.mRefused[static_cast<std::size_t>(i)] = lRows.number<std::uint64_t>(3 + i);
+        }
+        lrSum.mConsolidated = lRows.number<std::uint64_t>(10);
+        lrSum.mHandedOver = lRows.number<std::uint64_t>(11);
+        lrSum.mHeld = lRows.number<std::uint64_t>(12);
+        lrSum.mDropped = lRows.number<std::uint64_t>(13);
+    }
+    return lSums;
+}
+
 void ZTCLedgerBook::addTaken(std::uint64_t aGeneration, std::uint32_t aInitiator, ZTCKindKey aKind,
                              std::uint64_t aOccurrences) {
     mTaken[{aGeneration, aInitiator, aKind}] += aOccurrences;

@@ -10,6 +10,7 @@
 #include <span>
 #include <string>
 #include <tuple>
+#include <vector>
 
 #include "sensor/store/include/Ledger.h"
 #include "sensor/store/src/Counter.h"
@@ -26,6 +27,8 @@ public:
     /// The number of the agent with this start id, a new one where there is none.
     std::uint64_t findOrAddGeneration(const std::string& acrName);
     bool hasEnded(const std::string& acrName);
+
+    std::vector<ZTSPageCounts> sumOthers(const std::string& acrName);
 
     void addTaken(std::uint64_t aGeneration, std::uint32_t aInitiator, ZTCKindKey aKind, std::uint64_t aOccurrences);
     void note(const std::string& acrGeneration, std::span<const ZTSPageCounts> aCounts);

@@ -118,6 +118,11 @@ bool ZTCStore::hasEnded(const std::string& acrGeneration) const {
                                   [&] { return mpImplementation->mpOpen->mLedger.hasEnded(acrGeneration); });
 }
 
+std::vector<ZTSPageCounts> ZTCStore::sumCountsOfOthers(const std::string& acrGeneration) const {
+    return mpImplementation->look("sumCountsOfOthers",
+                                  [&] { return mpImplementation->mpOpen->mLedger.sumOthers(acrGeneration); });
+}
+
 bool ZTCStore::noteGap(const ZTSGap& acrGap) {
     return mpImplementation->change("noteGap", [&] { return mpImplementation->mpOpen->mLedger.noteGap(acrGap); });
 }

@@ -47,6 +47,38 @@ TEST_F(LiveStateJsonTest, WhatIsNotKnownIsNullAndNeverZero) {
     EXPECT_TRUE(lState["agent"]["pid"].is_null());
 }
 
+TEST_F(LiveStateJsonTest, TheLedgerIsThatOfAllAgentsUpToNow) {
+    EXPECT_TRUE(read()["ledger"].is_null()) << "what earlier agents counted is not known";
+    ZTSPageCounts lOther;
+    lOther.mWwpn = ZTSFcName{.mBytes = {0x10, 0, 0, 0, 0, 0, 0, 1}};
+    lOther.mWwnn = ZTSFcName{};
+    lOther.mKind = *findKind("rscn");
+    lOther.mReceived = 9;
+    lOther.mRefused[ZTRF_TotalLimit] = 4;
+    lOther.mConsolidated = lOther.mHandedOver = 5;
+    mFacts.mHistory.mpOthers = std::make_shared<const std::vector<ZTSPageCounts>>(1, lOther);
+    mFacts.mHistory.mGeneration = "00ff";
+    auto lpPage = std::make_shared<ZTSStatusSnapshot>(*mFacts.mpPage);
+    lpPage->mBoards[0].mRows[5].mConsolidated = 7;
+    lpPage->mBoards[0].mRows[5].mHandedOver = 6;
+    ASSERT_STREQ(getStatusRowName(5), "rscn");
+    mFacts.mpPage = lpPage;
+    const nlohmann::json lLedger = read()["ledger"];
+    ASSERT_EQ(lLedger.size(), 1U);
+    EXPECT_EQ(lLedger[0]["kind"], "rscn");
+    EXPECT_EQ(lLedger[0]["initiator"]["host"], "host7");
+    EXPECT_EQ(lLedger[0]["received"], 16);
+    EXPECT_EQ(lLedger[0]["refused"]["total-limit"], 4);
+    EXPECT_EQ(lLedger[0]["consolidated"], 12);
+    EXPECT_EQ(lLedger[0]["handedOver"], 11);
+    EXPECT_EQ(lLedger[0]["held"], 1);
+    // The page of an agent that has ended is among the others.
+    mFacts.mHistory.mGeneration = "";
+    EXPECT_EQ(read()["ledger"][0]["received"], 9);
+    mFacts.mHistory.mGeneration = "00fe";
+    EXPECT_TRUE(read()["ledger"].is_null()) << "the history has not met this agent yet";
+}
+
 TEST_F(LiveStateJsonTest, ThePageIsShown) {
     const nlohmann::json lState = read();
     EXPECT_EQ(lState["agent"]["generation"], "00ff");
