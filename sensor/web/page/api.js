@@ -37,13 +37,22 @@ export const timeline = (from, to, columns) => ask("timeline", { from: time(from
  *  way back: it gives its connection up, for there are only a few to one server. */
 export function follow(onEpisode, onState) {
   let source = null;
+  let retry = null;
   const open = () => {
     source = new EventSource("/api/v1/stream");
     source.addEventListener("episode", (event) => onEpisode(JSON.parse(event.data)));
     source.addEventListener("open", () => onState("Live", true));
-    source.addEventListener("error", () => onState("Not live. Trying again …", false));
+    source.addEventListener("error", () => {
+      onState("Not live. Trying again …", false);
+      if (source.readyState === EventSource.CLOSED) { // refused: the browser does not try again by itself
+        retry = setTimeout(open, 5000);
+      }
+    });
   };
-  window.addEventListener("pagehide", () => source.close());
+  window.addEventListener("pagehide", () => {
+    clearTimeout(retry);
+    source.close();
+  });
   window.addEventListener("pageshow", (event) => event.persisted && open());
   open();
 }
