@@ -13,14 +13,13 @@ export function findingBox(finding) {
   box.append(make("h4", [finding.title, finding.subject ? make("span", `, ${finding.subject}`, "plain") : ""]));
   box.append(...asList(finding.seen).map((text) => make("p", text)));
   box.append(make("p", finding.means, "quiet"));
-  const next = asList(finding.next);
-  if (next.length > 0) {
-    box.append(make("p", make("b", "What to look at next")), list(next));
-  }
+  const more = make("details", make("summary", "What to look at next, and what speaks against it"));
+  more.append(list(asList(finding.next)));
   const against = [...asList(finding.against), ...asList(finding.unless)];
   if (against.length > 0) {
-    box.append(make("p", make("b", "What speaks against it")), list(against));
+    more.append(make("p", make("b", "What speaks against it")), list(against));
   }
-  box.append(make("p", `Evidence: ${plural(finding.episodes.length, "episode")} (${finding.episodes.slice(0, 8).join(", ")}${finding.episodes.length > 8 ? " …" : ""}).`, "quiet small"));
+  more.append(make("p", `Evidence: ${plural(finding.episodes.length, "episode")} (${finding.episodes.slice(0, 8).join(", ")}${finding.episodes.length > 8 ? " …" : ""}).`, "quiet small"));
+  box.append(more);
   return box;
 }

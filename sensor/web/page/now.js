@@ -17,6 +17,7 @@ const hour = 3600000;
 const mostTroubles = 12;
 const mostDevices = 12;
 const mostKinds = 3;
+let shownFindings = "";
 const looks = new Map(); // what to look at next, by kind
 
 const code = (text) => make("code", text);
@@ -94,6 +95,11 @@ async function showOpen() {
 async function showFindings() {
   const { findings } = await api.diagnose();
   const found = (findings ?? []).filter(({ severity }) => severity === "problem" || severity === "warning");
+  const text = JSON.stringify(found);
+  if (text === shownFindings) {
+    return; // what a person has opened stays open
+  }
+  shownFindings = text;
   element("findings-title").hidden = found.length === 0;
   element("findings").replaceChildren(...found.slice(0, mostTroubles).map(findingBox));
 }

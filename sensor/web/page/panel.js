@@ -68,6 +68,7 @@ async function showExplanation(place, episode, mine) {
     return;
   }
   place.replaceChildren(...(document.findings ?? []).map(findingBox));
+  place.querySelectorAll("details").forEach((each) => { each.open = true; });
   for (const part of document.parts.filter(({ label }) => label !== "facts")) {
     place.append(make("h4", headings[part.label] ?? part.label.charAt(0).toUpperCase() + part.label.slice(1)), ...part.texts.map((text) => make("p", text)));
   }

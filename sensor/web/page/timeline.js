@@ -25,6 +25,7 @@ let other = null; // [from, to] to compare with
 let model = null;
 let layout = null;
 let cursor = null; // {key, column}
+let wanted = null; // {key, at, isOpen}: the cell of an address, until a chart shows it
 let drag = null; // {from, to, isOther}
 let missed = 0; // changes while the right edge is not now
 let loading = 0; // counts questions: only the newest answer is shown
@@ -72,11 +73,18 @@ export async function open(parameters) {
   other = readSpan(parameters.compare);
   missed = 0;
   cursor = null;
-  await reload(true);
   const [key, at] = (parameters.cell ?? "").split("@");
-  if (model !== null && at && laneOf(key)) {
-    setCursor({ key, column: Math.min(model.columns - 1, Math.max(0, columnOf(model, Date.parse(at)))) });
-    if (parameters.open === "1") {
+  wanted = at ? { key, at: Date.parse(at), isOpen: parameters.open === "1" } : null;
+  await reload(true);
+}
+
+/** The cell of an address, once there is a chart that has it. */
+function showWanted() {
+  const cell = wanted;
+  wanted = null;
+  if (cell && laneOf(cell.key)) {
+    setCursor({ key: cell.key, column: Math.min(model.columns - 1, Math.max(0, columnOf(model, cell.at))) });
+    if (cell.isOpen) {
       openCell(false);
     }
   }
@@ -113,6 +121,7 @@ export async function reload(isNew = false) {
     return;
   }
   redraw();
+  showWanted();
   drawCounters(model, width);
   fillTable();
   showEmpty();
