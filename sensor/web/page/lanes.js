@@ -70,7 +70,8 @@ function clip(context, text, width) {
     while (begin + 6 < text.length && context.measureText(`${text.slice(0, name)}…${text.slice(begin)}`).width > width) {
       begin += 3;
     }
-    return cut(context, `${text.slice(0, name)}…${text.slice(begin)}`, width);
+    const short = `${text.slice(0, name)}…${text.slice(begin)}`;
+    return context.measureText(short).width <= width ? short : cut(context, text.slice(0, name).trim(), width);
   }
   return cut(context, text, width);
 }
