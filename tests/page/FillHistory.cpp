@@ -20,14 +20,14 @@
 
 namespace {
 
-constexpr std::array<std::uint64_t, 12> gcPorts{0x500601603BA01234, 0x500601613BA01234, 0x500601683BA01234,
+constexpr std::array<std::uint64_t, 12> scPorts{0x500601603BA01234, 0x500601613BA01234, 0x500601683BA01234,
                                                 0x500601693BA01234, 0x50000973F0119900, 0x50000973F0119904,
                                                 0x50000973F0119908, 0x50000973F011990C, 0x2101001B32A90001,
                                                 0x2101001B32A90002, 0x500104F000ABC001, 0x500104F000ABC002};
-constexpr std::array<std::uint64_t, 2> gcInitiators{gcLocalPort, gcOtherLocalPort};
-constexpr int gcDays = 30;
+constexpr std::array<std::uint64_t, 2> scInitiators{gcLocalPort, gcOtherLocalPort};
+constexpr int scDays = 30;
 /// Records of one response.
-constexpr std::size_t gcFrameRecords = 400;
+constexpr std::size_t scFrameRecords = 400;
 
 struct ZTSPlanned {
     ZTSTestRecord mRecord;
@@ -57,7 +57,7 @@ ZTSTestRecord makeLoad(std::mt19937& arRandom, std::uint64_t aPort) {
 
 /// What a port's bad hour is made of: load most of all, now and then something severe.
 ZTSTestRecord makeTrouble(std::mt19937& arRandom, std::size_t aPort) {
-    const std::uint64_t lPort = gcPorts.at(aPort);
+    const std::uint64_t lPort = scPorts.at(aPort);
     const auto lDice = static_cast<unsigned>(arRandom() % 1000);
     ZTSTestRecord lRecord;
     if (lDice < 4 && aPort % 4 == 2) {
@@ -105,12 +105,12 @@ std::vector<ZTSPlanned> plan(std::uint64_t aEpisodes, std::int64_t aFrom, std::i
         for (int lTries = 0; lTries < 8 && !isBadHour(lPort, lTime); ++lTries) {
             lPort = lRandom() % 10;
         }
-        ZTSPlanned lOne{isBadHour(lPort, lTime) ? makeTrouble(lRandom, lPort) : makeNews(lRandom, gcPorts.at(lPort)),
-                        lRandom() % gcInitiators.size()};
+        ZTSPlanned lOne{isBadHour(lPort, lTime) ? makeTrouble(lRandom, lPort) : makeNews(lRandom, scPorts.at(lPort)),
+                        lRandom() % scInitiators.size()};
         lOne.mRecord.mBegin = lTime;
         lOne.mRecord.mEnd = lTime + static_cast<std::int64_t>(lRandom() % 50) * gcSecond;
         const bool lHasPort = lOne.mRecord.mKind != gcLink;
-        std::int64_t& lrFree = lFree[{lOne.mInitiator, lHasPort ? lPort : gcPorts.size(), lOne.mRecord.mKind}];
+        std::int64_t& lrFree = lFree[{lOne.mInitiator, lHasPort ? lPort : scPorts.size(), lOne.mRecord.mKind}];
         if (lrFree < lTime) {
             lrFree = lOne.mRecord.mEnd + 2 * gcMinute;
             lPlanned.push_back(lOne);
@@ -126,11 +126,11 @@ public:
     void begin() {
         ZTCStoreTransaction lTransaction = mrStore.begin();
         mrStore.beginRun(fromMicroseconds(mFrom));
-        for (std::size_t i = 0; i < gcInitiators.size(); ++i) {
+        for (std::size_t i = 0; i < scInitiators.size(); ++i) {
             mrStore.noteInitiator(
-                {.mWwpn = makeName(gcInitiators.at(i)), .mWwnn = {}, .mHost = "host" + std::to_string(7 + i)});
+                {.mWwpn = makeName(scInitiators.at(i)), .mWwnn = {}, .mHost = "host" + std::to_string(7 + i)});
         }
-        for (const std::uint64_t lPort : gcPorts) {
+        for (const std::uint64_t lPort : scPorts) {
             mrStore.noteRemotePort({.mWwpn = makeName(lPort), .mWwnn = makeName(lPort & ~0xFFULL), .mFcId = {}});
         }
         noteStates(mFrom, ZTKST_Listening);
@@ -139,11 +139,11 @@ public:
 
     /// One transaction for each response, as the collector does.
     void take(const std::vector<ZTSPlanned>& acrPlanned) {
-        for (std::size_t lBegin = 0; lBegin < acrPlanned.size(); lBegin += gcFrameRecords) {
-            const std::size_t lEnd = std::min(lBegin + gcFrameRecords, acrPlanned.size());
+        for (std::size_t lBegin = 0; lBegin < acrPlanned.size(); lBegin += scFrameRecords) {
+            const std::size_t lEnd = std::min(lBegin + scFrameRecords, acrPlanned.size());
             const std::int64_t lNow = acrPlanned[lEnd - 1].mRecord.mEnd;
             ZTCStoreTransaction lTransaction = mrStore.begin();
-            for (std::size_t lInitiator = 0; lInitiator < gcInitiators.size(); ++lInitiator) {
+            for (std::size_t lInitiator = 0; lInitiator < scInitiators.size(); ++lInitiator) {
                 std::vector<ZTSTestRecord> lRecords;
                 for (std::size_t i = lBegin; i < lEnd; ++i) {
                     if (acrPlanned[i].mInitiator == lInitiator) {
@@ -151,7 +151,7 @@ public:
                     }
                 }
                 mrStore.takeIn(mrStore.getLastFrame() + 1, "00000000000000a1",
-                               makeBody(lRecords, gcInitiators.at(lInitiator)), false, fromMicroseconds(lNow));
+                               makeBody(lRecords, scInitiators.at(lInitiator)), false, fromMicroseconds(lNow));
             }
             mrStore.closeEpisodes(fromMicroseconds(lNow), [](const ZTSInitiator&, ZTCKindKey) { return true; });
             mrStore.noteRunning(fromMicroseconds(lNow));
@@ -214,7 +214,7 @@ private:
         for (std::int64_t lMinute = aFrom; lMinute < aTo; lMinute += gcMinute) {
             for (const char* lpCounter : {"invalid_crc_count", "loss_of_sync_count"}) {
                 lSamples.push_back({.mMinute = lMinute / gcMinute * gcMinute,
-                                    .mInitiator = makeName(gcInitiators[1]),
+                                    .mInitiator = makeName(scInitiators[1]),
                                     .mRemotePort = {},
                                     .mCounter = lpCounter,
                                     .mDifference = static_cast<std::uint64_t>(1 + (lMinute - aFrom) / gcMinute)});
@@ -226,7 +226,7 @@ private:
     }
     void noteStates(std::int64_t aTime, ZTEKindState aRscn) {
         std::vector<ZTSKindStateNow> lStates;
-        for (const std::uint64_t lInitiator : gcInitiators) {
+        for (const std::uint64_t lInitiator : scInitiators) {
             for (const ZTCKindKey lKind : {gcQueueFull, gcLink, gcCheckCondition}) {
                 lStates.push_back(
                     {.mWwpn = makeName(lInitiator), .mWwnn = {}, .mKind = lKind, .mState = ZTKST_Listening});
@@ -242,7 +242,7 @@ private:
 
 void fill(const char* apDirectory, std::uint64_t aEpisodes, const char* apSysfs) {
     const std::int64_t lNow = toMicroseconds(getHistoryTime()) / gcMinute * gcMinute;
-    const std::int64_t lFrom = lNow - gcDays * gcDay;
+    const std::int64_t lFrom = lNow - scDays * gcDay;
     const std::int64_t lOutage = lFrom + 12 * gcDay;
     ZTCStore lStore(apDirectory, {}, [](const std::string& acrLine) { std::fprintf(stderr, "%s\n", acrLine.c_str()); });
     ZTCFiller lFiller(lStore, lFrom);

@@ -9,7 +9,7 @@
 
 namespace {
 
-constexpr std::int64_t gcHour = 60 * gcMinute;
+constexpr std::int64_t scHour = 60 * gcMinute;
 
 class TimelineTopologyTest : public ZTCStoreTest {
 protected:
@@ -35,7 +35,7 @@ protected:
     nlohmann::ordered_json timeline() {
         return makeTimelineDocument(
             history(),
-            {.mFrom = fromMicroseconds(gcBase), .mTo = fromMicroseconds(gcBase + 10 * gcHour), .mColumns = 10}, {},
+            {.mFrom = fromMicroseconds(gcBase), .mTo = fromMicroseconds(gcBase + 10 * scHour), .mColumns = 10}, {},
             "db07");
     }
     /// State, from and to.
@@ -49,28 +49,28 @@ protected:
         }
         return lTexts;
     }
-    static std::string at(int aHours) { return toRfc3339(fromMicroseconds(gcBase + aHours * gcHour)); }
+    static std::string at(int aHours) { return toRfc3339(fromMicroseconds(gcBase + aHours * scHour)); }
 };
 
 }  // namespace
 
 TEST_F(TimelineTopologyTest, ALinkHasItsStateFromTheChangeThatTheScanSaw) {
-    note(gcBase - gcHour, "Online");
-    note(gcBase + 3 * gcHour, "Linkdown");
-    note(gcBase + 4 * gcHour, "Online");
+    note(gcBase - scHour, "Online");
+    note(gcBase + 3 * scHour, "Linkdown");
+    note(gcBase + 4 * scHour, "Online");
     EXPECT_EQ(links(), (std::vector<std::string>{"Online " + at(0) + " " + at(3), "Linkdown " + at(3) + " " + at(4),
                                                  "Online " + at(4) + " " + at(10)}));
 }
 
 TEST_F(TimelineTopologyTest, BeforeTheFirstScanALinkHasNoState) {
-    note(gcBase + 6 * gcHour, "Online");
+    note(gcBase + 6 * scHour, "Online");
     EXPECT_EQ(links(), (std::vector<std::string>{"Online " + at(6) + " " + at(10)}));
 }
 
 TEST_F(TimelineTopologyTest, AnInitiatorThatWentAwayHasNoStateFromThenOn) {
-    note(gcBase - gcHour, "Online");
-    inTransaction([&] { store().noteTopology(gcBase + 2 * gcHour, {}); });
-    note(gcBase + 5 * gcHour, "Linkdown");
+    note(gcBase - scHour, "Online");
+    inTransaction([&] { store().noteTopology(gcBase + 2 * scHour, {}); });
+    note(gcBase + 5 * scHour, "Linkdown");
     EXPECT_EQ(links(), (std::vector<std::string>{"Online " + at(0) + " " + at(2), "Linkdown " + at(5) + " " + at(10)}));
 }
 
