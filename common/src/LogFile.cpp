@@ -56,6 +56,20 @@ bool sEndsInsideOfALine(int aDescriptor, ::off_t aSize) noexcept {
     return aSize > 0 && ::pread(aDescriptor, &lLast, 1, aSize - 1) == 1 && lLast != '\n';
 }
 
+/// Whether the file was left inside of a line. One that another process is writing at this moment seems to be: it is
+/// looked at again a little later.
+bool sIsTorn(int aDescriptor, ::off_t aSize) noexcept {
+    constexpr unsigned lcLooks = 3;
+    constexpr std::timespec lcPause{0, 1000000};
+    bool lIsTorn = sEndsInsideOfALine(aDescriptor, aSize);
+    for (unsigned lLook = 1; lIsTorn && lLook < lcLooks; ++lLook) {
+        ::nanosleep(&lcPause, nullptr);
+        struct stat lStatus {};
+        lIsTorn = ::fstat(aDescriptor, &lStatus) != 0 || sEndsInsideOfALine(aDescriptor, lStatus.st_size);
+    }
+    return lIsTorn;
+}
+
 }  // namespace
 
 bool ZTCLogFile::setPath(const char* apPath) noexcept {
@@ -162,7 +176,7 @@ bool ZTCLogFile::openPath() noexcept {
         sIgnoreFileSizeSignal();
         mDescriptor = lDescriptor;
         mIsRegularFile = S_ISREG(lStatus.st_mode);
-        mIsTorn = mIsRegularFile && sEndsInsideOfALine(lDescriptor, lStatus.st_size);
+        mIsTorn = mIsRegularFile && sIsTorn(lDescriptor, lStatus.st_size);
         return true;
     }
     if (lDescriptor >= 0) {

@@ -168,7 +168,6 @@ TEST_F(CollectorTest, StatusShowsWhatGoesOn) {
     EXPECT_EQ(lStatus["kinds"][0]["initiator"]["wwpn"], "10:00:00:00:c9:00:00:01");
     EXPECT_EQ(lStatus["storeId"], mStage.history()->getStoreId());
     EXPECT_EQ(lStatus["losses"]["refused"]["total-limit"], 0);
-    EXPECT_TRUE(lStatus["troubles"].is_null());
 }
 
 TEST_F(CollectorTest, AMarkIsStoredWhenItIsAnswered) {

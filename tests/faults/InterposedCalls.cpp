@@ -1,5 +1,5 @@
-/// The operating-system calls of the agent and of the sensor's programs, but for those that fail only when they are called wrongly. Each asks first
-/// whether it is to fail; otherwise it goes through.
+/// The operating-system calls of the agent and of the sensor's programs, but for those that fail only when they are
+/// called wrongly. Each asks first whether it is to fail; otherwise it goes through.
 #include <dirent.h>
 #include <dlfcn.h>
 #include <poll.h>

@@ -213,6 +213,7 @@ void ZTCOutlets::feedHistory() {
                 lrOutlet.mSeq.reset();
             }
             mStreamSeq.reset();
+            mNextMetrics = {};  // a file that was written without the history lacks most of its metrics
         }
         feedStream();
         for (ZTSFedOutlet& lrOutlet : mOutlets) {

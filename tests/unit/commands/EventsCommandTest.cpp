@@ -145,7 +145,8 @@ TEST_F(EventsCommand, AReaderThatGoesAwayEndsItQuietly) {
     }
     takeIn(lRecords);
     for (const char* lpArguments : {"events --limit 0", "--json events", "events --records --limit 0"}) {
-        const ZTSFinishedRun lRun = runShell("\"$0\" " + std::string(lpArguments) + " | head -1; echo ${PIPESTATUS:-done}");
+        const ZTSFinishedRun lRun =
+            runShell("\"$0\" " + std::string(lpArguments) + " | head -1; echo ${PIPESTATUS:-done}");
         EXPECT_EQ(lRun.mStatus, 0);
         EXPECT_EQ(lRun.mErrors, "");
     }

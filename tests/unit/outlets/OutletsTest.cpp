@@ -142,7 +142,7 @@ TEST_F(Outlets, TheMetricsFileIsWrittenAndNewPortsAreGivenTheirSeries) {
     lSettings.mMetricsTextfile = mDirectory.path("tavik.prom");
     takeOne(gcQueueFull);
     start(lSettings);
-    waitUntil([&] { return exists(lSettings.mMetricsTextfile); }, "the file");
+    waitUntil([&] { return !value(gcSeriesPortsValue).empty() && exists(lSettings.mMetricsTextfile); }, "the file");
     EXPECT_THAT(readFile(lSettings.mMetricsTextfile), HasSubstr("tavik_build_info{version=\"1.2.3\"} 1\n"));
     EXPECT_EQ(value(gcSeriesPortsValue), makeName(gcPortA).toText());
 }

@@ -154,8 +154,11 @@ TEST_F(Api, ThePageAndAllThatItLoadsComeFromThisServer) {
         EXPECT_EQ(lFile.mStatus, 200U) << lPath;
         EXPECT_EQ(lFile.mBody.find("eval("), std::string::npos) << lPath;
         if (!lPath.starts_with("/vendor/")) {
-            EXPECT_EQ(lFile.mBody.find("http:"), std::string::npos) << lPath;
-            EXPECT_EQ(lFile.mBody.find("https:"), std::string::npos) << lPath;
+            // The one name of a vocabulary, which nobody asks for.
+            static const std::regex scSvg("http://www\\.w3\\.org/2000/svg");
+            const std::string lText = std::regex_replace(lFile.mBody, scSvg, "");
+            EXPECT_EQ(lText.find("http:"), std::string::npos) << lPath;
+            EXPECT_EQ(lText.find("https:"), std::string::npos) << lPath;
         }
         for (std::sregex_iterator lNamed(lFile.mBody.begin(), lFile.mBody.end(), scNamed);
              lNamed != std::sregex_iterator(); ++lNamed) {
