@@ -121,8 +121,8 @@ void lookForChangedParameters(const ZTCEvidenceIndex& acrEvidence, const ZTSRule
 
 void lookForDeviceErrors(const ZTCEvidenceIndex& acrEvidence, const ZTSRule& acrRule, ZTCFindings& arFindings) {
     for (const auto& [lNode, lrEpisodes] : sByNode(acrEvidence, [](const ZTSEpisode& acrEpisode) {
-             return acrEpisode.mDetail.mSenseKey == ZTSK_MediumError ||
-                    acrEpisode.mDetail.mSenseKey == ZTSK_HardwareError;
+             const std::uint32_t lSenseKey = acrEpisode.mDetail.mSenseKey.value_or(0);
+             return lSenseKey == ZTSK_MediumError || lSenseKey == ZTSK_HardwareError;
          })) {
         const auto lLuns = describeLuns(unionOfLuns(lrEpisodes));
         const std::string lPorts = joinNames(acrEvidence.namesOf(acrEvidence.remotePortsOf(lrEpisodes)));

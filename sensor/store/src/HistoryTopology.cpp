@@ -207,7 +207,9 @@ std::vector<ZTSTopologyChange> ZTCHistory::readTopologyChanges(std::int64_t aFro
             }
             lpBefore = &lrRow;
         }
-        lVanish(*lpBefore);
+        if (lpBefore != nullptr) {
+            lVanish(*lpBefore);
+        }
     }
     std::ranges::stable_sort(lChanges, {}, &ZTSTopologyChange::mTime);
     return lChanges;

@@ -24,7 +24,7 @@ using ZTCJson = nlohmann::ordered_json;
 static constexpr std::chrono::hours scSpan{7 * 24};
 static constexpr std::uint64_t scMostEpisodes = 20000;
 static constexpr std::size_t scMostCounters = 200000;
-static constexpr std::size_t scMostLogBytes = 1024 * 1024;
+static constexpr std::size_t scMostLogBytes = 1U << 20U;
 /// The sensor's messages. A journal that hangs costs ten seconds.
 static constexpr const char* scJournal = "timeout 10 journalctl -u tavik -n 2000 --no-pager 2>&1";
 

@@ -200,14 +200,15 @@ static std::vector<ZTSDiffPassing> sFindPassing(const std::vector<ZTSTopologyCha
         lrPassing.mStates.emplace_back(fromMicroseconds(lrChange.mTime), lState);
     }
     std::vector<ZTSDiffPassing> lPassing;
-    for (auto& [lKey, lOne] : lFound) {
-        const auto lIsOfPort = [&lOne](const auto& acrOther) {
+    for (const auto& lrFound : lFound) {
+        const ZTSDiffSubject& lrSubject = lrFound.second.mSubject;
+        const auto lIsOfPort = [&lrSubject](const auto& acrOther) {
             const ZTSDiffSubject& lrPort = acrOther.second.mSubject;
-            return lrPort.mThing != ZTDF_Path && lrPort.mInitiator == lOne.mSubject.mInitiator &&
-                   (lrPort.mThing == ZTDF_Link || lrPort.mRemotePort == lOne.mSubject.mRemotePort);
+            return lrPort.mThing != ZTDF_Path && lrPort.mInitiator == lrSubject.mInitiator &&
+                   (lrPort.mThing == ZTDF_Link || lrPort.mRemotePort == lrSubject.mRemotePort);
         };
-        if (lOne.mSubject.mThing != ZTDF_Path || std::ranges::none_of(lFound, lIsOfPort)) {
-            lPassing.push_back(lOne);
+        if (lrSubject.mThing != ZTDF_Path || std::ranges::none_of(lFound, lIsOfPort)) {
+            lPassing.push_back(lrFound.second);
         }
     }
     return lPassing;

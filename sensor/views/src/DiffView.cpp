@@ -23,7 +23,7 @@ static std::string sNamePort(const ZTSDiffSubject& acrSubject, const ZTCNameBook
 
 /// "array7 ctrl-B from host8"; of paths with how many LUNs, or which.
 static std::string sName(const ZTSDiffSubject& acrSubject, const ZTCNameBook& acrNames, std::size_t aLuns) {
-    const std::string lInitiator = acrSubject.mInitiator ? acrNames.describe(*acrSubject.mInitiator) : "";
+    std::string lInitiator = acrSubject.mInitiator ? acrNames.describe(*acrSubject.mInitiator) : "";
     switch (acrSubject.mThing) {
         case ZTDF_Link:
             return lInitiator;

@@ -54,7 +54,7 @@ bool matches(const ZTSSanLun& acrLun, const ZTSPathsFilter& acrFilter) {
 
 /// "reduced" and "lost" with a mark; a whole one needs no word.
 static std::string sDescribeRedundancy(const ZTSSanLun& acrLun) {
-    const std::string lCount = formatNumber(acrLun.mRunning) + " of " + formatNumber(acrLun.mExpected);
+    std::string lCount = formatNumber(acrLun.mRunning) + " of " + formatNumber(acrLun.mExpected);
     switch (acrLun.mRedundancy) {
         case ZTRD_None:
             return lCount + " NO PATH";
