@@ -31,6 +31,7 @@ struct ZTSMetricFacts {
     ZTCSeriesPorts mSeriesPorts;
     std::map<ZTCKindKey, std::uint64_t> mOpenEpisodes;
     std::map<std::string, std::uint64_t> mLostByLibrary;  ///< by the library's name for the loss, of all agents
+    std::map<std::string, std::uint64_t> mLuns;           ///< by redundancy; empty: no topology is known
     std::uint64_t mLostInGaps = 0;                        ///< occurrences that all gaps are known to have cost
     std::uint64_t mAgentRestarts = 0;
     std::uint64_t mHookFailures = 0;

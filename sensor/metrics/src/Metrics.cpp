@@ -8,6 +8,7 @@
 #include <nlohmann/json.hpp>
 #include <sstream>
 
+#include "sensor/views/include/SanView.h"
 #include "sensor/views/include/StateTable.h"
 
 using prometheus::ClientMetric;
@@ -203,6 +204,13 @@ static void sAddHistory(const ZTSMetricFacts& acrFacts, std::vector<MetricFamily
         lMissed.add({{"output", lOutput}}, static_cast<double>(lCount));
     }
     lMissed.moveTo(arFamilies);
+    ZTCFamily lLuns("tavik_luns", MetricType::Gauge,
+                    "Logical units by what is left of their paths: whole, reduced, lost (a single path, initiator or "
+                    "remote port is left), none, or unknown.");
+    for (const auto& [lRedundancy, lCount] : acrFacts.mLuns) {
+        lLuns.add({{"redundancy", lRedundancy}}, static_cast<double>(lCount));
+    }
+    lLuns.moveTo(arFamilies);
     ZTCFamily lOpen("tavik_open_episodes", MetricType::Gauge, "Episodes that go on, by kind.");
     for (const auto& [lKind, lCount] : acrFacts.mOpenEpisodes) {
         lOpen.add({{"kind", getKindName(lKind)}}, static_cast<double>(lCount));
@@ -289,6 +297,12 @@ ZTSMetricFacts readMetricFacts(const ZTCHistory& acrHistory, ZTSStatusFacts aSta
     });
     for (const ZTSGap& lrGap : acrHistory.readGaps()) {
         lFacts.mLostInGaps += lrGap.getOccurrences();
+    }
+    if (const std::optional<ZTSSanView> lSan = readSan(acrHistory, getHistoryTime())) {
+        for (std::uint8_t i = 0; i < ZTRD_Count; ++i) {
+            const auto lRedundancy = static_cast<ZTERedundancy>(i);
+            lFacts.mLuns[getRedundancyName(lRedundancy)] = lSan->mFacts.countLuns(lRedundancy);
+        }
     }
     lFacts.mLostByLibrary = sReadLibraryLosses(acrHistory);
     lFacts.mAgentRestarts = sStoredNumber(acrHistory, gcAgentRestartsValue);
