@@ -96,7 +96,10 @@ systemctl restart tavik
 expect_true "collects" wait_until 20 is_collecting
 
 step "Upgrading a service that runs"
+# Each start brings 1,000: they are delivered, and then stored.
+has_stored_all() { [ $(($(occurrences queue-full) % 1000)) -eq 0 ]; }
 kpm-sim wait --timeout 20 >/dev/null
+wait_until 20 has_stored_all
 lBefore=$(occurrences queue-full)
 lPids=$(pids)
 expect_true "dpkg --install" dpkg --force-confdef --force-confold --install /packages/now/tavik_*.deb /packages/now/tavik-sim_*.deb
