@@ -2,6 +2,7 @@
 // manual.
 #include <CLI/CLI.hpp>
 
+#include <algorithm>
 #include <chrono>
 #include <cstdint>
 #include <exception>
@@ -168,13 +169,15 @@ static bool sIsReached(const std::string& acrStatus, const ZTSSimWaitOptions& ac
 
 static ZTESimExit sWait(const std::string& acrSocket, const ZTSSimWaitOptions& acrOptions) {
     static constexpr std::chrono::milliseconds scPause{20};
+    // A library that works may need a moment for its answer, however short the time is that the caller waits.
+    static constexpr std::chrono::seconds scAnswerTime{2};
     const auto lDeadline = std::chrono::steady_clock::now() + std::chrono::seconds(acrOptions.mTimeout);
     std::optional<ZTCSimControlClient> lClient;
     while (true) {
         std::string lStatus;
         try {
             if (!lClient) {
-                lClient.emplace(acrSocket, lDeadline);
+                lClient.emplace(acrSocket, std::max(lDeadline, std::chrono::steady_clock::now() + scAnswerTime));
             }
             lStatus = lClient->ask("status");
         } catch (const ZTCSimNoAnswer& lrException) {

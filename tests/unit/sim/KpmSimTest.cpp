@@ -109,12 +109,12 @@ TEST_F(KpmSim, EndsWithOneWhenTheLibraryListensAndDoesNotAnswer) {
     const sockaddr_un lAddress = makeSimSocketAddress(lPath);
     ASSERT_EQ(::bind(lSilent.get(), reinterpret_cast<const sockaddr*>(&lAddress), sizeof lAddress), 0);
     ASSERT_EQ(::listen(lSilent.get(), 0), 0);
-    const ZTSToolResult lNoAnswer = sRun("--socket '" + lPath + "' wait --timeout 1");
-    EXPECT_EQ(lNoAnswer.mOutput, "not reached within 1 s: " + lPath + ": the library does not answer\n");
+    const ZTSToolResult lNoAnswer = sRun("--socket '" + lPath + "' wait --timeout 2");
+    EXPECT_EQ(lNoAnswer.mOutput, "not reached within 2 s: " + lPath + ": the library does not answer\n");
     EXPECT_EQ(lNoAnswer.mStatus, 1);
     // The connection of the first one still takes the only place.
-    const ZTSToolResult lNoPlace = sRun("--socket '" + lPath + "' wait --timeout 1");
-    EXPECT_EQ(lNoPlace.mOutput, "not reached within 1 s: " + lPath + ": the library accepts no connection\n");
+    const ZTSToolResult lNoPlace = sRun("--socket '" + lPath + "' wait --timeout 2");
+    EXPECT_EQ(lNoPlace.mOutput, "not reached within 2 s: " + lPath + ": the library accepts no connection\n");
     EXPECT_EQ(lNoPlace.mStatus, 1);
 }
 
