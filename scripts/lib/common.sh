@@ -88,13 +88,26 @@ build_directory() {
     [1-9] | [1-4][0-9]) echo "   $lSteps steps, less than a minute" ;;
     *) echo "   $lSteps steps, about $lMinutes min" ;;
   esac
-  ninja -C "$lDirectory" "$@" | show_progress
+  in_turn "$lDirectory" ninja -C "$lDirectory" "$@" | show_progress
 }
 
-# configure_and_build PRESET [CMAKE-OPTION...]: into build/PRESET.
-configure_and_build() {
-  local lPreset=$1
+# in_turn DIRECTORY COMMAND...: scripts that run beside each other configure and build in a directory one after another.
+in_turn() {
+  local lLock=build/.${1//\//-}.lock
   shift
-  cmake --preset "$lPreset" "$@" >/dev/null
-  build_directory "build/$lPreset"
+  mkdir -p build
+  flock -o "$lLock" "$@"
+}
+
+# configure PRESET [DIRECTORY [CMAKE-OPTION...]]: into build/PRESET, or into the directory.
+configure() {
+  local lPreset=$1 lDirectory=${2:-build/$1}
+  shift $(($# > 1 ? 2 : 1))
+  in_turn "$lDirectory" cmake --preset "$lPreset" -B "$lDirectory" "$@" >/dev/null
+}
+
+# configure_and_build PRESET: into build/PRESET.
+configure_and_build() {
+  configure "$1"
+  build_directory "build/$1"
 }
