@@ -4,8 +4,8 @@
 ///   told apart by their WWPNs, LUNs by their wwids, so that a restart that renames disks is no difference.
 /// - Passing: what is the same at both moments and was not in between. That is no difference.
 /// - Rates: events of each kind and remote port between FROM and TO, compared with as long a time before FROM (an hour
-///   at least). They differ where the counts are farther apart than three times the square root of their sum, and one
-///   is at least twice the other.
+///   at least), or of two other stretches that end at FROM and TO. They differ where the counts, scaled to equal times,
+///   are farther apart than three times the square root of their sum, and one is at least twice the other.
 #ifndef SENSOR_VIEWS_INCLUDE_DIFFVIEW_H
 #define SENSOR_VIEWS_INCLUDE_DIFFVIEW_H
 
@@ -61,6 +61,23 @@ struct ZTSDiffPoint {
     std::string mMark;  ///< empty: no mark was named
 };
 
+struct ZTSDiffRequest {
+    ZTSDiffPoint mFrom;
+    ZTSDiffPoint mTo;  ///< later than mFrom
+    /// Where the stretch of the rates before begins, which ends at mFrom; absent: as long before mFrom as mTo is behind
+    /// it.
+    std::optional<ZTCHistoryTime> mBeforeSince{};
+    std::optional<ZTCHistoryTime> mAfterSince{};  ///< where the stretch of the rates after begins; absent: at mFrom
+};
+
+/// A request as people and programs write it; an empty text is not given.
+struct ZTSDiffTexts {
+    std::string mFrom{};         ///< as of readPoint(); default: the last mark, without one 24 hours ago
+    std::string mTo{};           ///< default: now
+    std::string mBeforeSince{};  ///< defaults as of ZTSDiffRequest
+    std::string mAfterSince{};
+};
+
 struct ZTSDiff {
     ZTSDiffPoint mFrom;
     ZTSDiffPoint mTo;
@@ -80,8 +97,11 @@ std::vector<ZTSDiffChange> compareTopologies(const ZTSTopology& acrBefore, const
 /// Whether two counts, of times that are this long, are different.
 bool areRatesDifferent(std::uint64_t aBefore, double aBeforeHours, std::uint64_t aAfter, double aAfterHours);
 
+/// Throws ZTCBadFilterEx, also where a stretch of time ends before it begins.
+ZTSDiffRequest readDiffRequest(const ZTSDiffTexts& acrTexts, const std::vector<ZTSMark>& acrMarks, ZTCHistoryTime aNow);
+
 /// Throws what ZTCHistory throws.
-ZTSDiff makeDiff(const ZTCHistory& acrHistory, const ZTSDiffPoint& acrFrom, const ZTSDiffPoint& acrTo);
+ZTSDiff makeDiff(const ZTCHistory& acrHistory, const ZTSDiffRequest& acrRequest);
 
 std::string formatDiff(const ZTSDiff& acrDiff, const ZTCNameBook& acrNames, std::size_t aTableWidth,
                        const ZTSTextStyle& acrStyle);

@@ -4,11 +4,15 @@
 #include <map>
 
 #include "sensor/views/include/DiffView.h"
+#include "sensor/views/include/FilterText.h"
 #include "sensor/views/include/SanFacts.h"
 #include "sensor/views/include/SanTroubles.h"
+#include "sensor/views/include/TimeText.h"
 
 static constexpr std::array<const char*, ZTDF_Count> scThings{"link", "remotePort", "lun", "path"};
 static constexpr std::chrono::hours scLeastBefore{1};
+/// Where no mark has been set.
+static constexpr std::chrono::hours scDefaultSpan{24};
 
 const char* getDiffThingName(ZTEDiffThing aThing) {
     return scThings.at(aThing);
@@ -229,27 +233,41 @@ static double sHours(std::chrono::microseconds aSpan) {
     return std::chrono::duration<double, std::ratio<3600>>(aSpan).count();
 }
 
-static void sAddRates(const ZTCHistory& acrHistory, ZTSDiff& arDiff) {
+using ZTCDiffRates = std::map<std::pair<ZTCKindKey, std::string>, ZTSDiffRate>;
+
+/// Adds what happened in [aFrom, aTo) to that count of each rate.
+static void sCount(const ZTCHistory& acrHistory, ZTCHistoryTime aFrom, ZTCHistoryTime aTo,
+                   std::uint64_t ZTSDiffRate::*apCount, ZTCDiffRates& arRates) {
+    ZTSHistoryFilter lFilter;
+    lFilter.mSince = aFrom;
+    lFilter.mUntil = aTo - std::chrono::microseconds(1);
+    acrHistory.visitMinutes(lFilter, [&](const ZTSBucket& acrBucket) {
+        const std::string lPort = acrBucket.mRemotePort ? acrBucket.mRemotePort->mWwpn.toText() : "";
+        ZTSDiffRate& lrRate = arRates[{acrBucket.mKind, lPort}];
+        lrRate.mKind = acrBucket.mKind;
+        lrRate.mRemotePort = acrBucket.mRemotePort;
+        lrRate.*apCount += acrBucket.mOccurrences;
+        return true;
+    });
+}
+
+/// Events are counted by the minute: both stretches are whole minutes.
+static void sAddRates(const ZTCHistory& acrHistory, const ZTSDiffRequest& acrRequest, ZTSDiff& arDiff) {
     using std::chrono::ceil;
     using std::chrono::floor;
     using std::chrono::minutes;
-    const ZTCHistoryTime lBorder = floor<minutes>(arDiff.mFrom.mTime);
-    const ZTCHistoryTime lEnd =
-        std::max(ceil<minutes>(arDiff.mTo.mTime), floor<minutes>(arDiff.mFrom.mTime) + minutes(1));
-    arDiff.mAfterSpan = lEnd - lBorder;
+    const ZTCHistoryTime lBorder = floor<minutes>(acrRequest.mFrom.mTime);
+    const ZTCHistoryTime lAfterSince = floor<minutes>(acrRequest.mAfterSince.value_or(lBorder));
+    const ZTCHistoryTime lEnd = std::max<ZTCHistoryTime>(ceil<minutes>(acrRequest.mTo.mTime), lAfterSince + minutes(1));
+    arDiff.mAfterSpan = lEnd - lAfterSince;
     arDiff.mBeforeSpan = std::max<std::chrono::microseconds>(arDiff.mAfterSpan, scLeastBefore);
-    std::map<std::pair<ZTCKindKey, std::string>, ZTSDiffRate> lRates;
-    ZTSHistoryFilter lFilter;
-    lFilter.mSince = lBorder - arDiff.mBeforeSpan;
-    lFilter.mUntil = lEnd - std::chrono::microseconds(1);
-    acrHistory.visitMinutes(lFilter, [&](const ZTSBucket& acrBucket) {
-        const std::string lPort = acrBucket.mRemotePort ? acrBucket.mRemotePort->mWwpn.toText() : "";
-        ZTSDiffRate& lrRate = lRates[{acrBucket.mKind, lPort}];
-        lrRate.mKind = acrBucket.mKind;
-        lrRate.mRemotePort = acrBucket.mRemotePort;
-        (acrBucket.mFrom < lBorder ? lrRate.mBefore : lrRate.mAfter) += acrBucket.mOccurrences;
-        return true;
-    });
+    if (acrRequest.mBeforeSince) {
+        arDiff.mBeforeSpan =
+            std::max<std::chrono::microseconds>(lBorder - floor<minutes>(*acrRequest.mBeforeSince), minutes(1));
+    }
+    ZTCDiffRates lRates;
+    sCount(acrHistory, lBorder - arDiff.mBeforeSpan, lBorder, &ZTSDiffRate::mBefore, lRates);
+    sCount(acrHistory, lAfterSince, lEnd, &ZTSDiffRate::mAfter, lRates);
     for (auto& [lKey, lRate] : lRates) {
         lRate.mIsDifferent =
             areRatesDifferent(lRate.mBefore, sHours(arDiff.mBeforeSpan), lRate.mAfter, sHours(arDiff.mAfterSpan));
@@ -260,12 +278,48 @@ static void sAddRates(const ZTCHistory& acrHistory, ZTSDiff& arDiff) {
     });
 }
 
-ZTSDiff makeDiff(const ZTCHistory& acrHistory, const ZTSDiffPoint& acrFrom, const ZTSDiffPoint& acrTo) {
+static ZTSDiffPoint sReadPoint(const std::string& acrText, const char* apName, const std::vector<ZTSMark>& acrMarks,
+                               ZTCHistoryTime aNow) {
+    const bool lIsMark = std::ranges::find(acrMarks, acrText, &ZTSMark::mName) != acrMarks.end();
+    return {.mTime = readPoint(acrText, apName, acrMarks, aNow), .mMark = lIsMark ? acrText : ""};
+}
+
+static void sCheckOrder(const char* apEarlier, ZTCHistoryTime aEarlier, const char* apLater, ZTCHistoryTime aLater) {
+    if (aEarlier >= aLater) {
+        throw ZTCBadFilterEx(std::string(apEarlier) + " has to be earlier than " + apLater + ", and " +
+                             formatDateTime(aEarlier) + " is not earlier than " + formatDateTime(aLater));
+    }
+}
+
+ZTSDiffRequest readDiffRequest(const ZTSDiffTexts& acrTexts, const std::vector<ZTSMark>& acrMarks,
+                               ZTCHistoryTime aNow) {
+    ZTSDiffRequest lRequest{.mFrom = {.mTime = aNow - scDefaultSpan, .mMark = ""}, .mTo = {.mTime = aNow, .mMark = ""}};
+    if (!acrTexts.mFrom.empty()) {
+        lRequest.mFrom = sReadPoint(acrTexts.mFrom, "from", acrMarks, aNow);
+    } else if (!acrMarks.empty()) {
+        lRequest.mFrom = {.mTime = acrMarks.back().mTime, .mMark = acrMarks.back().mName};
+    }
+    if (!acrTexts.mTo.empty()) {
+        lRequest.mTo = sReadPoint(acrTexts.mTo, "to", acrMarks, aNow);
+    }
+    sCheckOrder("from", lRequest.mFrom.mTime, "to", lRequest.mTo.mTime);
+    if (!acrTexts.mBeforeSince.empty()) {
+        lRequest.mBeforeSince = readPoint(acrTexts.mBeforeSince, "before-since", acrMarks, aNow);
+        sCheckOrder("before-since", *lRequest.mBeforeSince, "from", lRequest.mFrom.mTime);
+    }
+    if (!acrTexts.mAfterSince.empty()) {
+        lRequest.mAfterSince = readPoint(acrTexts.mAfterSince, "after-since", acrMarks, aNow);
+        sCheckOrder("after-since", *lRequest.mAfterSince, "to", lRequest.mTo.mTime);
+    }
+    return lRequest;
+}
+
+ZTSDiff makeDiff(const ZTCHistory& acrHistory, const ZTSDiffRequest& acrRequest) {
     ZTSDiff lDiff;
-    lDiff.mFrom = acrFrom;
-    lDiff.mTo = acrTo;
-    const std::int64_t lFrom = toMicroseconds(acrFrom.mTime);
-    const std::int64_t lTo = toMicroseconds(acrTo.mTime);
+    lDiff.mFrom = acrRequest.mFrom;
+    lDiff.mTo = acrRequest.mTo;
+    const std::int64_t lFrom = toMicroseconds(acrRequest.mFrom.mTime);
+    const std::int64_t lTo = toMicroseconds(acrRequest.mTo.mTime);
     const auto lBefore = acrHistory.readTopology(lFrom);
     const auto lAfter = acrHistory.readTopology(lTo);
     lDiff.mHasTopology = lBefore && lAfter;
@@ -273,6 +327,6 @@ ZTSDiff makeDiff(const ZTCHistory& acrHistory, const ZTSDiffPoint& acrFrom, cons
         lDiff.mChanges = compareTopologies(lBefore->mTopology, lAfter->mTopology);
         lDiff.mPassing = sFindPassing(acrHistory.readTopologyChanges(lFrom, lTo), lAfter->mTopology, lDiff.mChanges);
     }
-    sAddRates(acrHistory, lDiff);
+    sAddRates(acrHistory, acrRequest, lDiff);
     return lDiff;
 }

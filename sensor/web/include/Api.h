@@ -56,6 +56,7 @@ private:
     nlohmann::ordered_json makeEvents(const ZTSWebRequest& acrRequest);
     nlohmann::ordered_json makePorts(const ZTSWebRequest& acrRequest);
     nlohmann::ordered_json makePaths(const ZTSWebRequest& acrRequest);
+    nlohmann::ordered_json makeDifferences(const ZTSWebRequest& acrRequest);
     nlohmann::ordered_json makeExplanation(const ZTSWebRequest& acrRequest);
     nlohmann::ordered_json makeTimeline(const ZTSWebRequest& acrRequest);
     ZTSStatusFacts gatherFacts();

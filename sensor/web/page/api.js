@@ -27,8 +27,9 @@ const time = (value) => new Date(value).toISOString();
 export const status = () => ask("status");
 export const ports = (parameters) => ask("ports", parameters);
 export const events = (parameters) => ask("events", parameters);
-/** @param at  a moment; without it: now */
-export const paths = (at) => ask("paths", { at: at === undefined ? "" : time(at) });
+export const paths = () => ask("paths");
+/** @param parameters  {from, to, "before-since", "after-since"} as texts */
+export const diff = (parameters) => ask("diff", parameters);
 export const explain = (subject) => ask("explain", { subject });
 export const diagnose = () => ask("explain");
 export const timeline = (from, to, columns) => ask("timeline", { from: time(from), to: time(to), columns });

@@ -1,40 +1,42 @@
-// What is different between the paths of two moments. Nothing here touches the page.
+// What is different between two moments, as rows of a table, out of the document of `tavik diff`. Nothing here touches the page.
 
-import { initiatorName, number, portName } from "./format.js";
+import { initiatorName, plural, portName, shortTime } from "./format.js";
 
-const nameOf = (unit) => unit.multipath ?? unit.paths.find((path) => path.disk)?.disk ?? unit.wwid ?? unit.id;
-const pathsOf = (unit) => `${number(unit.running)} of ${number(unit.expected)} paths run`;
+const words = { link: "Link", remotePort: "Remote port", lun: "LUN", path: "Path" };
+const mostStates = 4;
 
-/** The state of each remote port as each local port sees it, and of each local port, by a name for people. */
-function portStates(units) {
-  const states = new Map();
-  for (const path of units.flatMap((unit) => unit.paths)) {
-    states.set(`Local port ${initiatorName(path.initiator)}`, path.initiatorState);
-    if (path.remotePort) {
-      states.set(`${portName(path.remotePort)} from ${initiatorName(path.initiator)}`, path.remotePortState);
-    }
-  }
-  return states;
+/** "array7 ctrl-B from host8"; of paths with how many LUNs, or which. */
+function nameOf(subject, luns) {
+  const port = subject.remotePort === null ? "an unknown port" : portName(subject.remotePort);
+  return {
+    link: () => initiatorName(subject.initiator),
+    remotePort: () => `${port} from ${initiatorName(subject.initiator)}`,
+    lun: () => subject.lunName ?? subject.lun,
+    path: () => `${luns === 1 ? subject.lunName ?? subject.lun : plural(luns, "LUN")} by ${initiatorName(subject.initiator)}, ${port}`,
+  }[subject.what]();
 }
 
-function differences(before, after, textOf) {
-  const changes = [];
-  for (const key of new Set([...before.keys(), ...after.keys()])) {
-    const texts = [before, after].map((side) => (side.has(key) ? textOf(side.get(key)) : "not there"));
-    if (texts[0] !== texts[1]) {
-      changes.push({ key, before: texts[0], after: texts[1] });
-    }
-  }
-  return changes;
+/** Rows of like cells; the paths of all LUNs through the same ports are one row. */
+function rowsOf(subjects, cellsOf) {
+  const rows = new Map();
+  subjects.forEach((subject, index) => {
+    const cells = cellsOf(subject);
+    const key = subject.what === "path" ? [initiatorName(subject.initiator), subject.remotePort?.wwpn, ...cells].join("\n") : String(index);
+    const row = rows.get(key) ?? { subject, cells, luns: 0 };
+    row.luns += 1;
+    rows.set(key, row);
+  });
+  return [...rows.values()].map(({ subject, cells, luns }) => [words[subject.what], nameOf(subject, luns), ...cells]);
 }
 
-/** [{what, before, after}], of two lists of LUNs as the document of the paths has them: ports first. */
-export function findChanges(before, after) {
-  const ports = differences(portStates(before), portStates(after), (state) => state ?? "not known")
-    .map((change) => ({ what: change.key, before: change.before, after: change.after }));
-  const [old, now] = [before, after].map((units) => new Map(units.map((unit) => [unit.id, unit])));
-  const luns = differences(old, now, (unit) => [pathsOf(unit), ...(unit.mounts ?? [])].join(", "))
-    .map((change) => ({ what: `LUN ${nameOf(now.get(change.key) ?? old.get(change.key))}`, before: change.before, after: change.after }))
-    .sort((one, other) => one.what.localeCompare(other.what, "en", { numeric: true }));
-  return [...ports, ...luns];
+/** [what, name, before, after] of each state that is different. */
+export const changeRows = (document) => rowsOf(document.changes, (change) => [change.before ?? "not there", change.after ?? "not there"]);
+
+function statesOf(passing) {
+  const shown = passing.states.slice(0, mostStates).map((state) => `${state.state} ${shortTime(state.time, true)}`);
+  const more = passing.states.length - shown.length;
+  return `${shown.join(", ")}${more > 0 ? ` and ${more} more` : ""}`;
 }
+
+/** [what, name, states] of what is the same at both moments and was not in between. */
+export const passingRows = (document) => rowsOf(document.passing, (passing) => [statesOf(passing)]);

@@ -1,50 +1,33 @@
-// Before and after: two stretches of time side by side, of a mark or chosen in the timeline.
+// Before and after a mark, or of two ranges that were chosen in the timeline: what `tavik diff` says, on the page.
 
 import * as api from "./api.js";
 import { makeAddress, readSpan, writeAddress, writeSpan } from "./address.js";
-import { findChanges } from "./changes.js";
+import { changeRows, passingRows } from "./changes.js";
 import { element, figure, fillTable, link } from "./dom.js";
 import { kindCell } from "./episodes.js";
-import { duration, initiatorName, number, plural, portName, span } from "./format.js";
+import { duration, number, plural, portName, shortTime, span } from "./format.js";
 import { kindOf, kinds } from "./kinds.js";
 import { findBlind } from "./model.js";
+import { quote } from "./words.js";
 
 const hour = 3600000;
 const mostChanges = 200;
 const longest = 30 * 24 * hour;
 
-let spans = null; // [[from, to], [from, to]]: before, after
+let turn = 0; // counts questions: only the newest answer is shown
 
-/** Around a mark: as long before it as after it, a day at most. */
-function around(at) {
-  const long = Math.min(24 * hour, Math.max(60000, Date.now() - at));
-  return [[at - long, at], [at, at + long]];
+/** [from, to] of the stretches that the rates are of. */
+function stretchesOf(document) {
+  const [from, to] = [Date.parse(document.from.time), Date.parse(document.to.time)];
+  return [[from - document.secondsBefore * 1000, from], [to - document.secondsAfter * 1000, to]];
 }
 
-/** Occurrences of each port and kind in a stretch, and how much of it could be seen. */
-async function count([from, to]) {
-  const document = await api.timeline(from, to, 1);
-  const rows = new Map();
-  for (const row of document.rows) {
-    const key = `${row.remotePort?.wwpn ?? `initiator ${row.initiator.wwpn}`} ${row.kind}`;
-    const before = rows.get(key);
-    rows.set(key, {
-      label: row.remotePort === null ? initiatorName(row.initiator) : portName(row.remotePort), wwpn: row.remotePort?.wwpn ?? null, kind: row.kind,
-      count: (before?.count ?? 0) + row.cells.reduce((sum, [, value]) => sum + value, 0),
-    });
-  }
-  const unseen = findBlind(document, from, to, Date.now()).filter((stretch) => stretch.isTotal)
-    .reduce((sum, stretch) => sum + Math.min(to, stretch.to) - Math.max(from, stretch.from), 0);
-  return { rows, seen: Math.max(0, Math.min(to, Date.now()) - from - unseen), marks: document.marks };
-}
+const rateText = (value) => (value === 0 ? "0" : value < 1 ? value.toFixed(2) : value < 10 ? value.toFixed(1) : number(Math.round(value)));
 
-const rate = (value, seen) => (seen === 0 ? null : (value * hour) / seen);
-const rateText = (value) => (value === null ? "not seen" : value === 0 ? "0" : value < 1 ? value.toFixed(2) : value < 10 ? value.toFixed(1) : number(Math.round(value)));
-
-/** Most changed first: new and gone ones in front of those that only grew or shrank; the worst kind where that is equal. */
-function changeOf(before, after) {
-  if (before === null || after === null) {
-    return { text: "not known", weight: 0, className: "quiet" };
+/** What became of a rate, and how much that is: new and gone ones are more than those that only grew or shrank. */
+function changeOf(before, after, isDifferent) {
+  if (!isDifferent) {
+    return { text: "the same", weight: 0, className: "quiet" };
   }
   if (before === 0) {
     return { text: "new", weight: 1e6 + after, className: "worse" };
@@ -52,93 +35,116 @@ function changeOf(before, after) {
   if (after === 0) {
     return { text: "gone", weight: 1e5 + before, className: "better" };
   }
-  const ratio = after / before;
-  const isSame = ratio < 1.25 && ratio > 0.8;
-  const text = ratio >= 1 ? `× ${ratio < 10 ? ratio.toFixed(1) : number(Math.round(ratio))}` : `÷ ${1 / ratio < 10 ? (1 / ratio).toFixed(1) : number(Math.round(1 / ratio))}`;
-  return { text: isSame ? "the same" : text, weight: isSame ? 0 : Math.abs(Math.log2(ratio)), className: isSame ? "quiet" : ratio > 1 ? "worse" : "better" };
+  const ratio = Math.max(before / after, after / before);
+  return { text: `${after > before ? "×" : "÷"} ${ratio < 10 ? ratio.toFixed(1) : number(Math.round(ratio))}`,
+    weight: ratio, className: after > before ? "worse" : "better" };
 }
 
-function showRates([before, after]) {
-  const keys = new Set([...before.rows.keys(), ...after.rows.keys()]);
-  const rows = [...keys].map((key) => {
-    const { label, wwpn, kind } = before.rows.get(key) ?? after.rows.get(key);
-    const rates = [before, after].map((side) => rate(side.rows.get(key)?.count ?? 0, side.seen));
-    return { label, wwpn, kind, rates, change: changeOf(...rates) };
-  }).sort((one, other) => kindOf(other.kind).level - kindOf(one.kind).level || other.change.weight - one.change.weight || kinds.indexOf(kindOf(one.kind)) - kinds.indexOf(kindOf(other.kind)));
-  const changed = rows.filter(({ change }) => change.text !== "the same").length;
-  element("compare-sum").textContent = rows.length === 0 ? "Nothing happened in either range."
-    : changed === 0 ? `The same in both ranges: ${plural(rows.length, "row")}, no rate differs by a quarter.` : `${plural(changed, "rate")} of ${number(rows.length)} differ by a quarter or more.`;
+function showRates(document) {
+  const stretches = stretchesOf(document);
+  const range = writeSpan([Math.min(...stretches.flat()), Math.max(...stretches.flat())]);
+  const place = (kind) => kinds.indexOf(kindOf(kind));
+  const rows = document.rates.map((row) => {
+    const rates = [(row.before * 3600) / document.secondsBefore, (row.after * 3600) / document.secondsAfter];
+    return { ...row, rates, change: changeOf(...rates, row.different) };
+  }).sort((one, other) => other.different - one.different || kindOf(other.kind).level - kindOf(one.kind).level
+    || other.change.weight - one.change.weight || place(one.kind) - place(other.kind));
   fillTable(element("compare-rates"),
-    ["Port", "Kind", { text: "Before, events an hour", number: true }, { text: "After, events an hour", number: true }, "Change"],
+    ["Port", "Kind", { text: "Before, events an hour", number: true }, { text: "After, events an hour", number: true }, { text: "Counts", number: true }, "Difference"],
     rows.map((row) => [
-      row.wwpn === null ? row.label : link(row.label, makeAddress("timeline", { range: writeSpan([spans[0][0], spans[1][1]].sort((one, other) => one - other)), find: row.wwpn })),
-      kindCell(row.kind), figure(rateText(row.rates[0])), figure(rateText(row.rates[1])),
+      row.remotePort === null ? "Local ports" : link(portName(row.remotePort), makeAddress("timeline", { range, find: row.remotePort.wwpn })),
+      kindCell(row.kind), figure(rateText(row.rates[0])), figure(rateText(row.rates[1])), figure(`${number(row.before)} → ${number(row.after)}`),
       { text: row.change.text, className: row.change.className }]),
     "Nothing happened in either range. Choose longer ones.");
 }
 
-/** The paths as they were at the end of either range. */
-async function showChanges() {
+function showChanges(document) {
   const place = element("compare-changes");
-  try {
-    const [before, after] = await Promise.all(spans.map(([, to]) => api.paths(Math.min(to, Date.now()))));
-    if (before.luns === null || after.luns === null) {
-      fillTable(place, ["What"], [], `The paths of ${before.luns === null ? "before" : "after"} are not known: no look at this host was stored by then.`);
-      return;
-    }
-    const changes = findChanges(before.luns, after.luns);
-    fillTable(place, ["What", "At the end of before", "At the end of after"], changes.slice(0, mostChanges).map((change) => [change.what, change.before, change.after]),
-      "No port, path or mount is different.");
-    element("compare-more").textContent = changes.length > mostChanges ? `${number(changes.length - mostChanges)} more differences are not shown.` : "";
-  } catch (problem) {
-    fillTable(place, ["What"], [], `Not known: ${problem.message}.`);
+  if (document.changes === null) {
+    fillTable(place, ["What"], [], "Not known: no look at this host was stored by both moments.");
+    element("compare-passing").replaceChildren();
+    return;
+  }
+  const changes = changeRows(document);
+  fillTable(place, ["What", "Name", `Before, ${shortTime(document.from.time)}`, `After, ${shortTime(document.to.time)}`], changes.slice(0, mostChanges),
+    "No link, remote port, LUN or path is different.");
+  element("compare-more").textContent = changes.length > mostChanges ? `${plural(changes.length - mostChanges, "more row")}: tavik diff shows them.` : "";
+  fillTable(element("compare-passing"), ["What", "Name", "Was in between"], passingRows(document).slice(0, mostChanges),
+    "Nothing that is the same again was different in between.");
+}
+
+function showSum(document) {
+  const rates = document.rates.filter((row) => row.different).length;
+  element("compare-sum").textContent = document.same === false ? `Different: ${plural((document.changes ?? []).length, "state")}, ${plural(rates, "rate")}.`
+    : document.same ? `The same: no state and no rate of ${number(document.rates.length)} differs.` : "No rate differs. Of links, ports and paths nothing is known.";
+  const stretches = stretchesOf(document);
+  element("compare-spans").textContent = ["Before", "After"]
+    .map((name, index) => `${name}: ${span(...stretches[index])} (${duration(stretches[index][1] - stretches[index][0])})`).join(" · ");
+}
+
+/** Where Tavik could not see, a rate is too low. */
+async function showBlind(document, mine) {
+  const parts = await Promise.all(stretchesOf(document).map(async ([from, to], index) => {
+    const unseen = findBlind(await api.timeline(from, to, 1), from, to, Date.now()).filter((stretch) => stretch.isTotal)
+      .reduce((sum, stretch) => sum + Math.min(to, stretch.to) - Math.max(from, stretch.from), 0);
+    return unseen < 1000 ? "" : `${duration(unseen)} of ${index === 0 ? "before" : "after"}`;
+  }));
+  if (mine === turn) {
+    const text = parts.filter(Boolean).join(" and ");
+    element("compare-blind").textContent = text === "" ? "" : `Tavik could not see ${text}: the true rates may be higher.`;
   }
 }
 
-function showSpans() {
-  const texts = ["Before", "After"].map((name, index) => `${name}: ${span(...spans[index])} (${duration(spans[index][1] - spans[index][0])})`);
-  element("compare-spans").textContent = texts.join(" · ");
-}
-
-export async function open(parameters) {
-  const chosen = [readSpan(parameters.a), readSpan(parameters.b)];
-  spans = chosen.every((each) => each !== null) ? chosen.sort(([one], [other]) => one - other) : null;
-  await show(parameters.mark);
+/** What the address asks for: {question, address, command}, or null. */
+function readWish({ a, b, mark }) {
+  const ranges = [readSpan(a), readSpan(b)];
+  if (ranges.every((each) => each !== null)) {
+    const [before, after] = ranges.sort(([, one], [, other]) => one - other);
+    const text = (time) => new Date(time).toISOString();
+    return { question: { from: text(before[1]), to: text(after[1]), "before-since": text(before[0]), "after-since": text(after[0]) },
+      address: { a: writeSpan(before), b: writeSpan(after) }, command: "" };
+  }
+  return mark ? { question: { from: mark }, address: { mark }, command: `tavik diff ${quote(mark)}` } : null;
 }
 
 function fillMarks(marks, chosen) {
   const list = element("compare-mark");
   list.replaceChildren(new Option(marks.length === 0 ? "there is no mark" : "choose a mark", ""),
-    ...marks.map((mark) => new Option(`${mark.name}, ${span(Date.parse(mark.time), Date.parse(mark.time)).split(" to ")[0]}`, mark.name)).reverse());
+    ...marks.map((mark) => new Option(`${mark.name}, ${shortTime(mark.time)}`, mark.name)).reverse());
   list.value = marks.some(({ name }) => name === chosen) ? chosen : "";
 }
 
-async function show(markName) {
-  const now = Date.now();
+export async function open(parameters) {
+  turn += 1;
+  const mine = turn;
+  const wish = readWish(parameters);
+  element("compare-how").hidden = wish !== null;
+  element("compare-result").hidden = wish === null;
   try {
+    const now = Date.now();
     const { marks } = await api.timeline(now - longest, now, 1);
-    fillMarks(marks, markName);
-    const mark = marks.find(({ name }) => name === markName);
-    if (spans === null && mark) {
-      spans = around(Date.parse(mark.time));
+    fillMarks(marks, parameters.mark);
+    writeAddress("compare", wish?.address ?? {});
+    if (wish === null) {
+      return;
     }
-    element("compare-how").hidden = spans !== null;
-    element("compare-result").hidden = spans === null;
-    if (spans !== null) {
-      writeAddress("compare", mark && !location.hash.includes("a=") ? { mark: mark.name } : { a: writeSpan(spans[0]), b: writeSpan(spans[1]) });
-      showSpans();
-      showRates(await Promise.all(spans.map(count)));
-      await showChanges();
+    element("compare-command").textContent = wish.command;
+    element("compare-terminal").hidden = wish.command === "";
+    const document = await api.diff(wish.question);
+    if (mine === turn) {
+      showSum(document);
+      showRates(document);
+      showChanges(document);
+      await showBlind(document, mine);
     }
   } catch (problem) {
-    element("compare-sum").textContent = `Not known: ${problem.message}.`;
+    if (mine === turn) {
+      element("compare-result").hidden = false;
+      element("compare-sum").textContent = `Not known: ${problem.message}.`;
+    }
   }
 }
 
 export function start() {
-  element("compare-mark").addEventListener("change", (event) => {
-    spans = null;
-    writeAddress("compare", { mark: event.target.value });
-    show(event.target.value);
-  });
+  element("compare-mark").addEventListener("change", (event) => open({ mark: event.target.value }));
 }

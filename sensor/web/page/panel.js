@@ -8,7 +8,7 @@ import { codes, luns, number, plural, span } from "./format.js";
 import { kinds, kindOf } from "./kinds.js";
 import { findingBox } from "./findings.js";
 import { spanOf, whyBlind } from "./model.js";
-import { describeCell, sentenceOf } from "./words.js";
+import { describeCell, quote, sentenceOf } from "./words.js";
 
 const panel = element("panel");
 const most = 200;
@@ -20,8 +20,6 @@ export const isOpen = () => !panel.hidden;
 export function close() {
   panel.hidden = true;
 }
-
-const quote = (text) => (/^[\w.:@/+-]+$/.test(text) ? text : `'${text}'`);
 
 /** What `tavik events` is to be asked to show the same. */
 function filterOf(lane, [from, to]) {

@@ -6,6 +6,9 @@ import { hasCells, spanOf, whyBlind } from "./model.js";
 
 const rank = (name) => kinds.indexOf(kindOf(name));
 
+/** As a word of a command line. */
+export const quote = (text) => (/^[\w.:@/+-]+$/.test(text) ? text : `'${text.replaceAll("'", "'\\''")}'`);
+
 /** "array7 ctrl-A said that its queue is full 20,000 times". */
 export const saysOf = (kind, who, count) => kindOf(kind).says(who, times(count));
 

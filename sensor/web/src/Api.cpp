@@ -8,6 +8,7 @@
 #include "sensor/client/include/RecordJson.h"
 #include "sensor/metrics/include/Metrics.h"
 #include "sensor/views/include/DiagnosisView.h"
+#include "sensor/views/include/DiffView.h"
 #include "sensor/views/include/EpisodeJson.h"
 #include "sensor/views/include/Explanation.h"
 #include "sensor/views/include/FilterText.h"
@@ -139,6 +140,9 @@ ZTSWebResponse ZTCApi::answerKnown(const ZTSWebRequest& acrRequest) {
     if (lrPath == "/api/v1/paths") {
         return sJson(makePaths(acrRequest));
     }
+    if (lrPath == "/api/v1/diff") {
+        return sJson(makeDifferences(acrRequest));
+    }
     if (lrPath == "/api/v1/explain") {
         return sJson(makeExplanation(acrRequest));
     }
@@ -225,6 +229,18 @@ ZTCJson ZTCApi::makePaths(const ZTSWebRequest& acrRequest) {
     }
     lRequest.mFilter = readPathsFilter(lTexts, lNames, sReadFlag(acrRequest, "trouble"));
     return makePathsDocument(lView ? &*lView : nullptr, lRequest, lNames, mSources.mHost, lrHistory.getStoreId());
+}
+
+ZTCJson ZTCApi::makeDifferences(const ZTSWebRequest& acrRequest) {
+    sCheckNames(acrRequest, {"from", "to", "before-since", "after-since"});
+    const ZTCHistory& lrHistory = openHistory();
+    const ZTSDiffRequest lRequest = readDiffRequest({.mFrom = acrRequest.get("from"),
+                                                     .mTo = acrRequest.get("to"),
+                                                     .mBeforeSince = acrRequest.get("before-since"),
+                                                     .mAfterSince = acrRequest.get("after-since")},
+                                                    lrHistory.readMarks(), getHistoryTime());
+    return makeDiffDocument(makeDiff(lrHistory, lRequest), makeNames(lrHistory), mSources.mHost,
+                            lrHistory.getStoreId());
 }
 
 ZTCJson ZTCApi::makeExplanation(const ZTSWebRequest& acrRequest) {

@@ -3,6 +3,7 @@
 #include <nlohmann/json.hpp>
 
 #include "sensor/views/include/DiffView.h"
+#include "sensor/views/include/FilterText.h"
 #include "tests/unit/store/StoreFixture.h"
 #include "tests/unit/views/SanSamples.h"
 
@@ -96,8 +97,8 @@ protected:
         inTransaction([&] { ASSERT_TRUE(store().noteTopology(aTime, acrTopology)); });
     }
     ZTSDiff diff() {
-        return makeDiff(history(), {.mTime = fromMicroseconds(scFrom), .mMark = "before update"},
-                        {.mTime = fromMicroseconds(scTo), .mMark = ""});
+        return makeDiff(history(), {.mFrom = {.mTime = fromMicroseconds(scFrom), .mMark = "before update"},
+                                    .mTo = {.mTime = fromMicroseconds(scTo), .mMark = ""}});
     }
     std::string format(const ZTSDiff& acrDiff) const { return formatDiff(acrDiff, mNames, 80, {}); }
 
@@ -163,6 +164,47 @@ TEST_F(DiffOfAHistory, ARateThatRoseIsADifference) {
     EXPECT_EQ(lDiff.mRates[0].mAfter, 505U);
     EXPECT_THAT(format(lDiff), HasSubstr("\nqueue-full"));
     EXPECT_THAT(format(lDiff), HasSubstr("3.0  505.0"));
+}
+
+TEST_F(DiffOfAHistory, TheRatesOfTwoStretchesAreThoseOfNothingElse) {
+    take({makeQueueFull(gcPortA, scFrom - 50 * gcMinute, scFrom - 50 * gcMinute, 1000)}, scFrom);
+    take({makeQueueFull(gcPortA, scFrom - 10 * gcMinute, scFrom - 10 * gcMinute, 7)}, scFrom);
+    take({makeQueueFull(gcPortA, scFrom + 10 * gcMinute, scFrom + 10 * gcMinute, 2000)}, scTo);
+    take({makeQueueFull(gcPortA, scTo - 5 * gcMinute, scTo - 5 * gcMinute, 90)}, scTo);
+    const ZTSDiff lDiff = makeDiff(history(), {.mFrom = {.mTime = fromMicroseconds(scFrom), .mMark = ""},
+                                               .mTo = {.mTime = fromMicroseconds(scTo), .mMark = ""},
+                                               .mBeforeSince = fromMicroseconds(scFrom - 20 * gcMinute),
+                                               .mAfterSince = fromMicroseconds(scTo - 30 * gcMinute)});
+    EXPECT_EQ(lDiff.mBeforeSpan, std::chrono::minutes(20));
+    EXPECT_EQ(lDiff.mAfterSpan, std::chrono::minutes(30));
+    ASSERT_THAT(lDiff.mRates, SizeIs(1));
+    EXPECT_EQ(lDiff.mRates[0].mBefore, 7U);
+    EXPECT_EQ(lDiff.mRates[0].mAfter, 90U);
+}
+
+TEST(DiffRequest, TheLastMarkIsWhereItBeginsAndNowIsWhereItEnds) {
+    const ZTCHistoryTime lNow = fromMicroseconds(gcBase);
+    const std::vector<ZTSMark> lMarks{{.mName = "old", .mTime = lNow - std::chrono::hours(3)},
+                                      {.mName = "before update", .mTime = lNow - std::chrono::hours(2)}};
+    const ZTSDiffRequest lRequest = readDiffRequest({}, lMarks, lNow);
+    EXPECT_EQ(lRequest.mFrom.mTime, lMarks[1].mTime);
+    EXPECT_EQ(lRequest.mFrom.mMark, "before update");
+    EXPECT_EQ(lRequest.mTo.mTime, lNow);
+    EXPECT_EQ(readDiffRequest({}, {}, lNow).mFrom.mTime, lNow - std::chrono::hours(24));
+    EXPECT_EQ(readDiffRequest({.mFrom = "old", .mTo = "1h"}, lMarks, lNow).mTo.mTime, lNow - std::chrono::hours(1));
+    EXPECT_EQ(readDiffRequest({.mFrom = "old", .mBeforeSince = "5h"}, lMarks, lNow).mBeforeSince,
+              lNow - std::chrono::hours(5));
+}
+
+TEST(DiffRequest, AStretchThatEndsBeforeItBeginsIsWrongUse) {
+    const ZTCHistoryTime lNow = fromMicroseconds(gcBase);
+    const ZTSDiffTexts lWrong[] = {{.mFrom = "1h", .mTo = "2h"},
+                                   {.mFrom = "1h", .mTo = "1h"},
+                                   {.mFrom = "2h", .mTo = "1h", .mBeforeSince = "2h"},
+                                   {.mFrom = "2h", .mTo = "1h", .mAfterSince = "30m"}};
+    for (const ZTSDiffTexts& lrTexts : lWrong) {
+        EXPECT_THROW(readDiffRequest(lrTexts, {}, lNow), ZTCBadFilterEx);
+    }
 }
 
 TEST_F(DiffOfAHistory, WithoutATopologyNothingIsSaidToBeTheSame) {

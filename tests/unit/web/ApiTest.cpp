@@ -97,6 +97,9 @@ TEST_F(Api, AWrongParameterGets400AndSaysWhy) {
         {"/api/v1/ports", {"since", "when?"}, "when?"},
         {"/api/v1/explain", {"subject", "nonsense"}, "nonsense"},
         {"/api/v1/explain", {"subject", "999"}, "999"},
+        {"/api/v1/diff", {"from", "nonsense"}, "nonsense"},
+        {"/api/v1/diff", {"to", "2000-01-01"}, "has to be earlier than to"},
+        {"/api/v1/diff", {"since", "1h"}, "since"},
         {"/api/v1/timeline", {"columns", "0"}, "columns"},
         {"/api/v1/timeline", {"columns", "4001"}, "4001"},
         {"/api/v1/timeline", {"to", "2000-01-01"}, "later than from"},
@@ -106,6 +109,19 @@ TEST_F(Api, AWrongParameterGets400AndSaysWhy) {
         EXPECT_EQ(lResponse.mStatus, 400U) << lrWrong.mParameter.second;
         EXPECT_THAT(nlohmann::json::parse(lResponse.mBody)["error"].get<std::string>(), HasSubstr(lrWrong.mpSaid));
     }
+}
+
+TEST_F(Api, DiffIsTheCommandsDocument) {
+    fill();
+    const nlohmann::json lDiff =
+        askJson("/api/v1/diff", {{"from", "2026-03-06"}, {"to", "2026-03-07"}, {"before-since", "2026-03-01"}});
+    EXPECT_EQ(lDiff["schema"], "tavik.diff/1");
+    EXPECT_EQ(lDiff["storeId"], store().getStoreId());
+    ASSERT_EQ(lDiff["rates"].size(), 2U);  // all that happened, before
+    const nlohmann::json& lrRate = lDiff["rates"][0]["kind"] == "queue-full" ? lDiff["rates"][0] : lDiff["rates"][1];
+    EXPECT_EQ(lrRate["remotePort"]["name"], "array7 ctrl-A");
+    EXPECT_EQ(lrRate["before"], 42);
+    EXPECT_EQ(lrRate["after"], 0);
 }
 
 TEST_F(Api, ExplainKnowsKindsStatesAndEpisodes) {
