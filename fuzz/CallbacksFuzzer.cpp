@@ -28,7 +28,7 @@ static constexpr std::size_t sLeastSize(const ZTSScopeEventKind& acrKind) {
 
 static constexpr unsigned scRscnPair = 1 << 8 | 0x20;
 
-/// The agent with the count that its responses are held against.
+/// The agent, with the count that its responses are compared with.
 class ZTCConservation {
 public:
     ZTCConservation(std::uint32_t aAdapters, unsigned aLogCode)

@@ -117,7 +117,7 @@ private:
     std::set<std::uint32_t> mMissing;
 };
 
-/// The changes that were told, held against what a link can do.
+/// Compares the reported changes with what a link can do.
 class ZTCLinkWatch {
 public:
     void noteMessage(std::uint32_t aCode) {

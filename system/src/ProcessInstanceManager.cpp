@@ -15,7 +15,7 @@
 
 namespace {
 
-// Whoever can open the file can hold its lock, and so pass a process off as an agent that runs.
+// A user who can open the file can hold its lock, and so pass a process off as an agent that runs.
 constexpr ::mode_t scPidFileMode = 0600;
 
 // Who looks whether the lock is held takes it for a moment (see sLookUp): one refusal proves nothing.
@@ -235,7 +235,7 @@ void ZTCProcessInstanceManager::exitInstanceManagement() {
     }
     // The next agent may run from here on: what comes to be logged belongs at the end of its file.
     allowLogRotation(false);
-    // The lock goes last: whoever gets it then finds that the file is not at its path any more.
+    // The lock is given up last: the next holder then finds that the file is not at its path any more.
     const ZTCDescriptor lFile(mDescriptor);
     mDescriptor = -1;
     mIsLocked = false;

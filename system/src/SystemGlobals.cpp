@@ -73,7 +73,7 @@ void sRunAlone(ZTCSystem& arSystem) {
         arSystem.systemDaemonize(ZTCString(""), lNull, lNull, lNull);
     }
     arSystem.markAsRunning();
-    // Made here: whoever needs them to end the process must not be the first to ask for them.
+    // Made here: a thread that needs them to end the process must not be the first to ask for them.
     getStopEvent();
     getExitEvent();
     arSystem.startSignalWaiter();

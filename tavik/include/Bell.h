@@ -55,7 +55,7 @@ public:
         ZT_EXIT();
     }
 
-    /// The number of retrievals so far, to be asked for before the bytes held are looked at.
+    /// The number of retrievals so far. Ask for it before you read the bytes held.
     std::uint64_t getRetrievals() const noexcept { return mRetrievals.load(std::memory_order_acquire); }
 
     /// Rings for an event that was refused after so many retrievals, if it is the first since.

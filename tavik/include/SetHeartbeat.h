@@ -1,4 +1,4 @@
-/// Touches a heartbeat file, so that whoever watches it sees that its owner is alive.
+/// Touches a heartbeat file, so that another process can see that its owner is alive.
 #ifndef TAVIK_INCLUDE_SETHEARTBEAT_H
 #define TAVIK_INCLUDE_SETHEARTBEAT_H
 

@@ -18,7 +18,7 @@ extern ZTCTavikSystem* gpTavikSystem;
 /// event that races a stop command may be counted on either side of it.
 extern std::atomic<bool> mDoScopeCollection;
 
-/// Seconds of a collection period. The command that sets one holds nothing against them and stores nothing.
+/// Seconds of a collection period. The command that sets one neither checks nor stores it.
 inline constexpr unsigned int ZT_COLLECTION_PERIOD_MIN = 60;
 inline constexpr unsigned int ZT_COLLECTION_PERIOD_MAX = 65535;
 inline constexpr unsigned int ZT_DEFAULT_COLLECTION_PERIOD = 3600;

@@ -39,7 +39,7 @@ public:
     auto begin() const { return mRecordList.begin(); }
     auto end() const { return mRecordList.end(); }
 
-    /// The number of records, then each record. The board is named by whoever embeds the list.
+    /// The number of records, then each record. The owner of the list names the board.
     void encode(ZTCEncodableOutStream& arStream) const;
 
 private:

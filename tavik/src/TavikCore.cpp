@@ -499,7 +499,7 @@ inline const char* sFindRefusal(unsigned int aBoardId, const char* apBadBoardTex
         return "Ignoring the event as Scope data Collection is not enabled.";
     }
     const char* lpRefusal = nullptr;
-    // Before the total is looked at: a retrieval in between makes the next refusal ring again.
+    // Before the total is read: a retrieval in between makes the next refusal ring again.
     const std::uint64_t lRetrievals = gpTavikSystem->getBell().getRetrievals();
     if (gpTavikSystem->isTotalLimitOnScopeDataReached()) {
         lpRefusal = "Ignoring the event as the limit on the total Event Data";

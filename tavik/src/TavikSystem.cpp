@@ -62,7 +62,7 @@ void sInitGlobals() {
     ZT_EXIT();
 }
 
-/// Whoever can write in the sensor's directory is trusted like the sensor: that should be nobody else.
+/// A user who can write in the sensor's directory is trusted like the sensor. It should be the sensor's user alone.
 void sWarnOfSharedDirectory(const ZTCString& acrPath) {
     ZT_ENTRY();
     // Names are appended to the directory as it stands, so that an empty one is the root.

@@ -6,7 +6,7 @@
 #include <string>
 #include <vector>
 
-/// "ok", or what SQLite says of the database in this directory.
+/// "ok", or what SQLite finds wrong with the database in this directory.
 std::string checkIntegrity(const std::string& acrStateDirectory);
 
 /// As another version of the sensor leaves it.

@@ -13,7 +13,7 @@ namespace {
 constexpr std::int64_t scMostDisk = 2 * 64 * 1024 + 64;
 
 // What the allocator may come to keep when threads meet in new ways; a leak passes it in the course of a long run, and
-// the blocks tell of it in a short one.
+// the blocks show it in a short one.
 constexpr std::int64_t scMostMemoryGrowth = 2048;
 
 std::int64_t sNumberOfEntries(const std::string& acrDirectory) {

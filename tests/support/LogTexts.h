@@ -1,5 +1,5 @@
 /// Every text that the agent can log, in one table: the tests drive each of them and find it in a log that was really
-/// written, and hold the sources against it, so that no text is changed, moved or added unnoticed.
+/// written, and compare the sources with it, so that no text is changed, moved or added unnoticed.
 #ifndef TESTS_SUPPORT_LOGTEXTS_H
 #define TESTS_SUPPORT_LOGTEXTS_H
 

@@ -10,7 +10,7 @@
 ///   adapter NODE PORT                    one more adapter, with these names (16 hex digits each)
 ///   adapters N                           from now on GetNumberOfAdapters says N
 ///   function-list-status S               KPM_GetFunctionList answers S
-///   version V, size S                    what the table of functions says of itself
+///   version V, size S                    the version and size that the table of functions states
 ///   null-entry N                         entry N of the table (0: Init ... 8: KpmUnregEvent) is null
 ///   init-status S                        Init answers S
 ///   ztapi-supported 0|1                  what IsZtapiSupported answers

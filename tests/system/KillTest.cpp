@@ -71,7 +71,7 @@ public:
     }
 
 private:
-    /// Does this, and kills the agent at a random moment meanwhile; what fails for that reason is no failure.
+    /// Does this, and kills the agent at a random moment meanwhile; what fails for that reason does not count.
     template <typename Action>
     void killWithin(unsigned aMilliseconds, Action aAction) {
         const ZTCDeadline lMoment(std::chrono::milliseconds(mrSeed.below(aMilliseconds)));

@@ -179,7 +179,7 @@ TEST(Log, LinesThatCannotBeWrittenGoToStandardErrorAndAreCounted) {
             lWords.begin(), lWords.end(), [](char c) { return c < '0' || c > '9'; }, ' ');
         lIsReported = lIsReported || lWords.find(" " + std::to_string(lLost) + " ") != std::string::npos;
     }
-    EXPECT_TRUE(lIsReported) << "nothing tells of " << lLost << " lines:\n" << readFile(lLater.path());
+    EXPECT_TRUE(lIsReported) << "no line reports that " << lLost << " lines are lost:\n" << readFile(lLater.path());
 }
 
 static const std::uintmax_t sLimit = 64ull * 1024 * 1024;

@@ -27,7 +27,7 @@ public:
     void lock() ZT_ACQUIRE() { OsLockMutex(mMutex); }
     void unlock() ZT_RELEASE() { OsUnlockMutex(mMutex); }
 
-    /// The operating system's mutex, to wait on a conditional with. Whoever uses it holds the lock.
+    /// The operating system's mutex, to wait on a conditional with. The caller holds the lock.
     ZTSOsMutex& getOsMutex() { return mMutex; }
 
 private:

@@ -51,7 +51,7 @@ inline constexpr const char* gcResponseFifoName = "/qrvtvkout.fifo";
 inline constexpr const char* gcAgentPidFileName = "/qrv-tvk.pid";
 inline constexpr const char* gcSensorPidFileName = "/qrv-sn.pid";
 
-/// Whoever acts as the sensor holds a flock on this file while it talks. The agent does not touch it.
+/// The program that acts as the sensor holds a flock on this file while it talks. The agent does not touch it.
 inline constexpr const char* gcSensorLockFileName = "/qrv-sn.lock";
 
 #endif

@@ -49,7 +49,7 @@ struct ZTSSessionEvents {
     std::vector<std::string> mLines;  ///< for the log
 };
 
-/// What the page that an agent left says of its end.
+/// How an agent ended, read from the page that it left.
 ZTSEndedAgent describeEndedAgent(const ZTCPagePointer& acrPage, const std::string& acrPagePath);
 
 class ZTCAgentSession {

@@ -1,5 +1,5 @@
-/// What the agent refused, dropped and was told of as lost within the last 24 hours, out of the pages of one start
-/// after the other. In steps of an hour.
+/// What the agent refused and dropped, and what its library reported as lost, in the last 24 hours: from the pages of
+/// one start after the other. In steps of an hour.
 #ifndef SENSOR_COLLECTOR_INCLUDE_LOSSWINDOW_H
 #define SENSOR_COLLECTOR_INCLUDE_LOSSWINDOW_H
 

@@ -9,7 +9,7 @@
 #include "sensor/collector/include/AgentSession.h"
 #include "sensor/collector/include/SpoolRecovery.h"
 
-/// What the page of an agent that another keeper had started says of its end. Where its keeper vanished, the next one
+/// How an agent of another keeper ended, read from its page. Where its keeper vanished, the next one
 /// ended it without a last retrieval: that is a gap, also where the agent happened to hold nothing.
 static ZTSEndedAgent sDescribe(const ZTCPagePointer& acrPage, const std::string& acrPath) {
     ZTSEndedAgent lAgent = describeEndedAgent(acrPage, acrPath);

@@ -53,7 +53,7 @@ public:
 
     /// Reaps a process that has ended, and forgets it. Returns its wait status; 0 for a stranger's.
     int forget(ZTEWatched aProcess);
-    /// What the page of the agent that was started last says of its end; "running" where it has none.
+    /// How the agent that was started last ended, read from its page; "running" where the page has no end.
     ZTEStatusEnd readEndReason();
 
 private:

@@ -20,7 +20,7 @@ inline constexpr const char* gcSeriesPortsValue = "metrics.remote_ports";
 class ZTCSeriesPorts {
 public:
     ZTCSeriesPorts() = default;
-    /// Reads the stored value: WWPNs with blanks between them. Texts that are no WWPNs are passed over.
+    /// Reads the stored value: WWPNs with blanks between them. It skips texts that are no WWPNs.
     explicit ZTCSeriesPorts(std::string_view aStored);
 
     /// Gives series to the ports of these totals that have none, as far as the limit goes, in the order of their names.

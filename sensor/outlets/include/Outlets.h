@@ -63,7 +63,7 @@ private:
     struct ZTSFedOutlet {
         std::unique_ptr<ZTCChangeOutlet> mpOutlet;
         std::optional<std::uint64_t> mSeq;  ///< the last change that it has; absent: to be read from the history
-        std::uint64_t mTold = 0;            ///< missed changes that it was told of
+        std::uint64_t mTold = 0;            ///< missed changes that it has reported
         std::string mProblem;
     };
 

@@ -110,11 +110,11 @@ public:
 
     /// The topology as it was at a time; absent where none was stored by then, or retention has taken it.
     std::optional<ZTSStoredTopology> readTopology(std::int64_t aTime) const;
-    /// Makes of the topology at `aFrom`, as readTopology() gave it, that at `aTo`, which is not before: in as much time
-    /// as there are changes between the two.
+    /// Turns the topology at `aFrom`, as readTopology() gave it, into the one at `aTo`, which is not before `aFrom`.
+    /// The time it takes grows with the changes between the two.
     void advanceTopology(ZTSStoredTopology& arStored, std::int64_t aFrom, std::int64_t aTo) const;
-    /// What changed later than `aFrom` and not later than `aTo`, by time, then thing and key. What the first scan of
-    /// all found did not appear then, so it is no change.
+    /// What changed later than `aFrom` and not later than `aTo`, by time, then thing and key. What the first
+    /// scan found was there before, so it is not a change.
     std::vector<ZTSTopologyChange> readTopologyChanges(std::int64_t aFrom, std::int64_t aTo) const;
     /// How far counters rose in the minutes from that of `aFrom` to that of `aTo`, by minute: the oldest `aMost`.
     std::vector<ZTSCounterSample> readCounters(std::int64_t aFrom, std::int64_t aTo, std::size_t aMost) const;

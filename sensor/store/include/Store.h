@@ -115,7 +115,7 @@ public:
     bool hasFrame(std::uint64_t aNumber) const;
     /// The highest number of a frame that was ever taken in; 0: none. Needs no transaction.
     std::uint64_t getLastFrame() const;
-    /// Takes a response in: `aBody` without its four bytes of length. A frame that the database has is passed over,
+    /// Takes a response in: `aBody` without its four bytes of length. A frame that the database has is skipped,
     /// with a problem that says so. Bytes that cannot be decoded end the taking in, never the frame's number: all whole
     /// records in front of them are taken in. A response without scope data holds no records. `aIsTorn`: the body may
     /// be cut anywhere.

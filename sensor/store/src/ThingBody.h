@@ -26,7 +26,7 @@ using ZTCThingValues = std::map<std::uint64_t, std::string>;
 /// Every thing of a topology, in no order.
 std::vector<ZTSThing> toThings(const ZTSTopology& acrTopology);
 
-/// Puts a stored thing into a topology. Attributes of a later version are passed over. Throws ZTCStoreDamagedEx for
+/// Puts a stored thing into a topology. It skips attributes of a later version. Throws ZTCStoreDamagedEx for
 /// bytes that end early.
 void addThing(ZTSTopology& arTopology, ZTETopologyThing aThing, const std::string& acrKey,
               std::span<const std::uint8_t> aBody);

@@ -14,7 +14,7 @@ public:
     explicit ZTCHistoryWatch(const std::string& acrStateDirectory);
 
     /// Returns soon after a write, else after a second at most. What is written becomes visible to readers only a
-    /// moment after the kernel has told of it: so the next calls return quickly for a while.
+    /// moment after the kernel has reported it: so the next calls return quickly for a while.
     void wait();
 
     /// Whether the path leads to another database than at the last call; true at the first.

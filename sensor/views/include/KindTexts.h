@@ -19,7 +19,7 @@ struct ZTSKindText {
 /// Reads the sections of a page of this form: "## Title (`kind`)", then paragraphs, of which the one on causes begins
 /// with
 /// "*Usual causes.*", the next with "*Look at.*" and the last with "*The next event of the kind is*". The first of the
-/// others that does not begin with "Category" is the meaning. Headings without a kind are passed over.
+/// others that does not begin with "Category" is the meaning. Headings without a kind are skipped.
 std::vector<ZTSKindText> parseKindTexts(std::string_view aPage);
 
 /// The sections of docs/events.md, in its order.

@@ -1,8 +1,8 @@
-/// What a running sensor says of itself, as the collector sends it and `tavik` reads it.
+/// The state of a running sensor, as the collector sends it and `tavik` reads it.
 ///
 /// The collector answers `{"request":"status"}` on the control socket with one line: the JSON object below. Every
 /// member may be missing or null: it is then not known, which is not the same as zero or empty. A member of a wrong
-/// type counts as not known and is named in `mProblems`. Members that this page does not name are passed over. Times
+/// type counts as not known and is named in `mProblems`. Members that this page does not name are skipped. Times
 /// are texts as of RFC 3339 with an offset and up to six digits of a fraction. WWNs are texts with colons.
 ///
 ///     {"schema": "tavik.live/1", "storeId": "5f…", "now": "2026-11-21T10:04:12.000000+01:00",

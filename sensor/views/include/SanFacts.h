@@ -1,4 +1,4 @@
-/// What a topology says of the host's storage: each logical unit with its paths, and the troubles.
+/// The host's storage as a topology shows it: each logical unit with its paths, and the troubles.
 ///
 /// Pure: it reads topologies, and nothing of this host. A value that is not known makes no trouble.
 #ifndef SENSOR_VIEWS_INCLUDE_SANFACTS_H

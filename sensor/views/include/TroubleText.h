@@ -1,4 +1,4 @@
-/// A trouble with what to say of it, for people. Of Tavik itself, or of the SAN.
+/// A trouble in words, for people. Of Tavik itself, or of the SAN.
 #ifndef SENSOR_VIEWS_INCLUDE_TROUBLETEXT_H
 #define SENSOR_VIEWS_INCLUDE_TROUBLETEXT_H
 

@@ -4,7 +4,7 @@
 #include <map>
 #include <set>
 
-/// Samples that are looked at for one episode.
+/// Most samples that are read for one episode.
 static constexpr std::size_t scMostSamples = 100000;
 
 static const ZTSTopologyInitiator* sFindInitiator(const ZTSTopology& acrTopology, const ZTSInitiator& acrInitiator) {

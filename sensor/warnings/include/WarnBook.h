@@ -73,7 +73,7 @@ public:
 
     /// The open troubles as a text that the next process, or a book with other rules, continues from.
     std::string toText() const;
-    /// Rules that are no longer there lose their troubles. A text that cannot be read is passed over. Returns whether
+    /// Rules that are no longer there lose their troubles. A text that cannot be read is skipped. Returns whether
     /// it could be read.
     bool load(const std::string& acrText);
 

@@ -22,7 +22,7 @@ using ZTCClock = std::chrono::steady_clock;
 /// A stream that nothing is sent on gets a comment this often, so that a reader that has gone is noticed.
 static constexpr std::chrono::seconds scStreamBeat{15};
 
-/// How often deadlines are looked at while there are connections.
+/// How often deadlines are checked while there are connections.
 static constexpr std::chrono::milliseconds scWatchPeriod{250};
 
 /// Headers of every answer. Scripts, styles and requests come from this server alone, and nobody frames its pages.

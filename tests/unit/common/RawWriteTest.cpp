@@ -14,7 +14,7 @@
 
 namespace {
 
-/// In a process of its own: what the signals do by default, whoever started the tests.
+/// In a process of its own: what the signals do by default, whatever started the tests.
 void sHandleByDefault(int aSignal) {
     signal(aSignal, SIG_DFL);
     sigset_t lSignals;

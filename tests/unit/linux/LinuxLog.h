@@ -1,4 +1,4 @@
-/// The agent's end of what the library says of itself: the lines it logs, and the states and losses it reports.
+/// The agent's end of the library's reports: the lines it logs, and the states and losses it reports.
 #ifndef TESTS_UNIT_LINUX_LINUXLOG_H
 #define TESTS_UNIT_LINUX_LINUXLOG_H
 

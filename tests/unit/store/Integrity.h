@@ -11,7 +11,7 @@
 std::string queryText(const std::string& acrPath, const std::string& acrSql);
 std::int64_t queryNumber(const std::string& acrPath, const std::string& acrSql);
 
-/// Expects that the database is sound, and that episodes, counts, totals, ledger and frames tell of the same
+/// Expects that the database is sound, and that episodes, counts, totals, ledger and frames agree on the
 /// occurrences.
 void expectIntegrity(const std::string& acrPath);
 

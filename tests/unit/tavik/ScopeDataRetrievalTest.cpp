@@ -243,7 +243,7 @@ TEST_F(ScopeDataRetrieval, EventsOfABoardThatHasComeBackAreDeliveredAgain) {
 
 TEST_F(ScopeDataRetrieval, TheLibraryIsAskedWithoutTheRecordLockAndEventsThatComeMeanwhileAreDelivered) {
     collect(2);
-    // Whoever holds the lock cannot take it again.
+    // The holder of the lock cannot take it again.
     mLibrary.mBeforeCounted = [] { deliver(kindNamed("prlo"), 1); };
     EXPECT_EQ(std::vector<std::string>{textOf(kindNamed("prlo"))}, retrieve().texts(1));
 }

@@ -38,7 +38,7 @@ const std::map<std::string, ZTSLogMacro>& sMacros() {
         {"ZT_INVARIANT", {"-H-", ZTEMacroSort::Condition}},
         {"ZT_BASE_INVARIANT", {"-H-", ZTEMacroSort::Condition}},
         {"ZT_NEVER_GET_HERE", {"-H-", ZTEMacroSort::Never}},
-        // What the log says of itself: a line object that has its mark, and the format that finishes it.
+        // The log's own parts: a line object that has its mark, and the format that finishes it.
         {"sFinish", {"-W-", ZTEMacroSort::Format}},
         // Those that nothing uses; a first use is to be noticed, as a call of no known text.
         {"ZT_LOG", {"?", ZTEMacroSort::Format}},
