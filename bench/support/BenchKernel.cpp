@@ -76,8 +76,8 @@ ZTCBenchKernel::~ZTCBenchKernel() {
 }
 
 ZTSLinuxOptions ZTCBenchKernel::options() const {
-    // No look at sysfs comes between.
-    return {sCapture(mKernel, "sysfs-online"), {{mDirectory}, {}}, std::chrono::hours(1)};
+    // No look at sysfs comes between, and no outcome waits for sense data.
+    return {sCapture(mKernel, "sysfs-online"), {{mDirectory}, {}, {}, ZTPU_Never}, std::chrono::hours(1)};
 }
 
 std::unique_ptr<ZTCFcEventSource> ZTCBenchKernel::openFcEvents(ZTSFeedProblem& /*arProblem*/) {

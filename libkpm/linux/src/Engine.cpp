@@ -243,12 +243,15 @@ ZTEFeedState ZTCLinuxEngine::getSourceState(std::size_t aKind) const {
     return ZTFS_Working;
 }
 
-ZTSRegistrationAnswer ZTCLinuxEngine::answerRegistration(std::uint32_t /*aBoard*/, std::size_t aKind) {
+ZTSRegistrationAnswer ZTCLinuxEngine::answerRegistration(std::uint32_t aBoard, std::size_t aKind) {
     if (getLinuxSource(aKind) == ZTLSO_None) {
         const bool lIsPerBoard = gcScopeEventKinds[aKind].mRegisteredCategory == 0;
         return {KPM_STATUS_NO_SOURCE, lIsPerBoard ? std::optional(0u) : std::nullopt, false};
     }
-    const ZTEFeedState lState = getSourceState(aKind);
-    const bool lWorks = lState == ZTFS_Working || lState == ZTFS_Resting;
-    return {lWorks ? KPM_STATUS_SUCCESS : KPM_STATUS_NO_RIGHTS, std::nullopt, true};
+    std::uint32_t lState = mReports.getState(aBoard, aKind);
+    if (lState == 0) {
+        // The board has just come: its first report is on its way.
+        lState = makeSourceReport(getSourceState(aKind), std::string()).mState;
+    }
+    return {lState == KPM_STATE_WORKING ? KPM_STATUS_SUCCESS : KPM_STATUS_NO_RIGHTS, std::nullopt, true};
 }

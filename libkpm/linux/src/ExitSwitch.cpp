@@ -5,25 +5,27 @@
 #include <atomic>
 
 // Whoever takes the descriptor out owns it: exit and Close may meet.
-static std::atomic<int> sFile{-1};
+static std::atomic<int> sFiles[ZTXS_Sense + 1] = {-1, -1};
 static std::atomic<bool> sIsPulled{false};
 
-void armLinuxExitSwitch(ZTCLibraryDescriptor aFile) noexcept {
-    const ZTCLibraryDescriptor lBefore(sFile.exchange(aFile.release()));
+void armLinuxExitSwitch(ZTEExitSwitch aEvent, ZTCLibraryDescriptor aFile) noexcept {
+    const ZTCLibraryDescriptor lBefore(sFiles[aEvent].exchange(aFile.release()));
 }
 
-void disarmLinuxExitSwitch() noexcept {
-    const ZTCLibraryDescriptor lFile(sFile.exchange(-1));
+void disarmLinuxExitSwitch(ZTEExitSwitch aEvent) noexcept {
+    const ZTCLibraryDescriptor lFile(sFiles[aEvent].exchange(-1));
 }
 
 void pullLinuxExitSwitch() noexcept {
     // Before the file is used: who switches on and then looks here finds out in time.
     sIsPulled.store(true);
-    const int lFile = sFile.exchange(-1);
-    if (lFile >= 0) {
-        // Not closed: the process ends, and other threads may be opening files.
-        const ssize_t lWritten = ::write(lFile, "0", 1);
-        static_cast<void>(lWritten);
+    for (std::atomic<int>& lrFile : sFiles) {
+        const int lFile = lrFile.exchange(-1);
+        if (lFile >= 0) {
+            // Not closed: the process ends, and other threads may be opening files.
+            const ssize_t lWritten = ::write(lFile, "0", 1);
+            static_cast<void>(lWritten);
+        }
     }
 }
 

@@ -1,17 +1,22 @@
-/// Switches the trace instance off where the process ends with the library open. Exit-time code may run while the
-/// library's threads do: it writes to one file that was opened before, and nothing else.
+/// Switches the trace events off where the process ends with the library open. Exit-time code may run while the
+/// library's threads do: it writes to files that were opened before, and does nothing else.
 #ifndef LIBKPM_LINUX_SRC_EXITSWITCH_H
 #define LIBKPM_LINUX_SRC_EXITSWITCH_H
 
+#include <cstdint>
+
 #include "libkpm/common/include/Descriptor.h"
 
-/// The file to write "0" to at exit. Replaces the one before.
-void armLinuxExitSwitch(ZTCLibraryDescriptor aFile) noexcept;
+/// The events that are switched off.
+enum ZTEExitSwitch : std::uint8_t { ZTXS_Outcomes, ZTXS_Sense };
 
-/// Closes the file, unless the process is already at its exit.
-void disarmLinuxExitSwitch() noexcept;
+/// The event's file, to write "0" to at exit. Replaces the one before.
+void armLinuxExitSwitch(ZTEExitSwitch aEvent, ZTCLibraryDescriptor aFile) noexcept;
 
-/// Writes "0" to the file, if there is one. For exit-time code.
+/// Closes the event's file, unless the process is already at its exit.
+void disarmLinuxExitSwitch(ZTEExitSwitch aEvent) noexcept;
+
+/// Writes "0" to the files there are. For exit-time code.
 void pullLinuxExitSwitch() noexcept;
 
 /// Whether that has happened: what is switched on now stays on.

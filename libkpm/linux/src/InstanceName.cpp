@@ -10,6 +10,7 @@
 #include "libkpm/linux/src/Sysfs.h"
 
 static const char* const scPrefix = "libkpm-linux-";
+static const char* const scSensePrefix = "libkpm-linux-sense-";
 
 /// When a process was started, in the kernel's ticks since boot: field 22 of its stat file.
 static std::optional<std::string> sStartTime(const std::string& acrProcess) {
@@ -28,15 +29,24 @@ static std::optional<std::string> sStartTime(const std::string& acrProcess) {
     return lText->substr(lPlace + 1, lText->find(' ', lPlace + 1) - lPlace - 1);
 }
 
+static std::string sMakeName(const char* apPrefix) {
+    return apPrefix + std::to_string(::getpid()) + "-" + sStartTime("self").value_or("0");
+}
+
 std::string makeTraceInstanceName() {
-    return scPrefix + std::to_string(::getpid()) + "-" + sStartTime("self").value_or("0");
+    return sMakeName(scPrefix);
+}
+
+std::string makeSenseInstanceName() {
+    return sMakeName(scSensePrefix);
 }
 
 bool isTraceInstanceLeftOver(const std::string& acrName) {
     if (!acrName.starts_with(scPrefix)) {
         return false;
     }
-    const std::string lRest = acrName.substr(std::strlen(scPrefix));
+    const std::string lRest =
+        acrName.substr(std::strlen(acrName.starts_with(scSensePrefix) ? scSensePrefix : scPrefix));
     const std::size_t lDash = lRest.find('-');
     const auto lIsNumber = [](std::string_view aText) {
         return !aText.empty() &&

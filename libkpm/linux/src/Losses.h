@@ -12,7 +12,8 @@ enum ZTELinuxLoss : std::uint8_t {
     ZTLO_MissingMessage,    ///< a number was passed over in the count of FC events
     ZTLO_ForeignMessage,    ///< a message that the kernel did not send
     ZTLO_MalformedMessage,  ///< a message that does not parse
-    ZTLO_TraceOverrun,      ///< records that a processor's trace buffer had no place for
+    ZTLO_OutcomeOverrun,    ///< outcomes that a processor's trace buffer had no place for
+    ZTLO_SenseOverrun,      ///< sense data, the same; their outcomes come without
     ZTLO_MalformedRecord,   ///< a trace page or record that does not parse
     ZTLO_Failure            ///< reading failed otherwise, or memory ran out over an event
 };
@@ -24,6 +25,7 @@ inline constexpr std::array<ZTSLossKind, ZTLO_Failure + 1> gcLinuxLosses{
      {"fc-messages-foreign", "FC messages are dropped: the kernel did not send them"},
      {"fc-messages-malformed", "FC messages are dropped: they do not parse"},
      {"scsi-outcomes-lost", "SCSI outcomes are lost: a trace buffer overran"},
+     {"scsi-sense-lost", "times sense data are lost: a trace buffer overran; their check conditions come without"},
      {"trace-records-malformed", "trace records are dropped: they do not parse"},
      {"other", "events are lost: they could not be read or handled"}}};
 

@@ -51,12 +51,18 @@ void ZTCLinuxOutcomeFeed::open() {
         happen(lProblem.mHappening, lProblem.mText);
         return;
     }
-    mPage.resize(mpTrace->getPageLayout().mPageSize);
-    mBuffers.assign(mpTrace->getBufferCount(), Buffer());
     mHostsVersion = mrWatcher.getVersion();
+    addBuffers(mpTrace->getBuffers(), false);
     openProbe();
     mPause.reset();
     happen(ZTFH_Opened);
+}
+
+void ZTCLinuxOutcomeFeed::addBuffers(ZTCTraceBuffers& arBuffers, bool aIsOfProbe) {
+    mPage.resize(std::max(mPage.size(), arBuffers.getPageLayout().mPageSize));
+    for (std::size_t lIndex = 0; lIndex < arBuffers.size(); ++lIndex) {
+        mBuffers.push_back({&arBuffers, lIndex, aIsOfProbe});
+    }
 }
 
 /// Where the trace has no sense data, they come by a probe, if this host grants it.
@@ -66,9 +72,10 @@ void ZTCLinuxOutcomeFeed::openProbe() {
     }
     ZTSFeedProblem lProblem{ZTFH_NotGranted, "the probe is switched off (KPM_LINUX_PROBE=0)"};
     if (mPlace.mProbeUse != ZTPU_Never) {
-        mpProbe = ZTCSenseProbe::open(mpTrace->getPath(), mPlace.mSysfsRoot, mrFiles, lProblem);
+        mpProbe = ZTCSenseProbe::open(mpTrace->getBuffers().getPath(), mPlace.mSysfsRoot, mrFiles, lProblem);
     }
     if (mpProbe != nullptr) {
+        addBuffers(mpProbe->getBuffers(), true);
         mpProbe->watchHosts(mrWatcher.getHosts());
         return;
     }
@@ -76,11 +83,18 @@ void ZTCLinuxOutcomeFeed::openProbe() {
     logLibraryLine(KPM_LOG_WARNING, "check conditions come with " + mSenseProblem);
 }
 
+/// Recording ends, and what was recorded is delivered.
 void ZTCLinuxOutcomeFeed::close() {
-    mBuffers.clear();
+    mpTrace->switchOff();
     if (mpProbe != nullptr) {
         mpProbe->switchOff();
     }
+    try {
+        drain();
+    } catch (const std::exception&) {
+        mrLosses.count(ZTLO_Failure);  // without memory, losses cannot be read
+    }
+    mBuffers.clear();
     mpTrace.reset();
     mpProbe.reset();
     mSenseProblem.clear();
@@ -140,75 +154,78 @@ void ZTCLinuxOutcomeFeed::followHosts() {
 // ---- Reading ----
 
 int ZTCLinuxOutcomeFeed::getDescriptor(std::size_t aBuffer) const {
-    return mBuffers[aBuffer].mState == ZTBS_Resting ? -1 : mpTrace->getDescriptor(aBuffer);
+    const Buffer& lrBuffer = mBuffers[aBuffer];
+    return lrBuffer.mState == ZTBS_Resting ? -1 : lrBuffer.mpBuffers->getDescriptor(lrBuffer.mIndex);
 }
 
 void ZTCLinuxOutcomeFeed::serve() {
-    for (std::size_t lBuffer = 0; lBuffer < mBuffers.size(); ++lBuffer) {
-        if (mBuffers[lBuffer].mState == ZTBS_Ready) {
-            readBuffer(lBuffer);
+    const ZTCSenseMatcher::Clock::time_point lNow = ZTCSenseMatcher::Clock::now();
+    // Before an outcome is given up, sense data are read that no descriptor has told of.
+    const bool lIsLastCall = mMatcher.getNextTime().value_or(lNow + ZTCSenseMatcher::scWait) <= lNow;
+    for (Buffer& lrBuffer : mBuffers) {
+        if (lrBuffer.mState == ZTBS_Ready || (lIsLastCall && lrBuffer.mIsOfProbe)) {
+            readBuffer(lrBuffer);
         }
     }
     if (mpProbe != nullptr) {
-        deliverMatched(mMatcher.take(ZTCSenseMatcher::Clock::now()));
+        deliverMatched(mMatcher.take(lNow));
     }
 }
 
 void ZTCLinuxOutcomeFeed::look() {
     happen(ZTFH_Look);
     noteHosts();
-    for (std::size_t lBuffer = 0; lBuffer < mBuffers.size(); ++lBuffer) {
-        readBuffer(lBuffer);
+    for (Buffer& lrBuffer : mBuffers) {
+        readBuffer(lrBuffer);
         // A buffer that has nothing may be waited for again: what it was left alone for may be over.
-        mBuffers[lBuffer].mState = ZTBS_Waiting;
+        lrBuffer.mState = ZTBS_Waiting;
     }
     readLosses();
 }
 
-void ZTCLinuxOutcomeFeed::stop() {
-    if (mpTrace != nullptr) {
-        mpTrace->switchOff();
-        for (std::size_t lBuffer = 0; lBuffer < mBuffers.size(); ++lBuffer) {
-            do {
-                readBuffer(lBuffer);
-            } while (mBuffers[lBuffer].mState == ZTBS_Ready);
-        }
-        deliverMatched(mMatcher.takeAll());
-        readLosses();
+void ZTCLinuxOutcomeFeed::drain() {
+    for (Buffer& lrBuffer : mBuffers) {
+        do {
+            readBuffer(lrBuffer);
+        } while (lrBuffer.mState == ZTBS_Ready);
     }
-    happen(ZTFH_Stop);
+    deliverMatched(mMatcher.takeAll());
+    readLosses();
 }
 
 /// Leaves the buffer Ready where the limit was reached, Resting where nothing was there.
-void ZTCLinuxOutcomeFeed::readBuffer(std::size_t aBuffer) {
-    Buffer& lrBuffer = mBuffers[aBuffer];
+void ZTCLinuxOutcomeFeed::readBuffer(Buffer& arBuffer) {
     for (unsigned lPages = 0; lPages < scPagesInARound; ++lPages) {
         std::size_t lSize = 0;
-        const ZTETraceRead lRead = mpTrace->read(aBuffer, mPage, lSize);
+        const ZTETraceRead lRead = arBuffer.mpBuffers->read(arBuffer.mIndex, mPage, lSize);
         if (lRead != ZTTR_Page) {
             if (lRead == ZTTR_Failed) {
                 mrLosses.count(ZTLO_Failure);
             }
             // Readable with nothing to read: it would wake the thread again at once.
-            lrBuffer.mState = lRead == ZTTR_Failed || lPages == 0 ? ZTBS_Resting : ZTBS_Waiting;
+            arBuffer.mState = lRead == ZTTR_Failed || lPages == 0 ? ZTBS_Resting : ZTBS_Waiting;
             return;
         }
-        lrBuffer.mHasRecords = true;
-        if (readPage(ZTCByteSpan(mPage).first(lSize))) {
-            lrBuffer.mHasLoss = true;
+        arBuffer.mHasRecords = true;
+        if (readPage(ZTCByteSpan(mPage).first(lSize), arBuffer)) {
+            arBuffer.mHasLoss = true;
         }
     }
-    lrBuffer.mState = ZTBS_Ready;
+    arBuffer.mState = ZTBS_Ready;
 }
 
 /// Whether the page says that records before it are lost.
-bool ZTCLinuxOutcomeFeed::readPage(ZTCByteSpan aPage) {
-    ZTCTracePage lPage(aPage, mpTrace->getPageLayout());
+bool ZTCLinuxOutcomeFeed::readPage(ZTCByteSpan aPage, const Buffer& acrBuffer) {
+    ZTCTracePage lPage(aPage, acrBuffer.mpBuffers->getPageLayout());
     while (const std::optional<ZTCByteSpan> lRecord = lPage.next()) {
         try {
-            readRecord(*lRecord, lPage.getTime());
+            if (acrBuffer.mIsOfProbe) {
+                readSense(*lRecord, lPage.getTime());
+            } else {
+                readOutcome(*lRecord, lPage.getTime());
+            }
         } catch (const std::exception&) {
-            // Memory has run out over one outcome: the others of the page may fare better.
+            // Memory has run out over one record: the others of the page may fare better.
             mrLosses.count(ZTLO_Failure);
         }
     }
@@ -218,40 +235,47 @@ bool ZTCLinuxOutcomeFeed::readPage(ZTCByteSpan aPage) {
     return lPage.hasLossBefore();
 }
 
-void ZTCLinuxOutcomeFeed::readRecord(ZTCByteSpan aRecord, std::uint64_t aTime) {
+void ZTCLinuxOutcomeFeed::readOutcome(ZTCByteSpan aRecord, std::uint64_t aTime) {
     const ZTSScsiDoneLayout& lrLayout = mpTrace->getRecordLayout();
     const std::optional<std::uint32_t> lId = getTraceRecordId(aRecord, lrLayout);
-    if (mpProbe != nullptr && lId == mpProbe->getLayout().mId) {
-        if (const std::optional<ZTSSenseRecord> lSense = parseSenseRecord(aRecord, mpProbe->getLayout())) {
-            mMatcher.addSense(*lSense, aTime, ZTCSenseMatcher::Clock::now());
-        } else {
-            mrLosses.count(ZTLO_MalformedRecord);
-        }
-        return;
-    }
     if (lId && *lId != lrLayout.mId) {
         return;
     }
     std::optional<ZTSScsiOutcome> lOutcome = lId ? parseScsiOutcome(aRecord, lrLayout) : std::nullopt;
     if (!lOutcome) {
         mrLosses.count(ZTLO_MalformedRecord);
-    } else if (mpProbe != nullptr && lOutcome->mStatus == ZTLSS_CheckCondition) {
-        // What the trace itself says, where it says it, does not count while the probe is in use.
-        lOutcome->mSenseKey = lOutcome->mAsc = lOutcome->mAscq = gcUnknownSense;
-        readCommandTags(aRecord, lrLayout, *lOutcome);
-        bool lWaits = false;
-        try {
-            mMatcher.addOutcome(*lOutcome, aTime, ZTCSenseMatcher::Clock::now());
-            lWaits = true;
-        } catch (const std::bad_alloc&) {
-            lWaits = false;  // no memory to wait in: delivered at once, without its sense data
-        }
-        if (!lWaits) {
-            handle(*lOutcome);
-        }
-    } else {
+        return;
+    }
+    if (mpProbe == nullptr || lOutcome->mStatus != ZTLSS_CheckCondition) {
+        handle(*lOutcome);
+        return;
+    }
+    // What the trace itself says, where it says it, does not count while the probe is in use.
+    lOutcome->mSenseKey = lOutcome->mAsc = lOutcome->mAscq = gcUnknownSense;
+    readCommandTags(aRecord, lrLayout, *lOutcome);
+    bool lWaits = false;
+    try {
+        mMatcher.addOutcome(*lOutcome, aTime, ZTCSenseMatcher::Clock::now());
+        lWaits = true;
+    } catch (const std::bad_alloc&) {
+        lWaits = false;  // no memory to wait in: delivered at once, without its sense data
+    }
+    if (!lWaits) {
         handle(*lOutcome);
     }
+}
+
+void ZTCLinuxOutcomeFeed::readSense(ZTCByteSpan aRecord, std::uint64_t aTime) {
+    const std::optional<std::uint32_t> lId = getTraceRecordId(aRecord, mpTrace->getRecordLayout());
+    if (lId && *lId != mpProbe->getLayout().mId) {
+        return;
+    }
+    const std::optional<ZTSSenseRecord> lSense = lId ? parseSenseRecord(aRecord, mpProbe->getLayout()) : std::nullopt;
+    if (!lSense) {
+        mrLosses.count(ZTLO_MalformedRecord);
+        return;
+    }
+    mMatcher.addSense(*lSense, aTime, ZTCSenseMatcher::Clock::now());
 }
 
 void ZTCLinuxOutcomeFeed::deliverMatched(const std::vector<ZTSScsiOutcome>& acrOutcomes) {
@@ -266,10 +290,10 @@ void ZTCLinuxOutcomeFeed::deliverMatched(const std::vector<ZTSScsiOutcome>& acrO
 
 /// A buffer that nothing came from has lost nothing either: the newest records are kept.
 void ZTCLinuxOutcomeFeed::readLosses() {
-    for (std::size_t lBuffer = 0; lBuffer < mBuffers.size(); ++lBuffer) {
-        Buffer& lrBuffer = mBuffers[lBuffer];
+    for (Buffer& lrBuffer : mBuffers) {
         if (lrBuffer.mHasRecords) {
-            mrLosses.count(ZTLO_TraceOverrun, mpTrace->takeLosses(lBuffer).value_or(lrBuffer.mHasLoss ? 1 : 0));
+            mrLosses.count(lrBuffer.mIsOfProbe ? ZTLO_SenseOverrun : ZTLO_OutcomeOverrun,
+                           lrBuffer.mpBuffers->takeLosses(lrBuffer.mIndex).value_or(lrBuffer.mHasLoss ? 1 : 0));
             lrBuffer.mHasRecords = false;
             lrBuffer.mHasLoss = false;
         }

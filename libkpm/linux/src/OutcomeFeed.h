@@ -1,5 +1,6 @@
 /// Outcomes of SCSI commands: opens the trace instance, keeps its filter at the hosts there are, reads its buffers, and
-/// delivers queue full, device busy and check condition. Opened, lost, retried and told by itself.
+/// delivers queue full, device busy and check condition. Where sense data come by a probe, its buffers are read too.
+/// Opened, lost, retried and told by itself.
 ///
 /// Used by the library's thread alone (and by start(), before there is one), save for getState().get().
 #ifndef LIBKPM_LINUX_SRC_OUTCOMEFEED_H
@@ -48,7 +49,7 @@ public:
     void look();
 
     /// The library is closing: recording ends, and what is left in the buffers is delivered.
-    void stop();
+    void stop() { happen(ZTFH_Stop); }
 
     /// When an outcome has waited long enough for its sense data; nothing where none waits.
     std::optional<std::chrono::steady_clock::time_point> getNextTime() const { return mMatcher.getNextTime(); }
@@ -73,6 +74,9 @@ private:
     };
 
     struct Buffer {
+        ZTCTraceBuffers* mpBuffers;  // of the trace instance, or of the probe
+        std::size_t mIndex;          // among those
+        bool mIsOfProbe;
         ZTEBufferState mState = ZTBS_Waiting;
         bool mHasRecords = false;  ///< was read from since its losses were looked at
         bool mHasLoss = false;     ///< a page said so since then
@@ -81,11 +85,14 @@ private:
     void happen(ZTEFeedHappening aHappening, const std::string& acrReason = std::string());
     void open();
     void close();
+    void drain();
     void tell() const;
     void followHosts();
-    void readBuffer(std::size_t aBuffer);
-    bool readPage(ZTCByteSpan aPage);
-    void readRecord(ZTCByteSpan aRecord, std::uint64_t aTime);
+    void addBuffers(ZTCTraceBuffers& arBuffers, bool aIsOfProbe);
+    void readBuffer(Buffer& arBuffer);
+    bool readPage(ZTCByteSpan aPage, const Buffer& acrBuffer);
+    void readOutcome(ZTCByteSpan aRecord, std::uint64_t aTime);
+    void readSense(ZTCByteSpan aRecord, std::uint64_t aTime);
     void openProbe();
     void deliverMatched(const std::vector<ZTSScsiOutcome>& acrOutcomes);
     void readLosses();
@@ -102,7 +109,7 @@ private:
     // Used by the library's thread alone.
     ZTCFeedState mState;
     ZTCRetryPause mPause;
-    std::unique_ptr<ZTCSenseProbe> mpProbe;     // where sense data come by it; closed after the instance
+    std::unique_ptr<ZTCSenseProbe> mpProbe;     // where sense data come by it
     std::unique_ptr<ZTCTraceInstance> mpTrace;  // set while the state is Working
     ZTCSenseMatcher mMatcher;                   // check conditions that wait for their sense data
     std::vector<Buffer> mBuffers;

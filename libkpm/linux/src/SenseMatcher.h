@@ -23,7 +23,7 @@ public:
 
     /// How long an outcome waits. Longer than a completion takes to move to another processor and its record to be
     /// read.
-    static constexpr std::chrono::milliseconds scWait{200};
+    static constexpr std::chrono::milliseconds scWait{1000};
 
     /// With more outcomes than this, the oldest of each command do not wait any longer.
     static constexpr std::size_t scMostHeld = 16384;

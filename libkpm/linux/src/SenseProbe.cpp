@@ -1,18 +1,20 @@
 #include "libkpm/linux/src/SenseProbe.h"
 
+#include <fcntl.h>
+#include <sys/stat.h>
+
 #include <algorithm>
 #include <cerrno>
 #include <cstring>
 #include <exception>
-#include <filesystem>
 #include <optional>
 #include <utility>
 
 #include "libkpm/common/include/AgentLink.h"
+#include "libkpm/linux/src/ExitSwitch.h"
 #include "libkpm/linux/src/InstanceName.h"
 #include "libkpm/linux/src/Sysfs.h"
 
-static constexpr std::size_t scMostDescription = 65536;
 static constexpr std::size_t scMostTypes = std::size_t{64} * 1024 * 1024;
 
 // How a probe names a function's first argument: the general form, and for older kernels the register's name.
@@ -36,6 +38,11 @@ static std::string sGroupOf(std::string aInstanceName) {
     return aInstanceName;
 }
 
+/// Where the files of a group's event are in an instance.
+static std::string sEventOf(const std::string& acrGroup) {
+    return "events/" + acrGroup + "/" + gcSenseEvent;
+}
+
 static ZTSFeedProblem sProblem(const std::string& acrWhat, int aError) {
     ZTSFeedProblem lProblem{judgeFeedError(aError), acrWhat + ": " + std::strerror(aError)};
     if (lProblem.mHappening == ZTFH_NotGranted) {
@@ -46,35 +53,46 @@ static ZTSFeedProblem sProblem(const std::string& acrWhat, int aError) {
     return lProblem;
 }
 
-/// The root of tracefs that an instance is of. By its name alone: the instance is gone when the probe is removed.
-static std::string sRootOf(const std::string& acrInstance) {
-    std::filesystem::path lPath(acrInstance);
-    if (!lPath.has_filename()) {
-        lPath = lPath.parent_path();
+static std::unique_ptr<ZTCTraceBuffers> sOpenBuffers(const std::string& acrOutcomes, ZTCTraceFiles& arFiles,
+                                                     ZTSFeedProblem& arProblem) {
+    const std::string lPrepared = acrOutcomes + "-sense";
+    struct stat lStatus {};
+    if (::stat(lPrepared.c_str(), &lStatus) == 0) {
+        return ZTCTraceBuffers::open(lPrepared, ZTTO_Prepared, arFiles, arProblem);
     }
-    return lPath.parent_path().parent_path().string();
+    const std::string lOwn = getParentDirectory(acrOutcomes) + "/" + makeSenseInstanceName();
+    return ZTCTraceBuffers::open(lOwn, ZTTO_Library, arFiles, arProblem);
 }
 
-ZTCSenseProbe::ZTCSenseProbe(const std::string& acrInstance, const std::string& acrGroup, ZTCTraceFiles& arFiles)
-    : mGroup(acrGroup),
-      mDefinitions(sRootOf(acrInstance) + "/kprobe_events"),
+ZTCSenseProbe::ZTCSenseProbe(std::unique_ptr<ZTCTraceBuffers> apBuffers, const std::string& acrGroup,
+                             ZTCTraceFiles& arFiles)
+    : mpBuffers(std::move(apBuffers)),
+      mGroup(acrGroup),
+      mDefinitions(getParentDirectory(getParentDirectory(mpBuffers->getPath())) + "/kprobe_events"),
       mRemoval("-:" + acrGroup + "/" + gcSenseEvent + "\n"),
-      mEventPath(acrInstance + "/events/" + acrGroup + "/" + gcSenseEvent),
+      mEventPath(mpBuffers->getPath() + "/" + sEventOf(acrGroup)),
       mEnablePath(mEventPath + "/enable"),
       mrFiles(arFiles) {}
 
-std::unique_ptr<ZTCSenseProbe> ZTCSenseProbe::open(const std::string& acrInstance, const std::string& acrSysfsRoot,
+std::unique_ptr<ZTCSenseProbe> ZTCSenseProbe::open(const std::string& acrOutcomes, const std::string& acrSysfsRoot,
                                                    ZTCTraceFiles& arFiles, ZTSFeedProblem& arProblem) {
-    std::unique_ptr<ZTCSenseProbe> lpPrepared(new ZTCSenseProbe(acrInstance, gcPreparedSenseGroup, arFiles));
-    if (readSmallFile(lpPrepared->mEventPath + "/format", scMostDescription)) {
-        return lpPrepared->switchOn(arProblem) ? std::move(lpPrepared) : nullptr;
+    std::unique_ptr<ZTCTraceBuffers> lpBuffers = sOpenBuffers(acrOutcomes, arFiles, arProblem);
+    if (lpBuffers == nullptr) {
+        return nullptr;
     }
-    std::unique_ptr<ZTCSenseProbe> lpOwn(new ZTCSenseProbe(acrInstance, sGroupOf(makeTraceInstanceName()), arFiles));
-    return lpOwn->define(acrSysfsRoot, arProblem) && lpOwn->switchOn(arProblem) ? std::move(lpOwn) : nullptr;
+    const std::string lFormat = lpBuffers->getPath() + "/" + sEventOf(gcPreparedSenseGroup) + "/format";
+    const bool lIsDefined = readSmallFile(lFormat, gcMostTraceDescription).has_value();
+    const std::string lGroup = lIsDefined ? gcPreparedSenseGroup : sGroupOf(makeTraceInstanceName());
+    std::unique_ptr<ZTCSenseProbe> lpProbe(new ZTCSenseProbe(std::move(lpBuffers), lGroup, arFiles));
+    const bool lIsThere = lIsDefined || lpProbe->define(acrSysfsRoot, arProblem);
+    return lIsThere && lpProbe->switchOn(arProblem) ? std::move(lpProbe) : nullptr;
 }
 
 ZTCSenseProbe::~ZTCSenseProbe() {
     switchOff();
+    disarmLinuxExitSwitch(ZTXS_Sense);
+    // The kernel keeps a probe that has open files in an instance.
+    mpBuffers.reset();
     const int lError = mIsOwn ? mrFiles.append(mDefinitions, mRemoval) : 0;
     if (lError == 0) {
         return;
@@ -129,7 +147,7 @@ bool ZTCSenseProbe::define(const std::string& acrSysfsRoot, ZTSFeedProblem& arPr
 }
 
 bool ZTCSenseProbe::switchOn(ZTSFeedProblem& arProblem) {
-    const std::optional<std::string> lFormat = readSmallFile(mEventPath + "/format", scMostDescription);
+    const std::optional<std::string> lFormat = readSmallFile(mEventPath + "/format", gcMostTraceDescription);
     if (!lFormat) {
         arProblem = {ZTFH_Broken, "the format of the probe's event cannot be read"};
         return false;
@@ -140,9 +158,14 @@ bool ZTCSenseProbe::switchOn(ZTSFeedProblem& arProblem) {
         return false;
     }
     mLayout = std::get<ZTSSenseLayout>(lLayout);
+    armLinuxExitSwitch(ZTXS_Sense,
+                       ZTCLibraryDescriptor(::open(mEnablePath.c_str(), O_WRONLY | O_CLOEXEC | O_NONBLOCK | O_NOCTTY)));
     if (const int lError = mrFiles.write(mEnablePath, "1"); lError != 0) {
         arProblem = sProblem("the probe for them cannot be switched on", lError);
         return false;
+    }
+    if (isLinuxExitSwitchPulled()) {
+        switchOff();
     }
     return true;
 }
@@ -151,17 +174,21 @@ void ZTCSenseProbe::watchHosts(const std::vector<std::uint32_t>& acrHosts) {
     mrFiles.write(mEventPath + "/filter", acrHosts.empty() ? std::string("0") : makeSenseFilter(acrHosts));
 }
 
-void removeLeftOverProbes(const std::string& acrTracefsRoot, ZTCTraceFiles& arFiles) {
+void removeLeftOverProbes(const std::string& acrInstances, ZTCTraceFiles& arFiles) {
     const std::string lPrefix = std::string(gcPreparedSenseGroup) + "_";
-    const std::vector<std::string> lNames =
-        listDirectory(acrTracefsRoot + "/events").value_or(std::vector<std::string>());
+    const std::string lRoot = getParentDirectory(acrInstances);
+    const std::vector<std::string> lNames = listDirectory(lRoot + "/events").value_or(std::vector<std::string>());
     for (const std::string& lrName : lNames) {
         std::string lInstance = lrName;
         std::replace(lInstance.begin(), lInstance.end(), '_', '-');
         if (!lrName.starts_with(lPrefix) || !isTraceInstanceLeftOver(lInstance)) {
             continue;
         }
-        const int lError = arFiles.append(acrTracefsRoot + "/kprobe_events", "-:" + lrName + "/" + gcSenseEvent + "\n");
+        // The killed run's own instance is gone before, and in a prepared one the probe may still be on.
+        for (const std::string& lrOther : listDirectory(acrInstances).value_or(std::vector<std::string>())) {
+            arFiles.write(acrInstances + "/" + lrOther + "/" + sEventOf(lrName) + "/enable", "0");
+        }
+        const int lError = arFiles.append(lRoot + "/kprobe_events", "-:" + lrName + "/" + gcSenseEvent + "\n");
         logLibraryLine(lError == 0 ? KPM_LOG_NOTICE : KPM_LOG_WARNING,
                        lError == 0
                            ? "removed the probe " + lrName + ", which a killed run has left"

@@ -1,5 +1,8 @@
-/// The probe for sense data in the library's trace instance: defined by the library and removed by it, or used as an
-/// administrator has defined it. Nobody else's probes are touched.
+/// The probe for sense data: defined by the library and removed by it, or used as an administrator has defined it.
+/// Nobody else's probes are touched.
+///
+/// Its records come in a trace instance of their own. In the instance of finished commands, a lost record could be of
+/// either kind, and nobody could say how many commands were lost.
 #ifndef LIBKPM_LINUX_SRC_SENSEPROBE_H
 #define LIBKPM_LINUX_SRC_SENSEPROBE_H
 
@@ -11,6 +14,7 @@
 
 #include "libkpm/linux/src/FeedState.h"
 #include "libkpm/linux/src/SenseData.h"
+#include "libkpm/linux/src/TraceBuffers.h"
 #include "libkpm/linux/src/TraceFiles.h"
 
 /// The group in which an administrator defines the probe for the library.
@@ -23,12 +27,14 @@ std::variant<std::string, ZTSTraceProblem> readSenseProbe(const std::string& acr
 /// One thread at a time.
 class ZTCSenseProbe {
 public:
-    /// Finds or defines the probe and switches its event on in the instance. Null, with the reason in `arProblem`,
-    /// where that cannot be done. `arFiles` outlives the probe, and the instance is removed before it.
-    static std::unique_ptr<ZTCSenseProbe> open(const std::string& acrInstance, const std::string& acrSysfsRoot,
+    /// Makes the instance, finds or defines the probe, and switches its event on. `acrOutcomes` is the instance of
+    /// finished commands: the new one is beside it. Where that name with "-sense" behind it is there, it was prepared
+    /// for this, and is used and stays. Null, with the reason in `arProblem`, where that cannot be done. `arFiles`
+    /// outlives the probe.
+    static std::unique_ptr<ZTCSenseProbe> open(const std::string& acrOutcomes, const std::string& acrSysfsRoot,
                                                ZTCTraceFiles& arFiles, ZTSFeedProblem& arProblem);
 
-    /// Removes the definition, if the library has made it.
+    /// Removes the instance and the definition, if the library has made them.
     ~ZTCSenseProbe();
     ZTCSenseProbe(const ZTCSenseProbe&) = delete;
     ZTCSenseProbe& operator=(const ZTCSenseProbe&) = delete;
@@ -42,12 +48,16 @@ public:
 
     const ZTSSenseLayout& getLayout() const { return mLayout; }
 
+    /// Where the records come.
+    ZTCTraceBuffers& getBuffers() { return *mpBuffers; }
+
 private:
-    ZTCSenseProbe(const std::string& acrInstance, const std::string& acrGroup, ZTCTraceFiles& arFiles);
+    ZTCSenseProbe(std::unique_ptr<ZTCTraceBuffers> apBuffers, const std::string& acrGroup, ZTCTraceFiles& arFiles);
 
     bool define(const std::string& acrSysfsRoot, ZTSFeedProblem& arProblem);
     bool switchOn(ZTSFeedProblem& arProblem);
 
+    std::unique_ptr<ZTCTraceBuffers> mpBuffers;
     const std::string mGroup;
     const std::string mDefinitions;  // the kernel's file of everybody's probes
     const std::string mRemoval;      // the line that removes this one
@@ -58,7 +68,7 @@ private:
     ZTSSenseLayout mLayout;
 };
 
-/// Removes the probes that killed runs have left below this root of tracefs. Their instances are gone before.
-void removeLeftOverProbes(const std::string& acrTracefsRoot, ZTCTraceFiles& arFiles);
+/// Removes the probes that killed runs have left in the tracefs that this directory of instances is of.
+void removeLeftOverProbes(const std::string& acrInstances, ZTCTraceFiles& arFiles);
 
 #endif

@@ -21,9 +21,9 @@ int main(int aArgc, char** appArgv) {
         std::printf("-:%s/%s\n", gcPreparedSenseGroup, gcSenseEvent);
         return 0;
     }
-    static constexpr std::size_t scMostDescription = 65536;
     const std::string lFormat =
-        readSmallFile("/sys/kernel/tracing/events/scsi/scsi_dispatch_cmd_done/format", scMostDescription).value_or("");
+        readSmallFile("/sys/kernel/tracing/events/scsi/scsi_dispatch_cmd_done/format", gcMostTraceDescription)
+            .value_or("");
     const auto lDone = makeScsiDoneLayout(parseTraceFormat(lFormat));
     const auto* lpDone = std::get_if<ZTSScsiDoneLayout>(&lDone);
     if (lpDone != nullptr && lpDone->hasSense()) {

@@ -22,14 +22,23 @@ ZTSSourceReport makeSourceReport(ZTEFeedState aState, const std::string& acrReas
 
 void ZTCSourceReports::update(std::uint32_t aBoard, const ZTCSourceRow& acrRow) {
     if (aBoard >= mRows.size()) {
+        const std::lock_guard<std::mutex> lGuard(mLock);
         mRows.resize(aBoard + std::size_t{1});
     }
     for (std::size_t lKind = 0; lKind < acrRow.size(); ++lKind) {
         if (mRows[aBoard][lKind] == acrRow[lKind]) {
             continue;
         }
-        mRows[aBoard][lKind] = acrRow[lKind];
+        {
+            const std::lock_guard<std::mutex> lGuard(mLock);
+            mRows[aBoard][lKind] = acrRow[lKind];
+        }
         reportLibraryState(aBoard, gcScopeEventKinds[lKind].mDeliveredCategory,
                            gcScopeEventKinds[lKind].mDeliveredSubcategory, acrRow[lKind].mState, acrRow[lKind].mReason);
     }
+}
+
+std::uint32_t ZTCSourceReports::getState(std::uint32_t aBoard, std::size_t aKind) const {
+    const std::lock_guard<std::mutex> lGuard(mLock);
+    return aBoard < mRows.size() ? mRows[aBoard].at(aKind).mState : 0;
 }

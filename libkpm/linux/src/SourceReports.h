@@ -1,9 +1,12 @@
 /// What the agent is told of each kind's source on each board: reported when a board is found, and on every change.
+/// Registrations are answered by the same states.
 #ifndef LIBKPM_LINUX_SRC_SOURCEREPORTS_H
 #define LIBKPM_LINUX_SRC_SOURCEREPORTS_H
 
 #include <array>
+#include <cstddef>
 #include <cstdint>
+#include <mutex>
 #include <string>
 #include <vector>
 
@@ -24,7 +27,7 @@ using ZTCSourceRow = std::array<ZTSSourceReport, gcLinuxKindCount>;
 /// The report of a feed in this state. A source that waits for its first look counts as failed.
 ZTSSourceReport makeSourceReport(ZTEFeedState aState, const std::string& acrReason);
 
-/// Used by one thread at a time.
+/// Used by one thread at a time, save for getState.
 class ZTCSourceReports {
 public:
     /// Counts of changes of everything that reports are made of.
@@ -37,9 +40,14 @@ public:
     /// Reports what differs from the board's last row.
     void update(std::uint32_t aBoard, const ZTCSourceRow& acrRow);
 
+    /// The state that was reported last (KPM_STATE_...); 0: none was. From any thread.
+    std::uint32_t getState(std::uint32_t aBoard, std::size_t aKind) const;
+
 private:
     Moment mMoment{};
-    std::vector<ZTCSourceRow> mRows;  // by board, as reported last
+
+    mutable std::mutex mLock;
+    std::vector<ZTCSourceRow> mRows;  // by board, as reported last; written with mLock held, read by others with it
 };
 
 #endif

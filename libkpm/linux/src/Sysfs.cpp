@@ -7,6 +7,7 @@
 
 #include <algorithm>
 #include <cerrno>
+#include <filesystem>
 #include <memory>
 
 #include "libkpm/common/include/Descriptor.h"
@@ -30,6 +31,7 @@ std::optional<std::string> readSmallFile(const std::string& acrPath, std::size_t
             return lText;
         }
         if (static_cast<std::size_t>(lRead) > aLimit - lText.size()) {
+            errno = EFBIG;
             return std::nullopt;
         }
         lText.append(lBlock, static_cast<std::size_t>(lRead));
@@ -55,6 +57,14 @@ std::optional<std::vector<std::string>> listDirectory(const std::string& acrPath
             lNames.emplace_back(lpEntry->d_name);
         }
     }
+}
+
+std::string getParentDirectory(const std::string& acrPath) {
+    std::filesystem::path lPath(acrPath);
+    if (!lPath.has_filename()) {
+        lPath = lPath.parent_path();
+    }
+    return lPath.parent_path().string();
 }
 
 static std::string sHostDirectory(std::uint32_t aHost) {

@@ -14,12 +14,16 @@
 #include "libkpm/linux/src/Boards.h"
 #include "libkpm/linux/src/SysfsText.h"
 
-/// The content of a small file; nothing where it cannot be read at once or is longer than `aLimit`.
+/// The content of a small file; nothing, with the reason in errno, where it cannot be read at once or is longer than
+/// `aLimit`.
 std::optional<std::string> readSmallFile(const std::string& acrPath, std::size_t aLimit);
 
 /// The names in a directory, without those that begin with a dot, in no order. None where there is no such directory;
 /// nothing where it cannot be read, as with descriptors or memory short.
 std::optional<std::vector<std::string>> listDirectory(const std::string& acrPath);
+
+/// The directory that a path's last name is in. By the text alone: the path need not be there.
+std::string getParentDirectory(const std::string& acrPath);
 
 class ZTCSysfs {
 public:

@@ -32,6 +32,9 @@ ZTSTraceFormat parseTraceFormat(std::string_view aText);
 /// No field of an event lies behind this, and no page is longer.
 inline constexpr std::size_t gcMostTraceOffset = std::size_t{1024} * 1024;
 
+/// A description of tracefs that is longer than this, in bytes, is not read.
+inline constexpr std::size_t gcMostTraceDescription = 65536;
+
 /// Where a field is in a record. A size of 0 means that the kernel has no such field.
 struct ZTSTraceFieldPlace {
     std::size_t mOffset = 0;

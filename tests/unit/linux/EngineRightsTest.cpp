@@ -99,6 +99,27 @@ TEST_F(LinuxEngine, AFilterThatFailsOnceKeepsTheOldOneAndIsTriedAgain) {
     EXPECT_EQ(mRecorder.waitFor(2).back(), "0 queue-full 0 0");
 }
 
+TEST_F(LinuxEngine, ARegistrationForABoardThatTheKeptFilterLeavesOutIsAnsweredWithAStatusUntilItIsNamed) {
+    mKernel.addHost(0);
+    start();
+    mKernel.refuseWrites("filter", "host_no <= 1", ENOMEM);
+    mKernel.addHost(1);
+    waitUntil([&] { return mLog.source(1, 4, 4).starts_with("failed (the filter of the trace event"); }, "the report");
+    for (const std::uint32_t lSubcategory : {0x01u, 0x02u, 0x04u}) {
+        EXPECT_EQ(registerPort(1, portName(2), 4, lSubcategory), KPM_STATUS_NO_RIGHTS) << lSubcategory;
+        EXPECT_NE(mHandle, 0u);
+        EXPECT_EQ(registerPort(0, portName(1), 4, lSubcategory), KPM_STATUS_SUCCESS) << lSubcategory;
+    }
+    EXPECT_EQ(registerPort(1, portName(2), 4, 0x40), KPM_STATUS_SUCCESS) << "queue depths have another source";
+    EXPECT_EQ(registerPort(1, portName(2), 16, 1), KPM_STATUS_SUCCESS);
+    mKernel.allowWrites();
+    waitUntil([&] { return mLog.source(1, 4, 1) == "working"; }, "the report of the new filter");
+    EXPECT_EQ(registerPort(1, portName(2), 4, 1), KPM_STATUS_SUCCESS);
+    mKernel.sendDone({.mHost = 1, .mLun = 3, .mResult = 0x08});
+    waitUntil([&] { return mRecorder.events().back() == "1 device-busy 0 3"; },
+              "the event of the registration that was answered with a status");
+}
+
 TEST_F(LinuxEngine, ABoardWhoseHostIsGoneIsReportedAsFailed) {
     mKernel.addHost(0);
     mKernel.addHost(1);
@@ -109,6 +130,10 @@ TEST_F(LinuxEngine, ABoardWhoseHostIsGoneIsReportedAsFailed) {
     EXPECT_EQ(mLog.source(0, 8, 2), "failed (the board's host is gone)");
     EXPECT_EQ(mLog.source(0, 16, 1), "working");
     EXPECT_EQ(mLog.source(1, 4, 1), "working");
+    waitUntil([&] { return mLog.source(0, 4, 0x40) == "failed (the board's host is gone)"; }, "the last report");
+    EXPECT_EQ(registerPort(0, portName(1), 4, 1), KPM_STATUS_NO_RIGHTS) << "the host may come back";
+    EXPECT_EQ(registerPort(0, portName(1), 16, 1), KPM_STATUS_SUCCESS);
+    EXPECT_EQ(registerPort(1, portName(2), 4, 1), KPM_STATUS_SUCCESS);
 }
 
 TEST_F(LinuxEngine, EveryKindOfEveryBoardIsReportedBeforeTheFirstRegistration) {

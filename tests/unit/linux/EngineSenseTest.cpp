@@ -1,4 +1,5 @@
 #include <algorithm>
+#include <atomic>
 #include <cerrno>
 #include <filesystem>
 
@@ -11,6 +12,14 @@ protected:
     LinuxEngineSense() {
         mKernel.mFormat = doneFormat(false);
         mKernel.addHost(0);
+    }
+
+    /// An instance that somebody has made.
+    std::string prepare(const std::string& acrName) {
+        const std::string lInstance = mKernel.tracefs() + "/instances/" + acrName;
+        std::filesystem::create_directory(lInstance);
+        mKernel.fillInstance(lInstance);
+        return lInstance;
     }
 
     std::string definitions() { return readFile(mKernel.tracefs() + "/kprobe_events"); }
@@ -26,18 +35,16 @@ TEST_F(LinuxEngineSense, TheProbeGivesThemAndEachCheckConditionIsDeliveredOnce) 
     mKernel.addTypes();
     start();
     EXPECT_EQ(mKernel.probes(), std::vector<std::string>{mGroup});
-    EXPECT_EQ(mKernel.instanceFile("events/" + mGroup + "/check_sense/enable"), "1");
-    EXPECT_EQ(mKernel.instanceFile("events/" + mGroup + "/check_sense/filter"), "host == 0");
+    EXPECT_EQ(mKernel.senseFile("events/" + mGroup + "/check_sense/enable"), "1");
+    EXPECT_EQ(mKernel.senseFile("events/" + mGroup + "/check_sense/filter"), "host == 0");
     EXPECT_EQ(mLog.source(0, 4, 4), "working");
     EXPECT_EQ(mLog.count("2 "), 0u) << mLog.all();
     mKernel.sendDone({.mResult = 2, .mDriverTag = 1, .mHasSense = false}, 0);
     mKernel.sendSense({.mDriverTag = 1}, 1);
     EXPECT_EQ(mRecorder.waitFor(1), ZTCTexts{"0 check-condition 0 0 28 5 21 0"});
-    // Read in the other order, from one buffer.
-    mKernel.sendPage(ZTCPageBuilder()
-                         .addShort(ZTSDoneRecord{.mResult = 2, .mDriverTag = 2, .mHasSense = false}.make())
-                         .addShort(ZTSSenseRecordBytes{.mDriverTag = 2, .mAsc = 0x24}.make())
-                         .make());
+    // Sent in the other order.
+    mKernel.sendSense({.mDriverTag = 2, .mAsc = 0x24});
+    mKernel.sendDone({.mResult = 2, .mDriverTag = 2, .mHasSense = false});
     EXPECT_EQ(mRecorder.waitFor(2).back(), "0 check-condition 0 0 28 5 24 0");
     // One without: the other outcomes do not wait for it.
     mKernel.sendDone({.mResult = 2, .mDriverTag = 3, .mHasSense = false});
@@ -132,22 +139,94 @@ TEST_F(LinuxEngineSense, ProbesOfKilledRunsAreRemovedAndNobodyElses) {
     EXPECT_EQ(definitions(), "-:libkpm_linux_999999999_1/check_sense\n") << "nothing but its own line";
 }
 
-TEST_F(LinuxEngineSense, AProbeThatRootHasDefinedIsUsedAndStays) {
-    const std::string lInstance = mKernel.tracefs() + "/instances/ours";
-    std::filesystem::create_directory(lInstance);
-    mKernel.fillInstance(lInstance);
+TEST_F(LinuxEngineSense, AProbeOfAKilledRunIsSwitchedOffInAPreparedInstanceAndRemoved) {
+    const std::string lGroup = "libkpm_linux_999999999_1";
+    const std::string lEnable = prepare("ours-sense") + "/events/" + lGroup + "/check_sense/enable";
+    mKernel.addProbe(lGroup);
+    writeFile(lEnable, "1");
+    start();
+    EXPECT_EQ(readFile(lEnable), "0");
+    EXPECT_EQ(mKernel.probes(), std::vector<std::string>()) << mLog.all();
+}
+
+TEST_F(LinuxEngineSense, AProbeThatRootHasDefinedIsUsedInPreparedInstancesAndAllStay) {
+    const std::string lInstance = prepare("ours");
+    prepare("ours-sense");
     mKernel.addProbe("libkpm_linux");
     mKernel.refuseWrites("kprobe_events", "", EACCES);
+    mKernel.mMakeError = EACCES;
     ZTSLinuxOptions lOptions = mKernel.options();
     lOptions.mTracePlace.mPrepared = lInstance;
     start(lOptions);
     EXPECT_EQ(mLog.count("2 "), 0u) << mLog.all();
+    EXPECT_EQ(mKernel.senseFile("events/libkpm_linux/check_sense/enable"), "1");
+    EXPECT_EQ(mKernel.instanceFile("events/libkpm_linux/check_sense/enable"), "0");
     mKernel.sendDone({.mResult = 2, .mHasSense = false});
     mKernel.sendSense({});
     EXPECT_EQ(mRecorder.waitFor(1), ZTCTexts{"0 check-condition 0 0 28 5 21 0"});
     mpEngine->stop();
     EXPECT_EQ(mKernel.probes(), std::vector<std::string>{"libkpm_linux"});
-    EXPECT_EQ(mKernel.instanceFile("events/libkpm_linux/check_sense/enable"), "0");
+    EXPECT_EQ(mKernel.senseFile("events/libkpm_linux/check_sense/enable"), "0");
+    EXPECT_EQ(mKernel.instances().size(), 2u);
+}
+
+TEST_F(LinuxEngineSense, APreparedInstanceWithoutOneForSenseDataSaysWhatIsMissing) {
+    const std::string lInstance = prepare("ours");
+    mKernel.addTypes();
+    mKernel.mMakeError = EACCES;
+    ZTSLinuxOptions lOptions = mKernel.options();
+    lOptions.mTracePlace.mPrepared = lInstance;
+    start(lOptions);
+    EXPECT_EQ(
+        mLog.count("2 check conditions come with no sense data: this kernel's trace has none, and the trace "
+                   "instance " +
+                   mKernel.tracefs() + "/instances/" + makeSenseInstanceName() + " cannot be made: Permission denied"),
+        1u)
+        << mLog.all();
+    mKernel.sendDone({.mResult = 2, .mHasSense = false});
+    EXPECT_EQ(mRecorder.waitFor(1), ZTCTexts{"0 check-condition 0 0 28 ffffffff ffffffff ffffffff"});
+}
+
+// ---- Losses ----
+
+TEST_F(LinuxEngineSense, LostOutcomesAndLostSenseDataAreCountedApart) {
+    mKernel.addTypes();
+    start();
+    writeFile(mKernel.instance() + "/per_cpu/cpu0/stats", "overrun: 5\n");
+    writeFile(mKernel.senseInstance() + "/per_cpu/cpu0/stats", "overrun: 7\n");
+    // The record of the first one's outcome is lost, and that of the second one's sense data.
+    mKernel.sendSense({.mDriverTag = 1});
+    mKernel.sendDone({.mResult = 2, .mDriverTag = 2, .mHasSense = false});
+    EXPECT_EQ(mRecorder.waitFor(1), ZTCTexts{"0 check-condition 0 0 28 ffffffff ffffffff ffffffff"});
+    waitForLog("2 5 SCSI outcomes are lost: a trace buffer overran (5 since the start)");
+    waitForLog(
+        "2 7 times sense data are lost: a trace buffer overran; their check conditions come without (7 since the "
+        "start)");
+    EXPECT_EQ(mLog.loss("scsi-outcomes-lost"), 5u);
+    EXPECT_EQ(mLog.loss("scsi-sense-lost"), 7u);
+    mpEngine->stop();
+    EXPECT_EQ(mRecorder.count(), 1u);
+}
+
+TEST_F(LinuxEngineSense, WhatWasRecordedBeforeTheOutcomesAreSwitchedOffIsDelivered) {
+    mKernel.addTypes();
+    startWithoutLooks();
+    std::atomic<bool> lMayReturn{false};
+    mRecorder.setHook([&] { waitUntil([&] { return lMayReturn.load(); }, "the test to go on"); });
+    mKernel.sendDone({.mLun = 1, .mResult = 8, .mHasSense = false});
+    waitUntil([&] { return mRecorder.count() == 1; }, "the first");
+    // While that one is delivered, more are recorded, and the next look switches the event off.
+    mKernel.sendDone({.mLun = 2, .mResult = 2, .mHasSense = false});
+    mKernel.sendSense({.mLun = 2});
+    mKernel.sendDone({.mLun = 3, .mResult = 8, .mHasSense = false}, 1);
+    mKernel.refuseWrites("filter", "", EINVAL, 2);
+    mKernel.addHost(1);
+    mKernel.sendFc({.mHost = 1, .mNumber = 1, .mCode = ZTLFC_Rscn, .mData = rscnData(1)});
+    lMayReturn = true;
+    waitForLog("2 no SCSI outcomes: the filter of the trace event");
+    ZTCTexts lEvents = mRecorder.waitFor(4);
+    EXPECT_EQ(std::count(lEvents.begin(), lEvents.end(), "0 check-condition 0 2 28 5 21 0"), 1) << lEvents.size();
+    EXPECT_EQ(std::count(lEvents.begin(), lEvents.end(), "0 device-busy 0 3"), 1);
 }
 
 TEST_F(LinuxEngineSense, WhereTheTraceHasThemTheProbeIsUsedOnlyIfItIsForced) {

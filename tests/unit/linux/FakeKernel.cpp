@@ -176,7 +176,8 @@ int ZTCFakeKernel::make(const std::string& acrPath) {
 }
 
 void ZTCFakeKernel::fillInstance(const std::string& acrPath) {
-    mInstance = acrPath;
+    const bool lIsOfSense = std::filesystem::path(acrPath).filename().string().find("sense") != std::string::npos;
+    (lIsOfSense ? mSense : mInstance) = acrPath;
     const std::string lEvent = acrPath + "/events/scsi/scsi_dispatch_cmd_done";
     std::filesystem::create_directories(lEvent);
     if (!mFormat.empty()) {
@@ -205,7 +206,11 @@ void ZTCFakeKernel::fillInstance(const std::string& acrPath) {
             throw std::runtime_error("a FIFO cannot be made");
         }
         // Open for both, so that the reader never sees an end.
-        mPipes[lProcessor] = ZTCLibraryDescriptor(::open((lBuffer + "/trace_pipe_raw").c_str(), O_RDWR | O_CLOEXEC));
+        mPipes[{acrPath, lProcessor}] =
+            ZTCLibraryDescriptor(::open((lBuffer + "/trace_pipe_raw").c_str(), O_RDWR | O_CLOEXEC));
+    }
+    for (const std::string& lrGroup : probes()) {
+        addProbeTo(acrPath, lrGroup);
     }
 }
 
@@ -236,6 +241,11 @@ void ZTCFakeKernel::refuseWrites(const std::string& acrName, const std::string& 
     mRefusals.push_back({"/" + acrName, acrText, aError, aTimes});
 }
 
+void ZTCFakeKernel::allowWrites() {
+    const std::lock_guard<std::mutex> lGuard(mLock);
+    mRefusals.clear();
+}
+
 /// The error number of a refusal that is meant for this; 0 where there is none.
 int ZTCFakeKernel::refuse(const std::string& acrPath, std::string_view aText) {
     const std::lock_guard<std::mutex> lGuard(mLock);
@@ -261,13 +271,19 @@ int ZTCFakeKernel::write(const std::string& acrPath, std::string_view aText) {
 
 // ---- Dynamic probes ----
 
+void ZTCFakeKernel::addProbeTo(const std::string& acrRoot, const std::string& acrGroup) const {
+    const std::string lEvent = acrRoot + "/events/" + acrGroup + "/check_sense";
+    std::filesystem::create_directories(lEvent);
+    writeFile(lEvent + "/format", mSenseFormat);
+    writeFile(lEvent + "/enable", "0");
+    writeFile(lEvent + "/filter", "none");
+}
+
 void ZTCFakeKernel::addProbe(const std::string& acrGroup) {
-    for (const std::string& lrRoot : {tracefs(), mInstance}) {
-        const std::string lEvent = lrRoot + "/events/" + acrGroup + "/check_sense";
-        std::filesystem::create_directories(lEvent);
-        writeFile(lEvent + "/format", mSenseFormat);
-        writeFile(lEvent + "/enable", "0");
-        writeFile(lEvent + "/filter", "none");
+    for (const std::string& lrRoot : {tracefs(), mInstance, mSense}) {
+        if (!lrRoot.empty() && std::filesystem::exists(lrRoot)) {
+            addProbeTo(lrRoot, acrGroup);
+        }
     }
 }
 
@@ -289,9 +305,11 @@ int ZTCFakeKernel::append(const std::string& acrPath, std::string_view aText) {
         addProbe(lGroup);
         return 0;
     }
-    const std::string lEnable = mInstance + "/events/" + lGroup + "/check_sense/enable";
-    if (std::filesystem::exists(lEnable) && readFile(lEnable) == "1") {
-        return EBUSY;
+    for (const std::string& lrName : instances()) {
+        const std::string lEnable = tracefs() + "/instances/" + lrName + "/events/" + lGroup + "/check_sense/enable";
+        if (std::filesystem::exists(lEnable) && readFile(lEnable) == "1") {
+            return EBUSY;
+        }
     }
     return std::filesystem::remove_all(lRoot) == 0 ? ENOENT : 0;
 }
@@ -307,14 +325,11 @@ void ZTCFakeKernel::addTypes() {
     writeFile(sysfs() + "/kernel/btf/scsi_mod", std::string(lBtf.mModule.begin(), lBtf.mModule.end()));
 }
 
-void ZTCFakeKernel::sendPage(const ZTCBytes& acrPage, unsigned aProcessor) {
-    if (::write(mPipes.at(aProcessor).get(), acrPage.data(), acrPage.size()) != static_cast<ssize_t>(acrPage.size())) {
+void ZTCFakeKernel::sendTo(const std::string& acrInstance, const ZTCBytes& acrPage, unsigned aProcessor) {
+    const int lPipe = mPipes.at({acrInstance, aProcessor}).get();
+    if (::write(lPipe, acrPage.data(), acrPage.size()) != static_cast<ssize_t>(acrPage.size())) {
         throw std::runtime_error("a page cannot be written");
     }
-}
-
-std::string ZTCFakeKernel::instance() const {
-    return mInstance;
 }
 
 std::vector<std::string> ZTCFakeKernel::instances() const {

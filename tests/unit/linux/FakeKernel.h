@@ -71,24 +71,30 @@ public:
     /// From now on, writing or appending a text with this in it to a control file of this name fails with the error
     /// number, so many times.
     void refuseWrites(const std::string& acrName, const std::string& acrText, int aError, unsigned aTimes = ~0u);
+    /// From now on, none fails.
+    void allowWrites();
 
     /// The groups of dynamic probes there are.
     std::vector<std::string> probes() const;
     /// The kernel's description of its types, with the SCSI structures.
     void addTypes();
-    /// Adds the files of a dynamic probe to the root and to the instance.
+    /// Adds the files of a dynamic probe to the root and to the instances that this object has made or filled.
     void addProbe(const std::string& acrGroup);
 
-    /// Writes a page to a processor's buffer.
-    void sendPage(const ZTCBytes& acrPage, unsigned aProcessor = 0);
+    /// Writes a page to a processor's buffer, of the instance of finished commands or of that of sense data.
+    void sendPage(const ZTCBytes& acrPage, unsigned aProcessor = 0) { sendTo(mInstance, acrPage, aProcessor); }
+    void sendSensePage(const ZTCBytes& acrPage, unsigned aProcessor = 0) { sendTo(mSense, acrPage, aProcessor); }
     void sendSense(const ZTSSenseRecordBytes& acrRecord, unsigned aProcessor = 0) {
-        sendPage(ZTCPageBuilder().addShort(acrRecord.make()).make(), aProcessor);
+        sendSensePage(ZTCPageBuilder().addShort(acrRecord.make()).make(), aProcessor);
     }
     void sendDone(const ZTSDoneRecord& acrRecord, unsigned aProcessor = 0) {
         sendPage(ZTCPageBuilder().addShort(acrRecord.make()).make(), aProcessor);
     }
-    std::string instance() const;
-    std::string instanceFile(const std::string& acrName) const { return readFile(instance() + "/" + acrName); }
+    /// The instance of finished commands that was made or filled last, and that of sense data.
+    std::string instance() const { return mInstance; }
+    std::string senseInstance() const { return mSense; }
+    std::string instanceFile(const std::string& acrName) const { return readFile(mInstance + "/" + acrName); }
+    std::string senseFile(const std::string& acrName) const { return readFile(mSense + "/" + acrName); }
     std::vector<std::string> instances() const;
 
     std::atomic<int> mMakeError{0};
@@ -100,12 +106,14 @@ public:
     std::string mStoredPercent{};  ///< what the kernel makes of any buffer_percent; empty: it stores what is written
     bool mHasFilter = true;
 
-    /// The files of an instance in a directory that is there.
+    /// The files of an instance in a directory that is there. One with "sense" in its name is that of sense data.
     void fillInstance(const std::string& acrPath);
 
 private:
     friend class ZTCFakeFcSource;
 
+    void addProbeTo(const std::string& acrRoot, const std::string& acrGroup) const;
+    void sendTo(const std::string& acrInstance, const ZTCBytes& acrPage, unsigned aProcessor);
     int refuse(const std::string& acrPath, std::string_view aText);
     bool isOpenElsewhere(const std::string& acrPath) const;
 
@@ -117,8 +125,9 @@ private:
     };
 
     ZTCTemporaryDirectory mDirectory;
-    std::map<unsigned, ZTCLibraryDescriptor> mPipes;
+    std::map<std::pair<std::string, unsigned>, ZTCLibraryDescriptor> mPipes;  // by instance and processor
     std::string mInstance;
+    std::string mSense;
 
     mutable std::mutex mLock;
     ZTCLibraryDescriptor mFcWake;

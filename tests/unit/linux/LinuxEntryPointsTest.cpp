@@ -118,25 +118,30 @@ TEST_F(LinuxEntryPoints, TheNumberOfAdaptersIsAnsweredWhileACallbackIsHeldUpAndW
     EXPECT_EQ(mrList.Init(), 0u);
 }
 
-/// Exits with 7 where the exit-time code finds the event on and leaves it off.
-static void sExitWithTheEventOn() {
+/// Exits with 7 where the exit-time code finds the events on and leaves them off.
+static void sExitWithTheEventsOn() {
     ZTCFakeKernel& lrKernel = *new ZTCFakeKernel;
+    lrKernel.mFormat = doneFormat(false);
+    lrKernel.addTypes();
     lrKernel.addHost(0);
     ZTCLinuxEngine& lrEngine = *new ZTCLinuxEngine(lrKernel.options(), lrKernel);
     lrEngine.start();
     ZTCLinuxRecorder& lrRecorder = *new ZTCLinuxRecorder;
     lrRecorder.registerAll(lrEngine, 0);
-    lrKernel.sendDone({.mResult = 0x28});
+    lrKernel.sendDone({.mResult = 0x28, .mHasSense = false});
     lrRecorder.waitFor(1);
-    const std::string lEnable = "events/scsi/scsi_dispatch_cmd_done/enable";
-    const bool lWasOn = lrKernel.instanceFile(lEnable) == "1";
+    const auto lStates = [&] {
+        return lrKernel.instanceFile("events/scsi/scsi_dispatch_cmd_done/enable") +
+               lrKernel.senseFile("events/" + lrKernel.probes().at(0) + "/check_sense/enable");
+    };
+    const bool lWasOn = lStates() == "11";
     pullLinuxExitSwitch();
-    const bool lIsOff = lrKernel.instanceFile(lEnable) == "0";
+    const bool lIsOff = lStates() == "00";
     std::filesystem::remove_all(std::filesystem::path(lrKernel.sysfs()).parent_path());
     std::exit(lWasOn && lIsOff ? 7 : 1);
 }
 
-TEST(LinuxEntryPointsDeathTest, AProcessThatExitsWithoutClosingSwitchesTheEventOffAndJoinsNothing) {
+TEST(LinuxEntryPointsDeathTest, AProcessThatExitsWithoutClosingSwitchesTheEventsOffAndJoinsNothing) {
     testing::FLAGS_gtest_death_test_style = "threadsafe";
-    EXPECT_EXIT(sExitWithTheEventOn(), testing::ExitedWithCode(7), "");
+    EXPECT_EXIT(sExitWithTheEventsOn(), testing::ExitedWithCode(7), "");
 }

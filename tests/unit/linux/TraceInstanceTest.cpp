@@ -44,8 +44,8 @@ TEST_F(TraceInstance, IsMadeUnderANameOfThisProcessAndRemovedWithItsOwner) {
         ASSERT_NE(lpInstance, nullptr) << mProblem.mText;
         EXPECT_EQ(mKernel.instances(), std::vector<std::string>{makeTraceInstanceName()});
         EXPECT_TRUE(makeTraceInstanceName().starts_with("libkpm-linux-" + std::to_string(::getpid()) + "-"));
-        EXPECT_EQ(lpInstance->getBufferCount(), 2u);
-        EXPECT_TRUE(lpInstance->wakesAtOnce());
+        EXPECT_EQ(lpInstance->getBuffers().size(), 2u);
+        EXPECT_TRUE(lpInstance->getBuffers().wakesAtOnce());
         EXPECT_EQ(mKernel.instanceFile("buffer_size_kb"), "256");
         EXPECT_EQ(mKernel.instanceFile("buffer_percent"), "0");
         EXPECT_EQ(event("enable"), "0") << "nothing is recorded yet";
@@ -97,12 +97,12 @@ TEST_F(TraceInstance, WhereTheOldFilterCannotBeSetAgainEitherTheEventIsSwitchedO
 
 TEST_F(TraceInstance, ABufferPercentThatTheKernelStoresAsOneDoesNotWakeAtOnce) {
     mKernel.mStoredPercent = "1\n";
-    EXPECT_FALSE(open()->wakesAtOnce());
+    EXPECT_FALSE(open()->getBuffers().wakesAtOnce());
     mKernel.mStoredPercent = "0\n";
-    EXPECT_TRUE(open()->wakesAtOnce());
+    EXPECT_TRUE(open()->getBuffers().wakesAtOnce());
     mKernel.mStoredPercent.clear();
     mKernel.mHasBufferPercent = false;
-    EXPECT_FALSE(open()->wakesAtOnce());
+    EXPECT_FALSE(open()->getBuffers().wakesAtOnce());
 }
 
 TEST_F(TraceInstance, ItsFilesAreClosedBeforeItIsRemoved) {
@@ -163,15 +163,15 @@ TEST_F(TraceInstance, PagesAreReadWithoutWaiting) {
     ASSERT_NE(lpInstance, nullptr) << mProblem.mText;
     ZTCBytes lPage(4096);
     std::size_t lSize = 0;
-    EXPECT_EQ(lpInstance->read(0, lPage, lSize), ZTTR_Empty);
+    EXPECT_EQ(lpInstance->getBuffers().read(0, lPage, lSize), ZTTR_Empty);
     const ZTCBytes lSent = ZTCPageBuilder().addShort({1, 2, 3, 4}).make();
     mKernel.sendPage(lSent, 0);
     mKernel.sendPage(lSent, 1);
     for (std::size_t lBuffer = 0; lBuffer < 2; ++lBuffer) {
-        EXPECT_EQ(lpInstance->read(lBuffer, lPage, lSize), ZTTR_Page);
+        EXPECT_EQ(lpInstance->getBuffers().read(lBuffer, lPage, lSize), ZTTR_Page);
         EXPECT_EQ(lSize, 4096u);
         EXPECT_EQ(lPage, lSent);
-        EXPECT_EQ(lpInstance->read(lBuffer, lPage, lSize), ZTTR_Empty);
+        EXPECT_EQ(lpInstance->getBuffers().read(lBuffer, lPage, lSize), ZTTR_Empty);
     }
 }
 
@@ -190,20 +190,20 @@ TEST_F(TraceInstance, LossesAreToldOnceAndACountThatGoesBackBeginsAnew) {
     const auto lpInstance = open();
     ASSERT_NE(lpInstance, nullptr) << mProblem.mText;
     const std::string lStats = mKernel.instance() + "/per_cpu/cpu0/stats";
-    EXPECT_EQ(lpInstance->takeLosses(0), 0u);
+    EXPECT_EQ(lpInstance->getBuffers().takeLosses(0), 0u);
     writeFile(lStats, "overrun: 7\ncommit overrun: 1\ndropped events: 2\n");
-    EXPECT_EQ(lpInstance->takeLosses(0), 10u);
-    EXPECT_EQ(lpInstance->takeLosses(0), 0u);
+    EXPECT_EQ(lpInstance->getBuffers().takeLosses(0), 10u);
+    EXPECT_EQ(lpInstance->getBuffers().takeLosses(0), 0u);
     writeFile(lStats, "overrun: 12\ncommit overrun: 1\ndropped events: 2\n");
-    EXPECT_EQ(lpInstance->takeLosses(0), 5u);
+    EXPECT_EQ(lpInstance->getBuffers().takeLosses(0), 5u);
     writeFile(lStats, "overrun: 3\n");
-    EXPECT_EQ(lpInstance->takeLosses(0), 0u);
+    EXPECT_EQ(lpInstance->getBuffers().takeLosses(0), 0u);
     writeFile(lStats, "overrun: 4\n");
-    EXPECT_EQ(lpInstance->takeLosses(0), 1u);
+    EXPECT_EQ(lpInstance->getBuffers().takeLosses(0), 1u);
     writeFile(lStats, "overrun: 18446744073709551615\n");
-    EXPECT_FALSE(lpInstance->takeLosses(0).has_value());
+    EXPECT_FALSE(lpInstance->getBuffers().takeLosses(0).has_value());
     std::filesystem::remove(lStats);
-    EXPECT_FALSE(lpInstance->takeLosses(0).has_value());
+    EXPECT_FALSE(lpInstance->getBuffers().takeLosses(0).has_value());
 }
 
 TEST_F(TraceInstance, WithoutTracefsTheReasonSaysHowToMountIt) {
@@ -254,8 +254,9 @@ TEST_F(TraceInstance, WhatKilledRunsHaveLeftIsRemovedAndNothingElse) {
     // No process has such a number; and this one was not started at that time.
     const std::string lDead = "libkpm-linux-999999999-1";
     const std::string lOther = "libkpm-linux-" + std::to_string(::getpid()) + "-1";
-    for (const std::string& lrName : {lDead, lOther, std::string("libkpm-linux-x-1"), std::string("libkpm-linux-1"),
-                                      std::string("someone"), makeTraceInstanceName()}) {
+    for (const std::string& lrName :
+         {lDead, lOther, std::string("libkpm-linux-sense-999999999-1"), std::string("libkpm-linux-x-1"),
+          std::string("libkpm-linux-1"), std::string("someone"), makeTraceInstanceName()}) {
         std::filesystem::create_directories(mKernel.tracefs() + "/instances/" + lrName + "/events");
     }
     const auto lpInstance = open();

@@ -45,6 +45,15 @@ lost() { logged "$1" | sed -n 's/.*(\([0-9]*\) since the start).*/\1/p' | tail -
 
 instances() { ls $gTracing/instances | grep -c . ; }
 
+# outcomes_instance: the directory of the agent's instance of finished commands. Sense data by the probe have one of their own.
+outcomes_instance() { ls -d $gTracing/instances/* | grep -v sense; }
+
+# shrink_buffers: each trace buffer of the agent holds eight kilobytes from now on.
+shrink_buffers() {
+  local lInstance
+  for lInstance in $gTracing/instances/*; do echo 8 >$lInstance/buffer_size_kb; done
+}
+
 # now: milliseconds since the boot.
 now() { sed 's/\([0-9]*\)\.\([0-9][0-9]\).*/\1\20/' /proc/uptime; }
 

@@ -74,7 +74,7 @@ printf '%-44s %9s %10s %9s %9s\n' "" commands/s "agent ms/s" wakes/s records >&3
 costs "idle" 0 usleep 20000000
 costs "good commands of the FC host" 40000 repeated 8 $(sg_of 0) 5000 $gGood
 costs "good commands of another host" 200000 repeated 2 $(other_disk) 100000 $gGood
-echo 'result & 42' >$(echo $gTracing/instances/*)/events/scsi/scsi_dispatch_cmd_done/filter
+echo 'result & 42' >$(outcomes_instance)/events/scsi/scsi_dispatch_cmd_done/filter
 costs "the same with no host in the filter" 200000 repeated 2 $(other_disk) 100000 $gGood
 printf '\n%-44s %9s %10s %9s %9s\n' "" events/s "us an event" came lost >&3
 failed_commands() { storm "$1" check-condition 'SCSI outcomes are lost' 8000 repeated 8 $(sg_of 1) 1000 $gPastEnd; }
