@@ -9,6 +9,7 @@
 /// names of the calls.
 #include <gtest/gtest.h>
 
+#include <chrono>
 #include <cstdio>
 #include <iostream>
 #include <set>
@@ -167,6 +168,7 @@ std::pair<unsigned, std::size_t> sRunWay(ZTCFaultStage& arStage, const ZTSFaultP
             continue;
         }
         ZTSRow lRow;
+        const auto lBegin = std::chrono::steady_clock::now();
         unsigned lNth = 1;
         while (lNth <= acrPhase.mMostFailures && lRow.mFindings.size() < 5 &&
                sRun(arStage, acrPhase, acrWay, lcrMode, lNth, lRow)) {
@@ -177,9 +179,10 @@ std::pair<unsigned, std::size_t> sRunWay(ZTCFaultStage& arStage, const ZTSFaultP
         }
         lRuns += lRow.mRuns;
         lFindings += lRow.mFindings.size();
-        std::printf("%-32s %-26s %-12s %-13s %6u %8u %8u %8u %9zu\n", acrPhase.mName.c_str(), acrWay.mpCall,
+        const std::chrono::duration<double> lTook = std::chrono::steady_clock::now() - lBegin;
+        std::printf("%-32s %-26s %-12s %-13s %6u %8u %8u %8u %9zu %7.1f\n", acrPhase.mName.c_str(), acrWay.mpCall,
                     acrWay.mpName, lcrMode.mpName, lRow.mRuns, lRow.mWentOn, lRow.mEndedInOrder, lRow.mAsserted,
-                    lRow.mFindings.size());
+                    lRow.mFindings.size(), lTook.count());
         for (const std::string& lcrFinding : lRow.mFindings) {
             std::printf("    finding: %s\n", sShortened(lcrFinding).c_str());
         }
@@ -245,8 +248,8 @@ int main(int argc, char** argv) {
     std::size_t lFindings = 0;
     unsigned lRuns = 0;
     if (lOptions.mPart == 0) {
-        std::printf("%-32s %-26s %-12s %-13s %6s %8s %8s %8s %9s\n", "phase", "call", "fails with", "how long", "runs",
-                    "went on", "ended 0", "ended 1", "findings");
+        std::printf("%-32s %-26s %-12s %-13s %6s %8s %8s %8s %9s %7s\n", "phase", "call", "fails with", "how long",
+                    "runs", "went on", "ended 0", "ended 1", "findings", "seconds");
     }
     unsigned lNumber = 0;
     for (const ZTSFaultPhase& lcrPhase : faultPhases()) {

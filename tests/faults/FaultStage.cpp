@@ -10,9 +10,6 @@
 #include <fstream>
 #include <iterator>
 
-/// What takes longer hangs.
-static constexpr std::chrono::seconds scPatience{10};
-
 /// One of them is the last word of an agent that ends in order.
 static const char* const sLastWords[] = {
     "Exit condition",
@@ -21,6 +18,7 @@ static const char* const sLastWords[] = {
 };
 
 ZTCFaultStage::ZTCFaultStage(ZTEFaultLibrary aLibrary) : mFaults(mAgent) {
+    mAgent.pipes().giveUpWhen([this] { return !isRunning(); });
     if (aLibrary == ZTEFaultLibrary::Kernel) {
         mpKernel = std::make_unique<ZTCFakeKernel>();
         mpKernel->addHost(0);
@@ -64,7 +62,7 @@ void ZTCFaultStage::launch(const std::vector<std::string>& acrArguments) {
 
 /// False where the agent has ended first.
 bool ZTCFaultStage::connect() {
-    if (!mAgent.pipes().openUnless([this] { return !isRunning(); }, ZTCDeadline(scPatience))) {
+    if (!mAgent.pipes().openUnless([this] { return !isRunning(); }, ZTCDeadline())) {
         return false;
     }
     if (mIsDaemon) {
@@ -127,7 +125,7 @@ bool ZTCFaultStage::isRunning() {
 
 ZTEFaultEnd ZTCFaultStage::waitForEnd() {
     try {
-        waitUntil([this] { return !isRunning(); }, "the end of the agent", ZTCDeadline(scPatience));
+        waitUntil([this] { return !isRunning(); }, "the end of the agent", ZTCDeadline());
     } catch (const std::runtime_error&) {
         const std::string lText = logText();
         kill();

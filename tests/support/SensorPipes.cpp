@@ -94,6 +94,27 @@ void ZTCSensorPipes::closeResponse() {
     sClose(mResponse);
 }
 
+/// Whether the descriptor is ready before the deadline.
+bool ZTCSensorPipes::waitFor(int aDescriptor, short aEvent, const ZTCDeadline& acrDeadline) const {
+    constexpr int lcSlice = 20;  // milliseconds between two questions whether it is over
+    while (true) {
+        // Asked first: what was written before the end is still there.
+        const bool lIsOver = isOver();
+        const int lLeft = acrDeadline.remainingMilliseconds();
+        pollfd lPoll{aDescriptor, aEvent, 0};
+        const int lReady = poll(&lPoll, 1, lIsOver ? 0 : mIsOver ? std::min(lLeft, lcSlice) : lLeft);
+        if (lReady != 0) {
+            return true;  // also where a signal came: the caller tries and asks again
+        }
+        if (lIsOver) {
+            throw std::runtime_error("the agent has ended");
+        }
+        if (acrDeadline.isOver()) {
+            return false;
+        }
+    }
+}
+
 void ZTCSensorPipes::sendRaw(const ZTCBytes& acrBytes) {
     const ZTCDeadline lDeadline;
     for (std::size_t lSent = 0; lSent < acrBytes.size();) {
@@ -101,8 +122,7 @@ void ZTCSensorPipes::sendRaw(const ZTCBytes& acrBytes) {
         if (lCount >= 0) {
             lSent += static_cast<std::size_t>(lCount);
         } else if (errno == EAGAIN) {
-            pollfd lPoll{mCommand, POLLOUT, 0};
-            if (poll(&lPoll, 1, lDeadline.remainingMilliseconds()) == 0) {
+            if (!waitFor(mCommand, POLLOUT, lDeadline)) {
                 throw std::runtime_error("the agent does not read its command FIFO");
             }
         } else if (errno != EINTR) {
@@ -136,7 +156,10 @@ static std::size_t sWaitingBytes(int aDescriptor) {
 }
 
 void ZTCSensorPipes::waitUntilTaken() const {
-    waitUntil([this] { return hasNothingToTake(); }, "the agent to empty its command FIFO");
+    waitUntil([this] { return hasNothingToTake() || isOver(); }, "the agent to empty its command FIFO");
+    if (!hasNothingToTake()) {
+        throw std::runtime_error("the agent has ended");
+    }
 }
 
 bool ZTCSensorPipes::hasNothingToTake() const {
@@ -150,9 +173,7 @@ std::size_t ZTCSensorPipes::waitingResponseBytes() const {
 std::optional<ZTCBytes> ZTCSensorPipes::readBytes(std::size_t aCount, const ZTCDeadline& acrDeadline) {
     ZTCBytes lBytes(aCount);
     for (std::size_t lRead = 0; lRead < aCount;) {
-        pollfd lPoll{mResponse, POLLIN, 0};
-        const int lReady = poll(&lPoll, 1, acrDeadline.remainingMilliseconds());
-        if (lReady == 0) {
+        if (!waitFor(mResponse, POLLIN, acrDeadline)) {
             throw std::runtime_error("no response: got " + std::to_string(lRead) + " of " + std::to_string(aCount) +
                                      " bytes before the deadline");
         }

@@ -34,6 +34,10 @@ public:
     void closeCommand();
     void closeResponse();
 
+    /// From now on, waiting for the agent to read or to answer is given up as soon as the condition holds, and throws
+    /// std::runtime_error. For tests whose agent may end: a FIFO does not tell of a writer that has never come.
+    void giveUpWhen(std::function<bool()> aIsOver) { mIsOver = std::move(aIsOver); }
+
     /// Writes the bytes as they stand.
     void sendRaw(const ZTCBytes& acrBytes);
     /// Writes what the command FIFO has room for, from this position on, and returns how much that was.
@@ -61,9 +65,12 @@ public:
 
 private:
     void lock();
+    bool isOver() const { return mIsOver && mIsOver(); }
+    bool waitFor(int aDescriptor, short aEvent, const ZTCDeadline& acrDeadline) const;
     std::optional<ZTCBytes> readBytes(std::size_t aCount, const ZTCDeadline& acrDeadline);
 
     std::string mDirectory;
+    std::function<bool()> mIsOver;
     int mLock = -1;
     int mCommand = -1;
     int mResponse = -1;

@@ -67,6 +67,9 @@ recorded() {
 agent_time() { cat /proc/$gAgent/task/*/schedstat | awk '{n += $1} END {printf "%.0f\n", n}'; }
 agent_wakes() { cat /proc/$gAgent/task/*/status | awk '/^voluntary_ctxt_switches/ {n += $2} END {print n}'; }
 
+# busy_time: nanoseconds that the machine's processors were not idle.
+busy_time() { awk '$1 == "cpu" {printf "%.0f\n", ($2 + $3 + $4 + $7 + $8) * 10000000}' /proc/stat; }
+
 # probe_hits: how often the kernel has run any probe so far.
 probe_hits() { awk '{n += $(NF - 1)} END {print n + 0}' $gTracing/kprobe_profile; }
 

@@ -318,15 +318,20 @@ came_as_answered() {
 }
 
 check_conservation() { # a seeded mix of good and failing commands: what the target has answered is what comes, each with its sense
+  local lHits lConditions
   usleep 1500000 # outcomes of the scan for devices are over
   collect
   : >$gRecords
   : >$gAnswers
+  lHits=$(probe_hits)
   send_mixture $gSeed $((120 * gFactor))
   wait_until 20 came_as_answered
   expect_text "seed $gSeed, $(grep -c . $gAnswers) commands" "$(answers)" "$(outcomes)"
   expect_text "lost" "0 0 0" \
     "$(lost 'SCSI outcomes are lost') $(lost 'sense data are lost') $(lost 'could not be read or handled')"
+  lConditions=$(awk '$1 == 2 {n++} END {print n + 0}' $gAnswers)
+  [ "$(records_of_one)" = 2 ] || lConditions=0 # there is no probe
+  expect_text "hits of the probe: the check conditions, and no other command" $lConditions $(($(probe_hits) - lHits))
   # The same of a storm that the agent cannot read.
   kill -STOP $gAgent
   shrink_buffers
