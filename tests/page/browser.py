@@ -117,6 +117,14 @@ class Browser:
     def keys(self, name, *keys):
         self.find(name).send_keys(*keys)
 
+    def press(self, *keys):
+        """Keys for whatever has the focus."""
+        ActionChains(self.driver).send_keys(*keys).perform()
+
+    def click(self, name, place):
+        """With the mouse, at a place of an element: [x, y] from its middle."""
+        ActionChains(self.driver).move_to_element_with_offset(self.find(name), *place).click().perform()
+
     def hover(self, name, place):
         ActionChains(self.driver).move_to_element_with_offset(self.find(name), *place).perform()
 

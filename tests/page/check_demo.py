@@ -5,6 +5,20 @@ from browser import require
 from palette import LEAST, closest
 
 TIMELINE = "#timeline;range=15m"
+# Where the chart shows the highest count of a port, seen from the middle of the chart: made from the same document as the chart.
+HIGHEST_CELL = """
+const [minutes, wwpn, done] = arguments;
+const canvas = document.getElementById('chart');
+Promise.all(['model', 'lanes', 'grid'].map((name) => import(`/${name}.js`))).then(async ([m, l, g]) => {
+  const now = Date.now(), wide = canvas.clientWidth;
+  const grid = g.makeGrid(now - minutes * 60000, now, wide - l.gutter(wide), l.columnPixels);
+  const query = `from=${new Date(grid.from).toISOString()}&to=${new Date(grid.to).toISOString()}&columns=${grid.columns}`;
+  const model = m.makeModel(await (await fetch(`/api/v1/timeline?${query}`)).json(), {filter: {families: null, text: ''}, before: null, unfolded: new Set(), now});
+  const layout = l.layOut(model, wide), row = layout.rows.find(({lane}) => lane.key === wwpn);
+  const [column] = [...row.lane.cells].sort(([, one], [, other]) => other.count - one.count)[0];
+  const x = l.xOf(layout, model, (m.spanOf(model, column)[0] + m.spanOf(model, column)[1]) / 2);
+  done([Math.round(x - wide / 2), Math.round(row.y + row.height / 2 - layout.height / 2)]);
+});"""
 
 
 def check_now(browser):
@@ -13,7 +27,9 @@ def check_now(browser):
     browser.wait_text("ports", "queue-full")
     browser.wait_text("live", "Live")
     browser.wait_text("open-troubles", "queue is full")
-    require("an open trouble does not name its port", "array7 ctrl-A" in browser.text("open-troubles"))
+    browser.wait("the disks of an open trouble", lambda: "sda" in browser.text("open-troubles"))
+    for what, name in (("port", "array7 ctrl-A port 0"), ("LUNs", "LUNs 0-3"), ("multipath device", "mpatha")):
+        require(f"an open trouble does not name its {what}", name in browser.text("open-troubles"))
     require("an open trouble does not say what to look at", "What to look at next" in browser.text("open-troubles"))
     worst = browser.run("return [...document.querySelectorAll('#open-troubles .trouble')].map((e) => e.className.includes('level-3'))")
     require("the worst trouble does not stand first", worst == sorted(worst, reverse=True))
@@ -29,6 +45,47 @@ def open_timeline(browser, address=TIMELINE):
     browser.wait("the overview", lambda: browser.colors("overview") > 2)
 
 
+def check_reachable(browser):
+    """With the keyboard alone: Tab comes to the views, the ranges, the filter, the overview and the chart, and shows where it is."""
+    open_timeline(browser)
+    browser.run("document.activeElement.blur(); getSelection().removeAllRanges()")
+    passed = []
+    while "chart" not in passed:
+        require(f"Tab does not come to the chart: {passed}", len(passed) < 60)
+        browser.press(Keys.TAB)
+        passed.append(browser.run("const e = document.activeElement; return e.id || e.dataset.view || e.dataset.minutes || e.dataset.family || e.tagName"))
+    missing = [name for name in ("paths", "60", "43200", "pause", "load", "find", "overview") if name not in passed]
+    require(f"Tab passes over {missing}", not missing)
+    require("the focus is not to be seen", browser.run("return getComputedStyle(document.activeElement).outlineStyle") != "none")
+
+
+def check_presets(browser):
+    open_timeline(browser)
+    for minutes, name in ((15, "15m"), (60, "1h"), (360, "6h"), (1440, "24h"), (10080, "7d"), (43200, "30d")):
+        browser.run(f"document.querySelector('[data-minutes=\"{minutes}\"]').click()")
+        browser.wait(f"the range {name} in the address", lambda: f";range={name}" in browser.address() + ";")
+        wait_loaded(browser)
+        pressed = browser.run("return [...document.querySelectorAll('#ranges [aria-pressed=true]')].map((e) => e.textContent)")
+        require(f"the button of {name} is not the one that is pressed: {pressed}", pressed == [name])
+        require(f"{name} is not live", browser.text("pause") == "Live")
+    browser.keys("chart", Keys.BACKSPACE)
+    browser.wait("the range before", lambda: ";range=7d" in browser.address())
+
+
+def check_fold(browser):
+    """Ports without an event that is shown are one row of their array, which Enter opens."""
+    open_timeline(browser, "#timeline;range=6h;families=load")
+    wait_loaded(browser)
+    tall = browser.find("chart").size["height"]
+    for _ in range(30):
+        browser.keys("chart", Keys.ARROW_DOWN)
+        if "▸" in browser.text("cell-text"):
+            break
+    require("there is no row of quiet ports", "▸" in browser.text("cell-text"))
+    browser.keys("chart", Keys.ENTER)
+    browser.wait("the quiet ports", lambda: browser.find("chart").size["height"] > tall)
+
+
 def check_keyboard(browser):
     open_timeline(browser)
     browser.keys("chart", "]")
@@ -37,8 +94,11 @@ def check_keyboard(browser):
     browser.wait("the next trouble", lambda: browser.text("cell-text") != first)
     browser.keys("chart", "[")
     browser.wait("the trouble before", lambda: browser.text("cell-text") == first)
-    for key in (Keys.ARROW_DOWN, Keys.ARROW_UP, Keys.ARROW_LEFT, Keys.ARROW_RIGHT):
-        browser.keys("chart", key)
+    for there, back in ((Keys.ARROW_DOWN, Keys.ARROW_UP), (Keys.ARROW_RIGHT, Keys.ARROW_LEFT)):
+        browser.keys("chart", there)
+        browser.wait("another cell", lambda: browser.text("cell-text") != first)
+        browser.keys("chart", back)
+        browser.wait("the cell before", lambda: browser.text("cell-text") == first)
     browser.keys("chart", "m")
     browser.wait("the command for a mark", lambda: "tavik mark " in browser.text("cell-text"))
     browser.keys("chart", "[")
@@ -79,10 +139,28 @@ def check_pointer(browser):
     address = browser.find("compare-link").get_attribute("href")
     browser.keys("chart", Keys.BACKSPACE)
     browser.wait("the range before", lambda: browser.text("range-text")[:8] == before[:8] and "fixed" not in browser.text("range-text"))
+    browser.drag("overview", (-wide // 8, 0), (0, 0))
+    browser.wait("the range of the brush", lambda: "fixed" in browser.text("range-text"))
+    browser.keys("chart", Keys.BACKSPACE)
+    browser.wait("the range before", lambda: "fixed" not in browser.text("range-text"))
     browser.keys("overview", "-")
     browser.wait("a longer range by the overview", lambda: "fixed" in browser.text("range-text"))
     browser.keys("chart", Keys.BACKSPACE)
     return address[address.index("#"):]
+
+
+def check_panel(browser):
+    """A click on a cell opens all that is known of it."""
+    open_timeline(browser, "#timeline;range=6h")
+    wait_loaded(browser)
+    browser.click("chart", browser.driver.execute_async_script(HIGHEST_CELL, 360, "30:00:00:00:00:02:00:00"))
+    browser.wait_text("panel-sentence", "array7 ctrl-A port 0 said that its queue is full")
+    browser.wait_text("panel-explanation", "What speaks against it")
+    browser.wait_text("panel-explanation", "Evidence")
+    facts = browser.text("panel-facts")
+    for name, part in (("LUNs", "0-3"), ("disks", "sda"), ("multipath devices", "mpatha")):
+        require(f"the panel does not name the {name}: {facts}", part in facts)
+    require("the panel names no command", "tavik events --since" in browser.text("panel-command"))
 
 
 def check_filter(browser):
@@ -100,13 +178,32 @@ def check_filter(browser):
 
 
 def check_live(browser, inject):
+    """New events are appended while the right edge is now; else a button says how many have come."""
+    rows = "return [...document.querySelectorAll('#chart-table tr')].filter((e) => /check-condition/.test(e.textContent)).length"
     open_timeline(browser)
+    require("a check condition before it happened", browser.run(rows) == 0)
+    inject()
+    browser.wait("the new event in the chart", lambda: browser.run(rows) > 0)
+    require("a live chart calls events new", not browser.find("missed").is_displayed())
     browser.run("document.getElementById('pause').click()")
     browser.wait_text("pause", "Paused")
     inject()
     browser.wait("how many are new", lambda: "new" in browser.text("missed"))
     browser.run("document.getElementById('missed').click()")
     browser.wait_text("pause", "Live")
+
+
+def check_pictures(browser):
+    """The two of the README."""
+    browser.resize(1280, 860)
+    open_timeline(browser, "#timeline;range=690m")
+    wait_loaded(browser)
+    browser.picture("day-timeline")
+    browser.open("#now")
+    browser.wait("the disks of an open trouble", lambda: "sda" in browser.text("open-troubles"))
+    browser.wait_text("ports", "array7")
+    browser.picture("day-now")
+    browser.resize(1280)
 
 
 def check_compare(browser, address):
@@ -116,6 +213,14 @@ def check_compare(browser, address):
     browser.run("const s = document.getElementById('compare-mark'); s.value = 'before-storm'; s.dispatchEvent(new Event('change'))")
     browser.wait_text("compare-rates", "queue-full")
     require("the address does not hold the mark", browser.address() == "#compare;mark=before-storm")
+    browser.open("#compare;mark=before-zoning")
+    browser.wait_text("compare-changes", "array7 ctrl-B port 1 from host8")
+    require("the state after the mark is not named", "Not Present" in browser.text("compare-changes"))
+    require("the command is not named", browser.text("compare-command") == "tavik diff before-zoning")
+    document, _ = browser.ask("/api/v1/diff?from=before-zoning")
+    different = sum(rate["different"] for rate in document["rates"])
+    require("the sum is not that of the document", f"{len(document['changes'])} state" in browser.text("compare-sum")
+            and f"{different} rate" in browser.text("compare-sum"))
     browser.open(address)
     browser.wait_text("compare-spans", "After:")
 
@@ -158,14 +263,19 @@ def check_palette(browser):
 
 def check_demo(browser, inject):
     check_now(browser)
+    check_reachable(browser)
+    check_presets(browser)
     check_keyboard(browser)
     check_address(browser)
+    check_fold(browser)
+    check_panel(browser)
     address = check_pointer(browser)
     check_filter(browser)
     check_live(browser, inject)
+    check_pictures(browser)
     check_compare(browser, address)
     browser.open("#paths")
-    browser.wait("the paths' answer", lambda: "Asking" not in browser.text("paths-text"))
+    browser.wait_text("paths-text", "LUNs of 6 with trouble")
     check_palette(browser)
     browser.check_quiet("after all views")
     check_events(browser)

@@ -6,11 +6,19 @@ import { kindOf, worstOf } from "./kinds.js";
 /** Up to so much behind the right edge, a run that goes on has not been noted yet. */
 const slack = 90000;
 
-/** An array is named by its administrator ("array7 ctrl-A" is of array7), else by its maker's words and node name. */
+/** Of a port's name the words up to the first with a digit ("array7 ctrl-A port 0" and "array7 ctrl-B" are of array7), or, where
+ *  that is none or the last, all words but the last. */
+function arrayOfName(name) {
+  const words = name.split(" ");
+  const number = words.findIndex((word) => /\d/.test(word));
+  const count = number >= 0 && number < words.length - 1 ? number + 1 : words.length - 1;
+  return words.slice(0, Math.max(1, count)).join(" ");
+}
+
+/** An array is named by its administrator, else by its maker's words and node name. */
 export function arrayOf(port) {
-  const name = port.name ?? "";
-  if (name !== "") {
-    return name.includes(" ") ? name.slice(0, name.lastIndexOf(" ")) : name;
+  if (port.name) {
+    return arrayOfName(port.name);
   }
   const maker = [port.vendor, port.model].filter(Boolean).join(" ").trim();
   const node = port.wwnn ?? "";
