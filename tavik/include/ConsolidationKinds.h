@@ -20,7 +20,7 @@ struct ZTSFieldCopy {
     std::uint16_t mSize;  ///< 0 ends the list
 };
 
-/// A number of the payload that is noted as one bit of a 256-bit field, whose length word stands in front of it.
+/// A number of the payload that is noted as one bit of a 256-bit field, whose length word comes before it.
 struct ZTSBitFieldCopy {
     std::uint16_t mPayloadOffset;
     std::uint16_t mLengthOffset;
@@ -36,7 +36,7 @@ inline constexpr unsigned gcMaxAppendedSize = 8;
 /// Bytes of every bit field.
 inline constexpr unsigned gcBitFieldSize = 32;
 
-/// Where the remote port's name stands in every payload.
+/// The offset of the remote port's name in every payload.
 inline constexpr unsigned gcRemotePortOffset = 4;
 
 struct ZTSConsolidationKind {

@@ -7,7 +7,7 @@
 inline constexpr unsigned int gcKindCategoryBits = 5;
 inline constexpr unsigned int gcKindSubcategoryBits = 8;
 
-/// The number of slots. It stands for a pair that has none, too.
+/// The number of slots. It is also the result for a pair that has no slot.
 inline constexpr unsigned int gcKindSlots = gcKindCategoryBits * gcKindSubcategoryBits;
 
 /// The slot of the pair, or gcKindSlots where category or subcategory is something else than one bit.

@@ -9,7 +9,7 @@
 #include "sensor/agentcommon/include/ScopeEvent.h"
 #include "sensor/agentcommon/include/WorldWideName.h"
 
-/// Key form of an event kind to the handle of its registration; a handle of 0 is no live registration.
+/// Key form of an event kind to the handle of its registration; a handle of 0 means that none is live.
 using ZTCScopeEventRegMap = ZTCMap<unsigned short, unsigned int>;
 
 /// The names and the board id never change and may be read by any thread; the registrations belong to the command

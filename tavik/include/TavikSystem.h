@@ -101,7 +101,7 @@ public:
     /// Adds the target under its FC id. The first registration of an FC id wins; a later one does nothing.
     void addFcTarget(const ZTCPointer<ZTCTavikTarget>& acrTarget) ZT_EXCLUDES(mPrevDataLock);
 
-    /// Adds the target under its port name; likewise.
+    /// Adds the target under its port name. Here too the first registration wins.
     void addWwpnTarget(const ZTCPointer<ZTCTavikTarget>& acrTarget) ZT_EXCLUDES(mPrevDataLock);
 
     /// Throw ZTCNotFoundEx where there is no such target. The key of a port name is ZTCWorldWideName::getKey.
@@ -112,7 +112,7 @@ public:
         return mTargetsWwpnMap.get(acrKey);
     }
 
-    /// For the path of events, where an unknown port is an everyday thing: null where there is no such target.
+    /// For the path of events, where unknown ports are common: null where there is no such target.
     const ZTCTavikTarget* findFcTarget(unsigned int aFcId) const ZT_REQUIRES(mPrevDataLock);
     const ZTSRemotePortNames* findWwpnNames(unsigned long aKey) noexcept ZT_REQUIRES(mPrevDataLock);
 

@@ -1,8 +1,5 @@
 #include "tavik/include/TavikSystem.h"
 
-#include <sys/stat.h>
-#include <unistd.h>
-
 #include <iostream>
 
 #include "common/include/Assert.h"
@@ -18,6 +15,7 @@
 #include "system/include/ProcessInstanceManager.h"
 #include "system/include/SystemGlobals.h"
 #include "system/include/Version.h"
+#include "tavik/include/SensorDirectory.h"
 #include "tavik/include/TavikCommandHandler.h"
 #include "tavik/include/TavikHeartbeatHandler.h"
 #include "tavik/include/TavikProtocolHandler.h"
@@ -31,16 +29,6 @@ constexpr char scRuntimeDir[] = "/tmp";
 
 // Hexadecimal 0x777 is octal 3567: set-group-id and sticky; owner r-x, group rw-, others rwx. The umask applies.
 constexpr int scRuntimeDirMode = 0x777;
-
-/// Returns the new total. Its writers hold the lock, so none comes in between; its readers without the lock need no
-/// order.
-inline std::uint32_t sAddToTotal(std::atomic<std::uint32_t>& arTotal, unsigned int aBytes) noexcept {
-    ZT_ENTRY();
-    const std::uint32_t lTotal = arTotal.load(std::memory_order_relaxed) + aBytes;
-    arTotal.store(lTotal, std::memory_order_relaxed);
-    ZT_EXIT();
-    return lTotal;
-}
 
 void sCreateRtdir() {
     ZT_ENTRY();
@@ -59,38 +47,6 @@ void sInitGlobals() {
     setLogCode(gcDefaultLogCode);
     setHbTimeout(gcDefaultHbTimeout);
     sCreateRtdir();
-    ZT_EXIT();
-}
-
-/// A user who can write in the sensor's directory is trusted like the sensor. It should be the sensor's user alone.
-void sWarnOfSharedDirectory(const ZTCString& acrPath) {
-    ZT_ENTRY();
-    // Names are appended to the directory as it stands, so that an empty one is the root.
-    const char* lpPath = *acrPath.get() != '\0' ? acrPath.get() : "/";
-    struct stat lStatus {};
-    try {
-        ClibStat(lpPath, &lStatus);
-    } catch (const ZTCClibStatFailedEx&) {  // what comes to use the directory says what is wrong with it
-        ZT_EXIT();
-        return;
-    }
-    const bool lIsShared = (lStatus.st_mode & (S_IWGRP | S_IWOTH)) != 0;
-    const bool lIsForeign = lStatus.st_uid != 0 && lStatus.st_uid != ::geteuid();
-    if (lIsShared || lIsForeign) {
-        char lWho[64];
-        char lRemedy[MAX_FILE_PATH];
-        if (lIsShared) {
-            ClibStrcpy(lWho, (lStatus.st_mode & S_IWOTH) != 0 ? "everybody" : "its group");
-            ClibSprintf(lRemedy, sizeof lRemedy, "chmod go-w '%s'", lpPath);
-        } else {
-            ClibSprintf(lWho, sizeof lWho, "user %u", lStatus.st_uid);
-            ClibSprintf(lRemedy, sizeof lRemedy, "run the agent as that user, or chown %u '%s'", ::geteuid(), lpPath);
-        }
-        ZT_LOG_WARN(
-            "The sensor directory '%s' can be written by %s, who can so command this agent and replace its files; to "
-            "make it private: %s",
-            lpPath, lWho, lRemedy);
-    }
     ZT_EXIT();
 }
 
@@ -141,7 +97,7 @@ void ZTCTavikSystem::init() {
     ZT_ENTRY();
     ZT_LOG_INFO("Performing Tavik system data initialization");
     ZTCSystem::init();
-    sWarnOfSharedDirectory(getInstallDir());
+    warnOfSharedDirectory(getInstallDir());
     initStatusPage();
     // Adapters come before anything else that leaves a trace in the file system: a host without any ends here.
     initLibkpm();
@@ -459,30 +415,7 @@ const ZTSRemotePortNames* ZTCTavikSystem::findWwpnNames(unsigned long aKey) noex
     return lpNames;
 }
 
-// ---- Record lists and the pending record ----
-
-void ZTCTavikSystem::makeRecordLists(ZTCTavikRecordsMap& arLists) {
-    ZT_ENTRY();
-    const unsigned int lNumberOfAdapters = mLibkpmAbs->LIBKPM_GetNumberOfAdapters();
-    mStatusPage.setAdapters(lNumberOfAdapters);
-    for (unsigned int lIndex = 0; lIndex < lNumberOfAdapters; ++lIndex) {
-        arLists.insert(lIndex, ZTCPointer<ZTCTavikRecordList>(NEW ZTCTavikRecordList(lIndex, this)));
-    }
-    ZT_EXIT();
-}
-
-void ZTCTavikSystem::clearRecordsMap(ZTCTavikRecordsMap& arTaken) noexcept {
-    ZT_ENTRY();
-    arTaken.clear();
-    mRecordsMap.swap(arTaken);
-    ZT_EXIT();
-}
-
-void ZTCTavikSystem::addNewRecordListsToRecordsMap(ZTCTavikRecordsMap& arLists) noexcept {
-    ZT_ENTRY();
-    mRecordsMap.swap(arLists);
-    ZT_EXIT();
-}
+// ---- Retrieval and limit ----
 
 void ZTCTavikSystem::noteRetrieval() {
     ZT_ENTRY();
@@ -500,61 +433,4 @@ bool ZTCTavikSystem::isTotalLimitOnScopeDataReached() {
     }
     ZT_EXIT();
     return lIsReached;
-}
-
-void ZTCTavikSystem::filePrevScopeRecord() {
-    ZT_ENTRY();
-    if (mRecordsMap.hasKey(mPrevBoardId)) {
-        mRecordsMap.get(mPrevBoardId)->addRecord(mPrevScopeRecord);
-    } else {
-        ZT_LOG_ERR("Dropping the pending scope record of board %u: the board has no record list any more",
-                   mPrevBoardId);
-        if (mpPrevRow != nullptr) {
-            mStatusPage.countDropped(*mpPrevRow, mPrevScopeRecord->getOccurrences());
-        }
-    }
-    ZT_EXIT();
-}
-
-void ZTCTavikSystem::setPrevScopeData(unsigned int aBoardId, ZTCPointer<ZTCScopeData>& arData) {
-    ZT_ENTRY();
-    const auto lRecord = ZTCPointer<ZTCTavikRecord>::make(arData);
-    if (mPrevScopeDataSet) {
-        filePrevScopeRecord();
-    }
-    // From here on nothing can fail: the filed record is pending no longer.
-    mPrevScopeData = arData;
-    mPrevScopeRecord = lRecord;
-    mPrevBoardId = aBoardId;
-    mPrevScopeDataSet = true;
-    const std::uint32_t lTotal = sAddToTotal(mTotalEventDataSize, arData->getEventDataSize());
-    mpPrevRow = mStatusPage.findRow(aBoardId, arData->getCategory(), arData->getSubcategory());
-    if (mpPrevRow != nullptr) {
-        countOccurrence();
-        mStatusPage.countRecord(lTotal);
-    }
-    mBell.noteHeld(lTotal);
-    ZT_EXIT();
-}
-
-void ZTCTavikSystem::clearPrevScopeData() {
-    ZT_ENTRY();
-    if (mPrevScopeDataSet) {
-        filePrevScopeRecord();
-        mPrevScopeDataSet = false;
-    }
-    ZT_EXIT();
-}
-
-void ZTCTavikSystem::appendEventData(unsigned char* apData, unsigned int aLength) {
-    ZT_ENTRY();
-    mPrevScopeData->appendEventData(apData, aLength);
-    mPrevScopeRecord->incrementOccurrences();
-    const std::uint32_t lTotal = sAddToTotal(mTotalEventDataSize, aLength);
-    if (mpPrevRow != nullptr) {
-        countOccurrence();
-        mStatusPage.setHeldBytes(lTotal);
-    }
-    mBell.noteHeld(lTotal);
-    ZT_EXIT();
 }

@@ -21,7 +21,7 @@ const std::vector<ZTSLogText>& logTexts() {
         {128, "-T-", ".//TavikSystem", "sCreateRtdir", "Trying to create '%s'", sProcess},
         {16, "-W-", ".//TavikSystem", "sCreateRtdir", "'%s' already exists... continuing", sAgent},
         {64, "-I-", ".//TavikSystem", "init", "Performing Tavik system data initialization", sAgent},
-        {16, "-W-", ".//TavikSystem", "sWarnOfSharedDirectory",
+        {16, "-W-", ".//SensorDirectory", "warnOfSharedDirectory",
          "The sensor directory '%s' can be written by %s, who can so command this agent and replace its files; to make "
          "it private: %s",
          sAgent},
@@ -53,7 +53,7 @@ const std::vector<ZTSLogText>& logTexts() {
         {32, "-N-", ".//TavikSystem", "addFcTarget", "Registered Target <%s, %s, %u>", sAgent},
         {32, "-N-", ".//TavikSystem", "addWwpnTarget", "Added Target <%s, %s, %u> to Wwpn Target Map", sAgent},
         {32, "-N-", ".//TavikSystem", "isTotalLimitOnScopeDataReached", "Current size = %u", sAgent},
-        {8, "-E-", ".//TavikSystem", "filePrevScopeRecord",
+        {8, "-E-", ".//PendingRecord", "filePrevScopeRecord",
          "Dropping the pending scope record of board %u: the board has no record list any more", sProcess},
         {64, "-I-", ".//TavikEventCatalogue", "ZTCTavikEventCatalogue",
          "Inserting ElsPlogi ScopeEvent into Events Catalogue", sAgent},
