@@ -9,6 +9,7 @@
 #include <vector>
 
 #include "sensor/client/include/SensorClient.h"
+#include "sensor/client/include/StandardStreams.h"
 
 enum ZTEExitStatus : int {
     ZTXS_Done = 0,
@@ -35,10 +36,7 @@ struct ZTSWatchOptions {
 /// One line on standard error, with the tool's name in front.
 void complain(const std::string& acrText);
 
-/// Writes all of it to standard output, or throws ZTCSystemCallEx.
-void writeOutput(const std::string& acrText);
-
-/// The same for a process that has to go on while its reader does not read. Calls acrPause at least once a second.
+/// writeOutput() for a process that has to go on while its reader does not read. Calls acrPause at least once a second.
 /// Where it returns false and the reader still does not read, some of the text stays unwritten and the result is false.
 bool writeOutputPatiently(const std::string& acrText, const std::function<bool()>& acrPause);
 

@@ -1,14 +1,12 @@
-#include <fcntl.h>
 #include <signal.h>
 #include <sys/stat.h>
-#include <unistd.h>
 
 #include <CLI/CLI.hpp>
-#include <cerrno>
 #include <cstdlib>
 #include <functional>
 
 #include "sensor/agentcommon/include/SensorAgentProtocol.h"
+#include "sensor/client/include/CommandLine.h"
 #include "sensor/client/src/Tavikctl.h"
 #include "sensor/client/src/TavikctlCommands.h"
 #include "sensor/client/src/TavikctlInput.h"
@@ -52,21 +50,6 @@ static ZTEExitStatus sRunWatch(const ZTSToolOptions& acrOptions, const ZTSComman
     lWatch.mMaxRecordBytes = parseUnsigned(acrLine.mMaxRecordBytes, "max-record-bytes");
     lWatch.mTargets = collectTargets(acrLine.mTargets);
     return runWatch(acrOptions, lWatch);
-}
-
-/// Descriptors 0 to 2 belong to the standard streams even where the parent has closed them: nothing else may get them.
-static void sReserveStandardStreams() {
-    const bool lHasOutput = fcntl(STDOUT_FILENO, F_GETFD) >= 0;
-    int lDescriptor;
-    do {
-        lDescriptor = open("/dev/null", O_RDWR | O_CLOEXEC);
-    } while (lDescriptor >= 0 && lDescriptor <= STDERR_FILENO);
-    if (lDescriptor >= 0) {
-        close(lDescriptor);
-    }
-    if (!lHasOutput) {
-        throw ZTCSystemCallEx("cannot write standard output", EBADF);
-    }
 }
 
 /// Parses the line and runs its command.
@@ -128,17 +111,9 @@ static ZTEExitStatus sRun(int aCount, const char* const* appArguments) {
         ->add_option("FILE", lLine.mDecodePath, "The file, or - for standard input")
         ->required();
 
-    try {
-        lApp.parse(aCount, appArguments);
-    } catch (const CLI::CallForVersion& lrVersion) {
-        writeOutput(std::string(lrVersion.what()) + "\n");
+    if (const auto lText = parseCommandLine<ZTCBadInputEx>(lApp, aCount, appArguments)) {
+        writeOutput(*lText);
         return ZTXS_Done;
-    } catch (const CLI::Success&) {
-        CLI::App* lpAsked = lApp.get_subcommands().empty() ? &lApp : lApp.get_subcommands().front();
-        writeOutput(lpAsked->help(lpAsked == &lApp ? "" : lApp.get_name()));
-        return ZTXS_Done;
-    } catch (const CLI::ParseError& lrError) {
-        throw ZTCBadInputEx(std::string(lrError.what()) + "; see tavikctl --help");
     }
     if (lpDecode->parsed()) {
         ZTSToolOptions lOptions;
@@ -151,7 +126,7 @@ static ZTEExitStatus sRun(int aCount, const char* const* appArguments) {
 int main(int aCount, char** appArguments) {
     signal(SIGPIPE, SIG_IGN);
     try {
-        sReserveStandardStreams();
+        requireStandardOutput();
         return sRun(aCount, appArguments);
     } catch (const ZTCBadInputEx& lrEx) {
         complain(lrEx.what());

@@ -2,9 +2,6 @@
 #include <poll.h>
 #include <unistd.h>
 
-#include <algorithm>
-#include <cerrno>
-
 #include "sensor/client/include/RecordTable.h"
 #include "sensor/client/src/Tavikctl.h"
 
@@ -12,26 +9,6 @@ void complain(const std::string& acrText) {
     const std::string lLine = "tavikctl: " + escapeText(acrText) + "\n";
     // Nothing can be said about a standard error that does not take the line.
     [[maybe_unused]] const ssize_t lWritten = write(STDERR_FILENO, lLine.data(), lLine.size());
-}
-
-/// One write. Returns the bytes written, 0 after an interruption; throws ZTCSystemCallEx.
-static std::size_t sWriteSome(const std::string& acrText, std::size_t aWritten, std::size_t aMost) {
-    const ssize_t lCount = write(STDOUT_FILENO, acrText.data() + aWritten, std::min(acrText.size() - aWritten, aMost));
-    if (lCount < 0 && (errno == EINTR || errno == EAGAIN)) {
-        return 0;
-    }
-    if (lCount <= 0) {
-        throw ZTCSystemCallEx("cannot write standard output: " + std::to_string(aWritten) + " of " +
-                                  std::to_string(acrText.size()) + " bytes written",
-                              lCount < 0 ? errno : ENOSPC);
-    }
-    return static_cast<std::size_t>(lCount);
-}
-
-void writeOutput(const std::string& acrText) {
-    for (std::size_t lWritten = 0; lWritten < acrText.size();) {
-        lWritten += sWriteSome(acrText, lWritten, acrText.size());
-    }
 }
 
 bool writeOutputPatiently(const std::string& acrText, const std::function<bool()>& acrPause) {
@@ -42,7 +19,7 @@ bool writeOutputPatiently(const std::string& acrText, const std::function<bool()
         const bool lMayGoOn = acrPause();
         if (lIsReady) {
             // A pipe that is ready takes this much without blocking.
-            lWritten += sWriteSome(acrText, lWritten, PIPE_BUF);
+            lWritten += writeSomeOutput(acrText, lWritten, PIPE_BUF);
         } else if (!lMayGoOn) {
             return false;
         }

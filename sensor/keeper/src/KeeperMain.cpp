@@ -1,26 +1,13 @@
-#include <fcntl.h>
-#include <unistd.h>
-
 #include <CLI/CLI.hpp>
 #include <cstdio>
 
 #include "sensor/client/include/ClientErrors.h"
+#include "sensor/client/include/StandardStreams.h"
 #include "sensor/keeper/include/HostWorld.h"
 #include "sensor/keeper/include/KeeperLoop.h"
 #include "sensor/keeper/include/Spawn.h"
 
 enum ZTEExitStatus { ZTEX_Done = 0, ZTEX_Failed = 1, ZTEX_BadSettings = 2 };
-
-/// Descriptors 0 to 2 belong to the standard streams even where the parent has closed them: nothing else may get them.
-static void sReserveStandardStreams() {
-    int lDescriptor;
-    do {
-        lDescriptor = open("/dev/null", O_RDWR);
-    } while (lDescriptor >= 0 && lDescriptor <= STDERR_FILENO);
-    if (lDescriptor >= 0) {
-        close(lDescriptor);
-    }
-}
 
 static void sPrint(const std::vector<ZTSSettingsProblem>& acrProblems) {
     for (const ZTSSettingsProblem& lcrProblem : acrProblems) {
@@ -44,7 +31,7 @@ static ZTEExitStatus sRun(const std::string& acrConfigOption, bool aIsCheck) {
 }
 
 int main(int aCount, char** appArguments) {
-    sReserveStandardStreams();
+    reserveStandardStreams();
     std::string lConfigOption;
     bool lIsCheck = false;
     CLI::App lApp{"Keeps the Fibre Channel event agent and the collector running, in the foreground.", "tavik-sensor"};

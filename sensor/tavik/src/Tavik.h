@@ -6,6 +6,7 @@
 #include <stdexcept>
 #include <string>
 
+#include "sensor/client/include/StandardStreams.h"
 #include "sensor/views/include/FilterText.h"
 
 /// Exit statuses that do not come from the table of states.
@@ -52,10 +53,6 @@ struct ZTSTavikOptions {
 
 /// One line on standard error, with the program's name in front.
 void complain(const std::string& acrText);
-
-/// Writes all of it to standard output; throws std::system_error. A reader that has gone ends the process by SIGPIPE,
-/// without a word.
-void writeOutput(const std::string& acrText);
 
 /// A document, indented, with a line break at its end.
 void writeDocument(const nlohmann::ordered_json& acrDocument);

@@ -1,29 +1,11 @@
-#include <fcntl.h>
 #include <signal.h>
-#include <unistd.h>
 
 #include <CLI/CLI.hpp>
-#include <cerrno>
 #include <functional>
-#include <system_error>
 
+#include "sensor/client/include/CommandLine.h"
 #include "sensor/store/include/StoreErrors.h"
 #include "sensor/tavik/src/Tavik.h"
-
-/// Descriptors 0 to 2 belong to the standard streams even where the parent has closed them: nothing else may get them.
-static void sReserveStandardStreams() {
-    const bool lHasOutput = fcntl(STDOUT_FILENO, F_GETFD) >= 0;
-    int lDescriptor;
-    do {
-        lDescriptor = open("/dev/null", O_RDWR | O_CLOEXEC);
-    } while (lDescriptor >= 0 && lDescriptor <= STDERR_FILENO);
-    if (lDescriptor >= 0) {
-        close(lDescriptor);
-    }
-    if (!lHasOutput) {
-        throw std::system_error(EBADF, std::generic_category(), "cannot write standard output");
-    }
-}
 
 /// A reader that goes away ends this process without a word, whatever the parent has made of the signal.
 static void sEndWithReader() {
@@ -115,24 +97,16 @@ static int sRun(int aCount, const char* const* appArguments) {
     lAdd("report", "Write an archive for support", runReport)
         ->add_option("-o,--output", lOptions.mOutput, "The file; default: tavik-report-HOST-TIME.tar.gz");
 
-    try {
-        lApp.parse(aCount, appArguments);
-    } catch (const CLI::CallForVersion& lrVersion) {
-        writeOutput(std::string(lrVersion.what()) + "\n");
+    if (const auto lText = parseCommandLine<ZTCWrongUseEx>(lApp, aCount, appArguments)) {
+        writeOutput(*lText);
         return ZTTX_Done;
-    } catch (const CLI::Success&) {
-        CLI::App* const lpAsked = lApp.get_subcommands().empty() ? &lApp : lApp.get_subcommands().front();
-        writeOutput(lpAsked->help(lpAsked == &lApp ? "" : lApp.get_name()));
-        return ZTTX_Done;
-    } catch (const CLI::ParseError& lrError) {
-        throw ZTCWrongUseEx(std::string(lrError.what()) + "; see tavik --help");
     }
     return lCommand(lOptions);
 }
 
 int main(int aCount, char** appArguments) {
     try {
-        sReserveStandardStreams();
+        requireStandardOutput();
         sEndWithReader();
         return sRun(aCount, appArguments);
     } catch (const ZTCWrongUseEx& lrEx) {

@@ -14,33 +14,10 @@
 #include <iterator>
 #include <string>
 
+#include "tests/support/ChildFunction.h"
 #include "tests/support/ResourceLimit.h"
 #include "tests/support/TemporaryDirectory.h"
-
-namespace {
-
-/// The text of the exception of this class that the call throws.
-template <typename Exception>
-std::string sTextOf(const std::function<void()>& acrCall) {
-    try {
-        acrCall();
-    } catch (const Exception& acrException) {
-        return acrException.what();
-    }
-    return "nothing was thrown";
-}
-
-/// The exit status of a child process that runs the function, or -1.
-int sStatusOfChild(const std::function<int()>& acrFunction) {
-    const pid_t lChild = fork();
-    if (lChild == 0) {
-        _exit(acrFunction());
-    }
-    int lStatus = -1;
-    return lChild > 0 && waitpid(lChild, &lStatus, 0) == lChild && WIFEXITED(lStatus) ? WEXITSTATUS(lStatus) : -1;
-}
-
-}  // namespace
+#include "tests/support/ThrownText.h"
 
 TEST(ClibProcess, AZombieIsNotAlive) {
     const pid_t lChild = fork();
@@ -94,7 +71,7 @@ TEST(ClibProcess, AStandardStreamThatIsReplacedTakesNoFurtherDescriptor) {
         const std::filesystem::directory_iterator lOpen("/proc/self/fd");
         return std::distance(begin(lOpen), end(lOpen));
     };
-    EXPECT_EQ(sStatusOfChild([&] {
+    EXPECT_EQ(statusOfChild([&] {
                   ClibRedirect(STDIN_FILENO, "/dev/null", O_RDONLY);
                   const auto lBefore = lNumberOfDescriptors();
                   ClibRedirect(STDIN_FILENO, "/dev/null", O_RDONLY);
@@ -124,7 +101,7 @@ TEST(ClibProcess, AProcessThatMayNotBeSignalledIsAlive) {
 
 TEST(ClibProcess, ChdirChangesTheWorkingDirectoryOfTheProcess) {
     const ZTCTemporaryDirectory lDirectory;
-    EXPECT_EQ(sStatusOfChild([&] {
+    EXPECT_EQ(statusOfChild([&] {
                   ClibChdir(lDirectory.path().c_str());
                   return std::filesystem::equivalent(std::filesystem::current_path(), lDirectory.path()) ? 0 : 1;
               }),
@@ -132,12 +109,12 @@ TEST(ClibProcess, ChdirChangesTheWorkingDirectoryOfTheProcess) {
 }
 
 TEST(ClibProcess, OneWhoLeadsASessionCannotMakeAnotherOne) {
-    EXPECT_EQ(sStatusOfChild([] {
+    EXPECT_EQ(statusOfChild([] {
                   ClibSetsid();
                   if (getsid(0) != getpid()) {
                       return 1;
                   }
-                  return sTextOf<ZTCClibSessionFailedEx>([] { ClibSetsid(); }) ==
+                  return thrownText<ZTCClibSessionFailedEx>([] { ClibSetsid(); }) ==
                                  std::string("Making a session failed: ") + std::strerror(EPERM)
                              ? 0
                              : 2;
@@ -146,19 +123,19 @@ TEST(ClibProcess, OneWhoLeadsASessionCannotMakeAnotherOne) {
 }
 
 TEST(ClibProcess, WhoMayNeitherForkNorSignalIsToldSo) {
-    EXPECT_EQ(sStatusOfChild([] {
+    EXPECT_EQ(statusOfChild([] {
                   // Root is not bound by the limit; and nobody else may signal the first process.
                   const uid_t lFormer = geteuid();
                   if (lFormer == 0 && setresuid(65534, 65534, 0) != 0) {
                       return 1;
                   }
                   const ZTCResourceLimit lLimit(RLIMIT_NPROC, 0);
-                  const std::string lFork = sTextOf<ZTCClibForkFailedEx>([] {
+                  const std::string lFork = thrownText<ZTCClibForkFailedEx>([] {
                       if (ClibFork() == 0) {
                           _exit(0);
                       }
                   });
-                  const std::string lKill = sTextOf<ZTCClibKillFailedEx>([] { ClibKill(1, 0); });
+                  const std::string lKill = thrownText<ZTCClibKillFailedEx>([] { ClibKill(1, 0); });
                   if (lFormer == 0 && setresuid(0, 0, 0) != 0) {
                       return 2;
                   }

@@ -16,33 +16,10 @@
 #include <functional>
 #include <string>
 
+#include "tests/support/ChildFunction.h"
 #include "tests/support/ResourceLimit.h"
 #include "tests/support/TemporaryDirectory.h"
-
-namespace {
-
-/// The text of the exception of this class that the call throws.
-template <typename Exception>
-std::string sTextOf(const std::function<void()>& acrCall) {
-    try {
-        acrCall();
-    } catch (const Exception& acrException) {
-        return acrException.what();
-    }
-    return "nothing was thrown";
-}
-
-/// The exit status of a child process that runs the function, or -1.
-int sStatusOfChild(const std::function<int()>& acrFunction) {
-    const pid_t lChild = fork();
-    if (lChild == 0) {
-        _exit(acrFunction());
-    }
-    int lStatus = -1;
-    return lChild > 0 && waitpid(lChild, &lStatus, 0) == lChild && WIFEXITED(lStatus) ? WEXITSTATUS(lStatus) : -1;
-}
-
-}  // namespace
+#include "tests/support/ThrownText.h"
 
 TEST(Clib, GetenvYieldsTheValueAndCopiesItWhereABufferIsGiven) {
     ASSERT_EQ(setenv("ZT_CLIB_TEST", "a value", 1), 0);
@@ -137,13 +114,13 @@ static bool sRefuseSystemCall(unsigned aNumber) {
 
 TEST(Clib, MkdirSaysThatThePathExistsWhereAFilterRefusesTheCall) {
     ZTCTemporaryDirectory lDirectory;
-    const int lStatus = sStatusOfChild([&] {
+    const int lStatus = statusOfChild([&] {
         if (!sRefuseSystemCall(scMkdir)) {
             return 2;
         }
         const bool lIsSeen =
-            sTextOf<ZTCExistsEx>([&] { ClibMkdir(lDirectory.path().c_str(), 03777); }) != "nothing was thrown";
-        const bool lIsRefused = sTextOf<ZTCClibMkdirFailedEx>([&] {
+            thrownText<ZTCExistsEx>([&] { ClibMkdir(lDirectory.path().c_str(), 03777); }) != "nothing was thrown";
+        const bool lIsRefused = thrownText<ZTCClibMkdirFailedEx>([&] {
                                     ClibMkdir(lDirectory.path("new").c_str(), 0700);
                                 }).find("Operation not permitted") != std::string::npos;
         return lIsSeen && lIsRefused ? 0 : 1;
@@ -282,27 +259,29 @@ TEST(Clib, ALockIsHeldByOneOpenFileAtATime) {
 TEST(Clib, AFailureNamesItsDescriptorAndTheReason) {
     const std::string lcReason = std::string(" -1 failed: ") + std::strerror(EBADF);
     struct stat lStatus {};
-    EXPECT_EQ(sTextOf<ZTCClibStatFailedEx>([&] { ClibFstat(-1, &lStatus); }),
+    EXPECT_EQ(thrownText<ZTCClibStatFailedEx>([&] { ClibFstat(-1, &lStatus); }),
               "Getting the status of descriptor" + lcReason);
-    EXPECT_EQ(sTextOf<ZTCClibReadFailedEx>([] { ClibBytesWaiting(-1); }),
+    EXPECT_EQ(thrownText<ZTCClibReadFailedEx>([] { ClibBytesWaiting(-1); }),
               "Counting the bytes of descriptor" + lcReason);
-    EXPECT_EQ(sTextOf<ZTCClibReadFailedEx>([] { ClibPipeCapacity(-1); }),
+    EXPECT_EQ(thrownText<ZTCClibReadFailedEx>([] { ClibPipeCapacity(-1); }),
               "Getting the capacity of descriptor" + lcReason);
-    EXPECT_EQ(sTextOf<ZTCClibLockFailedEx>([] { ClibTryLock(-1); }), "Locking descriptor" + lcReason);
-    EXPECT_EQ(sTextOf<ZTCClibTruncateFailedEx>([] { ClibFtruncate(-1, 0); }), "Cutting descriptor" + lcReason);
-    EXPECT_EQ(sTextOf<ZTCClibWriteFailedEx>([] { ClibPwriteAll(-1, "x", 1, 0); }), "Writing to descriptor" + lcReason);
+    EXPECT_EQ(thrownText<ZTCClibLockFailedEx>([] { ClibTryLock(-1); }), "Locking descriptor" + lcReason);
+    EXPECT_EQ(thrownText<ZTCClibTruncateFailedEx>([] { ClibFtruncate(-1, 0); }), "Cutting descriptor" + lcReason);
+    EXPECT_EQ(thrownText<ZTCClibWriteFailedEx>([] { ClibPwriteAll(-1, "x", 1, 0); }),
+              "Writing to descriptor" + lcReason);
 }
 
 TEST(Clib, AFailureNamesItsPathAndTheReason) {
     const std::string lcReason = std::string(" '/dev/null/none' failed: ") + std::strerror(ENOTDIR);
     struct stat lStatus {};
-    EXPECT_EQ(sTextOf<ZTCClibStatFailedEx>([&] { ClibLstat("/dev/null/none", &lStatus); }),
+    EXPECT_EQ(thrownText<ZTCClibStatFailedEx>([&] { ClibLstat("/dev/null/none", &lStatus); }),
               "Getting the status of" + lcReason);
-    EXPECT_EQ(sTextOf<ZTCClibUnlinkFailedEx>([] { ClibUnlink("/dev/null/none"); }), "Removing" + lcReason);
-    EXPECT_EQ(sTextOf<ZTCClibMkfifoFailedEx>([] { ClibMkfifo("/dev/null/none", 0600); }), "Making the FIFO" + lcReason);
-    EXPECT_EQ(sTextOf<ZTCClibOpenFailedEx>([] { ClibChdir("/dev/null/none"); }),
+    EXPECT_EQ(thrownText<ZTCClibUnlinkFailedEx>([] { ClibUnlink("/dev/null/none"); }), "Removing" + lcReason);
+    EXPECT_EQ(thrownText<ZTCClibMkfifoFailedEx>([] { ClibMkfifo("/dev/null/none", 0600); }),
+              "Making the FIFO" + lcReason);
+    EXPECT_EQ(thrownText<ZTCClibOpenFailedEx>([] { ClibChdir("/dev/null/none"); }),
               "Changing into the directory" + lcReason);
-    EXPECT_EQ(sTextOf<ZTCClibDupFailedEx>([] { ClibRedirect(-1, "/dev/null", O_RDONLY); }),
+    EXPECT_EQ(thrownText<ZTCClibDupFailedEx>([] { ClibRedirect(-1, "/dev/null", O_RDONLY); }),
               std::string("Replacing a standard stream by '/dev/null' failed: ") + std::strerror(EBADF));
 }
 
@@ -321,13 +300,13 @@ TEST(Clib, AnEventWhoseCounterIsFullStaysRaised) {
 TEST(Clib, WithoutADescriptorLeftEachCallSaysSo) {
     const ZTCResourceLimit lLimit(RLIMIT_NOFILE, 0);
     EXPECT_EQ(ClibTryOpen("/dev/null", O_RDONLY), -EMFILE);
-    EXPECT_EQ(sTextOf<ZTCClibEventFailedEx>([] { ClibEventFd(); }),
+    EXPECT_EQ(thrownText<ZTCClibEventFailedEx>([] { ClibEventFd(); }),
               std::string("Making an event counter failed: ") + std::strerror(EMFILE));
 }
 #endif
 
 TEST(Clib, ADescriptorThatCannotBeLiftedIsClosedAndAnError) {
-    EXPECT_EQ(sStatusOfChild([] {
+    EXPECT_EQ(statusOfChild([] {
                   close(0);
                   const ZTCResourceLimit lLimit(RLIMIT_NOFILE, 3);
                   return ClibTryOpen("/dev/null", O_RDONLY) < 0 && fcntl(0, F_GETFD) < 0 && errno == EBADF ? 0 : 1;
@@ -339,7 +318,7 @@ TEST(Clib, ADescriptorThatCannotBeLiftedIsClosedAndAnError) {
 TEST(Clib, AWaitOnMoreDescriptorsThanAProcessMayHaveIsAnError) {
     const ZTCResourceLimit lLimit(RLIMIT_NOFILE, 0);
     struct pollfd lDescriptor = {-1, POLLIN, 0};
-    EXPECT_EQ(sTextOf<ZTCClibPollFailedEx>([&] { ClibPoll(&lDescriptor, 1, 0); }),
+    EXPECT_EQ(thrownText<ZTCClibPollFailedEx>([&] { ClibPoll(&lDescriptor, 1, 0); }),
               std::string("Waiting on 1 descriptors failed: ") + std::strerror(EINVAL));
 }
 #endif
