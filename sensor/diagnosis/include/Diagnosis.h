@@ -1,4 +1,4 @@
-/// What the events of a stretch of time mean: a table of rules, each looked for in the evidence.
+/// Explains the events of a period of time: each rule of a table is looked for in the evidence.
 ///
 /// Pure: no clock, no files, no history. Any thread.
 #ifndef SENSOR_DIAGNOSIS_INCLUDE_DIAGNOSIS_H
@@ -25,7 +25,7 @@ enum ZTESeverity : std::uint8_t {
 };
 
 /// "problem", "warning", "note", "noise".
-const char* getSeverityName(ZTESeverity aSeverity);
+const char* getFindingSeverityName(ZTESeverity aSeverity);
 
 /// By how much one of the kernel's counters of a port rose within one minute.
 struct ZTSCounterRise {

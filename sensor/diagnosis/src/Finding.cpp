@@ -3,7 +3,7 @@
 #include "sensor/client/include/NumberText.h"
 #include "sensor/diagnosis/src/Rules.h"
 
-const char* getSeverityName(ZTESeverity aSeverity) {
+const char* getFindingSeverityName(ZTESeverity aSeverity) {
     static constexpr std::array<const char*, 4> scNames{"problem", "warning", "note", "noise"};
     return scNames.at(aSeverity);
 }

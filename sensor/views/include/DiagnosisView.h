@@ -1,4 +1,4 @@
-/// What a stretch of time means: the findings of the rules, and what no rule explains, as text and as JSON.
+/// Explains a period of time, as text and as JSON: the findings of the rules, and the events that no rule explains.
 #ifndef SENSOR_VIEWS_INCLUDE_DIAGNOSISVIEW_H
 #define SENSOR_VIEWS_INCLUDE_DIAGNOSISVIEW_H
 

@@ -71,7 +71,7 @@ enum ZTESanSeverity : std::uint8_t {
 };
 
 /// "notice", "warning" or "critical".
-const char* getSeverityName(ZTESanSeverity aSeverity);
+const char* getSanSeverityName(ZTESanSeverity aSeverity);
 
 /// The troubles that are looked for, the worst first.
 enum ZTESanTrouble : std::uint8_t {

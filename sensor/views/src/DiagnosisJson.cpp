@@ -33,7 +33,7 @@ ZTCJson toJson(const ZTSFinding& acrFinding, const ZTCNameBook& acrNames) {
     }
     const ZTSRule& lrRule = *acrFinding.mpRule;
     return {{"rule", lrRule.mpId},
-            {"severity", getSeverityName(acrFinding.mSeverity)},
+            {"severity", getFindingSeverityName(acrFinding.mSeverity)},
             {"title", lrRule.mpTitle},
             {"subject", acrFinding.mSubject},
             {"first", toRfc3339(acrFinding.mFirst)},

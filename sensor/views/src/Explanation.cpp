@@ -67,9 +67,10 @@ static ZTSExplanation sExplainRule(const ZTSRule& acrRule) {
     lExplanation.mSubject = "rule";
     lExplanation.mId = acrRule.mpId;
     lExplanation.mTitle = acrRule.mpTitle;
-    lExplanation.mParts = {{"looks for", {acrRule.mpWanted}}, {"means", {acrRule.mpMeans}},
-                           {"unless", {acrRule.mpAgainst}},   {"look at", sStepsOf(acrRule)},
-                           {"kinds", {acrRule.mpKinds}},      {"severity", {getSeverityName(acrRule.mSeverity)}}};
+    lExplanation.mParts = {
+        {"looks for", {acrRule.mpWanted}}, {"means", {acrRule.mpMeans}},
+        {"unless", {acrRule.mpAgainst}},   {"look at", sStepsOf(acrRule)},
+        {"kinds", {acrRule.mpKinds}},      {"severity", {getFindingSeverityName(acrRule.mSeverity)}}};
     return lExplanation;
 }
 

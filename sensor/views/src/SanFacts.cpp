@@ -13,7 +13,7 @@ const char* getRedundancyName(ZTERedundancy aRedundancy) {
     return scRedundancies.at(aRedundancy);
 }
 
-const char* getSeverityName(ZTESanSeverity aSeverity) {
+const char* getSanSeverityName(ZTESanSeverity aSeverity) {
     return scSeverities.at(aSeverity);
 }
 

@@ -299,7 +299,7 @@ ZTSTroubleText describeSanTrouble(const ZTSSanTrouble& acrTrouble, const ZTSSanF
     return {.mId = lrRow.mpId,
             .mTitle = lrRow.mpTitle,
             .mSubject = sSubject(acrTrouble, acrFacts, acrNames),
-            .mSeverity = getSeverityName(acrTrouble.mSeverity),
+            .mSeverity = getSanSeverityName(acrTrouble.mSeverity),
             .mStatus = sStatus(acrTrouble, acrFacts, acrNames, aNow),
             .mAction = {getSanAction(lrRow, sNamePort(acrTrouble, acrNames))},
             .mSee = std::string("tavik explain ") + lrRow.mpId};
