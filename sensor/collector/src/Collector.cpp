@@ -20,6 +20,17 @@ static constexpr seconds scFinishPatience{14};
 static constexpr seconds scHistoryPatience{4};
 static_assert(scFinishPatience + scHistoryPatience < gcFinishLimit);
 
+/// The places of what is polled; clients of the control socket come behind them.
+enum ZTEPolled : std::size_t {
+    ZTPD_Keeper,
+    ZTPD_History,
+    ZTPD_Response,
+    ZTPD_AgentBell,
+    ZTPD_Outputs,
+    ZTPD_Topology,
+    ZTPD_Count
+};
+
 static ZTSStoreLimits sStoreLimits(const ZTSSettings& acrSettings) {
     ZTSStoreLimits lLimits;
     lLimits.mEpisodeGap = acrSettings.mEpisodeGap;
@@ -142,25 +153,27 @@ int ZTCCollector::getPollTime(ZTCTime aNow) const {
 }
 
 void ZTCCollector::poll(ZTCTime aNow) {
-    mFds.clear();
-    mFds.push_back({.fd = mKeeper.getDescriptor(), .events = mKeeper.getEvents(), .revents = 0});
-    mFds.push_back({.fd = mHistory.getBell(), .events = POLLIN, .revents = 0});
-    mFds.push_back({.fd = mAgents.getResponseFifo(), .events = POLLIN, .revents = 0});
-    mFds.push_back({.fd = mAgents.getBell(), .events = POLLIN, .revents = 0});
-    mFds.push_back({.fd = mOutputs.getBell(), .events = POLLIN, .revents = 0});
-    mFds.push_back({.fd = mTopology.getBell(), .events = POLLIN, .revents = 0});
+    mFds.assign(ZTPD_Count, {.fd = -1, .events = POLLIN, .revents = 0});
+    mFds[ZTPD_Keeper].fd = mKeeper.getDescriptor();
+    mFds[ZTPD_Keeper].events = mKeeper.getEvents();
+    mFds[ZTPD_History].fd = mHistory.getBell();
+    mFds[ZTPD_Response].fd = mAgents.getResponseFifo();
+    mFds[ZTPD_AgentBell].fd = mAgents.getBell();
+    mFds[ZTPD_Outputs].fd = mOutputs.getBell();
+    mFds[ZTPD_Topology].fd = mTopology.getBell();
     mControl.addTo(mFds);
     if (::poll(mFds.data(), static_cast<nfds_t>(mFds.size()), getPollTime(aNow)) <= 0) {
         return;
     }
-    for (const std::size_t lBell : {1U, 5U}) {
+    // The bell of the outputs is read empty with what it rings for, at every turn.
+    for (const ZTEPolled lBell : {ZTPD_History, ZTPD_Topology}) {
         if (mFds[lBell].revents != 0) {
             std::uint64_t lCount = 0;
             [[maybe_unused]] const ssize_t lRead = read(mFds[lBell].fd, &lCount, sizeof(lCount));
         }
     }
-    mAgents.noteResponseEvents(mFds[2].revents);
-    mAgents.noteBellEvents(mFds[3].revents, std::chrono::steady_clock::now());
+    mAgents.noteResponseEvents(mFds[ZTPD_Response].revents);
+    mAgents.noteBellEvents(mFds[ZTPD_AgentBell].revents, std::chrono::steady_clock::now());
 }
 
 // ---- the keeper ----
