@@ -1,5 +1,6 @@
-// The configuration as people write it: a file is good or each of its errors names its line, its key and what is wrong;
-// what is good stays the same when it is read again. Durations and sizes can be written and read again.
+// Reads any text as a configuration file. Every file is good, or each of its errors names a line, a key and the reason.
+// A good file gives the same settings when it is read again. A duration or size that was read can be written and read
+// again.
 //
 // Input: the text of a configuration file. Its first line is also read as a duration and as a size.
 #include <algorithm>

@@ -1,6 +1,6 @@
 /// Assertions: broken invariants are bugs, logged at halt level, and end the process with exit status 1.
 ///
-/// The condition is evaluated once. Its text is logged as it stands in the source. The checks of consistency only log.
+/// The condition is evaluated once. Its text is logged exactly as in the source. The checks of consistency only log.
 
 #ifndef COMMON_INCLUDE_ASSERT_H
 #define COMMON_INCLUDE_ASSERT_H

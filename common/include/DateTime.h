@@ -35,7 +35,7 @@ public:
     std::uint16_t getMicroSeconds() const noexcept { return mMicroSeconds; }  ///< 0 to 999, below the millisecond
     std::uint64_t getSecondsSinceEpoch() const noexcept { return mSecondsSinceEpoch; }
 
-    /// Writes the fields in the order in which they stand here, 20 bytes. Failures are the stream's.
+    /// Writes the fields in the order of their declarations, 20 bytes. Failures are the stream's.
     void encode(ZTCEncodableOutStream& arStream) const;
 
     /// Stores the same 20 bytes; returns the address behind them.
@@ -53,7 +53,7 @@ private:
     }
     void setLocalFields(const std::tm& acrLocal) noexcept;
 
-    /// Bytes of the local fields, which stand first and without gaps.
+    /// Bytes of the local fields, which come first and without gaps.
     static constexpr std::size_t gcLocalSize = 7;
 
     std::uint16_t mYear = 0;

@@ -1,6 +1,6 @@
 /// Typed fields to and from the bytes of a message.
 ///
-/// Fields stand back to back without tags or padding; numbers are in network byte order; a string is its 32-bit byte
+/// Fields follow each other without tags or padding; numbers are in network byte order; a string is its 32-bit byte
 /// count and its bytes. What has no width of its own on the wire (bool, char, enumerations, pointers) is refused at
 /// compile time: the writer states the width.
 

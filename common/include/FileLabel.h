@@ -60,7 +60,7 @@ constexpr const char* fileLabelText() noexcept {
 /// The label of a path given as a string literal.
 #define ZT_FILE_LABEL_OF(aPath) (fileLabelText<ZTSFileLabel(aPath)>())
 
-/// The label of the file that this stands in.
+/// The label of the file that uses this macro.
 #define ZT_FILE_LABEL ZT_FILE_LABEL_OF(__FILE__)
 
 #endif

@@ -79,7 +79,7 @@ void setLogFileBound(std::uint64_t aBytes) noexcept;
 void printLogMessageFromText(unsigned aLevel, const char* apMark, unsigned aLine, const char* apFunction,
                              const char* apFile, const char* apText) noexcept;
 
-/// Writes one line at debug level, if the level is enabled. The text is taken as it stands. Its calls are kept out of
+/// Writes one line at debug level, if the level is enabled. The text is not a format. Its calls are kept out of
 /// the way of the code around them.
 [[gnu::cold]] void printTraceLine(unsigned aLine, const char* apFunction, const char* apFile,
                                   const char* apText) noexcept;

@@ -26,7 +26,7 @@ public:
     /// The milliseconds between two attempts to open a file that could not be opened or renamed.
     static constexpr std::uint64_t gcRetryIntervalMs = 1000;
 
-    /// The reason, in place of an error number, why something is refused that is no file for a log.
+    /// In place of an error number: what is at the path cannot be used as a log file.
     static constexpr int gcWrongKind = -2;
 
     constexpr ZTCLogFile() noexcept = default;

@@ -24,7 +24,7 @@ public:
     ~ZTCLogLine();
 
     /// Adds the formatted text, escapes its control characters, drops one line break at its end, and ends the line.
-    /// A format that cannot be carried out is added as it stands. Called once.
+    /// A format that cannot be carried out is added itself, as text. Called once.
     void finish(const char* apFormat, std::va_list aArguments) noexcept;
 
     /// Whether the line begins with room for a time stamp.

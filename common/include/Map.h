@@ -1,4 +1,4 @@
-/// An ordered map whose misses and collisions are the framework's exceptions.
+/// An ordered map. A missing key and a key that is there already are reported by the framework's exceptions.
 
 #ifndef COMMON_INCLUDE_MAP_H
 #define COMMON_INCLUDE_MAP_H

@@ -1,4 +1,4 @@
-/// Writing bytes below everything else, for the log.
+/// Writes bytes without using any other part of the framework. For the log, which all other parts use.
 
 #ifndef COMMON_INCLUDE_RAWWRITE_H
 #define COMMON_INCLUDE_RAWWRITE_H

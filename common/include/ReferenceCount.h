@@ -15,13 +15,13 @@ public:
 
     /// Adds one.
     void increment() noexcept {
-        // Relaxed: who adds one holds a pointer already, so the object cannot go away meanwhile.
+        // Relaxed: the caller already holds a pointer, so the object cannot go away meanwhile.
         mCount.fetch_add(1, std::memory_order_relaxed);
     }
 
     /// Subtracts one and returns the new count. Who gets zero releases the object.
     std::size_t decrement() noexcept {
-        // Release: what this thread did to the object comes before its release. Acquire: the one who releases sees it.
+        // Release: what this thread did to the object comes before its release. Acquire: the last owner sees it.
         return mCount.fetch_sub(1, std::memory_order_acq_rel) - 1;
     }
 

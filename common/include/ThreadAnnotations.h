@@ -39,7 +39,7 @@
 /// On a function: what it returns is the lock of the argument.
 #define ZT_RETURN_CAPABILITY(...) ZT_THREAD_ATTRIBUTE(lock_returned(__VA_ARGS__))
 
-/// On a function: its body is not analysed. The reason stands beside it.
+/// On a function: its body is not analyzed. A comment beside it says why.
 #define ZT_NO_THREAD_SAFETY_ANALYSIS ZT_THREAD_ATTRIBUTE(no_thread_safety_analysis)
 
 #endif

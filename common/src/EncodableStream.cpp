@@ -74,7 +74,7 @@ ZTCEncodableOutStream& ZTCEncodableOutStream::operator<<(const ZTCString& acrTex
     try {
         mBuffer->append(acrText.get(), lLength);
     } catch (...) {
-        // A count without its bytes is no field.
+        // A count without its bytes is not taken.
         mBuffer->resize(lFormerSize);
         throw;
     }

@@ -98,7 +98,7 @@ bool sHasControl(std::uint64_t aBytes) noexcept {
     return ((lBelowBlank | ((lDeletes - lcOnes) & ~lDeletes)) & lcHighs) != 0;
 }
 
-/// How many bytes stand in front of the first control character, or a few fewer.
+/// How many bytes come before the first control character, or a few fewer.
 std::size_t sSkipPlain(const char* apText, std::size_t aLength) noexcept {
     std::size_t lSkipped = 0;
     while (aLength - lSkipped >= sizeof(std::uint64_t)) {

@@ -11,7 +11,7 @@
 
 enum ZTECommandLineArgumentType : unsigned char {
     ZTCLAT_None = 0,
-    ZTCLAT_OptionOnly = 1,   ///< stands alone
+    ZTCLAT_OptionOnly = 1,   ///< has no value
     ZTCLAT_OptionValue = 2,  ///< the next argument is its value
     ZTCLAT_Max = 3
 };

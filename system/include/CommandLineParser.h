@@ -18,7 +18,7 @@ enum ZTEParsingState : unsigned char {
     ZTPS_Max = 4
 };
 
-/// What a command line asks for. A value stands only where its flag says so; of an option given twice the last one.
+/// What a command line asks for. A value is valid where its flag is set; of an option given twice the last one.
 struct ZTSCommandLineOptions {
     bool mShowHelp = false;       ///< -h
     bool mShowVersion = false;    ///< -v

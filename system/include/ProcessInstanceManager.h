@@ -32,7 +32,7 @@ public:
 
     /// Takes the lock, which is kept over a fork, and empties the file, made with mode 0644 where there is none: false.
     /// True, with nothing touched, while another process holds the lock; getProcessId() is then what the file names, or
-    /// -1. Throws ZTCInvalidEx where something else than a regular file stands at the path, ZTCClibEx for the rest.
+    /// -1. Throws ZTCInvalidEx where the path is not a regular file, ZTCClibEx for the rest.
     bool isAnInstanceRunning();
 
     /// Writes this process's id into the file, after taking the lock if isAnInstanceRunning() was not called. From here
@@ -49,8 +49,8 @@ public:
     /// does not rotate the log. Does nothing a second time.
     void exitInstanceManagement();
 
-    /// Returns if the pid file holds the id, above 0 and in decimal, of a process that exists and is no zombie; throws
-    /// ZTCClibGetProcStatusFailedEx, which names the file and the reason, if not.
+    /// Returns if the pid file holds the id, above 0 and in decimal, of a process that exists and is not a zombie;
+    /// throws ZTCClibGetProcStatusFailedEx, which names the file and the reason, if not.
     void getProcStatus(const ZTCString& acrPidFilePath) const;
 
     /// This process's id once it is marked as running, another's that runs in its place, or -1.

@@ -33,7 +33,7 @@ public:
 
     void noteEnd() noexcept;
 
-    /// Raised whenever a thread has ended; taken back by who looks.
+    /// Raised whenever a thread has ended; the thread that looks takes it back.
     ZTCProcessEvent& getEndEvent() { return mEndEvent; }
 
     /// Waits for every thread that was started.
@@ -50,7 +50,7 @@ private:
     std::list<ZTSEntry> mThreads;
     unsigned mNumberOfStarted = 0;
 
-    // Release on the way up, acquire where it is read: who sees the end of a thread sees what it did.
+    // Release on the way up, acquire where it is read: a reader that sees a thread's end sees what it did.
     std::atomic<unsigned> mNumberOfEnded{0};
     ZTCProcessEvent mEndEvent;
 };

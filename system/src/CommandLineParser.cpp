@@ -9,7 +9,7 @@
 
 namespace {
 
-/// A text of the command line as it can stand in a message: one line, of bounded length.
+/// Makes a text of the command line fit for a message: one line, of bounded length.
 class ZTCShownText {
 public:
     explicit ZTCShownText(const char* apText) {

@@ -22,7 +22,7 @@ constexpr ::mode_t scPidFileMode = 0600;
 constexpr int scLockTries = 10;
 constexpr int scLockPauseMilliseconds = 10;
 
-// Each round needs somebody who replaces the file in between.
+// Another round is needed only when somebody has replaced the file in between.
 constexpr int scReplacedTries = 100;
 
 constexpr int scPollMilliseconds = 20;
@@ -54,7 +54,7 @@ std::int32_t sParsePid(const char* apText) {
     return *apText == '\0' && lPid > 0 ? static_cast<std::int32_t>(lPid) : scBadPid;
 }
 
-/// The process id in the file that the descriptor stands at the beginning of.
+/// Reads the process id from the descriptor, which is at the beginning of its file.
 std::int32_t sReadPid(int aDescriptor) {
     char lText[64] = {};
     std::size_t lHad = 0;

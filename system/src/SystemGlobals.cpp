@@ -12,7 +12,7 @@
 
 namespace {
 
-// Relaxed: the value stands alone.
+// Relaxed: no other data depend on the value.
 std::atomic<unsigned> sHbTimeout{gcDefaultHbTimeout};
 
 ZTCSystem* spSystem = nullptr;

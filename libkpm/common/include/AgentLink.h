@@ -1,5 +1,5 @@
-/// What the library tells the agent of itself: lines for the agent's log, the state of each source, and the totals of
-/// losses. Each goes through a function that the agent hands over before Init; without one, it is dropped.
+/// Reports from the library to the agent: lines for the agent's log, the state of each source, and the totals of
+/// losses. Each goes through a function that the agent hands over before Init. Without that function it is dropped.
 ///
 /// All functions may be called from any thread, but never with a lock held that an entry of the library takes.
 #ifndef LIBKPM_COMMON_INCLUDE_AGENTLINK_H

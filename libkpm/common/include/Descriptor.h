@@ -27,7 +27,7 @@ public:
     int get() const { return mDescriptor; }
     bool isOpen() const { return mDescriptor >= 0; }
 
-    /// Gives it to the caller, who closes it.
+    /// Gives the descriptor to the caller, who has to close it.
     int release() { return std::exchange(mDescriptor, -1); }
 
 private:

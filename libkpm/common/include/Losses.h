@@ -1,5 +1,5 @@
-/// Counts what a library has lost, under names from a table, and says so: in the agent's log at most once a second and
-/// name, and as running totals through the report function.
+/// Counts what a library has lost, under names from a table. Reports each name in the agent's log at most once a
+/// second, and the running totals through the report function.
 #ifndef LIBKPM_COMMON_INCLUDE_LOSSES_H
 #define LIBKPM_COMMON_INCLUDE_LOSSES_H
 
@@ -27,7 +27,7 @@ public:
     void count(std::size_t aKind, std::uint64_t aNumber = 1) { mRows[aKind].mTotal += aNumber; }
     std::uint64_t getTotal(std::size_t aKind) const { return mRows[aKind].mTotal; }
 
-    /// Tells what is new of each kind that has been silent for a second. A kind that cannot be told for want of memory
+    /// Reports what is new of each kind that was not reported for a second. A kind that lacks the memory to be reported
     /// stays new.
     void tell(Clock::time_point aNow);
 

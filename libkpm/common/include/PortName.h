@@ -1,4 +1,4 @@
-/// World wide names: comparing and printing them, and telling a name from none. Pure.
+/// World wide names: compares them, prints them, and recognizes the empty name. Pure.
 #ifndef LIBKPM_COMMON_INCLUDE_PORTNAME_H
 #define LIBKPM_COMMON_INCLUDE_PORTNAME_H
 

@@ -1,6 +1,6 @@
-/// The entries of libkpm.h that ask for adapters and register callbacks, as both libraries answer them: the arguments
-/// are checked in one order, with one status for each mistake, and the registrations are kept. A library derives its
-/// engine from the desk and says which boards and kinds it has.
+/// The entries of libkpm.h for adapters and for registrations, as both libraries answer them. They check the arguments
+/// in the same order, return the same status for the same mistake, and keep the registrations. A library derives its
+/// engine from this class and overrides which boards and kinds it has.
 ///
 /// All operations may be called from any thread.
 #ifndef LIBKPM_COMMON_INCLUDE_REGISTRATIONDESK_H

@@ -1,6 +1,6 @@
-/// Which FC host is which board. The hosts of one look get boards in order of their numbers, and a board is never given
-/// to another port: a host that leaves leaves its board empty, and a port that comes back, known by its name, gets its
-/// own board again. A host without a name is held back until it has one. Pure.
+/// Maps FC hosts to boards. New hosts get boards in the order of their numbers. A board belongs to one port for ever:
+/// it stays empty while the port's host is gone, and the port gets it again when it comes back. Ports are known by
+/// their names, so a host whose name cannot be read yet has to wait for its board. Pure.
 #ifndef LIBKPM_LINUX_SRC_BOARDS_H
 #define LIBKPM_LINUX_SRC_BOARDS_H
 

@@ -105,7 +105,7 @@ void ZTCLinuxEngine::runRound() {
     report();
 }
 
-/// What is left is delivered and told, as far as memory allows. The sources are closed in any case.
+/// Delivers and reports what is left, as far as memory allows. Closes the sources in any case.
 void ZTCLinuxEngine::finish() {
     try {
         mOutcomes.stop();

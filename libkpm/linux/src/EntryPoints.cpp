@@ -24,7 +24,7 @@ using ZTCLinuxLibrary = ZTCOpenLibrary<ZTSLinuxSession>;
 static void sReportAs(const char* apPrefix, const char* apWhat) noexcept {
     try {
         logLibraryLine(KPM_LOG_ERROR, std::string(apPrefix) + apWhat);
-    } catch (const std::exception&) {  // out of memory: the status alone has to tell of it
+    } catch (const std::exception&) {  // out of memory: only the status can report it
         return;
     }
 }

@@ -1,5 +1,6 @@
 /// Finds lost messages in a running count. The kernel numbers its FC events with one count for all hosts, and two
-/// processors may send theirs in the other order: a number counts as lost only when the messages at hand are through.
+/// processors may send theirs in the wrong order. So a missing number counts as lost only after all messages that have
+/// arrived were read.
 #ifndef LIBKPM_LINUX_SRC_EVENTSEQUENCE_H
 #define LIBKPM_LINUX_SRC_EVENTSEQUENCE_H
 

@@ -1,4 +1,4 @@
-/// The socket on which the kernel tells of FC events.
+/// The netlink socket on which the kernel sends FC events.
 #ifndef LIBKPM_LINUX_SRC_FCEVENTSOCKET_H
 #define LIBKPM_LINUX_SRC_FCEVENTSOCKET_H
 

@@ -28,7 +28,7 @@ enum ZTELinuxFcCode : std::uint32_t {
     ZTLFC_LipReset = 0x4,
     ZTLFC_Rscn = 0x5,
     ZTLFC_AdapterChange = 0x103,
-    ZTLFC_PortUnknown = 0x200,  ///< the first of the five that tell a port's state
+    ZTLFC_PortUnknown = 0x200,  ///< the first of the five that report a port's state
     ZTLFC_PortError = 0x204     ///< the last of them
 };
 

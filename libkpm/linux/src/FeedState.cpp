@@ -81,7 +81,7 @@ ZTSFeedStep ZTCFeedState::happen(ZTEFeedHappening aHappening, const std::string&
         // First: where memory is short, the state is as it was.
         mReason = acrReason;
     }
-    // The same state for the same reason was told before.
+    // The same state was already reported for the same reason.
     lStep.mIsToTell = lIsNewReason || (lStep.mIsToTell && lStep.mNext != get());
     mChanges += lStep.mIsToTell ? 1 : 0;
     mState.store(lStep.mNext, std::memory_order_relaxed);

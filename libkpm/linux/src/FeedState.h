@@ -37,7 +37,7 @@ enum ZTEFeedAction : std::uint8_t {
 struct ZTSFeedStep {
     ZTEFeedState mNext;
     ZTEFeedAction mAction;
-    bool mIsToTell = false;  ///< the log and the agent are told of the new state
+    bool mIsToTell = false;  ///< the new state is to be logged and reported to the agent
 };
 
 /// The table.
@@ -81,7 +81,7 @@ public:
     /// Why it does not work; empty where it does. The library's thread alone.
     const std::string& getReason() const { return mReason; }
 
-    /// Counts what was to be told. The library's thread alone.
+    /// Counts the reports that were due. The library's thread alone.
     std::uint64_t getChanges() const { return mChanges; }
 
 private:

@@ -12,7 +12,7 @@
 
 using ZTCByteSpan = std::span<const std::uint8_t>;
 
-/// The number of a type's size that stands at a place, in that order of its bytes.
+/// Reads a number of the type's size at this place, in this byte order.
 template <class Number>
 std::uint64_t loadNumber(const std::uint8_t* apPlace, std::endian aOrder) {
     Number lNumber = 0;

@@ -1,4 +1,4 @@
-/// What each of the twenty event kinds is made from here, in the order of gcScopeEventKinds.
+/// The source in the kernel of each of the twenty event kinds, in the order of gcScopeEventKinds.
 #ifndef LIBKPM_LINUX_SRC_KINDSOURCES_H
 #define LIBKPM_LINUX_SRC_KINDSOURCES_H
 

@@ -9,7 +9,7 @@
 
 #include "libkpm/linux/src/SysfsText.h"
 
-/// One change as the link callback tells it.
+/// One change as the link callback reports it.
 struct ZTSLinuxLinkChange {
     bool mIsUp = false;
     std::uint32_t mTag = 0;  ///< number of this change
@@ -36,8 +36,8 @@ private:
 
     ZTELinuxLink mState = ZTLK_Unknown;
     bool mIsToldUp = false;     // what the last message said, or would have said
-    std::uint32_t mUntold = 0;  // changes that messages told of and no reading has shown
-    std::uint32_t mAhead = 0;   // changes that a reading has shown and no message has told of
+    std::uint32_t mUntold = 0;  // changes reported by messages that no reading has shown
+    std::uint32_t mAhead = 0;   // changes shown by a reading that no message has reported
     std::uint32_t mUp = 0;
     std::uint32_t mDown = 0;
 };

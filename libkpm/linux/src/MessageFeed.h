@@ -1,5 +1,5 @@
-/// FC messages of the kernel: opens the socket, reads it, delivers RSCNs, and passes on to the watcher what tells of a
-/// link. Opened, lost, retried and told by itself.
+/// The feed of FC messages from the kernel: opens the socket, reads it, delivers RSCNs, and passes messages about links
+/// to the watcher. It reports its own state, and opens its source again after a failure.
 ///
 /// Used by the library's thread alone (and by start(), before there is one), save for getState().get().
 #ifndef LIBKPM_LINUX_SRC_MESSAGEFEED_H

@@ -1,6 +1,6 @@
-/// Outcomes of SCSI commands: opens the trace instance, keeps its filter at the hosts there are, reads its buffers, and
-/// delivers queue full, device busy and check condition. Where sense data come by a probe, its buffers are read too.
-/// Opened, lost, retried and told by itself.
+/// The feed of SCSI outcomes: opens the trace instance, sets its filter to the present hosts, reads its buffers, and
+/// delivers queue full, device busy and check condition. Where sense data come by a probe, it reads the probe's buffers
+/// too. It reports its own state, and opens its source again after a failure.
 ///
 /// Used by the library's thread alone (and by start(), before there is one), save for getState().get().
 #ifndef LIBKPM_LINUX_SRC_OUTCOMEFEED_H
@@ -102,7 +102,7 @@ private:
     const ZTSTracePlace mPlace;
     ZTCTraceFiles& mrFiles;
     ZTCLinuxHostWatcher& mrWatcher;
-    ZTCLinuxQueueDepths& mrDepths;  // told of each queue full
+    ZTCLinuxQueueDepths& mrDepths;  // notified of each queue full
     const ZTCLinuxDelivery& mrDelivery;
     ZTCLosses& mrLosses;
 
@@ -115,7 +115,7 @@ private:
     std::vector<Buffer> mBuffers;
     std::uint64_t mHostsVersion = 0;            // of the hosts that the filter names; 0: to be set
     std::vector<std::uint32_t> mFilteredHosts;  // that the filter in use names, in ascending order
-    std::string mFilterProblem;                 // as it was told last; empty while the filter names all hosts
+    std::string mFilterProblem;                 // as last reported; empty while the filter names all hosts
     std::uint64_t mFilterChanges = 0;
     std::string mSenseProblem;
     std::vector<std::uint8_t> mPage;

@@ -1,4 +1,4 @@
-/// The outcome of one SCSI command as a trace record tells it. Pure.
+/// The outcome of one SCSI command as a trace record has it. Pure.
 #ifndef LIBKPM_LINUX_SRC_SCSIOUTCOME_H
 #define LIBKPM_LINUX_SRC_SCSIOUTCOME_H
 

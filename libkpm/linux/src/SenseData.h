@@ -1,5 +1,6 @@
-/// Sense data on kernels whose trace has none: a probe on the function with which the kernel looks at the sense data of
-/// a failed command, and what its records say. Pure: descriptions in, texts and numbers out.
+/// Sense data on kernels whose trace records have none. The kernel decodes the sense data of a failed command in one
+/// function; a probe on that function records them. This header makes the text of the probe and reads its records.
+/// Pure: descriptions in, texts and numbers out.
 #ifndef LIBKPM_LINUX_SRC_SENSEDATA_H
 #define LIBKPM_LINUX_SRC_SENSEDATA_H
 

@@ -1,9 +1,13 @@
-/// Joins check conditions with their sense data where the two come as separate trace records. A command's outcome is
-/// written first, its sense data soon after, perhaps on another processor and so to another buffer: the records may be
-/// read in any order. An outcome waits a short time for its sense data and is then handed on without. Pure.
+/// Joins check conditions with their sense data where the two come as separate trace records.
 ///
-/// Sense data belong to the last outcome of a command of that name that was written before them. Such as belong to
-/// none (the kernel looks at sense data of its own commands too) are dropped after the same time.
+/// The kernel writes a command's outcome first and its sense data soon after. That may happen on another processor, and
+/// so in another buffer: the two records can be read in either order. An outcome waits a short time for its sense data,
+/// and is then handed on without them.
+///
+/// Sense data belong to the last outcome of the same command that was written before them. Sense data that belong to no
+/// outcome are dropped after the same time; the kernel also decodes sense data of commands that it sends itself.
+///
+/// Makes no system call. Belongs to one thread.
 #ifndef LIBKPM_LINUX_SRC_SENSEMATCHER_H
 #define LIBKPM_LINUX_SRC_SENSEMATCHER_H
 
@@ -21,26 +25,27 @@ class ZTCSenseMatcher {
 public:
     using Clock = std::chrono::steady_clock;
 
-    /// How long an outcome waits. Longer than a completion takes to move to another processor and its record to be
-    /// read.
+    /// How long an outcome waits. It is longer than the time in which a completion moves to another processor and its
+    /// record is read.
     static constexpr std::chrono::milliseconds scWait{1000};
 
-    /// With more outcomes than this, the oldest of each command do not wait any longer.
+    /// With more outcomes and sense data than this, take() hands on all outcomes without waiting.
     static constexpr std::size_t scMostHeld = 16384;
 
-    /// Times of records are in one clock, that of the trace; `aNow` is when they are read. Throw std::bad_alloc, with
-    /// what was held before as it was.
+    /// @param aTime  the record's own time, by the clock of the trace
+    /// @param aNow   when it was read
+    /// Throw std::bad_alloc; what was held before is unchanged then.
     void addOutcome(const ZTSScsiOutcome& acrOutcome, std::uint64_t aTime, Clock::time_point aNow);
     void addSense(const ZTSSenseRecord& acrRecord, std::uint64_t aTime, Clock::time_point aNow);
 
-    /// The outcomes that have their sense data, or have waited long enough; each once. To be called when all records
-    /// at hand were added. Allocates nothing. What it returns is good until the next call of any operation.
+    /// Returns each outcome that has its sense data or has waited long enough, once. To be called when all records at
+    /// hand were added. Allocates nothing. The result is valid until the next call of any function.
     const std::vector<ZTSScsiOutcome>& take(Clock::time_point aNow) noexcept;
 
-    /// All outcomes that are held, with their sense data where these have come.
+    /// Returns all outcomes, with their sense data where these have come.
     const std::vector<ZTSScsiOutcome>& takeAll() noexcept { return take(Clock::time_point::max()); }
 
-    /// When the first outcome will have waited long enough; nothing where none waits.
+    /// When the first outcome will have waited long enough; empty where no outcome waits.
     std::optional<Clock::time_point> getNextTime() const;
 
 private:

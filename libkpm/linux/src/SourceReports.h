@@ -1,5 +1,5 @@
-/// What the agent is told of each kind's source on each board: reported when a board is found, and on every change.
-/// Registrations are answered by the same states.
+/// Reports to the agent the state of each kind's source on each board: when a board is found, and after each change.
+/// Registrations get their answers from the same states.
 #ifndef LIBKPM_LINUX_SRC_SOURCEREPORTS_H
 #define LIBKPM_LINUX_SRC_SOURCEREPORTS_H
 

@@ -1,5 +1,5 @@
-/// What the library asks of the kernel that needs rights: the socket of FC events, and the directories of trace
-/// instances. Tests have a kernel of their own.
+/// The two sources in the kernel that need rights: the socket of FC events, and the directories of trace instances.
+/// Tests replace them with doubles.
 #ifndef LIBKPM_LINUX_SRC_SOURCES_H
 #define LIBKPM_LINUX_SRC_SOURCES_H
 

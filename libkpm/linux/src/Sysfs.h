@@ -1,5 +1,5 @@
-/// Looks at the FC transport class below one root (/sys; tests have trees of their own). What is missing, garbled or
-/// vanishes while it is read is told as not known. From any thread.
+/// Reads the FC transport class below one root: /sys, or a tree made by a test. A value is absent from the result where
+/// its file is missing, cannot be parsed, or vanishes while it is read. May be used from any thread.
 #ifndef LIBKPM_LINUX_SRC_SYSFS_H
 #define LIBKPM_LINUX_SRC_SYSFS_H
 
@@ -29,7 +29,7 @@ class ZTCSysfs {
 public:
     explicit ZTCSysfs(std::string aRoot) : mRoot(std::move(aRoot)) {}
 
-    /// All FC hosts, in ascending order; nothing where it cannot be told which there are.
+    /// All FC hosts, in ascending order; empty where the directory cannot be read.
     std::optional<std::vector<ZTSLinuxHost>> readHosts() const;
 
     ZTELinuxLink readPortState(std::uint32_t aHost) const;
@@ -52,7 +52,7 @@ class ZTCLinuxRemotePorts {
 public:
     explicit ZTCLinuxRemotePorts(const ZTCSysfs& acrSysfs) : mrSysfs(acrSysfs) {}
 
-    /// The port name of a target; the zero name where it cannot be told.
+    /// The port name of a target; the zero name where it is not known.
     HBA_wwn find(std::uint32_t aHost, std::uint32_t aChannel, std::uint32_t aTarget);
 
     void forget();

@@ -47,7 +47,7 @@ struct ZTSTracePageLayout {
     std::size_t mCommitSize = 0;
     std::size_t mDataOffset = 0;
     std::size_t mPageSize = 0;
-    ZTSTraceFieldPlace mTime{};  ///< of the page; a size of 0: not told
+    ZTSTraceFieldPlace mTime{};  ///< of the page; a size of 0: not described
 };
 
 /// Where the fields of a finished SCSI command are in its record.

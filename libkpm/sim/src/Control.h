@@ -1,4 +1,4 @@
-/// What can be asked of a running engine, one line of text for one line of answer.
+/// The requests to a running engine: one line of text each, with one line as the answer.
 ///
 ///   status                    ok delivered=N dropped=N pages=N registered=N adapters=N schedule=waiting|running|done
 ///   counts                    ok KIND=N ...: delivered events of each kind
@@ -13,7 +13,7 @@
 
 class ZTCSimEngine;
 
-/// Answers one line, without line breaks on either side. Throws nothing but std::bad_alloc.
+/// Answers one line, without line breaks on either side. Throws only std::bad_alloc.
 std::string answerSimLine(ZTCSimEngine& arEngine, std::string_view aLine);
 
 #endif

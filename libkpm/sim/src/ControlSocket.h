@@ -1,5 +1,4 @@
-/// The Unix stream socket on which a running library is spoken to: each line that a client sends is answered with one
-/// line.
+/// The Unix stream socket of a running library. Each line that a client sends gets one line as its answer.
 #ifndef LIBKPM_SIM_SRC_CONTROLSOCKET_H
 #define LIBKPM_SIM_SRC_CONTROLSOCKET_H
 

@@ -13,7 +13,7 @@
 struct ZTSSimDelivery {
     std::size_t mKind = 0;
     std::uint32_t mBoard = 0;      ///< whose registration is used
-    std::uint32_t mToldBoard = 0;  ///< what the callback is told
+    std::uint32_t mToldBoard = 0;  ///< the board that the callback gets
     HBA_wwn mLocal{};
     std::uint32_t mCategory = 0;
     std::uint32_t mSubcategory = 0;

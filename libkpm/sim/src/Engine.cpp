@@ -230,7 +230,7 @@ bool ZTCSimEngine::deliver(const ZTSSimDelivery& acrDelivery) {
     }
     lendSimDelivery(*lRegistration, acrDelivery, mScenario.mHasOddAddresses);
     mPages.fetch_add(countSimPages(acrDelivery), std::memory_order_relaxed);
-    // Release, with the acquire in getStatus(): who reads the count sees what the callback did.
+    // Release, with the acquire in getStatus(): a thread that reads the count sees what the callback did.
     mDeliveredByKind[acrDelivery.mKind].fetch_add(1, std::memory_order_release);
     return true;
 }

@@ -1,10 +1,10 @@
 /// Plays one scenario: answers the entry points' questions, keeps the registrations, and delivers the events of the
 /// schedule from threads of its own.
 ///
-/// Threads. One thread, the timer, delivers all lines that ask for no threads of their own, changes the number of
-/// boards and the states of kinds, and loses what there is to lose; every line with threads= and every storm has its
-/// own. All are started by start(), wait for the schedule's start, and have ended when stop() returns. inject()
-/// delivers on the thread that calls it. A callback is called with no lock held.
+/// Threads. One thread, the timer, delivers the lines without threads=, changes the number of boards and the states of
+/// kinds, and reports losses. Each line with threads= and each storm has threads of its own. start() starts all of
+/// them, and they wait for the begin of the schedule. They have ended when stop() returns. inject() delivers on the
+/// thread that calls it. No lock is held while a callback runs.
 #ifndef LIBKPM_SIM_SRC_ENGINE_H
 #define LIBKPM_SIM_SRC_ENGINE_H
 

@@ -28,7 +28,7 @@ using ZTCSimLibrary = ZTCOpenLibrary<ZTSSimSession>;
 static void sReportAs(const char* apPrefix, const char* apWhat) noexcept {
     try {
         reportSimProblem(std::string(apPrefix) + apWhat);
-    } catch (const std::exception&) {  // out of memory: the status alone has to tell of it
+    } catch (const std::exception&) {  // out of memory: only the status can report it
         return;
     }
 }

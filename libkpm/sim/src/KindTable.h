@@ -1,6 +1,6 @@
-/// What the simulated library knows of each of the twenty event kinds: how it is delivered, and the name, place and
-/// default of each field. One row a kind, in the order of gcScopeEventKinds, which holds everything else. Reading
-/// scenarios, building events, storms and the tool's listing all walk this table.
+/// The simulated library's table of the twenty event kinds: how each is delivered, and the name, place and default of
+/// each of its fields. It has one row for each kind, in the order of gcScopeEventKinds, which has the rest. The reader
+/// of scenarios, the builder of events, the storms and the tool's listing all use this table.
 #ifndef LIBKPM_SIM_SRC_KINDTABLE_H
 #define LIBKPM_SIM_SRC_KINDTABLE_H
 

@@ -7,9 +7,9 @@
 
 #include "libkpm/common/include/Callbacks.h"
 
-/// Memory that lives for one callback: what a callback is given stands at the end of its block, at an odd address
-/// unless the scenario wants it aligned, and is overwritten before it is freed. An agent that keeps a pointer, reads
-/// too far or expects alignment is found out.
+/// Memory that lives for one callback. The data are at the end of the block, at an odd address unless the scenario asks
+/// for alignment, and are overwritten before they are freed. So an agent is caught that keeps a pointer, reads too far,
+/// or expects alignment.
 class ZTCSimLoan {
 public:
     ZTCSimLoan(const void* apBytes, std::size_t aSize, bool aIsOdd)

@@ -67,7 +67,7 @@ struct ZTSSimBoards {
 struct ZTSSimEvent {
     std::size_t mKind = 0;
     ZTSSimBoards mBoards;              ///< every occurrence is delivered to each of them
-    std::optional<std::uint32_t> mAs;  ///< board number that the callback is told instead
+    std::optional<std::uint32_t> mAs;  ///< board number that the callback gets instead
     std::uint64_t mAt = 0;             ///< ms after the schedule's start
     std::uint64_t mEvery = 0;          ///< ms between two occurrences
     std::uint64_t mTimes = 1;          ///< occurrences; 0: without end
@@ -76,14 +76,14 @@ struct ZTSSimEvent {
     std::vector<ZTSSimPort> mPorts;    ///< remote ports, one after the other; never empty
     std::vector<ZTSSimSetting> mSettings;
     std::optional<std::vector<std::uint32_t>> mPages;  ///< RSCN page words; unset: one, the remote port's FC id
-    std::optional<std::uint32_t> mCategory;            ///< what the scope callback is told instead
-    std::optional<std::uint32_t> mSubcategory;         ///< likewise
-    std::optional<HBA_wwn> mLocal;                     ///< likewise, the local port
-    std::optional<std::vector<std::uint8_t>> mData;    ///< the data as they stand, instead of fields
+    std::optional<std::uint32_t> mCategory;            ///< the category that the scope callback gets instead
+    std::optional<std::uint32_t> mSubcategory;         ///< the subcategory
+    std::optional<HBA_wwn> mLocal;                     ///< the local port
+    std::optional<std::vector<std::uint8_t>> mData;    ///< the data themselves, instead of fields
     bool mDataNull = false;                            ///< the payload object's data pointer is null
     bool mPayloadNull = false;                         ///< the event has no payload object
     std::optional<std::uint32_t> mLength;              ///< bytes of data, filled up with zeros or cut
-    std::optional<std::uint64_t> mSize;                ///< zt_evt_size as it stands
+    std::optional<std::uint64_t> mSize;                ///< the value of zt_evt_size
 };
 
 /// A line that delivers a random mix, the same for the same seed however many threads deliver it.

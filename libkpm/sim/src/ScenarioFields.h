@@ -1,4 +1,4 @@
-/// The values that stand in a scenario's lines: numbers, bytes, names, lists of them, boards and ports.
+/// The values in a scenario's lines: numbers, bytes, names, lists of them, boards and ports.
 ///
 /// A `read` function reads one text, a `take` function takes its field from a line first. All of them refuse what does
 /// not fit, with ZTCSimRefusal: the message names the field, the limit and the value.
@@ -39,11 +39,11 @@ std::vector<std::uint8_t> readSimBytes(std::string_view aField, std::string_view
 /// A world wide name in its 23 characters; none where the text is something else.
 std::optional<HBA_wwn> findSimWwn(std::string_view aText);
 
-/// A world wide name: as it stands, or that of an adapter or a remote port.
+/// A world wide name: written out, or that of an adapter or a remote port.
 HBA_wwn readSimWwn(std::string_view aField, std::string_view aText, const ZTSSimScenario& acrScenario,
                    bool aIsNodeName);
 
-/// The world wide name, as it stands, in a field that the line needs.
+/// The world wide name, written out, in a field that the line needs.
 HBA_wwn takeSimWwn(ZTCSimLine& arLine, std::string_view aField);
 
 /// The port of this name, or null.

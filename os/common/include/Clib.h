@@ -40,7 +40,7 @@ char* ClibStrcpy(char (&arTo)[N], const char* apFrom) {
 /// Negative, 0 or positive, as strcmp.
 int ClibStrcmp(const char* apLeft, const char* apRight);
 
-/// Formats into the aSize bytes at apBuffer, cut to fit and always terminated. Returns the length of what stands there.
+/// Formats into the aSize bytes at apBuffer, cut to fit and always terminated. Returns the length of the text.
 int ClibSprintf(char* apBuffer, std::size_t aSize, const char* apFormat, ...) __attribute__((format(printf, 3, 4)));
 
 std::uint32_t ClibNtohl(std::uint32_t aNetworkOrder);
@@ -50,22 +50,22 @@ void* ClibMemset(void* apTo, int aByte, std::size_t aSize);
 
 // ---- Paths ----
 
-/// Makes the directory with the mode less the umask. Throws ZTCExistsEx where anything stands at the path,
+/// Makes the directory with the mode less the umask. Throws ZTCExistsEx where the path exists already,
 /// ZTCClibMkdirFailedEx otherwise.
 void ClibMkdir(const char* apPath, int aMode);
 
-/// Makes the FIFO with the mode less the umask. Throws ZTCExistsEx where anything stands at the path,
+/// Makes the FIFO with the mode less the umask. Throws ZTCExistsEx where the path exists already,
 /// ZTCClibMkfifoFailedEx otherwise.
 void ClibMkfifo(const char* apPath, ::mode_t aMode);
 
 /// Fills the status of what the path leads to. Throws ZTCClibStatFailedEx.
 void ClibStat(const char* apPath, struct stat* apStatus);
 
-/// Fills the status of what stands at the path itself, a symbolic link included; false where nothing does. Throws
+/// Fills the status of the file at the path itself, also of a symbolic link; false where there is none. Throws
 /// ZTCClibStatFailedEx for every other failure.
 bool ClibLstat(const char* apPath, struct stat* apStatus);
 
-/// Sets the access and modification times of what stands at the path itself to now: of a symbolic link those of the
+/// Sets the access and modification times of the file at the path itself to now: of a symbolic link those of the
 /// link, never of what it leads to. Throws ZTCClibUtimeFailedEx.
 void ClibUtime(const char* apPath);
 
@@ -149,7 +149,7 @@ bool ClibTryLock(int aDescriptor);
 
 // ---- Processes and time ----
 
-/// Whether the process exists and is no zombie. One that may not be signalled exists.
+/// Whether the process exists and is not a zombie. One that may not be signaled exists.
 bool ClibIsProcessAlive(::pid_t aProcessId);
 
 /// Sends the signal; false where there is no such process. Throws ZTCClibKillFailedEx.

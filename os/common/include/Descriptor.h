@@ -17,7 +17,7 @@ public:
 
     int get() const noexcept { return mDescriptor; }
 
-    /// Gives it to the caller, who closes it.
+    /// Gives the descriptor to the caller, who has to close it.
     int release() noexcept { return std::exchange(mDescriptor, -1); }
 
 private:

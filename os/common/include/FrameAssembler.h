@@ -22,7 +22,7 @@
 enum ZTEFrameState : unsigned char {
     ZTFS_Incomplete = 0,  ///< more bytes are wanted
     ZTFS_Complete = 1,    ///< the body can be taken
-    ZTFS_BadLength = 2    ///< the length is 0 or above the limit; nothing but reset() helps
+    ZTFS_BadLength = 2    ///< the length is 0 or above the limit; only reset() leaves this state
 };
 
 class ZTCFrameAssembler {
@@ -38,13 +38,14 @@ public:
     Size getWanted() const;
     unsigned char* getSpace();
 
-    /// aCount of the wanted bytes stand at the space now. Throws ZTCInvalidEx where aCount is more than were wanted.
+    /// Takes in aCount of the wanted bytes, which are at the space now. Throws ZTCInvalidEx where aCount is more than
+    /// were wanted.
     void commit(Size aCount);
 
     /// Bytes that have come of this frame, the length's 4 included.
     Size getHad() const { return mHad; }
 
-    /// The size of the whole frame, the length's 4 bytes included. Before the length has come it counts as 0.
+    /// The size of the whole frame: the 4 bytes of the length and the body; 4 until the length has come.
     std::uint64_t getTotal() const;
 
     /// What the length says; 0 until it is there.

@@ -41,7 +41,7 @@ public:
 
     /// Makes the FIFO, with mode 0600, or takes over one that is there, with a warning line where that is another
     /// user's, or is open to more than its owner. Anything else at the path is left untouched:
-    /// ZTCInvalidEx that names the path and what stands there.
+    /// ZTCInvalidEx that names the path and what is there.
     void create() override;
 
     /// Opens the path, which has to be a FIFO (ZTCInvalidEx). For reading it never waits, in either state, and holds a

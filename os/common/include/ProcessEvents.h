@@ -16,7 +16,7 @@ public:
     void raise() noexcept;
     bool isRaised() const;
 
-    /// Readable while the event is raised. The event's own: neither read nor closed by who polls it.
+    /// Readable while the event is raised. It belongs to the event: a poller neither reads nor closes it.
     int getDescriptor() const { return mDescriptor; }
 
     /// Waits until the event is raised (true) or the time has passed (false); a negative time never ends.

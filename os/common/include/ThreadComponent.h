@@ -47,7 +47,7 @@ private:
     const ZTCString mName;
     ZTCSystemInterface* const mpSystemInterface;
 
-    // Acquire and release: who sees the mark sees what its setter did before.
+    // Acquire and release: a thread that sees the mark sees what its setter did before.
     std::atomic<bool> mIsSetForExit{false};
 };
 

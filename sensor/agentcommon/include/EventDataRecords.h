@@ -1,6 +1,6 @@
 /// The event data of scope records, byte for byte: written by the agent, read by the sensor.
 ///
-/// Every 32-bit field is little-endian whatever the host; world wide names stand as on the wire. All structures are
+/// Every 32-bit field is little-endian whatever the host; world wide names are as on the wire. All structures are
 /// packed by their own types (no padding, alignment 1), so that they may be read and written at any address. A record
 /// of an appending kind starts with its first structure and goes on with any number of its `TavikCons...` structures.
 #ifndef SENSOR_AGENTCOMMON_INCLUDE_EVENTDATARECORDS_H

@@ -44,7 +44,7 @@ enum ZTESensorAgentProtocolStatus : std::uint32_t {
     ZTSAPS_Max = 491  ///< bound, never sent
 };
 
-/// Environment variable that names the sensor's install directory, and the files in it, appended as they stand.
+/// Environment variable that names the sensor's install directory, and the names that are appended to it.
 inline constexpr const char* gcSensorDirVariable = "ZT_QRV_SENSOR_DIR";
 inline constexpr const char* gcCommandFifoName = "/qrvtvkcmd.fifo";
 inline constexpr const char* gcResponseFifoName = "/qrvtvkout.fifo";

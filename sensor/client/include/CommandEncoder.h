@@ -1,4 +1,4 @@
-/// The six commands as request bodies: what stands in a frame behind its length.
+/// Encodes the six commands as request bodies: the bytes of a frame after its length.
 #ifndef SENSOR_CLIENT_INCLUDE_COMMANDENCODER_H
 #define SENSOR_CLIENT_INCLUDE_COMMANDENCODER_H
 

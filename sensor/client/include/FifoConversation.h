@@ -1,12 +1,16 @@
 /// Frames to and from an agent over its two FIFOs.
 ///
-/// Connecting opens the response FIFO for reading first (an agent that starts waits for that reader), takes the
-/// client's lock, opens the command FIFO without blocking, and throws away what stands in the response FIFO: where
-/// there is something, up to the refusal of a collection period of 0, which it sends for that. What is missing is tried
-/// again until the time limit, so that an agent that is just starting is met. Any failure disconnects:
-/// what the agent still sends then belongs to no request of ours.
+/// Connecting takes four steps:
+///   1. Open the response FIFO for reading. An agent that starts waits for this reader.
+///   2. Take the client's lock.
+///   3. Open the command FIFO without blocking.
+///   4. Discard old answers from the response FIFO. Where it has bytes, send a request that the agent always refuses (a
+///      collection period of 0), and discard everything up to that refusal.
+/// A step that fails because something is missing is tried again until the time limit: the agent may just be starting.
 ///
-/// One thread at a time. Signals: SIGPIPE is kept from the process by the calls themselves; EINTR never shows.
+/// Any failure disconnects, since later bytes from the agent can no longer be assigned to a request.
+///
+/// One thread at a time. No call raises SIGPIPE or returns EINTR.
 #ifndef SENSOR_CLIENT_INCLUDE_FIFOCONVERSATION_H
 #define SENSOR_CLIENT_INCLUDE_FIFOCONVERSATION_H
 

@@ -1,4 +1,4 @@
-/// A file descriptor that is closed with its owner. Movable, not copyable; -1 = none.
+/// A file descriptor that is closed with its owner. It can be moved, but not copied. -1: no descriptor.
 #ifndef SENSOR_CLIENT_INCLUDE_FILEDESCRIPTOR_H
 #define SENSOR_CLIENT_INCLUDE_FILEDESCRIPTOR_H
 

@@ -1,5 +1,5 @@
-/// Scope data as it stands in a response's bytes: list by list and record by record, without a copy or an allocation a
-/// record. For receivers that take in tens of thousands of records at once; decodeResponse() makes values of the same.
+/// Reads scope data in place, list by list and record by record: it copies and allocates nothing for a record. For
+/// receivers that take in tens of thousands of records at once. decodeResponse() makes values of the same bytes.
 #ifndef SENSOR_CLIENT_INCLUDE_RECORDVIEW_H
 #define SENSOR_CLIENT_INCLUDE_RECORDVIEW_H
 

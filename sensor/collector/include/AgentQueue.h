@@ -1,5 +1,5 @@
-/// The agents that the keeper has started, one after the other: the next one's turn comes when all that the one before
-/// it wrote is in the spool. One thread.
+/// The agents that the keeper has started. The collector works with one at a time: it goes on to the next one when all
+/// bytes that the former one wrote are in the spool. One thread.
 #ifndef SENSOR_COLLECTOR_INCLUDE_AGENTQUEUE_H
 #define SENSOR_COLLECTOR_INCLUDE_AGENTQUEUE_H
 

@@ -1,5 +1,5 @@
-/// The collector's dealings with one start of the agent, from the keeper's word that it was started until the last byte
-/// that it wrote is in the spool.
+/// The collector's work with one start of the agent. It begins when the keeper reports the start, and ends when the
+/// last byte that the agent wrote is in the spool.
 ///
 /// In order: the page is opened, since its start id names the spool's files. What an earlier collector left of this
 /// start's answers is completed. The targets are registered, the start command is sent, and then the schedule says when

@@ -1,5 +1,5 @@
 /// The collecting loop: one thread over the link to the keeper, the agent's FIFO and bell, the control socket and the
-/// clock. It decides nothing itself: agents are the sessions', the database is the worker's.
+/// clock. It passes on what happens: sessions decide about agents, and the worker about the database.
 #ifndef SENSOR_COLLECTOR_INCLUDE_COLLECTOR_H
 #define SENSOR_COLLECTOR_INCLUDE_COLLECTOR_H
 

@@ -1,14 +1,12 @@
 /// The one thread that writes the history.
 ///
-/// It takes what it is handed in the order of the calls, in transactions that it commits as soon as nothing more waits,
-/// and at least every second. Files of the spool are removed after the commit. So a slow disk delays the history, and
-/// never the retrieval.
+/// It stores its jobs in the order of the calls. It commits as soon as no job waits, and at least every second. Files
+/// of the spool are removed after the commit. So a slow disk delays the history, but never the retrieval.
 ///
-/// When the disk is full, nothing is dropped: the work is done again, whole, until it succeeds. A damaged database is
-/// set aside and the work goes into a new one.
+/// Nothing is dropped when the disk is full: the whole transaction is tried again until it succeeds. A damaged database
+/// is set aside, and a new one is begun.
 ///
-/// The functions of the two sinks may be called by any thread, all others by one. None of them waits for the disk, but
-/// for finish().
+/// Any thread may call the functions of the two sinks. One thread calls all others. Only finish() waits for the disk.
 #ifndef SENSOR_COLLECTOR_INCLUDE_HISTORYWORKER_H
 #define SENSOR_COLLECTOR_INCLUDE_HISTORYWORKER_H
 

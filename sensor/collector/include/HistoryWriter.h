@@ -1,5 +1,5 @@
-/// What the collector stores, step by step. Each function is one thing that has happened, and needs a transaction of
-/// the store around it; each may be done again after a transaction that failed. One thread.
+/// Stores one thing that has happened with each function. The caller has begun a transaction of the store. If that
+/// transaction fails, the same call may be made again in the next one. One thread.
 #ifndef SENSOR_COLLECTOR_INCLUDE_HISTORYWRITER_H
 #define SENSOR_COLLECTOR_INCLUDE_HISTORYWRITER_H
 

@@ -1,4 +1,4 @@
-/// The collector's end of the link: what it has to say waits here until the link takes it. One thread.
+/// The collector's end of the link to the keeper. Messages wait here until the link takes them. One thread.
 #ifndef SENSOR_COLLECTOR_INCLUDE_KEEPERPORT_H
 #define SENSOR_COLLECTOR_INCLUDE_KEEPERPORT_H
 

@@ -1,5 +1,5 @@
-/// What collectors, agents and keepers that are gone have left: `.part` files that will never be whole, and status
-/// pages. One thread.
+/// Takes in the files that earlier collectors, agents and keepers have left: `.part` files that will never be whole,
+/// and status pages. One thread.
 #ifndef SENSOR_COLLECTOR_INCLUDE_LEFTOVERS_H
 #define SENSOR_COLLECTOR_INCLUDE_LEFTOVERS_H
 

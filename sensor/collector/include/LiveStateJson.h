@@ -1,4 +1,4 @@
-/// The answer to `{"request":"status"}`: what the collector knows now, as the JSON that LiveState.h describes.
+/// The answer to `{"request":"status"}`: the collector's present state, as the JSON that LiveState.h describes.
 #ifndef SENSOR_COLLECTOR_INCLUDE_LIVESTATEJSON_H
 #define SENSOR_COLLECTOR_INCLUDE_LIVESTATEJSON_H
 

@@ -1,7 +1,7 @@
-/// What leaves the sensor without being asked for: the outlets and the warnings. Both have threads of their own; this
+/// The outputs that nobody has to ask for: the outlets and the warnings. Both have threads of their own; this class
 /// feeds them.
 ///
-/// One thread. Nothing here waits.
+/// Used by the collecting thread alone. No call waits.
 #ifndef SENSOR_COLLECTOR_INCLUDE_OUTPUTS_H
 #define SENSOR_COLLECTOR_INCLUDE_OUTPUTS_H
 
@@ -23,13 +23,13 @@ public:
     ZTCOutputs(const std::string& acrStateDirectory, const ZTSSettings& acrSettings, ZTCHistoryWorker& arHistory);
 
     void setSettings(const ZTSSettings& acrSettings);
-    /// To be called at each turn: what they show is at most a second older than the last thing that happened.
+    /// To be called at each turn. The live state that they show is then at most a second old.
     void feed(ZTCTime aNow, const std::function<std::string()>& acrDescribe);
 
     /// Runs all hooks with a test record. Returns how long that takes at most.
     std::chrono::milliseconds testHooks(std::uint64_t aTicket) { return mWarnings.test(aTicket); }
     std::vector<ZTSHookTest> takeHookTests() { return mWarnings.takeTests(); }
-    /// Readable when takeHookTests() has something.
+    /// Readable when takeHookTests() has something; takeHookTests() reads it empty.
     int getBell() const { return mWarnings.getBell(); }
     /// The open warnings, as JSON.
     std::string describeWarnings() const { return mWarnings.describe(); }

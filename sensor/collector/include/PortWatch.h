@@ -1,5 +1,7 @@
-/// The targets that agents are told of, from the ports in sysfs and from the targets' file; and which events are a
-/// reason to look at the host anew. One thread: the collecting one.
+/// Finds the targets to register with the agent, and decides when to scan the host again.
+///
+/// Targets come from the ports in sysfs and from the targets' file. A fabric event on the agent's status page leads to
+/// a new scan. Used by the collecting thread alone.
 #ifndef SENSOR_COLLECTOR_INCLUDE_PORTWATCH_H
 #define SENSOR_COLLECTOR_INCLUDE_PORTWATCH_H
 
@@ -24,18 +26,18 @@ public:
     ZTCPortWatch(ZTCTopologyWatch& arTopology, Report aReport);
 
     ZTCTime getNextScan() const { return mNextScan; }
-    /// The next look at the targets is due at once.
+    /// Makes the next scan due at once.
     void hurry() { mNextScan = {}; }
-    /// Returns whether a look was due, and the targets are new.
+    /// Scans if a scan is due. Returns whether the targets have changed.
     bool scan(const ZTSSettings& acrSettings, ZTCTime aNow);
-    /// Whether agents can be told of their targets: the ports are known, or they have been waited for long enough.
+    /// Whether targets can be registered: the ports are known, or waiting for them has taken too long.
     bool isReady() const { return mIsReady; }
 
-    /// A page of the running agent. Where it shows a new event that says that something on the fabric has changed, the
-    /// host is looked at anew.
+    /// Takes the running agent's status page. Asks for a new scan where the page counts a new event of a kind that
+    /// reports a change of the fabric.
     void noteEvents(const std::shared_ptr<const ZTSStatusSnapshot>& acrPage);
 
-    /// As of the last look.
+    /// As of the last scan.
     const ZTSTopology& getPorts() const { return *mpPorts; }
     const std::vector<ZTSTargetPort>& getTargets() const { return mTargets; }
 

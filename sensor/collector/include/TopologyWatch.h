@@ -1,9 +1,9 @@
 /// Looks at the ports, LUNs and counters of this host, on a thread of its own, so that collecting never waits for an
 /// attribute of a sick adapter.
 ///
-/// The ports are looked at often, everything less often, and soon after whoever sees an event says so. Counters are
-/// read at the begin of each minute. The results are handed to a sink on the watch's thread. All public functions may
-/// be called by any thread and never wait for a file.
+/// It scans the ports often and the whole topology less often. The whole topology is also scanned soon after an event
+/// was seen. Counters are read at the begin of each minute. The results are handed to a sink on the watch's thread. All
+/// public functions may be called by any thread and never wait for a file.
 #ifndef SENSOR_COLLECTOR_INCLUDE_TOPOLOGYWATCH_H
 #define SENSOR_COLLECTOR_INCLUDE_TOPOLOGYWATCH_H
 

@@ -1,4 +1,5 @@
-/// The keeper's one thread: waits for ends of processes, messages, signals and time, and tells the rules.
+/// The keeper's one thread: waits for processes to end, for messages, signals and points in time, and passes them to
+/// the rules.
 #ifndef SENSOR_KEEPER_INCLUDE_KEEPERLOOP_H
 #define SENSOR_KEEPER_INCLUDE_KEEPERLOOP_H
 

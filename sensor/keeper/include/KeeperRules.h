@@ -1,4 +1,5 @@
-/// What the keeper does when: one table. The keeper takes its times from it, and docs/sensor.md shows it row by row.
+/// The table of the keeper's rules: what it does in which case, and after which time. The keeper takes its times from
+/// it, and docs/sensor.md shows it row by row.
 #ifndef SENSOR_KEEPER_INCLUDE_KEEPERRULES_H
 #define SENSOR_KEEPER_INCLUDE_KEEPERRULES_H
 

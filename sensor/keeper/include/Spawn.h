@@ -1,4 +1,4 @@
-/// Starts a process of its own process group, with nothing of the keeper's but what is handed on.
+/// Starts a process in a process group of its own. It inherits only what is listed for it.
 #ifndef SENSOR_KEEPER_INCLUDE_SPAWN_H
 #define SENSOR_KEEPER_INCLUDE_SPAWN_H
 

@@ -1,7 +1,7 @@
-/// What leaves the sensor on its own: the web server with its stream, the metrics file, the file of JSON lines.
+/// Feeds the sensor's outlets: the web server with its stream, the metrics file, the file of JSON lines, the journal.
 ///
-/// A thread of its own reads the history and feeds them. Nothing here holds up collecting: an outlet that fails is
-/// reported once, tried again, and catches up from where it stopped.
+/// It reads the history in a thread of its own, so that a slow outlet never delays collecting. An outlet that fails is
+/// reported once and tried again. It then continues where it stopped.
 #ifndef SENSOR_OUTLETS_INCLUDE_OUTLETS_H
 #define SENSOR_OUTLETS_INCLUDE_OUTLETS_H
 
@@ -22,8 +22,10 @@
 #include "sensor/views/include/NameBook.h"
 #include "sensor/web/include/Api.h"
 
-/// Names of stored values of an outlet: the number of the last change that it has (seq), how many changes retention
-/// took before it had them (missed; the history counts them), and of how many of these it was told (told).
+/// The name of a stored value of an outlet. There are three values:
+///   seq     the number of the last change that the outlet has
+///   missed  how many changes were deleted as too old before the outlet had them; the history counts these
+///   told    how many of the missed changes were reported to the outlet
 std::string getOutletValue(const std::string& acrOutlet, const char* apValue);
 
 struct ZTSOutletsSetup {

@@ -1,4 +1,5 @@
-/// One question to the running sensor over its control socket: a line of JSON there, a line of JSON back.
+/// Asks the running sensor over its control socket: sends one line of JSON and returns the line of JSON that answers
+/// it.
 #ifndef SENSOR_TAVIK_SRC_CONTROLCLIENT_H
 #define SENSOR_TAVIK_SRC_CONTROLCLIENT_H
 

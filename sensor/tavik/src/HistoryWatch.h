@@ -1,4 +1,5 @@
-/// Waits until the history may have changed: told by the kernel of writes to its journal, and by the clock otherwise.
+/// Waits until the history may have changed. The kernel reports writes to its journal (inotify). Without such a report
+/// the wait ends after a second.
 #ifndef SENSOR_TAVIK_SRC_HISTORYWATCH_H
 #define SENSOR_TAVIK_SRC_HISTORYWATCH_H
 

@@ -1,4 +1,4 @@
-/// A tar archive, compressed, that is whole or not there.
+/// Writes a compressed tar archive. It gets its name only when it is complete.
 #ifndef SENSOR_TAVIK_SRC_REPORTARCHIVE_H
 #define SENSOR_TAVIK_SRC_REPORTARCHIVE_H
 

@@ -63,7 +63,7 @@ public:
     /// Runs every hook with a test record. Returns how long that can take at most; takeTests() has the result then.
     std::chrono::milliseconds test(std::uint64_t aTicket);
     std::vector<ZTSHookTest> takeTests();
-    /// Readable when takeTests() has something. The caller reads it empty.
+    /// Readable when takeTests() has something; takeTests() reads it empty.
     int getBell() const { return mBell.get(); }
     /// The open warnings as a JSON list, as LiveState.h describes it.
     std::string describe() const;

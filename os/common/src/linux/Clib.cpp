@@ -50,7 +50,7 @@ char sProcessState(::pid_t aProcessId) {
     } while (lCount < 0 && errno == EINTR);
     ClibClose(lDescriptor);
 
-    // The name, which may hold anything, stands in brackets in front of the state.
+    // The name, which may hold any character, is in parentheses before the state.
     const char* lpNameEnd = lCount > 0 ? std::strrchr(lStat, ')') : nullptr;
     return lpNameEnd != nullptr && lpNameEnd[1] == ' ' ? lpNameEnd[2] : '\0';
 }
