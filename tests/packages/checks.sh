@@ -46,9 +46,9 @@ occurrences() { tavik --json events --kind "$1" | jq '[.episodes[].count] | add 
 has_occurrences() { [ "$(occurrences "$1")" = "$2" ]; }
 store_id() { tavik --json events --limit 1 | jq -r .storeId; }
 
-# expect_occurrences WHAT KIND COUNT: within twenty seconds.
+# expect_occurrences WHAT KIND COUNT: within 90 seconds.
 expect_occurrences() {
-  wait_until 20 has_occurrences "$2" "$3"
+  wait_until 90 has_occurrences "$2" "$3"
   expect "$1" "$3" "$(occurrences "$2")"
 }
 

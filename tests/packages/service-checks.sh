@@ -16,6 +16,14 @@ drop_in() {
 configure() { sed -i "$1" /etc/tavik/tavik.toml; }
 said_lately() { journalctl -b -u tavik --since -1min | grep -q -F -- "$1"; }
 
+has_journal_entry() { journalctl -b --no-pager "$1" | grep -q .; }
+
+# sandbox_lines: KEY=VALUE of each line of the unit's sandbox that systemd shows as it stands in the file.
+sandbox_lines() {
+  sed -n '/^NoNewPrivileges=/,/^\[Install\]/p' /usr/lib/systemd/system/tavik.service /lib/systemd/system/tavik.service 2>/dev/null |
+    grep '^[A-Z]' | grep -v '^SystemCall\|^Restrict[AN][da]\|^IPAddress' | sort -u
+}
+
 keeper_pid() { systemctl show -p MainPID --value tavik; }
 agent_pid() { cat /run/tavik/agent/qrv-tvk.pid; }
 collector_pid() { pgrep -f /libexec/tavik/tavik-collector -P "$(keeper_pid)"; }

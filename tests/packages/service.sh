@@ -13,7 +13,7 @@ step "Installing, on a host without adapters"
 expect_true "dpkg --install" dpkg --install /packages/before/tavik_*.deb /packages/before/tavik-sim_*.deb
 expect "enabled" enabled "$(systemctl is-enabled tavik)"
 expect "started by the installation" active "$(systemctl is-active tavik)"
-expect_true "says that there are no adapters" wait_until 20 has_state no-adapters
+expect_true "says that there are no adapters" wait_until 90 has_state no-adapters
 expect "tavik status" "NOT COLLECTING; no Fibre Channel adapter was found" "$(tavik --json status | jq -r .text)"
 expect "tavik check" 0 "$(tavik check >/dev/null; echo $?)"
 expect "restarts, result" "NRestarts=0 Result=success" "$(properties NRestarts Result)"
@@ -27,52 +27,83 @@ install -m 644 /tests/scenario.kpm /opt/
 configure "s|^#library = .*|library = \"$lLibrary\"|; s|^#log_level = .*|log_level = 63|"
 expect_true "restart" systemctl restart tavik
 expect "the type of the start" "Type=notify NotifyAccess=main" "$(properties Type NotifyAccess)"
-expect_true "collects" wait_until 20 is_collecting
-kpm-sim wait --timeout 20 >/dev/null
+expect_true "collects" wait_until 90 is_collecting
+kpm-sim wait --timeout 90 >/dev/null
 expect_occurrences "QUEUE FULL" queue-full 1000
 expect_occurrences "check conditions" check-condition 8
 expect "the HTTP interface answers" "HTTP/1.1 200 OK" "$(http_status 127.0.0.1 9632 /healthz)"
 expect_rights
 
+step "Every line of the sandbox is in force"
+sandbox_lines | while IFS='=' read -r lKey lValue; do
+  expect "$lKey" "$lKey=$lValue" "$(properties "$lKey")"
+done >/tmp/sandbox
+grep -c '^ok' /tmp/sandbox | sed 's/$/ lines are/'
+grep -v '^ok' /tmp/sandbox
+expect_true "more than fifteen lines" test "$(grep -c '^ok' /tmp/sandbox)" -gt 15
+expect "the seccomp filter, the address families" "" "$(properties SystemCallFilter RestrictAddressFamilies | grep -wo 'mount\|reboot\|AF_PACKET')"
+
+step "All outlets work within it"
+cp -p /etc/tavik/tavik.toml /opt/tavik.toml
+sed -i '/^\[ndjson\]/,/^\[/s|^#path = .*|path = "/var/lib/tavik/events.ndjson"|
+  /^\[journal\]/,/^\[/s|^#enabled = .*|enabled = true|' /etc/tavik/tavik.toml
+printf '[[warn]]\nkind = "queue-full"\ncount = 1\nwithin = "5m"\nrun = ["/usr/bin/tee", "/var/lib/tavik/warned"]\n' >>/etc/tavik/tavik.toml
+expect_true "restart" systemctl restart tavik
+expect_true "collects" wait_until 90 is_collecting
+kpm-sim wait --timeout 90 >/dev/null
+expect_occurrences "QUEUE FULL, once more" queue-full 2000
+expect_true "lines of JSON" wait_until 90 grep -q '"kind":"queue-full"' /var/lib/tavik/events.ndjson
+expect_true "the journal" wait_until 90 has_journal_entry TAVIK_KIND=queue-full
+expect_true "a warning's program, run by an event" wait_until 90 grep -q '"queue-full"' /var/lib/tavik/warned
+expect_true "tavik warn --test" tavik warn --test
+for lPath in / /app.js /metrics "/api/v1/events?limit=5" /api/v1/paths /api/v1/timeline /api/v1/diff; do
+  expect "GET $lPath" "HTTP/1.1 200 OK" "$(http_status 127.0.0.1 9632 "$lPath")"
+done
+cp -p /opt/tavik.toml /etc/tavik/tavik.toml
+expect_true "restart" systemctl restart tavik
+expect_true "collects" wait_until 90 is_collecting
+kpm-sim wait --timeout 90 >/dev/null
+expect_occurrences "QUEUE FULL, once more" queue-full 3000
+
 step "Reloading the configuration"
 lPids=$(pids)
 configure 's|^#period = .*|period = 1.5|'
 expect_true "reload" systemctl reload tavik
-expect_true "the sensor says so" wait_until 20 said_lately "was read again; 1 keys have changed"
+expect_true "the sensor says so" wait_until 90 said_lately "was read again; 1 keys have changed"
 configure 's|^period = .*|period = "soon"|'
 systemctl reload tavik
-expect_true "a bad file is reported" wait_until 20 said_lately "collect.period: "
+expect_true "a bad file is reported" wait_until 90 said_lately "collect.period: "
 configure 's|^period = .*|#period = 5.0|'
 expect "the same processes" "$lPids" "$(pids)"
 
 step "The log is rotated"
 lPids=$(pids)
 expect_true "logrotate" logrotate --force /etc/logrotate.d/tavik
-expect_true "the agent writes a new log" wait_until 20 test -e /var/log/tavik/qrv-tvk.log
+expect_true "the agent writes a new log" wait_until 90 test -e /var/log/tavik/qrv-tvk.log
 expect "the same processes" "$lPids" "$(pids)"
 
 step "Killed and hung"
 lAgent=$(agent_pid)
 kill -KILL "$lAgent"
-expect_true "another agent" wait_until 30 is_other_agent "$lAgent"
-expect_true "collects again" wait_until 20 is_collecting
-kpm-sim wait --timeout 20 >/dev/null
-expect_occurrences "the scenario, once more" queue-full 2000
+expect_true "another agent" wait_until 90 is_other_agent "$lAgent"
+expect_true "collects again" wait_until 90 is_collecting
+kpm-sim wait --timeout 90 >/dev/null
+expect_occurrences "the scenario, once more" queue-full 4000
 expect_rights
 expect "restarts by systemd" "NRestarts=0" "$(properties NRestarts)"
 # The sensor feeds it with each look of the collector, every five seconds.
-drop_in watchdog "WatchdogSec=12s"
+drop_in watchdog "WatchdogSec=20s"
 expect_true "restart" systemctl restart tavik
-expect_true "collects" wait_until 20 is_collecting
-kpm-sim wait --timeout 20 >/dev/null
-expect_occurrences "the scenario, once more" queue-full 3000
-sleep 14 # longer than the watchdog: a sensor that is well feeds it in time
+expect_true "collects" wait_until 90 is_collecting
+kpm-sim wait --timeout 90 >/dev/null
+expect_occurrences "the scenario, once more" queue-full 5000
+sleep 22 # longer than the watchdog: a sensor that is well feeds it in time
 expect "restarts of a sensor that is well" "NRestarts=0" "$(properties NRestarts)"
 kill -STOP "$(keeper_pid)"
-expect_true "a sensor that hangs is replaced" wait_until 40 has_restarted
-expect_true "collects again" wait_until 40 is_collecting
-kpm-sim wait --timeout 20 >/dev/null
-expect_occurrences "the scenario, once more" queue-full 4000
+expect_true "a sensor that hangs is replaced" wait_until 90 has_restarted
+expect_true "collects again" wait_until 90 is_collecting
+kpm-sim wait --timeout 90 >/dev/null
+expect_occurrences "the scenario, once more" queue-full 6000
 rm /etc/systemd/system/tavik.service.d/watchdog.conf
 
 step "A textfile, and an address for everybody"
@@ -83,35 +114,35 @@ configure 's|^#textfile = .*|textfile = "/var/lib/prometheus/node-exporter/tavik
 systemctl daemon-reload
 expect "systemd-analyze verify" "" "$(systemd-analyze verify --man=no tavik.service 2>&1)"
 expect_true "restart" systemctl restart tavik
-expect_true "the textfile" wait_until 20 grep -q '^tavik_agent_up 1' /var/lib/prometheus/node-exporter/tavik.prom
+expect_true "the textfile" wait_until 90 grep -q '^tavik_agent_up 1' /var/lib/prometheus/node-exporter/tavik.prom
 expect "the file's owner" "tavik:tavik" "$(stat -c %U:%G /var/lib/prometheus/node-exporter/tavik.prom)"
 ip address add 192.0.2.1/32 dev lo
-expect_true "collects" wait_until 20 is_collecting
+expect_true "collects" wait_until 90 is_collecting
 expect "an answer on another address" "HTTP/1.1 200 OK" "$(http_status 192.0.2.1 9632 /healthz)"
 rm /etc/systemd/system/tavik.service.d/textfile.conf /etc/systemd/system/tavik.service.d/http-public.conf
 rm -r /var/lib/prometheus
 configure 's|^textfile = .*|#textfile = ""|; s|^listen = .*|#listen = "127.0.0.1:9632"|; s|^public = .*|#public = false|; s|^hosts = .*|#hosts = []|'
 systemctl daemon-reload
 systemctl restart tavik
-expect_true "collects" wait_until 20 is_collecting
+expect_true "collects" wait_until 90 is_collecting
 
 step "Upgrading a service that runs"
 # Each start brings 1,000: they are delivered, and then stored.
 has_stored_all() { [ $(($(occurrences queue-full) % 1000)) -eq 0 ]; }
-kpm-sim wait --timeout 20 >/dev/null
-wait_until 20 has_stored_all
+kpm-sim wait --timeout 90 >/dev/null
+wait_until 90 has_stored_all
 lBefore=$(occurrences queue-full)
 lPids=$(pids)
 expect_true "dpkg --install" dpkg --force-confdef --force-confold --install /packages/now/tavik_*.deb /packages/now/tavik-sim_*.deb
-expect_true "collects again" wait_until 30 is_collecting
+expect_true "collects again" wait_until 90 is_collecting
 expect "restarted" 0 "$(echo "$lPids" | grep -cx "$(keeper_pid)")"
-kpm-sim wait --timeout 20 >/dev/null
+kpm-sim wait --timeout 90 >/dev/null
 expect_occurrences "the history goes on" queue-full $((lBefore + 1000))
 
 step "A configuration that cannot be used"
 configure 's|^#gap = .*|gap = "never"|'
 systemctl restart tavik 2>/dev/null
-expect_true "failed, not tried again" wait_until 20 test "$(properties ActiveState NRestarts ExecMainStatus)" = "ActiveState=failed NRestarts=0 ExecMainStatus=2"
+expect_true "failed, not tried again" wait_until 90 test "$(properties ActiveState NRestarts ExecMainStatus)" = "ActiveState=failed NRestarts=0 ExecMainStatus=2"
 expect_true "the reason is in the journal" said_lately "episode.gap: "
 configure 's|^gap = .*|#gap = 60|'
 expect_true "start" systemctl start tavik

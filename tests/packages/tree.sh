@@ -14,7 +14,7 @@ start_sensor() {
   setpriv --reuid=tavik --regid=tavik --init-groups --inh-caps=-all,+net_admin --ambient-caps=-all,+net_admin \
     --bounding-set=-all,+net_admin --no-new-privs tavik-sensor >>/out/sensor.log 2>&1 &
   gSensor=$!
-  wait_until 20 is_collecting
+  wait_until 90 is_collecting
   expect "tavik status, collecting" COLLECTING "$(tavik --json status | jq -r .verdict)"
 }
 # stop_sensor: in order.
@@ -51,7 +51,7 @@ chmod 640 /var/lib/tavik/history.db
 
 step "Running the version before, on a history of the first schema"
 start_sensor
-kpm-sim wait --timeout 20 >/dev/null
+kpm-sim wait --timeout 90 >/dev/null
 expect_occurrences "QUEUE FULL: 1,000 of the history, 1,000 new ones" queue-full 2000
 expect_occurrences "check conditions: 8 and 8" check-condition 16
 lStore=$(store_id)
@@ -60,21 +60,25 @@ step "Rotating the agent's log"
 lPids=$(pgrep -u tavik)
 echo "what the agent rotated by itself" >/var/log/tavik/qrv-tvk.log.1
 expect_true "logrotate" logrotate --force /etc/logrotate.d/tavik
-expect_true "the agent writes a new log" wait_until 20 test -e /var/log/tavik/qrv-tvk.log
+expect_true "the agent writes a new log" wait_until 90 test -e /var/log/tavik/qrv-tvk.log
 expect "the agent's own file" "what the agent rotated by itself" "$(cat /var/log/tavik/qrv-tvk.log.1)"
 expect "rotated logs" "/var/log/tavik/qrv-tvk.log-$(date +%Y%m%d)" "$(ls /var/log/tavik/qrv-tvk.log-*)"
 expect "the processes" "$lPids" "$(pgrep -u tavik)"
 expect "messages about settings that were read again" "" "$(grep 'read again' /out/sensor.log)"
 stop_sensor
 
-step "Upgrading"
-expect_true "dpkg --install" dpkg --force-confdef --force-confold --install \
-  /packages/now/tavik_*.deb /packages/now/tavik-sim_*.deb /packages/now/libkpm-dev_*.deb
+step "Upgrading: what changes in the configuration is shown, and what we have changed is kept"
+# The answers: show the differences, then keep ours.
+printf 'D\nN\n' | PAGER=cat dpkg --install /packages/now/tavik_*.deb /packages/now/tavik-sim_*.deb /packages/now/libkpm-dev_*.deb >/out/upgrade 2>&1
+expect "dpkg --install" 0 $?
+expect_true "dpkg asks" grep -q "Configuration file '/etc/tavik/tavik.toml'" /out/upgrade
+expect_true "it shows what the new version has no longer" grep -qx -- '-# As the version before had it.' /out/upgrade
+expect_true "it shows what we have changed" grep -qx -- '-days = 3650' /out/upgrade
 expect "our changes of the configuration" 3 "$(grep -c '^library = \|^days = \|^log_level = ' /etc/tavik/tavik.toml)"
 expect "the new configuration, beside it" "#library = \"\"" "$(grep '^#library' /etc/tavik/tavik.toml.dpkg-dist)"
 expect "the history" 2000 "$(occurrences queue-full)"
 start_sensor
-kpm-sim wait --timeout 20 >/dev/null
+kpm-sim wait --timeout 90 >/dev/null
 expect_occurrences "QUEUE FULL: 2,000 of the history, 1,000 new ones" queue-full 3000
 expect "the history's id" "$lStore" "$(store_id)"
 expect "what is lost, dropped and refused; gaps" "0 0 0 0" \
