@@ -21,7 +21,7 @@ struct ZTSStatusRowCopy {
     std::int64_t mLastEvent = 0;                             ///< time of the last one, whatever its outcome
     ZTEStatusState mState = ZTSS_Off;
     std::int64_t mStateSince = 0;
-    std::string mStateReason;  ///< in words of the adapters' library, or empty
+    std::string mStateReason;  ///< in words of the adapters' library; empty: none, or being written
 
     std::uint64_t getRefused() const;
     std::uint64_t getReceived() const { return mConsolidated + getRefused(); }

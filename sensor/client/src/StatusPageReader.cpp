@@ -19,7 +19,7 @@ namespace {
 /// Copies that are made before one that a retrieval interrupted is taken as it is.
 constexpr int scMostCopies = 10;
 
-/// Looks at a state that is being written at this moment, before it is taken as it is: its writer may have been killed.
+/// Looks at a state that is being written at this moment, before it is taken without its words.
 constexpr int scMostLooks = 20;
 
 template <std::size_t Words>
@@ -48,6 +48,8 @@ void sCopyState(const ZTSStatusRow& acrRow, ZTSStatusRowCopy& arCopy) {
             return;
         }
     }
+    // The writer is slow, or was killed in the middle: the words may be a mixture of two.
+    arCopy.mStateReason.clear();
 }
 
 void sCopyRow(const ZTSStatusRow& acrRow, ZTSStatusRowCopy& arCopy) {

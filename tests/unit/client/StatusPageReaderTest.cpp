@@ -255,6 +255,22 @@ TEST_F(StatusPageReader, SaysThatACopyWasInterruptedByARetrieval) {
     EXPECT_FALSE(mSnapshot.mIsConsistent);
 }
 
+TEST_F(StatusPageReader, WordsThatTheirWriterHasNotFinishedAreNotTaken) {
+    ZTCStatusPageFile lFile(mPath, 1);
+    ZTSStatusRow& lrRow = lFile.row(0, 5);
+    lrRow.mState = ZTSS_NoRights;
+    setText(lrRow.mStateReason, "needs CAP_NEoo many open files");
+    lrRow.mStateSequence = 3;
+    ASSERT_TRUE(mReader.open(mPath)) << mReader.getReason();
+    ASSERT_TRUE(mReader.read(mSnapshot)) << mReader.getReason();
+    EXPECT_EQ(mSnapshot.mBoards[0].mRows[5].mState, ZTSS_NoRights);
+    EXPECT_EQ(mSnapshot.mBoards[0].mRows[5].mStateReason, "");
+
+    lrRow.mStateSequence = 4;
+    ASSERT_TRUE(mReader.read(mSnapshot)) << mReader.getReason();
+    EXPECT_EQ(mSnapshot.mBoards[0].mRows[5].mStateReason, "needs CAP_NEoo many open files");
+}
+
 TEST_F(StatusPageReader, SeesOneMomentOfWhatIsHandedOverInAStorm) {
     constexpr std::uint32_t lcBoards = 2;
     ZTCStatusPageFile lFile(mPath, lcBoards);

@@ -59,7 +59,7 @@ TEST(SignalWaiter, SignalsThatWaitAreHandedOnEachAsItIs) {
         ZTCSignalWaiter::handOnSignals(lHeir);
         int lStatus = -1;
         waitpid(lHeir, &lStatus, 0);
-        return lStatus;
+        return WIFEXITED(lStatus) ? WEXITSTATUS(lStatus) : 2;
     });
     EXPECT_EQ(lChild.waitForExit(), 0);
 }
