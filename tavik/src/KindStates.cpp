@@ -99,7 +99,9 @@ void ZTCKindStates::noteStatus(unsigned aBoardId, const ZTCScopeEvent& acrEvent,
     if (ZTSKindState* lpState = findKind(aBoardId, lKind); lpState != nullptr) {
         const bool lIsReportNewer = lpState->mReportNumber > aReports;
         lpState->mIsRegistered = true;
-        lpState->mState = lIsReportNewer ? lpState->mReported : sGetStateOfStatus(aStatus);
+        // The status does not tell a source that has failed from one that needs rights; the report does.
+        const bool lIsReportExact = aStatus == KPM_STATUS_NO_RIGHTS && lpState->mReported == ZTSS_Failed;
+        lpState->mState = lIsReportNewer || lIsReportExact ? lpState->mReported : sGetStateOfStatus(aStatus);
         show(aBoardId, lKind);
     }
     ZT_EXIT();

@@ -26,7 +26,7 @@ enum ZTEBtfForm : std::uint8_t {
 };
 
 struct ZTSBtfMember {
-    std::size_t mOffset = 0;  ///< in bytes, from the begin of the structure, through members without a name
+    std::size_t mOffset = 0;  ///< in bytes, from the beginning of the structure, through members without a name
     ZTEBtfForm mForm = ZTBF_Other;
     std::size_t mSize = 0;  ///< in bytes; of numbers alone
 };

@@ -122,7 +122,7 @@ void ZTCLinuxEngine::waitForWork() {
     // A member: with memory short, waiting must go on working.
     mPolls.resize(scFirstBuffer + mOutcomes.getBufferCount());
     mPolls[0] = {mWake.get(), POLLIN, 0};
-    // A negative descriptor is passed over.
+    // poll skips a negative descriptor.
     mPolls[1] = {mMessages.getDescriptor(), POLLIN, 0};
     for (std::size_t lBuffer = 0; lBuffer < mOutcomes.getBufferCount(); ++lBuffer) {
         mPolls[scFirstBuffer + lBuffer] = {mOutcomes.getDescriptor(lBuffer), POLLIN, 0};

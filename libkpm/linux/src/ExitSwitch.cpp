@@ -4,7 +4,7 @@
 
 #include <atomic>
 
-// Whoever takes the descriptor out owns it: exit and Close may meet.
+// The thread that takes the descriptor out owns it: exit and Close may run at once.
 static std::atomic<int> sFiles[ZTXS_Sense + 1] = {-1, -1};
 static std::atomic<bool> sIsPulled{false};
 
@@ -17,7 +17,7 @@ void disarmLinuxExitSwitch(ZTEExitSwitch aEvent) noexcept {
 }
 
 void pullLinuxExitSwitch() noexcept {
-    // Before the file is used: who switches on and then looks here finds out in time.
+    // Before the files are used: a thread that switches an event on and then looks here switches it off again.
     sIsPulled.store(true);
     for (std::atomic<int>& lrFile : sFiles) {
         const int lFile = lrFile.exchange(-1);

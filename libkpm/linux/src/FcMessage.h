@@ -48,8 +48,8 @@ public:
     explicit ZTCLinuxFcMessages(ZTCByteSpan aDatagram, std::endian aOrder = std::endian::native)
         : mRest(aDatagram), mOrder(aOrder) {}
 
-    /// The next event; nothing when the datagram is at its end. Messages of other kinds are passed over, such as do not
-    /// parse are passed over and counted, and a length that leads nowhere ends the datagram and counts.
+    /// The next event; nothing when the datagram is at its end. Skips messages of other kinds. Skips and counts
+    /// malformed messages. A bad length ends the datagram and counts once.
     std::optional<ZTSLinuxFcEvent> next();
 
     /// Messages so far that did not parse.

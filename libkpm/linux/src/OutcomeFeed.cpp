@@ -177,7 +177,7 @@ void ZTCLinuxOutcomeFeed::look() {
     noteHosts();
     for (Buffer& lrBuffer : mBuffers) {
         readBuffer(lrBuffer);
-        // A buffer that has nothing may be waited for again: what it was left alone for may be over.
+        // A resting buffer is waited for again: it may have stopped being readable with nothing in it.
         lrBuffer.mState = ZTBS_Waiting;
     }
     readLosses();

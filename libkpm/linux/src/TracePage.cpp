@@ -45,7 +45,7 @@ std::optional<ZTCByteSpan> ZTCTracePage::next() {
         if (!lHeader) {
             return take(mRest.size() + 1, 0);
         }
-        // The bit field of 5 bits is the first of its word: which end that is hangs on the byte order.
+        // The field of 5 bits is the first of its word. Which end of the number that is depends on the byte order.
         const bool lIsBig = mOrder == std::endian::big;
         const std::uint64_t lType = lIsBig ? *lHeader >> 27 : *lHeader & 31;
         const std::uint64_t lTime = lIsBig ? *lHeader & scLengthMask : *lHeader >> 5;

@@ -22,7 +22,7 @@ public:
     using Answer = std::function<std::string(std::string_view aLine)>;
 
     /// Makes the socket, of mode 0600, and starts to serve. A socket that nobody listens on is taken over; one that is
-    /// served, and whatever is no socket, is refused. Throws std::runtime_error with the path and the reason.
+    /// served, and a path that is not a socket, is refused. Throws std::runtime_error with the path and the reason.
     ZTCSimControlSocket(std::string aPath, Answer aAnswer);
 
     /// Ends the service after the line that is being answered, and removes the socket if it is still this one.

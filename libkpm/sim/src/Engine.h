@@ -107,7 +107,7 @@ private:
     ZTCSimSources mSources;
     std::atomic<std::uint32_t> mCount;
     std::atomic<bool> mIsStopping{false};
-    std::vector<std::atomic<std::uint32_t>> mLinkTags;  // by board; only counted, nothing hangs on their order
+    std::vector<std::atomic<std::uint32_t>> mLinkTags;  // by board; only counted, no other data depend on their order
     std::array<std::atomic<std::uint64_t>, gcSimKindCount> mDeliveredByKind{};
     std::atomic<std::uint64_t> mDropped{0};
     std::atomic<std::uint64_t> mPages{0};

@@ -115,6 +115,16 @@ TEST_F(KindStates, AStatusCountsMoreThanAReportBeforeItAndKeepsItsWordsWhereBoth
     EXPECT_EQ("no_rights: good words", state(0, "prlo"));
 }
 
+TEST_F(KindStates, WhereTheStatusSaysThatTheSourceMayComeLaterAReportOfAFailureIsKept) {
+    bringUp();
+    report(0, 4, 0x01, KPM_STATE_FAILED, "the filter cannot be set");
+    mLibrary.mRegisterStatuses[{0, 4, 0x01}] = KPM_STATUS_NO_RIGHTS;
+    startScope();
+    EXPECT_EQ("failed: the filter cannot be set", state(0, "queue-full"));
+    report(0, 4, 0x01, KPM_STATE_WORKING);
+    EXPECT_EQ("listening", state(0, "queue-full"));
+}
+
 TEST_F(KindStates, AReportThatComesWhileTheRegistrationRunsCountsMoreThanItsStatus) {
     bringUp();
     mLibrary.mBeforeRegistered = [this](const ZTCRegistrationKey& acrKey) {
