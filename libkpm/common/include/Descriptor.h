@@ -2,8 +2,10 @@
 #ifndef LIBKPM_COMMON_INCLUDE_DESCRIPTOR_H
 #define LIBKPM_COMMON_INCLUDE_DESCRIPTOR_H
 
+#include <fcntl.h>
 #include <unistd.h>
 
+#include <cerrno>
 #include <utility>
 
 class ZTCLibraryDescriptor {
@@ -33,5 +35,15 @@ public:
 private:
     int mDescriptor = -1;
 };
+
+/// Opens a file that is there, for this process alone and without waiting; a signal does not end the attempt. Not open,
+/// with the reason in errno, where that cannot be done.
+inline ZTCLibraryDescriptor openLibraryFile(const char* apPath, int aFlags) {
+    int lFile = -1;
+    do {
+        lFile = ::open(apPath, aFlags | O_CLOEXEC | O_NONBLOCK | O_NOCTTY);
+    } while (lFile < 0 && errno == EINTR);
+    return ZTCLibraryDescriptor(lFile);
+}
 
 #endif

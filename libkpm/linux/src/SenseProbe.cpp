@@ -158,8 +158,7 @@ bool ZTCSenseProbe::switchOn(ZTSFeedProblem& arProblem) {
         return false;
     }
     mLayout = std::get<ZTSSenseLayout>(lLayout);
-    armLinuxExitSwitch(ZTXS_Sense,
-                       ZTCLibraryDescriptor(::open(mEnablePath.c_str(), O_WRONLY | O_CLOEXEC | O_NONBLOCK | O_NOCTTY)));
+    armLinuxExitSwitch(ZTXS_Sense, openLibraryFile(mEnablePath.c_str(), O_WRONLY));
     if (const int lError = mrFiles.write(mEnablePath, "1"); lError != 0) {
         arProblem = sProblem("the probe for them cannot be switched on", lError);
         return false;

@@ -13,7 +13,7 @@
 #include "libkpm/common/include/Descriptor.h"
 
 std::optional<std::string> readSmallFile(const std::string& acrPath, std::size_t aLimit) {
-    const ZTCLibraryDescriptor lFile(::open(acrPath.c_str(), O_RDONLY | O_CLOEXEC | O_NONBLOCK | O_NOCTTY));
+    const ZTCLibraryDescriptor lFile = openLibraryFile(acrPath.c_str(), O_RDONLY);
     if (!lFile.isOpen()) {
         return std::nullopt;
     }

@@ -134,8 +134,7 @@ bool ZTCTraceBuffers::openAll(ZTSFeedProblem& arProblem) {
         const std::string lBuffer = mPath + "/per_cpu/" + lrName;
         Buffer lNew;
         lNew.mStatsPath = lBuffer + "/stats";
-        lNew.mPipe = ZTCLibraryDescriptor(
-            ::open((lBuffer + "/trace_pipe_raw").c_str(), O_RDONLY | O_NONBLOCK | O_CLOEXEC | O_NOCTTY));
+        lNew.mPipe = openLibraryFile((lBuffer + "/trace_pipe_raw").c_str(), O_RDONLY);
         if (!lNew.mPipe.isOpen()) {
             lError = errno;
             ++lMissing;

@@ -9,7 +9,7 @@
 #include "libkpm/common/include/Descriptor.h"
 
 static int sWrite(const std::string& acrPath, std::string_view aText, int aFlags) {
-    const ZTCLibraryDescriptor lFile(::open(acrPath.c_str(), O_WRONLY | O_CLOEXEC | O_NONBLOCK | O_NOCTTY | aFlags));
+    const ZTCLibraryDescriptor lFile = openLibraryFile(acrPath.c_str(), O_WRONLY | aFlags);
     if (!lFile.isOpen()) {
         return errno;
     }

@@ -135,8 +135,7 @@ ZTETraceFilter ZTCTraceInstance::watchHosts(const std::vector<std::uint32_t>& ac
         return ZTTF_Off;
     }
     if (lError == 0) {
-        armLinuxExitSwitch(ZTXS_Outcomes, ZTCLibraryDescriptor(::open(mEnablePath.c_str(),
-                                                                      O_WRONLY | O_CLOEXEC | O_NONBLOCK | O_NOCTTY)));
+        armLinuxExitSwitch(ZTXS_Outcomes, openLibraryFile(mEnablePath.c_str(), O_WRONLY));
         lError = mrFiles.write(mEnablePath, "1");
         if (isLinuxExitSwitchPulled()) {
             mrFiles.write(mEnablePath, "0");
