@@ -1,5 +1,4 @@
 #include <algorithm>
-#include <atomic>
 #include <cerrno>
 #include <filesystem>
 
@@ -206,27 +205,6 @@ TEST_F(LinuxEngineSense, LostOutcomesAndLostSenseDataAreCountedApart) {
     EXPECT_EQ(mLog.loss("scsi-sense-lost"), 7u);
     mpEngine->stop();
     EXPECT_EQ(mRecorder.count(), 1u);
-}
-
-TEST_F(LinuxEngineSense, WhatWasRecordedBeforeTheOutcomesAreSwitchedOffIsDelivered) {
-    mKernel.addTypes();
-    startWithoutLooks();
-    std::atomic<bool> lMayReturn{false};
-    mRecorder.setHook([&] { waitUntil([&] { return lMayReturn.load(); }, "the test to go on"); });
-    mKernel.sendDone({.mLun = 1, .mResult = 8, .mHasSense = false});
-    waitUntil([&] { return mRecorder.count() == 1; }, "the first");
-    // While that one is delivered, more are recorded, and the next look switches the event off.
-    mKernel.sendDone({.mLun = 2, .mResult = 2, .mHasSense = false});
-    mKernel.sendSense({.mLun = 2});
-    mKernel.sendDone({.mLun = 3, .mResult = 8, .mHasSense = false}, 1);
-    mKernel.refuseWrites("filter", "", EINVAL, 2);
-    mKernel.addHost(1);
-    mKernel.sendFc({.mHost = 1, .mNumber = 1, .mCode = ZTLFC_Rscn, .mData = rscnData(1)});
-    lMayReturn = true;
-    waitForLog("2 no SCSI outcomes: the filter of the trace event");
-    ZTCTexts lEvents = mRecorder.waitFor(4);
-    EXPECT_EQ(std::count(lEvents.begin(), lEvents.end(), "0 check-condition 0 2 28 5 21 0"), 1) << lEvents.size();
-    EXPECT_EQ(std::count(lEvents.begin(), lEvents.end(), "0 device-busy 0 3"), 1);
 }
 
 TEST_F(LinuxEngineSense, WhereTheTraceHasThemTheProbeIsUsedOnlyIfItIsForced) {
