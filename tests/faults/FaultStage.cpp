@@ -49,6 +49,10 @@ void ZTCFaultStage::endFailure() {
 
 std::vector<std::string> ZTCFaultStage::arguments(const std::vector<std::string>& acrMore) const {
     std::vector<std::string> lArguments{"-D", "false", "-d", "127", "-l", mAgent.agentLogPath()};
+    if (std::count(acrMore.begin(), acrMore.end(), "-b") == 0) {
+        // There is no sensor: an agent that serves a long phase would end at its default period.
+        lArguments.insert(lArguments.end(), {"-b", "86400"});
+    }
     lArguments.insert(lArguments.end(), acrMore.begin(), acrMore.end());
     return lArguments;
 }
