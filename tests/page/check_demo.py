@@ -198,6 +198,12 @@ def check_pictures(browser):
     browser.resize(1280, 860)
     open_timeline(browser, "#timeline;range=690m")
     wait_loaded(browser)
+    for counter in ("CRC errors", "Loss of sync"):
+        browser.wait_text("counters", counter)
+    require("a counter's chart is blank", browser.run(
+        "return [...document.querySelectorAll('#counters canvas')].every((c) => {"
+        "  const d = c.getContext('2d').getImageData(0, 0, c.width, c.height).data; const s = new Set();"
+        "  for (let i = 0; i < d.length; i += 4) s.add(d[i] << 24 | d[i + 1] << 16 | d[i + 2] << 8 | d[i + 3]); return s.size > 3; })"))
     browser.picture("day-timeline")
     browser.open("#now")
     browser.wait("the disks of an open trouble", lambda: "sda" in browser.text("open-troubles"))

@@ -27,7 +27,7 @@ const rateText = (value) => (value === 0 ? "0" : value < 1 ? value.toFixed(2) : 
 /** What became of a rate, and how much that is: new and gone ones are more than those that only grew or shrank. */
 function changeOf(before, after, isDifferent) {
   if (!isDifferent) {
-    return { text: "the same", weight: 0, className: "quiet" };
+    return { text: "none", weight: 0, className: "quiet" };
   }
   if (before === 0) {
     return { text: "new", weight: 1e6 + after, className: "worse" };
