@@ -44,6 +44,8 @@ log = "$gDir/$1/agent.log"
 [sensor]
 directory = "$gDir/$1/run"
 state = "$gDir/$1/state"
+[collect]
+period = 1
 [http]
 listen = "$2"
 ${3:-}

@@ -2,7 +2,8 @@
 ///
 /// No shell is between. The program gets its input as a file on standard input, so that it need not read it. What it
 /// prints is kept for the report, the end of it. It runs in a process group of its own, as the user and in the sandbox
-/// of this process, with the signals' default actions and no other descriptors.
+/// of this process, with the signals' default actions and no other descriptors. A process between this one and the
+/// program ends all that the program has started, in whatever group or session, also where this process is killed.
 #ifndef SENSOR_WARNINGS_INCLUDE_HOOKPROCESS_H
 #define SENSOR_WARNINGS_INCLUDE_HOOKPROCESS_H
 
@@ -30,7 +31,7 @@ public:
     /// Starts it. Throws ZTCSystemCallEx where that fails: the program is missing, may not be run, or there is no room
     /// for a process.
     ZTCHookProcess(const ZTSHookCall& acrCall, ZTCTime aNow);
-    /// Ends its process group, if it still runs.
+    /// Ends all of its processes, if it still runs.
     ~ZTCHookProcess();
     ZTCHookProcess(const ZTCHookProcess&) = delete;
     ZTCHookProcess& operator=(const ZTCHookProcess&) = delete;
@@ -39,20 +40,23 @@ public:
     void addTo(std::vector<pollfd>& arFds) const;
     /// When step() is to be called at the latest.
     ZTCTime getNextStep(ZTCTime aNow) const;
-    /// To be called after each poll(). Nothing: it runs. A text: it has ended, and all of its process group with it; an
-    /// empty one: it did its work, else why it counts as failed, one line.
+    /// To be called after each poll(). Nothing: it runs. A text: it has ended, and all that it has started with it;
+    /// an empty one: it did its work, else why it counts as failed, one line.
     std::optional<std::string> step(ZTCTime aNow);
 
 private:
     void readOutput();
     std::string quoteOutput() const;
-    void endGroup();
+    std::string describeEnd() const;
 
     const std::chrono::milliseconds mTimeout;
     const ZTCTime mDeadline;
-    pid_t mPid = 0;             ///< 0: it has been waited for
+    pid_t mPid = 0;             ///< of the process between; 0: it has been waited for
+    pid_t mHook = 0;            ///< leader of the program's process group
+    bool mIsTold = false;       ///< to end the hook
     ZTCFileDescriptor mPidFd;   ///< readable when it has ended; closed where the kernel has no such descriptors
     ZTCFileDescriptor mOutput;  ///< what it prints
+    ZTCFileDescriptor mReport;  ///< what came of it
     std::string mText;          ///< the end of that
 };
 

@@ -95,6 +95,7 @@ private:
     void noteEnd(const ZTSHook& acrHook, const std::string& acrProblem);
     void endTest();
     ZTSWarnDocument makeDocument(const ZTSTrouble& acrTrouble);
+    std::string makeInput(const ZTSWarnDocument& acrDocument);
     ZTCNameBook makeNames() const;
     void save();
     void publish();

@@ -2,7 +2,6 @@
 
 #include <fcntl.h>
 #include <signal.h>
-#include <spawn.h>
 #include <sys/mman.h>
 #include <sys/syscall.h>
 #include <sys/wait.h>
@@ -15,6 +14,7 @@
 #include <string_view>
 
 #include "sensor/client/include/ClientErrors.h"
+#include "sensor/warnings/src/HookSupervisor.h"
 
 using std::chrono::milliseconds;
 
@@ -22,6 +22,8 @@ using std::chrono::milliseconds;
 static constexpr std::size_t scMostOutput = 200;
 /// Between two looks where the kernel cannot say when a process ends.
 static constexpr milliseconds scLookPeriod{100};
+/// For the processes of a hook to end when they are killed.
+static constexpr std::chrono::seconds scEndPatience{10};
 
 extern char** environ;
 
@@ -51,51 +53,43 @@ static bool sIsForHooks(std::string_view aVariable) {
 static std::vector<char*> sToPointers(const std::vector<std::string>& acrTexts) {
     std::vector<char*> lPointers;
     for (const std::string& lrText : acrTexts) {
-        lPointers.push_back(const_cast<char*>(lrText.c_str()));  // posix_spawn() changes none of them
+        lPointers.push_back(const_cast<char*>(lrText.c_str()));  // execvpe() changes none of them
     }
     lPointers.push_back(nullptr);
     return lPointers;
 }
 
-/// Attributes and file actions of a start, freed with it.
-struct ZTSSpawnPlan {
-    posix_spawnattr_t mAttributes;
-    posix_spawn_file_actions_t mActions;
+/// Reads a whole value from a pipe. False: it has ended before.
+template <typename T>
+static bool sReadValue(const ZTCFileDescriptor& acrPipe, T& arValue) {
+    ssize_t lCount = 0;
+    do {
+        lCount = read(acrPipe.get(), &arValue, sizeof(arValue));
+    } while (lCount < 0 && errno == EINTR);
+    return lCount == static_cast<ssize_t>(sizeof(arValue));
+}
 
-    ZTSSpawnPlan(int aInput, int aOutput) {
-        posix_spawnattr_init(&mAttributes);
-        posix_spawn_file_actions_init(&mActions);
-        sigset_t lAll;
-        sigset_t lNone;
-        sigfillset(&lAll);
-        sigemptyset(&lNone);
-        posix_spawnattr_setflags(&mAttributes, POSIX_SPAWN_SETPGROUP | POSIX_SPAWN_SETSIGDEF | POSIX_SPAWN_SETSIGMASK);
-        posix_spawnattr_setpgroup(&mAttributes, 0);
-        posix_spawnattr_setsigdefault(&mAttributes, &lAll);
-        posix_spawnattr_setsigmask(&mAttributes, &lNone);
-        posix_spawn_file_actions_adddup2(&mActions, aInput, STDIN_FILENO);
-        posix_spawn_file_actions_adddup2(&mActions, aOutput, STDOUT_FILENO);
-        posix_spawn_file_actions_adddup2(&mActions, aOutput, STDERR_FILENO);
-        posix_spawn_file_actions_addclosefrom_np(&mActions, STDERR_FILENO + 1);
+struct ZTSPipe {
+    ZTCFileDescriptor mReader;
+    ZTCFileDescriptor mWriter;
+
+    explicit ZTSPipe(const std::string& acrHook) {
+        std::array<int, 2> lEnds{};
+        if (pipe2(lEnds.data(), O_CLOEXEC) != 0) {
+            throw ZTCSystemCallEx("cannot make a pipe for " + acrHook, errno);
+        }
+        mReader = ZTCFileDescriptor(lEnds[0]);
+        mWriter = ZTCFileDescriptor(lEnds[1]);
     }
-    ~ZTSSpawnPlan() {
-        posix_spawn_file_actions_destroy(&mActions);
-        posix_spawnattr_destroy(&mAttributes);
-    }
-    ZTSSpawnPlan(const ZTSSpawnPlan&) = delete;
-    ZTSSpawnPlan& operator=(const ZTSSpawnPlan&) = delete;
 };
 
 ZTCHookProcess::ZTCHookProcess(const ZTSHookCall& acrCall, ZTCTime aNow)
     : mTimeout(acrCall.mTimeout), mDeadline(aNow + acrCall.mTimeout) {
+    const std::string& lrProgram = acrCall.mRun.front();
     const ZTCFileDescriptor lInput = sMakeInput(acrCall.mInput);
-    int lEnds[2];
-    if (pipe2(lEnds, O_CLOEXEC) != 0) {
-        throw ZTCSystemCallEx("cannot make a pipe for the output of " + acrCall.mRun.front(), errno);
-    }
-    mOutput = ZTCFileDescriptor(lEnds[0]);
-    const ZTCFileDescriptor lOutput(lEnds[1]);
-    fcntl(mOutput.get(), F_SETFL, O_NONBLOCK);
+    ZTSPipe lOutput(lrProgram);
+    ZTSPipe lReport(lrProgram);
+    fcntl(lOutput.mReader.get(), F_SETFL, O_NONBLOCK);
     std::vector<std::string> lEnvironment;
     for (char** lppVariable = environ; *lppVariable != nullptr; ++lppVariable) {
         if (sIsForHooks(*lppVariable)) {
@@ -105,24 +99,36 @@ ZTCHookProcess::ZTCHookProcess(const ZTSHookCall& acrCall, ZTCTime aNow)
     lEnvironment.insert(lEnvironment.end(), acrCall.mEnvironment.begin(), acrCall.mEnvironment.end());
     const std::vector<char*> lVariables = sToPointers(lEnvironment);
     const std::vector<char*> lArguments = sToPointers(acrCall.mRun);
-    const ZTSSpawnPlan lPlan(lInput.get(), lOutput.get());
-    const int lError = posix_spawnp(&mPid, lArguments.front(), &lPlan.mActions, &lPlan.mAttributes, lArguments.data(),
-                                    lVariables.data());
-    if (lError != 0) {
-        throw ZTCSystemCallEx("cannot run " + acrCall.mRun.front(), lError);
+    const ZTSHookPlan lPlan{.mpArguments = lArguments.data(),
+                            .mpEnvironment = lVariables.data(),
+                            .mInput = lInput.get(),
+                            .mOutput = lOutput.mWriter.get(),
+                            .mReport = lReport.mWriter.get(),
+                            .mOwner = getpid()};
+    mPid = fork();
+    if (mPid == 0) {
+        superviseHook(lPlan);
     }
+    ZTSHookStart lStart{.mError = mPid < 0 ? errno : ECHILD};  // the latter: it was killed before it could report
+    lReport.mWriter.reset();
+    const bool lIsReported = mPid > 0 && sReadValue(lReport.mReader, lStart);
+    if (!lIsReported || lStart.mError != 0) {
+        if (mPid > 0) {
+            waitpid(mPid, nullptr, 0);
+        }
+        throw ZTCSystemCallEx("cannot run " + lrProgram, lStart.mError);
+    }
+    mHook = lStart.mPid;
+    mOutput = std::move(lOutput.mReader);
+    mReport = std::move(lReport.mReader);
     mPidFd = ZTCFileDescriptor(static_cast<int>(syscall(SYS_pidfd_open, mPid, 0)));
 }
 
 ZTCHookProcess::~ZTCHookProcess() {
     if (mPid != 0) {
-        endGroup();
+        kill(mPid, SIGTERM);
         waitpid(mPid, nullptr, 0);
     }
-}
-
-void ZTCHookProcess::endGroup() {
-    kill(-mPid, SIGKILL);
 }
 
 void ZTCHookProcess::addTo(std::vector<pollfd>& arFds) const {
@@ -131,7 +137,8 @@ void ZTCHookProcess::addTo(std::vector<pollfd>& arFds) const {
 }
 
 ZTCHookProcess::ZTCTime ZTCHookProcess::getNextStep(ZTCTime aNow) const {
-    return mPidFd.isOpen() ? mDeadline : std::min(mDeadline, aNow + scLookPeriod);
+    const ZTCTime lEnd = mIsTold ? mDeadline + scEndPatience : mDeadline;
+    return mPidFd.isOpen() ? lEnd : std::min(lEnd, aNow + scLookPeriod);
 }
 
 void ZTCHookProcess::readOutput() {
@@ -163,30 +170,50 @@ std::string ZTCHookProcess::quoteOutput() const {
 
 std::optional<std::string> ZTCHookProcess::step(ZTCTime aNow) {
     readOutput();
+    if (!mIsTold && aNow >= mDeadline) {
+        kill(mPid, SIGTERM);
+        mIsTold = true;
+    }
     int lStatus = 0;
     pid_t lEnded = waitpid(mPid, &lStatus, WNOHANG);
-    const bool lIsLate = lEnded == 0 && aNow >= mDeadline;
-    if (lIsLate) {
-        endGroup();
+    if (lEnded == 0 && aNow >= mDeadline + scEndPatience) {
+        kill(mPid, SIGKILL);
         lEnded = waitpid(mPid, &lStatus, 0);
     }
     if (lEnded == 0) {
         return std::nullopt;
     }
-    // The group outlives its leader as long as it has members, and its number is not used again until then.
-    const bool lHasLeft = !lIsLate && kill(-mPid, SIGKILL) == 0;
     mPid = 0;
     readOutput();
-    if (lIsLate) {
-        return "it still ran after " + std::to_string(mTimeout.count() / 1000) + " s, its timeout: it was ended" +
-               quoteOutput();
+    const std::string lProblem = describeEnd();
+    return lProblem.empty() ? lProblem : lProblem + quoteOutput();
+}
+
+/// Empty: it did its work.
+std::string ZTCHookProcess::describeEnd() const {
+    ZTSHookReport lReport;
+    const bool lIsReported = sReadValue(mReport, lReport);
+    if (!lIsReported) {
+        kill(-mHook, SIGKILL);
     }
-    if (WIFSIGNALED(lStatus)) {
-        return std::string("it was ended by signal ") + std::to_string(WTERMSIG(lStatus)) + " (" +
-               strsignal(WTERMSIG(lStatus)) + ")" + quoteOutput();
+    if (mIsTold) {
+        const bool lIsUnended = !lIsReported || lReport.mIsUnended;
+        return "it still ran after " + std::to_string(mTimeout.count() / 1000) + " s, its timeout: it " +
+               (lIsUnended ? "was killed and has not ended" : "was ended");
     }
-    if (WEXITSTATUS(lStatus) != 0) {
-        return "it ended with status " + std::to_string(WEXITSTATUS(lStatus)) + quoteOutput();
+    if (!lIsReported) {
+        return "the process that watches it was killed";
     }
-    return lHasLeft ? "it left processes behind, which were ended" + quoteOutput() : "";
+    if (WIFSIGNALED(lReport.mStatus)) {
+        return std::string("it was ended by signal ") + std::to_string(WTERMSIG(lReport.mStatus)) + " (" +
+               strsignal(WTERMSIG(lReport.mStatus)) + ")";
+    }
+    if (WEXITSTATUS(lReport.mStatus) != 0) {
+        return "it ended with status " + std::to_string(WEXITSTATUS(lReport.mStatus));
+    }
+    if (lReport.mHasLeft) {
+        return std::string("it left processes behind, which were ") +
+               (lReport.mIsUnended ? "killed and have not ended" : "ended");
+    }
+    return "";
 }

@@ -262,7 +262,7 @@ void ZTCWarnings::warn() {
         ZTSHook& lrHook = mHooks.emplace_back();
         lrHook.mSettings = lDocument.mRule;
         lrHook.mRule = lrTrouble.mRule;
-        lrHook.mInput = toHookInput(lDocument, lNames);
+        lrHook.mInput = makeInput(lDocument);
         lrHook.mEnvironment = toHookEnvironment(lDocument, lNames);
         mSetup.mReport("warning: " + describeTrouble(lDocument.mRule, lrTrouble, lNames) + "; " +
                        lDocument.mRule.mRun.front() + " is run, and again at " + toRfc3339(lrTrouble.mNext) +
@@ -297,7 +297,7 @@ void ZTCWarnings::beginTest() {
                               .mSettings = mSettings.mWarnings[i],
                               .mTicket = lTicket,
                               .mpProcess = nullptr,
-                              .mInput = toHookInput(lFilled, lNames),
+                              .mInput = makeInput(lFilled),
                               .mEnvironment = toHookEnvironment(lFilled, lNames)});
         }
         if (mSettings.mWarnings.empty()) {
@@ -415,6 +415,20 @@ ZTSWarnDocument ZTCWarnings::makeDocument(const ZTSTrouble& acrTrouble) {
         mpHistory.reset();
     }
     return lDocument;
+}
+
+/// With the devices of the episode, where the history can say them.
+std::string ZTCWarnings::makeInput(const ZTSWarnDocument& acrDocument) {
+    ZTCNameBook lNames = makeNames();
+    if (mpHistory != nullptr) {
+        lNames.setTopology(readTopologyOf(*mpHistory));
+    }
+    try {
+        return toHookInput(acrDocument, lNames);
+    } catch (const ZTCStoreEx&) {
+        mpHistory.reset();
+        return toHookInput(acrDocument, makeNames());
+    }
 }
 
 void ZTCWarnings::save() {

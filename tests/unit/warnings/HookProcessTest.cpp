@@ -4,6 +4,8 @@
 #include <gtest/gtest.h>
 #include <signal.h>
 #include <sys/stat.h>
+#include <sys/wait.h>
+#include <unistd.h>
 
 #include <cerrno>
 #include <cstdlib>
@@ -35,14 +37,14 @@ protected:
                 .mInput = "{\"kind\":\"queue-full\"}\n",
                 .mTimeout = seconds(3600)};
     }
-    /// What came of it. The poll is what the real loop does.
-    static std::string finish(ZTCHookProcess& arProcess) {
+    /// What came of it, where it is so late all the time. The poll is what the real loop does.
+    static std::string finish(ZTCHookProcess& arProcess, milliseconds aLater = {}) {
         const ZTCDeadline lDeadline;
         while (!lDeadline.isOver()) {
             std::vector<pollfd> lFds;
             arProcess.addTo(lFds);
             poll(lFds.data(), static_cast<nfds_t>(lFds.size()), 50);
-            if (const auto lEnd = arProcess.step(std::chrono::steady_clock::now())) {
+            if (const auto lEnd = arProcess.step(std::chrono::steady_clock::now() + aLater)) {
                 return *lEnd;
             }
         }
@@ -54,6 +56,11 @@ protected:
     }
     std::string read(const std::string& acrName) const { return readFile(mDirectory.path(acrName)); }
     std::string out(const std::string& acrName) const { return " > " + mDirectory.path(acrName); }
+    /// A script's line: a process number in a file that then appears whole.
+    std::string keepPid(const std::string& acrPid, const std::string& acrName) const {
+        return "\necho " + acrPid + out(acrName + ".part") + "\nmv " + mDirectory.path(acrName + ".part") + " " +
+               mDirectory.path(acrName);
+    }
     static bool isGone(const std::string& acrPid) { return kill(std::stoi(acrPid), 0) != 0 && errno == ESRCH; }
 
     ZTCTemporaryDirectory mDirectory;
@@ -116,20 +123,56 @@ TEST_F(HookProcess, ThatIsKilledSaysTheSignal) {
     EXPECT_THAT(run(call("kill -KILL $$")), StartsWith("it was ended by signal 9"));
 }
 
-TEST_F(HookProcess, ThatHangsIsEndedWithItsWholeGroupAtItsTimeout) {
-    ZTSHookCall lCall = call("sleep 1000 &\necho $!" + out("child.part") + "\nmv " + mDirectory.path("child.part") +
-                             " " + mDirectory.path("child") + "\nsleep 1000");
+TEST_F(HookProcess, ThatHangsIsEndedWithAllItsProcessesAtItsTimeout) {
+    ZTSHookCall lCall = call("sleep 1000 &" + keepPid("$!", "child") + "\nsleep 1000");
     const auto lNow = std::chrono::steady_clock::now();
     ZTCHookProcess lProcess(lCall, lNow);
     waitUntil([&] { return exists(mDirectory.path("child")); }, "the hook's child");
     EXPECT_EQ(lProcess.step(lNow + seconds(3599)), std::nullopt);
-    EXPECT_THAT(lProcess.step(lNow + seconds(3600)).value_or(""), HasSubstr("after 3600 s"));
-    waitUntil([&] { return isGone(read("child")); }, "the end of the hook's child");
+    EXPECT_THAT(finish(lProcess, seconds(3600)), HasSubstr("after 3600 s, its timeout: it was ended"));
+    EXPECT_TRUE(isGone(read("child")));
+}
+
+TEST_F(HookProcess, ThatHangsInASessionOfItsOwnIsEndedAtItsTimeout) {
+    ZTSHookCall lCall = call("setsid sh -c 'sleep 1000 &" + keepPid("$!", "child") + "\nsleep 1000' &\nsleep 1000");
+    ZTCHookProcess lProcess(lCall, std::chrono::steady_clock::now());
+    waitUntil([&] { return exists(mDirectory.path("child")); }, "the hook's child");
+    EXPECT_THAT(finish(lProcess, seconds(3600)), HasSubstr("after 3600 s"));
+    EXPECT_TRUE(isGone(read("child")));
 }
 
 TEST_F(HookProcess, ThatLeavesAProcessBehindIsReportedAndItIsEnded) {
     EXPECT_THAT(run(call("sleep 1000 &\necho $!" + out("child"))), HasSubstr("left processes behind"));
-    waitUntil([&] { return isGone(read("child")); }, "the end of the hook's child");
+    EXPECT_TRUE(isGone(read("child")));
+}
+
+TEST_F(HookProcess, ThatLeavesADaemonOfItsOwnSessionIsReportedAndItIsEnded) {
+    const std::string lDaemon = "setsid sh -c 'setsid sleep 1000 &" + keepPid("$!", "child") + "'";
+    EXPECT_THAT(run(call(lDaemon)), HasSubstr("left processes behind"));
+    EXPECT_TRUE(isGone(read("child")));
+}
+
+TEST_F(HookProcess, ThatForksWithoutEndIsEndedAtItsTimeout) {
+    // Each process starts the next one and ends.
+    const std::string lNext = mDirectory.path("next");
+    ZTSHookCall lCall = call(lNext + "\nsleep 1000");
+    std::ofstream(lNext) << "#!/bin/sh\ntest -e " << mDirectory.path("stop") << " || setsid " << lNext << " &\n: > "
+                         << mDirectory.path("runs") << "\n";
+    chmod(lNext.c_str(), 0700);
+    ZTCHookProcess lProcess(lCall, std::chrono::steady_clock::now());
+    waitUntil([&] { return exists(mDirectory.path("runs")); }, "the chain of processes");
+    EXPECT_THAT(finish(lProcess, seconds(3600)), HasSubstr("it was ended"));
+    writeFile(mDirectory.path("stop"), "");
+}
+
+TEST_F(HookProcess, WhoseWatchingProcessIsKilledHasFailed) {
+    ZTCHookProcess lProcess(call(keepPid("$$", "hook") + keepPid("$PPID", "parent") + "\nsleep 1000"),
+                            std::chrono::steady_clock::now());
+    waitUntil([&] { return exists(mDirectory.path("parent")); }, "the hook");
+    const std::string lHook = read("hook");
+    ASSERT_EQ(kill(std::stoi(read("parent")), SIGKILL), 0);
+    EXPECT_THAT(finish(lProcess), HasSubstr("watches it was killed"));
+    waitUntil([&] { return isGone(lHook); }, "the end of the hook");
 }
 
 TEST_F(HookProcess, ThatPrintsWithoutEndStillMeetsItsTimeout) {
@@ -137,15 +180,26 @@ TEST_F(HookProcess, ThatPrintsWithoutEndStillMeetsItsTimeout) {
     const auto lNow = std::chrono::steady_clock::now();
     ZTCHookProcess lProcess(lCall, lNow);
     EXPECT_EQ(lProcess.step(lNow + seconds(1)), std::nullopt);
-    EXPECT_THAT(lProcess.step(lNow + seconds(3600)).value_or(""), HasSubstr("still ran"));
+    EXPECT_THAT(finish(lProcess, seconds(3600)), HasSubstr("still ran"));
 }
 
-TEST_F(HookProcess, IsEndedWithItsGroupWhereItsOwnerEnds) {
+TEST_F(HookProcess, IsEndedWithAllItsProcessesWhereItsOwnerEnds) {
     {
-        ZTCHookProcess lProcess(call("echo $$" + out("pid.part") + "\nmv " + mDirectory.path("pid.part") + " " +
-                                     mDirectory.path("pid") + "\nsleep 1000"),
-                                std::chrono::steady_clock::now());
+        ZTCHookProcess lProcess(call(keepPid("$$", "pid") + "\nsleep 1000"), std::chrono::steady_clock::now());
         waitUntil([&] { return exists(mDirectory.path("pid")); }, "the hook");
     }
     EXPECT_TRUE(isGone(read("pid")));
+}
+
+TEST_F(HookProcess, IsEndedWhereItsOwnerIsKilled) {
+    const ZTSHookCall lCall = call("setsid sleep 1000 &" + keepPid("$!", "child") + "\nsleep 1000");
+    const pid_t lOwner = fork();
+    if (lOwner == 0) {
+        const ZTCHookProcess lProcess(lCall, std::chrono::steady_clock::now());
+        pause();
+    }
+    waitUntil([&] { return exists(mDirectory.path("child")); }, "the hook");
+    kill(lOwner, SIGKILL);
+    waitpid(lOwner, nullptr, 0);
+    waitUntil([&] { return isGone(read("child")); }, "the end of the hook's child");
 }

@@ -118,6 +118,25 @@ TEST_F(Warnings, AHookGetsTheEpisodeAndWhatIsToBeKnownOfTheWarning) {
                       HasSubstr("TAVIK_NEXT=2"), HasSubstr("TAVIK_EPISODE=1\n"), HasSubstr("TAVIK_TEST=0\n")));
 }
 
+TEST_F(Warnings, AHookGetsTheDisksBehindTheEpisode) {
+    ZTSTopology lTopology;
+    lTopology.mInitiators.emplace_back();
+    lTopology.mInitiators[0].mHost = "host7";
+    lTopology.mInitiators[0].mWwpn = makeName(gcLocalPort);
+    lTopology.mRemotePorts = {{.mName = "rport-7:0-3", .mHost = "host7", .mWwpn = makeName(gcPortA)}};
+    lTopology.mPaths = {
+        {.mAddress = "7:0:3:3", .mHost = "host7", .mRemotePort = "rport-7:0-3", .mLun = 3, .mDisk = "sdb"}};
+    const std::int64_t lNow = toMicroseconds(getHistoryTime());
+    inTransaction([&] { ASSERT_TRUE(store().noteTopology(lNow, lTopology)); });
+    start({rule("queue-full", keep("warned"))}).openHistory();
+    takeNow(5);
+    mpWarnings->setLive("{}");
+    const nlohmann::json lDocument = document("warned");
+    ASSERT_EQ(lDocument["devices"].size(), 1U) << lDocument;
+    EXPECT_EQ(lDocument["devices"][0]["disk"], "sdb");
+    EXPECT_EQ(lDocument["remotePort"]["rport"], "rport-7:0-3");
+}
+
 TEST_F(Warnings, AStateIsWarnedOfWithoutAnEpisodeAndItsEndIsReported) {
     ZTSWarnRule lRule = rule("disk-full", keep("warned"));
     lRule.mWithin = seconds(1);
