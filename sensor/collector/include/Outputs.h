@@ -31,8 +31,8 @@ public:
     std::vector<ZTSHookTest> takeHookTests() { return mWarnings.takeTests(); }
     /// Readable when takeHookTests() has something; takeHookTests() reads it empty.
     int getBell() const { return mWarnings.getBell(); }
-    /// The open warnings, as JSON.
-    std::string describeWarnings() const { return mWarnings.describe(); }
+    /// The open warnings and the outlets that do not work, as JSON.
+    std::string describeWarnings() const;
 
 private:
     ZTCHistoryWorker& mrHistory;

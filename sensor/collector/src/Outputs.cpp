@@ -3,7 +3,9 @@
 #include <unistd.h>
 
 #include <array>
+#include <nlohmann/json.hpp>
 
+#include "sensor/client/include/RecordJson.h"
 #include "sensor/collector/include/CollectorLog.h"
 #include "sensor/metrics/include/Metrics.h"
 
@@ -53,4 +55,12 @@ void ZTCOutputs::feed(ZTCTime aNow, const std::function<std::string()>& acrDescr
     mOutlets.setLive(lLive);
     mOutlets.wake();
     mWarnings.setLive(lLive);
+}
+
+std::string ZTCOutputs::describeWarnings() const {
+    nlohmann::ordered_json lWarnings = nlohmann::ordered_json::parse(mWarnings.describe());
+    for (const nlohmann::ordered_json& lrFailing : nlohmann::ordered_json::parse(mOutlets.describe())) {
+        lWarnings.push_back(lrFailing);
+    }
+    return dumpJson(lWarnings, -1);
 }

@@ -175,6 +175,17 @@ static void sAddLive(const ZTSMetricFacts& acrFacts, std::vector<MetricFamily>& 
     ZTCFamily lHeld("tavik_held_bytes", MetricType::Gauge, "Bytes of event data that the agent holds.");
     lHeld.addKnown({}, lrLive->mAgent.mHeldBytes);
     lHeld.moveTo(arFamilies);
+    if (lrLive->mWarnings) {
+        ZTCFamily lWarnings("tavik_open_warnings", MetricType::Gauge,
+                            "Warnings that are open, by kind of trouble; hook: hooks that failed last; output: outputs "
+                            "that cannot be written.");
+        lWarnings.add({{"kind", "hook"}}, 0);
+        lWarnings.add({{"kind", "output"}}, 0);
+        for (const ZTSLiveWarning& lrWarning : *lrLive->mWarnings) {
+            lWarnings.add({{"kind", lrWarning.mKind}}, 1);
+        }
+        lWarnings.moveTo(arFamilies);
+    }
     sAddKindStates(*lrLive, arFamilies);
 }
 

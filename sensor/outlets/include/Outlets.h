@@ -60,7 +60,14 @@ public:
     /// The port of the web server; 0: none, or a Unix socket.
     unsigned getPort() const;
 
+    /// What does not work now, as a JSON list of open warnings, as LiveState.h describes it.
+    std::string describe() const;
+
 private:
+    struct ZTSFailing {
+        ZTCHistoryTime mSince;
+        std::string mProblem;
+    };
     /// An outlet with what it has.
     struct ZTSFedOutlet {
         std::unique_ptr<ZTCChangeOutlet> mpOutlet;
@@ -85,6 +92,8 @@ private:
     ZTCNameBook makeNames() const;
     /// Reports a problem of one outlet when it is new, and its end.
     void report(std::string& arLast, const std::string& acrProblem, const char* apOutlet);
+    /// What is switched off or changed has no problem any more.
+    void forget(std::string& arLast, const char* apOutlet);
     std::string readLive() const;
     void giveSeries(ZTSMetricFacts& arFacts);
 
@@ -114,6 +123,7 @@ private:
     ZTCSeriesPorts mSeriesPorts;  ///< of the database with this id
     std::string mSeriesStoreId;
     unsigned mPort = 0;
+    std::map<std::string, ZTSFailing> mFailing;  ///< by title
 
     std::unique_ptr<ZTCApi> mpApi;           ///< of the server's thread; outlives the server
     std::unique_ptr<ZTCApi> mpFileApi;       ///< of the outlets' thread

@@ -12,6 +12,7 @@
 #include "sensor/outlets/include/NdjsonOutlet.h"
 #include "sensor/views/include/EpisodeJson.h"
 #include "sensor/views/include/StatusView.h"
+#include "sensor/views/include/TimeText.h"
 
 using std::chrono::seconds;
 using std::chrono::steady_clock;
@@ -24,6 +25,11 @@ static constexpr seconds scMetricsPeriod{15};
 static constexpr seconds scServerPause{10};
 /// Changes in one writing: each is a part of an answer in memory.
 static constexpr std::uint64_t scMostChanges = 1000;
+
+/// What works or fails here beside the table of outlets, for people.
+static constexpr const char* scServerTitle = "the web server";
+static constexpr const char* scMetricsTitle = "the metrics file";
+static constexpr const char* scHistoryTitle = "the outlets' reading of the history";
 
 ZTCOutlets::ZTCOutlets(ZTSOutletsSetup aSetup, const ZTSSettings& acrSettings)
     : mSetup(std::move(aSetup)), mNewSettings(acrSettings) {
@@ -140,6 +146,11 @@ void ZTCOutlets::applySettings() {
     if (lNew->mHttpListen != mSettings.mHttpListen || lNew->mHttpHosts != mSettings.mHttpHosts) {
         mpServer.reset();
         mNextServer = {};
+        forget(mServerProblem, scServerTitle);
+    }
+    if (lNew->mMetricsTextfile != mSettings.mMetricsTextfile) {
+        mNextMetrics = {};
+        forget(mMetricsProblem, scMetricsTitle);
     }
     makeOutlets(*lNew);
     mSettings = std::move(*lNew);
@@ -154,8 +165,9 @@ void ZTCOutlets::makeOutlets(const ZTSSettings& acrNew) {
         return;
     }
     std::map<std::string, std::pair<std::optional<std::uint64_t>, std::uint64_t>> lHad;
-    for (const ZTSFedOutlet& lrOutlet : mOutlets) {
+    for (ZTSFedOutlet& lrOutlet : mOutlets) {
         lHad[lrOutlet.mpOutlet->getName()] = {lrOutlet.mSeq, lrOutlet.mTold};  // what is stored may be older
+        forget(lrOutlet.mProblem, lrOutlet.mpOutlet->getTitle());
     }
     mOutlets.clear();
     if (!acrNew.mNdjsonPath.empty()) {
@@ -179,6 +191,33 @@ void ZTCOutlets::report(std::string& arLast, const std::string& acrProblem, cons
         mSetup.mReport(acrProblem.empty() ? std::string(apOutlet) + " works again" : acrProblem + "; trying on");
         arLast = acrProblem;
     }
+    const std::lock_guard lLock(mMutex);
+    if (acrProblem.empty()) {
+        mFailing.erase(apOutlet);
+    } else {
+        const auto lAdded =
+            mFailing.try_emplace(apOutlet, ZTSFailing{.mSince = getHistoryTime(), .mProblem = acrProblem});
+        lAdded.first->second.mProblem = acrProblem;
+    }
+}
+
+void ZTCOutlets::forget(std::string& arLast, const char* apOutlet) {
+    arLast.clear();
+    const std::lock_guard lLock(mMutex);
+    mFailing.erase(apOutlet);
+}
+
+std::string ZTCOutlets::describe() const {
+    nlohmann::ordered_json lWarnings = nlohmann::ordered_json::array();
+    const std::lock_guard lLock(mMutex);
+    for (const auto& [lOutlet, lrFailing] : mFailing) {
+        lWarnings.push_back({{"kind", "output"},
+                             {"text", lOutlet + " does not work: " + lrFailing.mProblem},
+                             {"since", toRfc3339(lrFailing.mSince)},
+                             {"given", nullptr},
+                             {"next", nullptr}});
+    }
+    return dumpJson(lWarnings, -1);
 }
 
 void ZTCOutlets::openServer() {
@@ -190,11 +229,11 @@ void ZTCOutlets::openServer() {
         mpServer = std::make_unique<ZTCWebServer>(
             ZTSWebOptions{.mListen = mSettings.mHttpListen, .mHosts = mSettings.mHttpHosts},
             [this](const ZTSWebRequest& acrRequest) { return mpApi->answer(acrRequest); });
-        report(mServerProblem, "", "the web server");
+        report(mServerProblem, "", scServerTitle);
         const std::lock_guard lLock(mMutex);
         mPort = mpServer->getPort();
     } catch (const ZTCClientEx& lrEx) {
-        report(mServerProblem, lrEx.what(), "the web server");
+        report(mServerProblem, lrEx.what(), scServerTitle);
     }
 }
 
@@ -219,10 +258,10 @@ void ZTCOutlets::feedHistory() {
         for (ZTSFedOutlet& lrOutlet : mOutlets) {
             feed(lrOutlet);
         }
-        report(mHistoryProblem, "", "the outlets' reading of the history");
+        report(mHistoryProblem, "", scHistoryTitle);
     } catch (const ZTCStoreEx& lrEx) {
         mpHistory.reset();  // it may have been replaced
-        report(mHistoryProblem, std::string("the outlets cannot read the history: ") + lrEx.what(), "");
+        report(mHistoryProblem, std::string("the outlets cannot read the history: ") + lrEx.what(), scHistoryTitle);
     }
 }
 
@@ -358,9 +397,9 @@ void ZTCOutlets::writeMetrics() {
     const ZTSWebResponse lMetrics = mpFileApi->answer({.mPath = "/metrics", .mParameters = {}});
     try {
         writeMetricsFile(mSettings.mMetricsTextfile, lMetrics.mBody);
-        report(mMetricsProblem, "", "the metrics file");
+        report(mMetricsProblem, "", scMetricsTitle);
     } catch (const ZTCSystemCallEx& lrEx) {
-        report(mMetricsProblem, lrEx.what(), "the metrics file");
+        report(mMetricsProblem, lrEx.what(), scMetricsTitle);
         mNextMetrics = steady_clock::now() + scFeedPeriod;
     }
 }

@@ -39,7 +39,8 @@
 /// - `losses`: what was refused or dropped in the last 24 hours, as far back as `since` where the collector knows less.
 ///
 /// - `warnings` are the open ones of the configuration's rules: `given` so often, `next` time if the trouble goes on. A
-///   hook that failed is one of the kind `hook` until it works again.
+///   hook that failed is one of the kind `hook`, an output that cannot be written one of the kind `output`, until it
+///   works again.
 ///
 /// `{"request":"warn-test"}` runs every hook with a test record. The answer comes when all have ended:
 /// `{"hooks":[{"kind":"queue-full","run":["/usr/local/bin/tell"],"problem":null}]}`.

@@ -189,6 +189,21 @@ static ZTCJson sLosses(const ZTSStatusFacts& acrFacts) {
     return lLosses;
 }
 
+static ZTCJson sWarnings(const ZTSStatusFacts& acrFacts) {
+    if (!acrFacts.mLive || !acrFacts.mLive->mWarnings) {
+        return nullptr;
+    }
+    ZTCJson lWarnings = ZTCJson::array();
+    for (const ZTSLiveWarning& lrWarning : *acrFacts.mLive->mWarnings) {
+        lWarnings.push_back({{"kind", lrWarning.mKind},
+                             {"text", lrWarning.mText},
+                             {"since", sTime(lrWarning.mSince)},
+                             {"given", sValue(lrWarning.mGiven)},
+                             {"next", sTime(lrWarning.mNext)}});
+    }
+    return lWarnings;
+}
+
 static void sAddHistory(const ZTSStatusFacts& acrFacts, ZTCJson& arDocument) {
     if (!acrFacts.mHistory) {
         arDocument["ledger"] = nullptr;
@@ -229,6 +244,7 @@ ZTCJson makeStatusDocument(const ZTSStatusFacts& acrFacts) {
     lDocument["adapters"] = lIsLive ? sAdapters(acrFacts.mLive->mAdapters) : ZTCJson(nullptr);
     lDocument["kinds"] = lIsLive ? sKinds(acrFacts.mLive->mKinds) : ZTCJson(nullptr);
     sAddHistory(acrFacts, lDocument);
+    lDocument["warnings"] = sWarnings(acrFacts);
     lDocument["lastEvent"] = {{"time", sTime(lLast.mTime)}, {"kind", sText(lLast.mKind)}};
     const bool lHasSan = acrFacts.mHistory && acrFacts.mHistory->mSan;
     lDocument["paths"] = lHasSan ? ZTCJson(summarizePaths(acrFacts.mHistory->mSan->mFacts)) : ZTCJson(nullptr);

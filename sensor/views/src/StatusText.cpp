@@ -35,6 +35,7 @@ public:
         for (const ZTSTroubleText& lrTrouble : lTroubles) {
             mPage.addTrouble(lrTrouble);
         }
+        addFailing();
         if (mJudgement.isCollecting() && lTroubles.empty() && !lHasSanTroubles) {
             addLinks();
             addPaths();
@@ -167,6 +168,18 @@ private:
         }
         const bool lIsQuiet = !lLast.mTime || mrFacts.mNow - *lLast.mTime >= scQuietSpan;
         mPage.add(lIsQuiet ? "quiet" : "events", lText);
+    }
+
+    /// Hooks and outputs that do not work: Tavik collects all the same.
+    void addFailing() {
+        if (!mrFacts.mLive || !mrFacts.mLive->mWarnings) {
+            return;
+        }
+        for (const ZTSLiveWarning& lrWarning : *mrFacts.mLive->mWarnings) {
+            if (lrWarning.mKind == "hook" || lrWarning.mKind == "output") {
+                mPage.add(lrWarning.mKind, lrWarning.mText);
+            }
+        }
     }
 
     /// "0 of 256 KiB": the first without a unit where it is nothing.

@@ -1,6 +1,7 @@
 #include "sensor/web/include/WebServer.h"
 
 #include <microhttpd.h>
+#include <poll.h>
 #include <sys/socket.h>
 #include <unistd.h>
 
@@ -90,7 +91,7 @@ public:
 
     bool hasStreams() const {
         const std::lock_guard lLock(mMutex);
-        return !mStreams.empty();
+        return countStreams() != 0;
     }
 
     void send(const std::string& acrText) {
@@ -225,7 +226,8 @@ private:
         Stream* lpStream = nullptr;
         {
             const std::lock_guard lLock(mMutex);
-            if (mStreams.size() < mOptions.mLimits.mStreams) {
+            dropGoneStreams();  // a page that was loaded again has left the stream that it had
+            if (countStreams() < mOptions.mLimits.mStreams) {
                 mStreams.emplace_back();
                 lpStream = &mStreams.back();
                 lpStream->mpOwner = this;
@@ -283,6 +285,26 @@ private:
         }
     }
 
+    /// With mMutex held. A place is free as soon as its reader is known to have gone.
+    std::size_t countStreams() const {
+        return static_cast<std::size_t>(
+            std::ranges::count_if(mStreams, [](const Stream& acrStream) { return !acrStream.mIsDropped; }));
+    }
+
+    /// With mMutex held. The library does not look at a stream's connection while there is nothing to send.
+    void dropGoneStreams() {
+        for (Stream& lrStream : mStreams) {
+            const auto lFound = mConnections.find(lrStream.mpConnection);
+            pollfd lFd{.fd = lFound == mConnections.end() ? -1 : lFound->second.mDescriptor,
+                       .events = POLLRDHUP,
+                       .revents = 0};
+            if (!lrStream.mIsDropped && poll(&lFd, 1, 0) > 0) {
+                lrStream.mIsDropped = true;
+                wake(lrStream);
+            }
+        }
+    }
+
     /// With mMutex held.
     static void wake(Stream& arStream) {
         if (arStream.mIsSuspended) {
@@ -308,6 +330,7 @@ private:
                     shutdown(lrConnection.mDescriptor, SHUT_RDWR);
                 }
             }
+            dropGoneStreams();
             if (lNow >= lNextBeat) {
                 lNextBeat = lNow + scStreamBeat;
                 lLock.unlock();

@@ -202,6 +202,17 @@ TEST_F(WebServer, AStreamMoreThanTheLimitGets503AndAPlaceThatIsFreeAgainIsGiven)
         "the place of the client that has gone");
 }
 
+TEST_F(WebServer, TheStreamOfAPageThatWasLeftIsFreeAtOnce) {
+    ZTCWebServer& lrServer = start(ZTSWebLimits{.mStreams = 1});
+    // A page that is loaded again and again: each time the one place is free, though nothing was sent meanwhile.
+    for (int i = 0; i < 20; ++i) {
+        ZTCHttpClient lClient(lrServer.getPort());
+        ASSERT_TRUE(lClient.send(scStreamRequest));
+        EXPECT_THAT(lClient.readUntil(": begin\n\n"), HasSubstr(" 200 OK")) << i;
+    }
+    waitUntil([&] { return !lrServer.hasStreams(); }, "the end of the last stream");
+}
+
 TEST_F(WebServer, AReaderOfTheStreamThatStopsReadingIsDroppedAndHoldsNobodyUp) {
     ZTCWebServer& lrServer = start(ZTSWebLimits{.mStreamBytes = 65536});
     ZTCHttpClient lStuck(lrServer.getPort());
