@@ -1,16 +1,19 @@
 /// The raw records of an episode: its first and its last ones, as many as the limit says at each end.
 ///
-/// Records are stored in chunks, one row a transaction. Like records differ in few bytes, so each is stored as what
-/// differs from the one before it in the chunk: the difference of its number to the number before; its size; then,
+/// Records are stored in chunks, a row each. A transaction begins a new chunk, and so does a record that comes when the
+/// chunk is full: a larger row would need a page of its own. Like records differ in few bytes, so each is stored as
+/// what differs from the one before it in the chunk: the difference of its number to the number before; its size; then,
 /// until the size is reached, bytes that are the same (a count) and bytes that are not (a count and the bytes). Bytes
 /// behind the end of the record before count as 0. The record's bytes are those on the wire.
+///
+/// A record is put into its chunk when it comes: keeping copies until the end of the transaction would take more time
+/// than all else that is done with it, because of the fresh memory that they need.
 ///
 /// Chunks that fall out at the back are deleted whole; readers cut what is left to the limit.
 #ifndef SENSOR_STORE_SRC_RECORDWINDOW_H
 #define SENSOR_STORE_SRC_RECORDWINDOW_H
 
 #include <cstdint>
-#include <deque>
 #include <functional>
 #include <span>
 #include <vector>
@@ -18,24 +21,18 @@
 #include "sensor/client/include/RecordView.h"
 #include "sensor/store/src/Varint.h"
 
-/// Records that are not stored yet, in a row.
+/// Records that are not stored yet, in a row, as the chunk that they become.
 class ZTCPendingRecords {
 public:
     void add(std::uint64_t aSeq, std::span<const std::uint8_t> aRecord);
-    /// Keeps the last ones only.
-    void keepLast(std::size_t aCount);
-    std::size_t size() const { return mEntries.size(); }
-    ZTCStoreBytes encode() const;
-    void clear();
+    std::size_t size() const { return mCount; }
+    const ZTCStoreBytes& getChunk() const { return mChunk; }
 
 private:
-    struct Entry {
-        std::uint64_t mSeq;
-        std::size_t mOffset;
-        std::size_t mSize;
-    };
-    ZTCStoreBytes mBytes;
-    std::vector<Entry> mEntries;
+    ZTCStoreBytes mChunk;
+    ZTCStoreBytes mBefore;  ///< the last record
+    std::uint64_t mSeqBefore = 0;
+    std::size_t mCount = 0;
 };
 
 /// Reads a chunk record by record. A view lives as long as the visitor's call. Throws ZTCStoreDamagedEx where it is no
@@ -60,11 +57,12 @@ private:
         std::uint64_t mOrdinal;
         std::uint64_t mCount;
     };
-    ZTCPendingRecords mHead;
-    ZTCPendingRecords mTail;
-    std::uint64_t mNextHead = 0;  ///< ordinal behind the last pending record of the head
-    std::uint64_t mNextTail = 0;
-    std::deque<Chunk> mStored;
+    struct Pending {
+        std::uint64_t mOrdinal = 0;  ///< of its first record
+        ZTCPendingRecords mRecords;
+    };
+    std::vector<Pending> mPending;  ///< rising
+    std::vector<Chunk> mStored;     ///< rising
 };
 
 #endif

@@ -11,12 +11,31 @@
 
 using ZTCStoreBytes = std::vector<std::uint8_t>;
 
-inline void appendVarint(ZTCStoreBytes& arBytes, std::uint64_t aValue) {
+/// Bytes of the largest number.
+inline constexpr std::size_t gcMostVarintBytes = 10;
+
+constexpr std::size_t countVarintBytes(std::uint64_t aValue) {
+    std::size_t lBytes = 1;
     while (aValue >= 0x80) {
-        arBytes.push_back(static_cast<std::uint8_t>(aValue | 0x80));
+        aValue >>= 7;
+        ++lBytes;
+    }
+    return lBytes;
+}
+
+/// There is room for it. Returns the place behind it.
+inline std::uint8_t* writeVarint(std::uint8_t* apTo, std::uint64_t aValue) {
+    while (aValue >= 0x80) {
+        *apTo++ = static_cast<std::uint8_t>(aValue | 0x80);
         aValue >>= 7;
     }
-    arBytes.push_back(static_cast<std::uint8_t>(aValue));
+    *apTo++ = static_cast<std::uint8_t>(aValue);
+    return apTo;
+}
+
+inline void appendVarint(ZTCStoreBytes& arBytes, std::uint64_t aValue) {
+    std::uint8_t lBytes[gcMostVarintBytes];
+    arBytes.insert(arBytes.end(), lBytes, writeVarint(lBytes, aValue));
 }
 
 /// Takes a number off the front. Throws ZTCStoreDamagedEx where there is none.

@@ -188,7 +188,7 @@ TEST_F(HistoryTest, AChunkThatIsDamagedIsNoRecordAndNoCrash) {
     for (unsigned i = 0; i < 3; ++i) {
         lPending.add(7 + i, encodeRecord(makeQueueFull(gcPortA, gcBase, gcBase + i, i + 1)));
     }
-    const ZTCStoreBytes lChunk = lPending.encode();
+    const ZTCStoreBytes lChunk = lPending.getChunk();
     EXPECT_LT(lChunk.size(), 150U) << "like records are stored as their differences";
     std::vector<std::uint32_t> lOccurrences;
     visitChunk(lChunk, [&](std::uint64_t aSeq, const ZTSRecordView& acrRecord) {
