@@ -56,7 +56,14 @@ public:
     /// As of the last look; null: not known.
     const ZTCPagePointer& getPage() const { return mpLastPage; }
     std::optional<ZTCHistoryTime> getLastAsked() const { return mLastAsked; }
-    ZTSLosses getLosses(ZTCHistoryTime aNow) { return mLosses.get(aNow); }
+    /// @param aSince  from then on; the last 24 hours at most
+    ZTSLosses getLosses(ZTCHistoryTime aNow, ZTCHistoryTime aSince = {}) { return mLosses.get(aNow, aSince); }
+
+    // ---- what outlives this process ----
+    /// What another one told of last. To be called before run().
+    void restoreLosses(const std::string& acrText) { mLosses.restore(acrText); }
+    /// To be stored, where something was lost since the last call.
+    std::optional<std::string> takeNewLosses();
 
 private:
     struct ZTSWaitingAgent {
@@ -82,6 +89,7 @@ private:
     ZTCPagePointer mpLastPage;
     std::optional<ZTCHistoryTime> mLastAsked;
     ZTCLossWindow mLosses;
+    bool mHasNewLosses = false;
 };
 
 #endif

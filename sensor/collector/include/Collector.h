@@ -52,9 +52,10 @@ private:
     void sweep(ZTCTime aNow);
     void noteHistory();
     void tellState();
+    void storeLosses();
 
     std::optional<std::string> serve(std::uint64_t aTicket, const std::string& acrRequest);
-    std::string describeState();
+    std::string describeState(ZTCHistoryTime aLossesSince = {});
 
     ZTSInheritance mInheritance;
     ZTSSettings mSettings;

@@ -12,9 +12,10 @@ enum ZTEControlRequest : std::uint8_t { ZTCR_Status, ZTCR_Mark, ZTCR_WarnTest, Z
 
 struct ZTSControlRequest {
     ZTEControlRequest mKind = ZTCR_Wrong;
-    std::string mName;                      ///< of a mark
-    std::string mError;                     ///< of a wrong request: one line
-    std::optional<ZTCHistoryTime> mTime{};  ///< of a mark; absent: now
+    std::string mName;   ///< of a mark
+    std::string mError;  ///< of a wrong request: one line
+    /// Of a mark; absent: now. Of a status: losses are told from then on; absent: of the last 24 hours.
+    std::optional<ZTCHistoryTime> mTime{};
 };
 
 /// Longest name of a mark in bytes.

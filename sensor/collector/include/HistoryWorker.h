@@ -26,6 +26,9 @@
 #include "sensor/store/include/Store.h"
 #include "sensor/topology/include/Topology.h"
 
+/// The value that holds the losses of the last day: the text of a ZTCLossWindow.
+inline constexpr const char* gcLossesValue = "collector.losses";
+
 /// What can be seen of the worker at any time.
 struct ZTSHistoryState {
     bool mIsOpen = false;  ///< the database is open: numbers and id below are known
@@ -81,6 +84,8 @@ public:
     void setMark(std::uint64_t aTicket, const std::string& acrName, ZTCHistoryTime aTime);
     /// Stores a value under a name, for those who read the history. A later value replaces it.
     void setValue(const std::string& acrName, const std::string& acrValue);
+    /// The losses that the history had when it was opened; once. Empty: none, or they were taken.
+    std::string takeStoredLosses();
     /// Marks that are done since the last call.
     std::vector<ZTSMarkResult> takeMarkResults();
 
@@ -183,6 +188,7 @@ private:
     bool mIsDone = false;
     ZTSHistoryState mState;
     std::vector<ZTSMarkResult> mMarkResults;
+    std::string mStoredLosses;
 
     std::thread mThread;
 };

@@ -1,12 +1,14 @@
 /// What the agent refused and dropped, and what its library reported as lost, in the last 24 hours: from the pages of
-/// one start after the other. In steps of an hour.
+/// one start after the other. Losses of the last hour are told apart by the minute, earlier ones by the hour.
+///
+/// It can be kept as text, so that the next process of this kind goes on where this one stopped.
 #ifndef SENSOR_COLLECTOR_INCLUDE_LOSSWINDOW_H
 #define SENSOR_COLLECTOR_INCLUDE_LOSSWINDOW_H
 
 #include <cstdint>
-#include <deque>
 #include <map>
 #include <string>
+#include <vector>
 
 #include "sensor/client/include/StatusPageReader.h"
 #include "sensor/store/include/HistoryTime.h"
@@ -23,29 +25,41 @@ public:
     /// @param aNow  nothing is known of the time before
     explicit ZTCLossWindow(ZTCHistoryTime aNow) : mBegin(aNow) {}
 
+    /// Goes on where the window stopped that toText() made the text of. To be called before the first page. Any other
+    /// text changes nothing; returns false.
+    bool restore(const std::string& acrText);
+    /// JSON of one line.
+    std::string toText() const;
+
     /// Counts what is new on the page. The first page of a start that is older than this object is where counting
-    /// begins.
-    void note(const ZTSStatusSnapshot& acrPage, ZTCHistoryTime aNow);
-    ZTSLosses get(ZTCHistoryTime aNow);
+    /// begins. Returns whether there was anything new: toText() has changed.
+    bool note(const ZTSStatusSnapshot& acrPage, ZTCHistoryTime aNow);
+    /// @param aSince  counted from then on, to the minute or to the hour; the last 24 hours at most
+    ZTSLosses get(ZTCHistoryTime aNow, ZTCHistoryTime aSince = {});
 
 private:
     struct ZTSCounts {
         std::map<std::string, std::uint64_t> mRefused;
         std::uint64_t mDropped = 0;
         std::map<std::string, std::uint64_t> mLibrary;
+
+        bool operator==(const ZTSCounts&) const = default;
     };
-    struct ZTSHour {
+    /// What was lost between two pages or more.
+    struct ZTSSlot {
         ZTCHistoryTime mBegin;
+        ZTCHistoryTime mEnd;
         ZTSCounts mCounts;
     };
 
     static ZTSCounts countAll(const ZTSStatusSnapshot& acrPage);
-    void forgetOld(ZTCHistoryTime aNow);
+    static void addGrowth(ZTSCounts& arSum, const ZTSCounts& acrOld, const ZTSCounts& acrNew);
+    void tidy(ZTCHistoryTime aNow);
 
-    const ZTCHistoryTime mBegin;
+    ZTCHistoryTime mBegin;
     std::string mGeneration;
     ZTSCounts mLast;
-    std::deque<ZTSHour> mHours;
+    std::vector<ZTSSlot> mSlots;  ///< rising
 };
 
 #endif

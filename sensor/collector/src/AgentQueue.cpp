@@ -4,6 +4,7 @@
 #include <poll.h>
 
 #include <algorithm>
+#include <utility>
 
 /// Of an orderly end: how long a full disk may hold up the agent's shut-down.
 static constexpr std::chrono::seconds scStopPatience{8};
@@ -105,6 +106,10 @@ ZTCPagePointer ZTCAgentQueue::readPage() {
     return mpSession != nullptr ? mpSession->readPageNow() : mpLastPage;
 }
 
+std::optional<std::string> ZTCAgentQueue::takeNewLosses() {
+    return std::exchange(mHasNewLosses, false) ? std::optional(mLosses.toText()) : std::nullopt;
+}
+
 void ZTCAgentQueue::beginNext(ZTCTime aNow) {
     if (mpSession != nullptr || mWaiting.empty()) {
         return;
@@ -134,7 +139,7 @@ void ZTCAgentQueue::step(ZTCTime aNow) {
     }
     if (mpSession->getPage() != nullptr) {
         if (mpLastPage != mpSession->getPage()) {
-            mLosses.note(*mpSession->getPage(), getHistoryTime());
+            mHasNewLosses |= mLosses.note(*mpSession->getPage(), getHistoryTime());
         }
         mpLastPage = mpSession->getPage();
     }

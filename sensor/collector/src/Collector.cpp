@@ -117,6 +117,7 @@ void ZTCCollector::turn(ZTCTime aNow) {
         }
         if (mPorts.isReady()) {
             mAgents.run(aNow);
+            storeLosses();
             mPorts.noteEvents(mAgents.getPage());
             sweep(aNow);
         }
@@ -247,6 +248,7 @@ void ZTCCollector::openSpool(ZTCTime aNow) {
     }
     try {
         mLeftovers.takeInWaiting(mHistory.getState().mLastFrame);
+        mAgents.restoreLosses(mHistory.takeStoredLosses());
         mIsReady = true;
         mSpoolProblem.clear();
     } catch (const ZTCSpoolTroubleEx& lrEx) {
@@ -256,6 +258,13 @@ void ZTCCollector::openSpool(ZTCTime aNow) {
         mSpoolProblem = lrEx.what();
         mSpoolErrno = lrEx.getErrno();
         mNextSpoolTry = aNow + scSpoolPause;
+    }
+}
+
+/// The losses of the last day outlive this process.
+void ZTCCollector::storeLosses() {
+    if (const std::optional<std::string> lLosses = mAgents.takeNewLosses()) {
+        mHistory.setValue(gcLossesValue, *lLosses);
     }
 }
 
@@ -301,7 +310,7 @@ std::optional<std::string> ZTCCollector::serve(std::uint64_t aTicket, const std:
     const ZTSControlRequest lRequest = parseControlRequest(acrRequest);
     switch (lRequest.mKind) {
         case ZTCR_Status:
-            return describeState();
+            return describeState(lRequest.mTime.value_or(ZTCHistoryTime()));
         case ZTCR_Mark:
             mHistory.setMark(aTicket, lRequest.mName, lRequest.mTime.value_or(getHistoryTime()));
             return std::nullopt;
@@ -314,7 +323,7 @@ std::optional<std::string> ZTCCollector::serve(std::uint64_t aTicket, const std:
     return toErrorJson(lRequest.mError);
 }
 
-std::string ZTCCollector::describeState() {
+std::string ZTCCollector::describeState(ZTCHistoryTime aLossesSince) {
     const ZTCAgentSession* const lpSession = mAgents.getSession();
     ZTSLiveFacts lFacts;
     lFacts.mNow = getHistoryTime();
@@ -335,7 +344,7 @@ std::string ZTCCollector::describeState() {
     }
     lFacts.mIsSpoolReadOnly = !lFacts.mSpoolProblem.empty() && lErrno == EROFS;
     lFacts.mHistory = mHistory.getState();
-    lFacts.mLosses = mAgents.getLosses(lFacts.mNow);
+    lFacts.mLosses = mAgents.getLosses(lFacts.mNow, aLossesSince);
     lFacts.mPorts = mPorts.getPorts();
     lFacts.mWarnings = mOutputs.describeWarnings();
     lFacts.mTopology = mTopology.getState();

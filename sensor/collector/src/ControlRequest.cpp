@@ -18,6 +18,18 @@ static bool sHasControlCharacters(const std::string& acrText) {
     return false;
 }
 
+/// Adds the time of that name, where there is one.
+static ZTSControlRequest sReadTime(const nlohmann::json& acrJson, const char* apName, ZTSControlRequest aRequest) {
+    if (acrJson.contains(apName)) {
+        const nlohmann::json& lrTime = acrJson[apName];
+        aRequest.mTime = lrTime.is_string() ? fromRfc3339(lrTime.get<std::string>()) : std::nullopt;
+        if (!aRequest.mTime) {
+            return sWrong("\"" + std::string(apName) + "\" is a text as of RFC 3339");
+        }
+    }
+    return aRequest;
+}
+
 ZTSControlRequest parseControlRequest(const std::string& acrLine) {
     const nlohmann::json lJson = nlohmann::json::parse(acrLine, nullptr, false);
     if (!lJson.is_object() || !lJson.contains("request") || !lJson["request"].is_string()) {
@@ -25,7 +37,7 @@ ZTSControlRequest parseControlRequest(const std::string& acrLine) {
     }
     const auto lRequest = lJson["request"].get<std::string>();
     if (lRequest == "status") {
-        return {.mKind = ZTCR_Status, .mName = {}, .mError = {}};
+        return sReadTime(lJson, "lossesSince", {.mKind = ZTCR_Status, .mName = {}, .mError = {}});
     }
     if (lRequest == "warn-test") {
         return {.mKind = ZTCR_WarnTest, .mName = {}, .mError = {}};
@@ -41,14 +53,7 @@ ZTSControlRequest parseControlRequest(const std::string& acrLine) {
         return sWrong("a mark's name has 1 to " + std::to_string(gcMaxMarkName) +
                       " bytes without control characters, this one has " + std::to_string(lName.size()));
     }
-    std::optional<ZTCHistoryTime> lTime;
-    if (lJson.contains("time")) {
-        lTime = lJson["time"].is_string() ? fromRfc3339(lJson["time"].get<std::string>()) : std::nullopt;
-        if (!lTime) {
-            return sWrong("a mark's \"time\" is a text as of RFC 3339");
-        }
-    }
-    return {.mKind = ZTCR_Mark, .mName = lName, .mError = {}, .mTime = lTime};
+    return sReadTime(lJson, "time", {.mKind = ZTCR_Mark, .mName = lName, .mError = {}});
 }
 
 std::string toErrorJson(const std::string& acrError) {

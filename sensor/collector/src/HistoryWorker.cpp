@@ -115,6 +115,11 @@ void ZTCHistoryWorker::setValue(const std::string& acrName, const std::string& a
     submit(ZTSValueJob{acrName, acrValue});
 }
 
+std::string ZTCHistoryWorker::takeStoredLosses() {
+    const std::lock_guard lLock(mMutex);
+    return std::exchange(mStoredLosses, {});
+}
+
 std::vector<ZTSMarkResult> ZTCHistoryWorker::takeMarkResults() {
     const std::lock_guard lLock(mMutex);
     return std::exchange(mMarkResults, {});
@@ -215,7 +220,9 @@ void ZTCHistoryWorker::beginRun() {
     ZTCStoreTransaction lTransaction = mpStore->begin();
     mpStore->beginRun(getHistoryTime());
     lTransaction.commit();
+    const std::string lLosses = mpStore->getValue(gcLossesValue);
     const std::lock_guard lLock(mMutex);
+    mStoredLosses = lLosses;
     mState.mIsOpen = true;
     mState.mStoreId = mpStore->getStoreId();
     mState.mLastFrame = mpStore->getLastFrame();

@@ -5,33 +5,41 @@
 
 static constexpr const char* scDefaultSince = "10m";
 
-/// Events since then, and only the gaps since then left in the facts.
-static std::optional<std::uint64_t> sCountEvents(const ZTSTavikOptions& acrOptions, const ZTCContext& acrContext,
-                                                 ZTSStatusFacts& arFacts) {
+/// From when on losses and events count. Where no history can be read there are no marks either.
+static ZTCHistoryTime sReadSince(const ZTSTavikOptions& acrOptions, const ZTCContext& acrContext) {
     const std::string lSince = acrOptions.mFilter.mSince.empty() ? scDefaultSince : acrOptions.mFilter.mSince;
+    std::optional<std::vector<ZTSMark>> lMarks;
     try {
-        const std::unique_ptr<ZTCHistory> lpHistory = acrContext.openHistory();
+        lMarks = acrContext.openHistory()->readMarks();
+    } catch (const ZTCStoreEx&) {
+        if (!isTimeOrDuration(lSince)) {
+            return readPoint(scDefaultSince, "--since", {}, getHistoryTime());
+        }
+    }
+    return readPoint(lSince, "--since", lMarks.value_or(std::vector<ZTSMark>()), getHistoryTime());
+}
+
+/// Empty: no history can be read; the facts hold the reason.
+static std::optional<std::uint64_t> sCountEvents(const ZTCContext& acrContext, ZTCHistoryTime aSince) {
+    try {
         ZTSHistoryFilter lFilter;
-        lFilter.mSince = readPoint(lSince, "--since", lpHistory->readMarks(), arFacts.mNow);
+        lFilter.mSince = aSince;
         std::uint64_t lEvents = 0;
-        lpHistory->visitMinutes(lFilter, [&lEvents](const ZTSBucket& acrBucket) {
+        acrContext.openHistory()->visitMinutes(lFilter, [&lEvents](const ZTSBucket& acrBucket) {
             lEvents += acrBucket.mOccurrences;
             return true;
         });
-        if (arFacts.mHistory) {
-            arFacts.mHistory->mGaps = lpHistory->readGaps(lFilter.mSince);
-        }
         return lEvents;
     } catch (const ZTCStoreEx&) {
-        return std::nullopt;  // the facts hold the reason
+        return std::nullopt;
     }
 }
 
 int runCheck(const ZTSTavikOptions& acrOptions) {
     const ZTCContext lContext(acrOptions);
-    ZTSStatusFacts lFacts = lContext.gatherFacts();
-    const std::optional<std::uint64_t> lEvents = sCountEvents(acrOptions, lContext, lFacts);
-    const ZTSCheck lCheck = makeCheck(lFacts, lEvents);
+    const ZTCHistoryTime lSince = sReadSince(acrOptions, lContext);
+    const ZTSStatusFacts lFacts = lContext.gatherFacts(lSince);
+    const ZTSCheck lCheck = makeCheck(lFacts, sCountEvents(lContext, lSince));
     if (acrOptions.mIsJson) {
         writeDocument(makeCheckDocument(lCheck, lFacts));
     } else {

@@ -10,6 +10,7 @@
 #include "sensor/client/include/ClientErrors.h"
 #include "sensor/client/include/StatusPageReader.h"
 #include "sensor/tavik/src/ControlClient.h"
+#include "sensor/views/include/TimeText.h"
 
 namespace fs = std::filesystem;
 
@@ -56,10 +57,15 @@ ZTCNameBook ZTCContext::makeNames(const ZTCHistory* apHistory) const {
     return lNames;
 }
 
-ZTSStatusFacts ZTCContext::gatherFacts() const {
+ZTSStatusFacts ZTCContext::gatherFacts(std::optional<ZTCHistoryTime> aLossesSince) const {
     ZTSStatusFacts lFacts;
     lFacts.mHost = mHost;
-    ZTSControlAnswer lAnswer = askSensor(mSettings.controlPath(), {{"request", "status"}}, gcAskLimit);
+    nlohmann::json lRequest{{"request", "status"}};
+    if (aLossesSince) {
+        lRequest["lossesSince"] = toRfc3339(*aLossesSince);
+        lFacts.mLossSpan = std::chrono::floor<std::chrono::seconds>(getHistoryTime() - *aLossesSince);
+    }
+    ZTSControlAnswer lAnswer = askSensor(mSettings.controlPath(), lRequest, gcAskLimit);
     lFacts.mAnswer = lAnswer.mAnswer;
     lFacts.mAnswerProblem = lAnswer.mProblem;
     if (lAnswer.mAnswer == ZTAN_Answered) {
@@ -70,9 +76,13 @@ ZTSStatusFacts ZTCContext::gatherFacts() const {
     try {
         lpHistory = openHistory();
         lFacts.mHistory = readHistoryFacts(*lpHistory, lFacts.mNow);
+        if (aLossesSince) {
+            lFacts.mHistory->mGaps = lpHistory->readGaps(*aLossesSince);
+        }
     } catch (const ZTCStoreEx& lrEx) {
         lpHistory.reset();
         lFacts.mHistoryProblem = lrEx.what();
+        lFacts.mIsHistoryNewer = dynamic_cast<const ZTCStoreNewerEx*>(&lrEx) != nullptr;
     }
     lFacts.mNames = makeNames(lpHistory.get());
     lFacts.mNames.setTopology(nullptr);  // the history ends here

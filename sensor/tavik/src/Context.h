@@ -3,6 +3,7 @@
 #define SENSOR_TAVIK_SRC_CONTEXT_H
 
 #include <memory>
+#include <optional>
 #include <string>
 
 #include "sensor/settings/include/Settings.h"
@@ -27,7 +28,8 @@ public:
     /// otherwise it outlives the names
     ZTCNameBook makeNames(const ZTCHistory* apHistory) const;
     /// Asks the sensor and reads the history. Never throws for what it meets: what is not known is in the facts.
-    ZTSStatusFacts gatherFacts() const;
+    /// @param aLossesSince  losses from then on; absent: of the last 24 hours
+    ZTSStatusFacts gatherFacts(std::optional<ZTCHistoryTime> aLossesSince = {}) const;
 
 private:
     void addLeftPage(ZTSStatusFacts& arFacts) const;

@@ -12,10 +12,11 @@
 /// Exit statuses that do not come from the table of states.
 enum ZTETavikExit : int {
     ZTTX_Done = 0,
-    ZTTX_HookFailed = 1,   ///< of warn --test
-    ZTTX_WrongUse = 2,     ///< the command line or the configuration
-    ZTTX_NotKnown = 3,     ///< no sensor or no history to ask
-    ZTTX_LocalFailure = 4  ///< standard output cannot be written, or the like
+    ZTTX_HookFailed = 1,    ///< of warn --test
+    ZTTX_WrongUse = 2,      ///< the command line or the configuration
+    ZTTX_NewerHistory = 2,  ///< the history was written by a newer version: another try changes nothing
+    ZTTX_NotKnown = 3,      ///< no sensor or no history to ask
+    ZTTX_LocalFailure = 4   ///< standard output cannot be written, or the like
 };
 
 /// The command line or the configuration is wrong. One line for people.

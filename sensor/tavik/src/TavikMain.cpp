@@ -46,8 +46,9 @@ static int sRun(int aCount, const char* const* appArguments) {
     lApp.add_flag("--json", lOptions.mIsJson, "Print JSON instead of text");
     lApp.footer(
         "Without a command: status. Exit status of status: 0 collecting, 1 collecting but deaf for a kind or with\n"
-        "losses in the last 24 hours, 3 not collecting. Of the others: 0 done. Of all: 2 wrong use, 3 what was asked\n"
-        "for cannot be learned now, 4 standard output cannot be written.");
+        "losses in the last 24 hours, 3 not collecting. Of the others: 0 done. Of all: 2 wrong use, or a history that "
+        "a\n"
+        "newer version has written, 3 what was asked for cannot be learned now, 4 standard output cannot be written.");
 
     const auto lAdd = [&](const char* apName, const char* apText, int (*apRun)(const ZTSTavikOptions&)) {
         CLI::App* const lpCommand = lApp.add_subcommand(apName, apText);
@@ -83,7 +84,7 @@ static int sRun(int aCount, const char* const* appArguments) {
     lpExplain->add_option("--until", lOptions.mFilter.mUntil, "Up to a time, a duration back from now, or a mark");
     lpExplain->add_flag("--all", lOptions.mIsAll, "What is harmless, too");
     lAdd("check", "Report in one line for a monitoring system: 0 OK, 1 WARNING, 2 CRITICAL, 3 UNKNOWN", runCheck)
-        ->add_option("--since", lOptions.mFilter.mSince, "How far back gaps and events count; default: 10m");
+        ->add_option("--since", lOptions.mFilter.mSince, "How far back losses and events count; default: 10m");
     CLI::App* const lpMark = lAdd("mark", "Give this moment a name, for --since and --until", runMark);
     lpMark->add_option("NAME", lOptions.mMark, "The name; an earlier mark of that name moves")->required();
     lpMark->add_option("--at", lOptions.mMarkTime, "Another moment: a time, or a duration back from now");
@@ -118,6 +119,9 @@ int main(int aCount, char** appArguments) {
     } catch (const ZTCNotKnownEx& lrEx) {
         complain(lrEx.what());
         return ZTTX_NotKnown;
+    } catch (const ZTCStoreNewerEx& lrEx) {
+        complain(lrEx.what());
+        return ZTTX_NewerHistory;
     } catch (const ZTCStoreEx& lrEx) {
         complain(lrEx.what());
         return ZTTX_NotKnown;

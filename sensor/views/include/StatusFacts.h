@@ -32,7 +32,7 @@ struct ZTSLeftPage {
 struct ZTSHistoryFacts {
     std::string mStoreId;
     std::vector<ZTSLedgerRow> mLedger;
-    std::vector<ZTSGap> mGaps;  ///< those of the last 24 hours, oldest first
+    std::vector<ZTSGap> mGaps;  ///< those within the facts' span, oldest first
     std::optional<ZTSRun> mLastRun;
     ZTSRetrievalTotals mRetrievals;
     std::optional<ZTCHistoryTime> mLastEvent;
@@ -45,6 +45,9 @@ struct ZTSHistoryFacts {
 /// Open episodes that the status counts at most: it has to answer at once.
 inline constexpr std::uint64_t gcMostOpenEpisodes = 1000;
 
+/// How far back losses are told, unless somebody asks for less.
+inline constexpr std::chrono::hours gcLossSpan{24};
+
 struct ZTSStatusFacts {
     std::string mHost;
     ZTCHistoryTime mNow;
@@ -52,7 +55,9 @@ struct ZTSStatusFacts {
     std::string mAnswerProblem;         ///< one line: why the sensor did not answer
     std::optional<ZTSLiveState> mLive;  ///< present for ZTAN_Answered alone
     std::optional<ZTSHistoryFacts> mHistory;
-    std::string mHistoryProblem;  ///< one line: why there is no history to read
+    std::string mHistoryProblem;                       ///< one line: why there is no history to read
+    bool mIsHistoryNewer = false;                      ///< the reason is that a newer version has written it
+    std::chrono::microseconds mLossSpan = gcLossSpan;  ///< how far back the losses of both reach
     std::optional<ZTSLeftPage> mLeftPage;
     std::string mPageProblem;  ///< one line: why it is not known whether a page was left
     ZTCNameBook mNames;
@@ -61,10 +66,7 @@ struct ZTSStatusFacts {
 /// Throws what ZTCHistory throws.
 ZTSHistoryFacts readHistoryFacts(const ZTCHistory& acrHistory, ZTCHistoryTime aNow);
 
-/// How far back losses are told.
-inline constexpr std::chrono::hours gcLossSpan{24};
-
-/// Events lost in the last 24 hours, as far as that is known.
+/// Events lost within the facts' span, as far as that is known.
 struct ZTSLossSum {
     std::uint64_t mInGaps = 0;
     bool mIsAtLeast = false;      ///< a gap does not know how much it lacks

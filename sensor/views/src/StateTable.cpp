@@ -110,6 +110,10 @@ static bool sHasVanished(const ZTSStatusFacts& acrFacts) {
     return lIsRunOpen || acrFacts.mLeftPage;
 }
 
+static ZTCLines sStatusOfNewerHistory(const ZTSStatusFacts& acrFacts) {
+    return {acrFacts.mHistoryProblem + ". No sensor of this version runs with it, and nothing is collected."};
+}
+
 static ZTCLines sStatusOfNoSensor(const ZTSStatusFacts& acrFacts) {
     if (!acrFacts.mHistory) {
         return {"Nothing listens on its control socket."};
@@ -238,6 +242,10 @@ static ZTCLines sStatusOfDeaf(const ZTSStatusFacts& acrFacts) {
     return lLines;
 }
 
+static std::string sLossSpan(const ZTSStatusFacts& acrFacts) {
+    return " in the last " + (acrFacts.mLossSpan == gcLossSpan ? "24 h" : formatSpan(acrFacts.mLossSpan));
+}
+
 static ZTCLines sStatusOfGap(const ZTSStatusFacts& acrFacts) {
     static constexpr std::size_t scMostGaps = 2;
     const std::vector<ZTSGap>& lrGaps = acrFacts.mHistory->mGaps;
@@ -254,7 +262,7 @@ static ZTCLines sStatusOfGap(const ZTSStatusFacts& acrFacts) {
                          (lrGap.mReason.empty() ? "" : "; " + lrGap.mReason));
     }
     if (lrGaps.size() > scMostGaps) {
-        lLines.push_back(formatCount(lrGaps.size() - scMostGaps, "earlier gap") + " in the last 24 h.");
+        lLines.push_back(formatCount(lrGaps.size() - scMostGaps, "earlier gap") + sLossSpan(acrFacts) + ".");
     }
     return lLines;
 }
@@ -275,7 +283,7 @@ static ZTCLines sStatusOfRefused(const ZTSStatusFacts& acrFacts) {
             lParts.push_back(formatNumber(lrLoss.mCount) + " lost by the adapters' library (" + lrLoss.mName + ")");
         }
     }
-    const auto lSince = std::max(lrLosses.mSince.value_or(ZTCHistoryTime()), acrFacts.mNow - gcLossSpan);
+    const auto lSince = std::max(lrLosses.mSince.value_or(ZTCHistoryTime()), acrFacts.mNow - acrFacts.mLossSpan);
     return {sJoin(lParts) + "; since " + formatShortTime(lSince, acrFacts.mNow) + "."};
 }
 
@@ -286,6 +294,24 @@ static ZTCLines sStatusOfCollecting(const ZTSStatusFacts&) {
 // ---- the table ----
 
 static constexpr std::array scTable{
+    ZTSStateRow{
+        .mpId = "newer-history",
+        .mVerdict = ZTVD_NotCollecting,
+        .mpHolds =
+            [](const ZTSStatusFacts& acrFacts) {
+                return acrFacts.mAnswer == ZTAN_NoSensor && acrFacts.mIsHistoryNewer;
+            },
+        .mpHeadline = "the history is of a newer version of Tavik",
+        .mpStatus = sStatusOfNewerHistory,
+        .mpAction = "Install the newer version again, or move history.db out of /var/lib/tavik;  "
+                    "sudo systemctl start tavik",
+        .mpSee = "tavik explain newer-history",
+        .mpMeans = "A newer version of Tavik has written the history. This version cannot read it, and leaves it as it "
+                   "is: its sensor ends with status 2 at each start. Nothing is collected.",
+        .mpCauses = "Tavik was replaced by an older version; the state directory was taken over from another host.",
+        .mpLookAt = "With the newer version everything is there again. To stay with this one, move history.db, "
+                    "history.db-wal and history.db-shm out of sensor.state together: the sensor then begins a new "
+                    "history."},
     ZTSStateRow{
         .mpId = "sensor-vanished",
         .mVerdict = ZTVD_NotCollecting,
@@ -538,10 +564,11 @@ ZTSJudgement judge(const ZTSStatusFacts& acrFacts) {
 
 static std::string sLossHeadline(const ZTSStatusFacts& acrFacts) {
     const ZTSLossSum lSum = sumLosses(acrFacts);
+    const std::string lSpan = sLossSpan(acrFacts);
     if (lSum.getTotal() == 0) {
-        return lSum.mIsAtLeast ? "unknown how much was lost in the last 24 h" : "a gap in the last 24 h, nothing lost";
+        return lSum.mIsAtLeast ? "unknown how much was lost" + lSpan : "a gap" + lSpan + ", nothing lost";
     }
-    return (lSum.mIsAtLeast ? "at least " : "") + formatCount(lSum.getTotal(), "event") + " lost in the last 24 h";
+    return (lSum.mIsAtLeast ? "at least " : "") + formatCount(lSum.getTotal(), "event") + " lost" + lSpan;
 }
 
 std::string formatHeadline(const ZTSStatusFacts& acrFacts, const ZTSJudgement& acrJudgement, bool aHasSince) {

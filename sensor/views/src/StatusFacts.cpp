@@ -13,6 +13,7 @@ ZTSLossSum sumLosses(const ZTSStatusFacts& acrFacts) {
     }
     const bool lIsKnown = acrFacts.mLive && acrFacts.mLive->mLosses;
     lSum.mIsRefusedKnown = lIsKnown;
+    lSum.mIsAtLeast = lSum.mIsAtLeast || acrFacts.mLossSpan > gcLossSpan;  // of what was refused, a day is known
     if (lIsKnown) {
         const ZTSLiveLosses& lrLosses = *acrFacts.mLive->mLosses;
         for (const auto& [lReason, lCount] : lrLosses.mRefused) {

@@ -130,13 +130,17 @@ static ZTCJson sKinds(const std::optional<std::vector<ZTSLiveKinds>>& acrKinds) 
     return lKinds;
 }
 
+static bool sIsOf(const ZTSLiveLedgerRow& acrLive, const ZTSLedgerRow& acrRow) {
+    return acrLive.mInitiator.mWwpn == acrRow.mInitiator.mWwpn && acrLive.mKind == getKindName(acrRow.mKind);
+}
+
 /// The running sensor's row of the same initiator and kind, or null.
 static const ZTSLiveLedgerRow* sFindLiveRow(const ZTSStatusFacts& acrFacts, const ZTSLedgerRow& acrRow) {
     if (!acrFacts.mLive || !acrFacts.mLive->mLedger) {
         return nullptr;
     }
     for (const ZTSLiveLedgerRow& lrRow : *acrFacts.mLive->mLedger) {
-        if (lrRow.mInitiator.mWwpn == acrRow.mInitiator.mWwpn && lrRow.mKind == getKindName(acrRow.mKind)) {
+        if (sIsOf(lrRow, acrRow)) {
             return &lrRow;
         }
     }
@@ -166,6 +170,22 @@ static ZTCJson sLedgerRow(const ZTSLedgerRow& acrRow, const ZTSLiveLedgerRow* ap
             {"lost", acrRow.mLost},
             {"held", lNewer(&ZTSLiveLedgerRow::mHeld, acrRow.mHeld)},
             {"dropped", lNewer(&ZTSLiveLedgerRow::mDropped, acrRow.mDropped)}};
+}
+
+/// Rows of the running sensor that the history does not have yet: of a kind that came for the first time just now.
+static void sAddLiveRows(const ZTSStatusFacts& acrFacts, ZTCJson& arLedger) {
+    if (!acrFacts.mLive || !acrFacts.mLive->mLedger) {
+        return;
+    }
+    for (const ZTSLiveLedgerRow& lrLive : *acrFacts.mLive->mLedger) {
+        const auto lIsOf = [&lrLive](const ZTSLedgerRow& acrRow) { return sIsOf(lrLive, acrRow); };
+        if (std::ranges::none_of(acrFacts.mHistory->mLedger, lIsOf)) {
+            ZTSLedgerRow lNone;
+            lNone.mInitiator = lrLive.mInitiator;
+            arLedger.push_back(sLedgerRow(lNone, &lrLive));
+            arLedger.back()["kind"] = lrLive.mKind;
+        }
+    }
 }
 
 static ZTCJson sLosses(const ZTSStatusFacts& acrFacts) {
@@ -216,6 +236,7 @@ static void sAddHistory(const ZTSStatusFacts& acrFacts, ZTCJson& arDocument) {
     for (const ZTSLedgerRow& lrRow : lrHistory.mLedger) {
         arDocument["ledger"].push_back(sLedgerRow(lrRow, sFindLiveRow(acrFacts, lrRow)));
     }
+    sAddLiveRows(acrFacts, arDocument["ledger"]);
     arDocument["losses"] = sLosses(acrFacts);
     arDocument["gaps"] = ZTCJson::array();
     for (const ZTSGap& lrGap : lrHistory.mGaps) {

@@ -29,6 +29,7 @@ TEST(ControlRequest, AnythingElseIsWrongInWords) {
         {R"({"request":"mark","name":7})", "\"name\""},
         {R"({"request":"mark","name":"x","time":"yesterday"})", "RFC 3339"},
         {R"({"request":"mark","name":"x","time":7})", "RFC 3339"},
+        {R"({"request":"status","lossesSince":"yesterday"})", "RFC 3339"},
         {R"({"request":"mark","name":""})", "1 to 200 bytes"},
         {R"({"request":"mark","name":"a\nb"})", "control characters"},
         {R"({"request":"mark","name":")" + std::string(gcMaxMarkName + 1, 'x') + "\"}", "this one has 201"},

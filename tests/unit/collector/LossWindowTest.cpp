@@ -64,3 +64,62 @@ TEST_F(LossWindowTest, WhatWasLostLateInAnHourIsNotForgottenWithTheHoursBegin) {
     EXPECT_EQ(refused(mBegin + hours(24) + minutes(30)), 15U);
     EXPECT_EQ(refused(mBegin + hours(25) + minutes(3)), 0U);
 }
+
+TEST_F(LossWindowTest, LossesOfTheLastHourAreToldApartByTheMinute) {
+    mWindow.note(page("a", 10, mBegin), mBegin + minutes(2));
+    mWindow.note(page("a", 15, mBegin), mBegin + minutes(20));
+    const ZTCHistoryTime lNow = mBegin + minutes(25);
+    EXPECT_EQ(mWindow.get(lNow, lNow - minutes(10)).mRefused.at("total-limit"), 5U);
+    EXPECT_EQ(mWindow.get(lNow, lNow - minutes(10)).mSince, lNow - minutes(10));
+    EXPECT_EQ(mWindow.get(lNow, lNow - minutes(4)).mRefused.at("total-limit"), 0U);
+    EXPECT_EQ(mWindow.get(lNow, lNow - hours(1)).mRefused.at("total-limit"), 15U);
+    EXPECT_EQ(mWindow.get(lNow, lNow - hours(1)).mSince, mBegin);
+}
+
+TEST_F(LossWindowTest, TheNextProcessGoesOnFromTheText) {
+    mWindow.note(page("a", 10, mBegin), mBegin + minutes(2));
+    ZTCLossWindow lNext(mBegin + minutes(9));
+    ASSERT_TRUE(lNext.restore(mWindow.toText()));
+    // The same start goes on: what was counted is not counted again.
+    EXPECT_TRUE(lNext.note(page("a", 12, mBegin), mBegin + minutes(10)));
+    const ZTSLosses lLosses = lNext.get(mBegin + minutes(10));
+    EXPECT_EQ(lLosses.mRefused.at("total-limit"), 12U);
+    EXPECT_EQ(lLosses.mRefused.at("unknown-board"), 1U);
+    EXPECT_EQ(lLosses.mLibrary.at("ring"), 24U);
+    EXPECT_EQ(lLosses.mSince, mBegin);
+    // An agent that began between the two is counted from its begin.
+    EXPECT_TRUE(lNext.note(page("b", 3, mBegin + minutes(5)), mBegin + minutes(11)));
+    EXPECT_EQ(lNext.get(mBegin + minutes(11)).mRefused.at("total-limit"), 15U);
+}
+
+TEST_F(LossWindowTest, OtherTextsChangeNothing) {
+    mWindow.note(page("a", 10, mBegin), mBegin + minutes(2));
+    const std::string lText = mWindow.toText();
+    for (const std::string& lrText : {std::string(), std::string("{}"), std::string("[1]"), lText.substr(1),
+                                      lText.substr(0, lText.size() / 2), std::string(R"({"begin":"soon"})")}) {
+        EXPECT_FALSE(mWindow.restore(lrText)) << lrText;
+        EXPECT_EQ(mWindow.toText(), lText);
+    }
+}
+
+TEST_F(LossWindowTest, ItsTextChangesOnlyWhereSomethingWasLost) {
+    EXPECT_TRUE(mWindow.note(page("a", 10, mBegin), mBegin + minutes(2)));
+    const std::string lText = mWindow.toText();
+    EXPECT_FALSE(mWindow.note(page("a", 10, mBegin), mBegin + minutes(9)));
+    EXPECT_EQ(mWindow.toText(), lText);
+}
+
+TEST_F(LossWindowTest, ADayOfConstantLossesStaysSmall) {
+    for (unsigned i = 1; i <= 24 * 60; ++i) {
+        mWindow.note(page("a", i, mBegin), mBegin + minutes(i));
+    }
+    EXPECT_EQ(refused(mBegin + hours(24)), 24U * 60);
+    EXPECT_LT(mWindow.toText().size(), 32U * 1024);
+}
+
+TEST_F(LossWindowTest, AClockThatWasSetBackKeepsTheLosses) {
+    mWindow.note(page("a", 10, mBegin), mBegin + hours(24 * 30));
+    const ZTCHistoryTime lNow = mBegin + minutes(5);
+    EXPECT_EQ(refused(lNow), 10U);
+    EXPECT_EQ(refused(lNow + hours(25)), 0U);
+}

@@ -47,6 +47,12 @@ static ZTSGap sGap(std::uint64_t aHeld, bool aIsKnown) {
 static std::vector<std::pair<std::string, ZTSStatusFacts>> sFactsOfEachState() {
     using ZTCJson = nlohmann::json;
     std::vector<std::pair<std::string, ZTSStatusFacts>> lCases;
+    ZTSStatusFacts lNewer = sUnanswered(ZTAN_NoSensor);
+    lNewer.mHistory.reset();
+    lNewer.mHistoryProblem = "its schema has version 99";
+    lNewer.mIsHistoryNewer = true;
+    lNewer.mLeftPage = ZTSLeftPage();
+    lCases.emplace_back("newer-history", lNewer);
     ZTSStatusFacts lVanished = sUnanswered(ZTAN_NoSensor);
     lVanished.mHistory->mLastRun->mIsOpen = true;
     lCases.emplace_back("sensor-vanished", lVanished);
@@ -111,9 +117,9 @@ TEST_F(LocalTime, IdsAndNumbersOfStatesAreUniqueAndCollectingIsZero) {
 }
 
 TEST_F(LocalTime, ExitStatusesAreThoseOfTheContract) {
-    const std::pair<const char*, int> lExits[] = {{"no-sensor", 3},   {"not-permitted", 3}, {"collector-silent", 3},
-                                                  {"no-adapters", 3}, {"disk-full", 3},     {"deaf", 1},
-                                                  {"gap", 1},         {"refused", 1},       {"collecting", 0}};
+    const std::pair<const char*, int> lExits[] = {
+        {"newer-history", 3}, {"no-sensor", 3}, {"not-permitted", 3}, {"collector-silent", 3}, {"no-adapters", 3},
+        {"disk-full", 3},     {"deaf", 1},      {"gap", 1},           {"refused", 1},          {"collecting", 0}};
     for (const auto& [lpId, lExit] : lExits) {
         EXPECT_EQ(getVerdictExit(findState(lpId)->mVerdict), lExit) << lpId;
     }
@@ -166,6 +172,15 @@ TEST_F(LocalTime, AnEndedAgentsReasonChoosesItsState) {
     EXPECT_THAT(lStateFor("no-event-support"), ElementsAre("no-adapters"));
     EXPECT_THAT(lStateFor("no-library"), ElementsAre("no-library"));
     EXPECT_THAT(lStateFor("signal"), ElementsAre("agent-down"));
+}
+
+TEST_F(LocalTime, LossesAreToldForTheSpanThatWasAskedFor) {
+    ZTSStatusFacts lFacts = sFactsOf([](nlohmann::json& arLive) { arLive["losses"]["dropped"] = 2; });
+    lFacts.mLossSpan = std::chrono::minutes(10);
+    EXPECT_EQ(formatHeadline(lFacts, judge(lFacts), true), "COLLECTING; 2 events lost in the last 10 min");
+    // What was refused longer than a day ago is not known any more.
+    lFacts.mLossSpan = std::chrono::hours(24 * 30);
+    EXPECT_EQ(formatHeadline(lFacts, judge(lFacts), true), "COLLECTING; at least 2 events lost in the last 30 days");
 }
 
 TEST_F(LocalTime, TheLossesAreSummedAndUnknownOnesAreALowerBound) {

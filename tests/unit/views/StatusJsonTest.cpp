@@ -98,6 +98,30 @@ TEST_F(StatusJson, TheLedgerJoinsWhatIsStoredWithTheRunningAgentsCounts) {
     EXPECT_EQ(lLedger[1]["received"], 8);
 }
 
+TEST_F(StatusJson, TheLedgerHasARowForAKindThatTheHistoryHasNotSeenYet) {
+    nlohmann::json lLive = makeHealthyJson();
+    const auto lRow = [](const char* apKind, unsigned aReceived) {
+        return nlohmann::json{{"initiator", {{"wwpn", "10:00:00:00:c9:00:00:01"}}},
+                              {"kind", apKind},
+                              {"received", aReceived},
+                              {"refused", {{"total-limit", 2}}},
+                              {"consolidated", 10},
+                              {"handedOver", 9},
+                              {"held", 1},
+                              {"dropped", 0}};
+    };
+    lLive["ledger"] = {lRow("rscn", 12), lRow("other", 5)};
+    const ZTCJson lLedger = makeStatusDocument(makeFacts(lLive))["ledger"];
+    ASSERT_EQ(lLedger.size(), 2U);
+    EXPECT_EQ(lLedger[0]["kind"], "rscn");
+    EXPECT_EQ(lLedger[0]["initiator"]["wwpn"], "10:00:00:00:c9:00:00:01");
+    EXPECT_EQ(lLedger[0]["received"], 12);
+    EXPECT_EQ(lLedger[0]["refused"]["total-limit"], 2);
+    EXPECT_EQ(lLedger[0]["held"], 1);
+    EXPECT_EQ(lLedger[0]["stored"], 0);
+    EXPECT_EQ(lLedger[1]["kind"], "other");
+}
+
 TEST_F(StatusJson, AGapOfUnknownSizeHasNoCount) {
     ZTSStatusFacts lFacts = makeHealthyFacts();
     ZTSGap lGap;
