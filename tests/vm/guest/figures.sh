@@ -69,7 +69,7 @@ fabric_up || exit 1
 modprobe scsi_debug max_luns=1 delay=0 ndelay=0
 wait_until 20 other_disk
 start_agent || exit 1
-printf 'Linux %s, %s processors, emulated; its clock counts instructions, one a nanosecond\n\n' "$(uname -r)" "$(processors)" >&3
+printf 'Linux %s, %s processors, emulated\n\n' "$(uname -r)" "$(processors)" >&3
 printf '%-44s %9s %10s %9s %9s\n' "" commands/s "agent ms/s" wakes/s records >&3
 costs "idle" 0 usleep 20000000
 costs "good commands of the FC host" 40000 repeated 8 $(sg_of 0) 5000 $gGood
