@@ -8,8 +8,8 @@
 #include <nlohmann/json.hpp>
 #include <sstream>
 
+#include "sensor/views/include/Judgement.h"
 #include "sensor/views/include/SanView.h"
-#include "sensor/views/include/StateTable.h"
 
 using prometheus::ClientMetric;
 using prometheus::MetricFamily;

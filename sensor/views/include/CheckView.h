@@ -7,7 +7,7 @@
 #include <optional>
 #include <string>
 
-#include "sensor/views/include/StateTable.h"
+#include "sensor/views/include/Judgement.h"
 
 /// The four results of a monitoring plugin; the numbers are its exit statuses.
 enum ZTECheckResult : int { ZTCR_Ok = 0, ZTCR_Warning = 1, ZTCR_Critical = 2, ZTCR_Unknown = 3 };

@@ -1,8 +1,5 @@
-/// The table of the states that Tavik can be in: the one place that knows how each is told from the facts, its id, its
-/// exit status, its number in metrics, and its words.
-///
-/// The order is the order of weight. All states that hold are reported; the first one names the whole. States in which
-/// Tavik does not collect exclude each other: of these only the first counts.
+/// The table of the states that Tavik can be in. It is the one place that knows of each state when it holds, its id,
+/// its exit status, its number in metrics, and its words. The worst state comes first.
 #ifndef SENSOR_VIEWS_INCLUDE_STATETABLE_H
 #define SENSOR_VIEWS_INCLUDE_STATETABLE_H
 
@@ -12,7 +9,6 @@
 #include <vector>
 
 #include "sensor/views/include/StatusFacts.h"
-#include "sensor/views/include/TroubleText.h"
 
 /// What a state means for the people who rely on Tavik.
 enum ZTEVerdict : std::uint8_t {
@@ -52,24 +48,5 @@ const ZTSStateRow* findState(std::string_view aId);
 
 /// The state's number in metrics: its place in the table, from the last, "collecting" = 0, upwards.
 std::size_t getStateNumber(const ZTSStateRow& acrRow);
-
-struct ZTSJudgement {
-    std::vector<const ZTSStateRow*> mStates;  ///< all that hold, the worst first; never empty
-
-    const ZTSStateRow& getWorst() const { return *mStates.front(); }
-    int getExit() const { return getVerdictExit(getWorst().mVerdict); }
-    bool isCollecting() const { return getWorst().mVerdict >= ZTVD_PartlyDeaf; }
-};
-
-ZTSJudgement judge(const ZTSStatusFacts& acrFacts);
-
-/// "COLLECTING since 14 Nov 08:12; nothing lost". `aHasSince`: with the time since when, where it is known.
-std::string formatHeadline(const ZTSStatusFacts& acrFacts, const ZTSJudgement& acrJudgement, bool aHasSince);
-
-/// The troubles of Tavik itself that hold, with their words. Not those of the SAN.
-std::vector<ZTSTroubleText> describeTroubles(const ZTSStatusFacts& acrFacts, const ZTSJudgement& acrJudgement);
-
-/// The troubles of the SAN that count, in words, the worst first; notices are not among them.
-std::vector<ZTSTroubleText> describeSanTroubles(const ZTSStatusFacts& acrFacts);
 
 #endif

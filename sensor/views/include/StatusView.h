@@ -5,7 +5,7 @@
 #include <nlohmann/json_fwd.hpp>
 #include <string>
 
-#include "sensor/views/include/StateTable.h"
+#include "sensor/views/include/Judgement.h"
 
 struct ZTSTextStyle {
     std::size_t mWidth = 80;  ///< characters in a line

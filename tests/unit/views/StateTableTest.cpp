@@ -5,6 +5,7 @@
 #include <functional>
 #include <set>
 
+#include "sensor/views/include/Judgement.h"
 #include "tests/unit/views/ViewSamples.h"
 
 using testing::ElementsAre;

@@ -1,0 +1,226 @@
+#include "sensor/views/src/StateTexts.h"
+
+#include <algorithm>
+
+#include "sensor/views/include/TextTable.h"
+#include "sensor/views/include/TimeText.h"
+
+using ZTCLines = std::vector<std::string>;
+
+std::string formatSince(const std::optional<ZTCHistoryTime>& acrTime, const ZTSStatusFacts& acrFacts) {
+    return acrTime ? " since " + formatShortTime(*acrTime, acrFacts.mNow) : "";
+}
+
+static ZTCLines sOneLine(const std::string& acrText) {
+    return acrText.empty() ? ZTCLines() : ZTCLines{acrText};
+}
+
+/// What is known of the agent's end and of the next start.
+static std::string sDescribeAgentEnd(const ZTSStatusFacts& acrFacts) {
+    const ZTSLiveAgent& lrAgent = acrFacts.mLive->mAgent;
+    const ZTSLiveKeeper& lrKeeper = acrFacts.mLive->mKeeper;
+    std::string lText = "No agent runs" + formatSince(lrKeeper.mSince, acrFacts) + ".";
+    lText += !lrAgent.mProblem.empty()     ? " " + lrAgent.mProblem
+             : !lrAgent.mEndReason.empty() ? " The last one ended: " + lrAgent.mEndReason
+                                           : " Why the last one ended is not known";
+    lText += lText.ends_with('.') ? "" : ".";
+    if (lrKeeper.mNextStart) {
+        lText += " The next start is at " + formatShortTime(*lrKeeper.mNextStart, acrFacts.mNow) + ".";
+    }
+    return lText;
+}
+
+static std::string sDescribeLeftPage(const ZTSStatusFacts& acrFacts) {
+    const ZTSLeftPage& lrPage = *acrFacts.mLeftPage;
+    if (lrPage.mIsAgentAlive) {
+        return "Its agent runs on and holds " + formatCount(lrPage.mHeld, "event") + ".";
+    }
+    return lrPage.mHeld == 0
+               ? "Its agent held nothing (from the page it left)."
+               : "Lost: the " + formatCount(lrPage.mHeld, "event") + " its agent held (from the page it left).";
+}
+
+ZTCLines describeNewerHistoryState(const ZTSStatusFacts& acrFacts) {
+    return {acrFacts.mHistoryProblem + ". No sensor of this version runs with it, and nothing is collected."};
+}
+
+ZTCLines describeNoSensorState(const ZTSStatusFacts& acrFacts) {
+    if (!acrFacts.mHistory) {
+        return {"Nothing listens on its control socket."};
+    }
+    if (!acrFacts.mHistory->mLastRun) {
+        return {"None has ever run with this history."};
+    }
+    return {"It was stopped in order at " + formatShortTime(acrFacts.mHistory->mLastRun->mTo, acrFacts.mNow) +
+            ". Unseen: all since."};
+}
+
+ZTCLines describeVanishedState(const ZTSStatusFacts& acrFacts) {
+    const bool lHasRun = acrFacts.mHistory && acrFacts.mHistory->mLastRun;
+    std::string lText = "It vanished";
+    lText += lHasRun ? " about " + formatShortTime(acrFacts.mHistory->mLastRun->mTo, acrFacts.mNow) : "";
+    lText += " without an orderly stop.";
+    lText += acrFacts.mLeftPage ? " " + sDescribeLeftPage(acrFacts) : "";
+    return {lText + " Unseen: all since."};
+}
+
+ZTCLines describeAnswerState(const ZTSStatusFacts& acrFacts) {
+    return sOneLine(acrFacts.mAnswerProblem);
+}
+
+ZTCLines describeStoppingState(const ZTSStatusFacts& acrFacts) {
+    return {"It has been asked to stop" + formatSince(acrFacts.mLive->mKeeper.mSince, acrFacts) +
+            ": it takes in what the agent holds, and ends within 20 s."};
+}
+
+ZTCLines describeNoAdaptersState(const ZTSStatusFacts& acrFacts) {
+    return {"The agent found none" + formatSince(acrFacts.mLive->mKeeper.mSince, acrFacts) +
+            ". The sensor looks every 10 s and starts the agent by itself."};
+}
+
+ZTCLines describeNoLibraryState(const ZTSStatusFacts& acrFacts) {
+    const std::string& lrProblem = acrFacts.mLive->mAgent.mProblem;
+    return {lrProblem.empty() ? "The agent ended because it could not load the adapters' library." : lrProblem};
+}
+
+static std::string sStartedAt(const ZTSStatusFacts& acrFacts) {
+    const auto& lrSince = acrFacts.mLive->mKeeper.mSince;
+    return lrSince ? "; it was started at " + formatShortTime(*lrSince, acrFacts.mNow) : "";
+}
+
+ZTCLines describeStartingState(const ZTSStatusFacts& acrFacts) {
+    return {"Its agent has not begun to listen yet" + sStartedAt(acrFacts) + "."};
+}
+
+ZTCLines describeAgentDownState(const ZTSStatusFacts& acrFacts) {
+    return {sDescribeAgentEnd(acrFacts)};
+}
+
+ZTCLines describeDiskState(const ZTSStatusFacts& acrFacts) {
+    const ZTSLiveState& lrLive = *acrFacts.mLive;
+    const std::string& lrProblem = lrLive.mCollector.mDiskProblem;
+    std::string lText = lrProblem.empty() ? "The folder of the history cannot be written" : lrProblem;
+    lText += lText.ends_with('.') ? "" : ".";
+    if (lrLive.mAgent.mHeldBytes && lrLive.mAgent.mLimitBytes) {
+        lText += " The agent holds " + formatBytes(*lrLive.mAgent.mHeldBytes) + " of " +
+                 formatBytes(*lrLive.mAgent.mLimitBytes) + "; beyond that it has to refuse.";
+    }
+    return {lText};
+}
+
+bool isDeafState(std::string_view aState) {
+    return aState == getKindStateName(ZTKST_Failed) || aState == getKindStateName(ZTKST_NoRights);
+}
+
+/// Kinds in one state, with the same words of the library.
+struct ZTSKindGroup {
+    std::string mState;
+    std::string mWords;
+    ZTCLines mKinds;
+};
+
+static std::string sJoin(const ZTCLines& acrTexts) {
+    std::string lText;
+    for (const std::string& lrText : acrTexts) {
+        lText += (lText.empty() ? "" : ", ") + lrText;
+    }
+    return lText;
+}
+
+/// Kinds of every adapter that are in one of these states, each once, by state and words.
+static std::vector<ZTSKindGroup> sGroupKinds(const ZTSStatusFacts& acrFacts, bool aIsWithWords,
+                                             bool (*apIsWanted)(std::string_view)) {
+    std::vector<ZTSKindGroup> lGroups;
+    for (const ZTSLiveKinds& lrKinds : *acrFacts.mLive->mKinds) {
+        for (const auto& [lKind, lState] : lrKinds.getOrdered()) {
+            if (!apIsWanted(lState)) {
+                continue;
+            }
+            const auto lFound = lrKinds.mWords.find(lKind);
+            const std::string lWords = lFound == lrKinds.mWords.end() ? "" : lFound->second;
+            const std::string lName = lKind + (aIsWithWords && !lWords.empty() ? " (" + lWords + ")" : "");
+            const std::string lKey = aIsWithWords ? "" : lWords;
+            const auto lIsGroup = [&lKey, &lrState = lState](const ZTSKindGroup& acrGroup) {
+                return acrGroup.mState == lrState && acrGroup.mWords == lKey;
+            };
+            auto lGroup = std::find_if(lGroups.begin(), lGroups.end(), lIsGroup);
+            if (lGroup == lGroups.end()) {
+                lGroup = lGroups.insert(lGroups.end(), {lState, lKey, {}});
+            }
+            if (std::find(lGroup->mKinds.begin(), lGroup->mKinds.end(), lName) == lGroup->mKinds.end()) {
+                lGroup->mKinds.push_back(lName);
+            }
+        }
+    }
+    return lGroups;
+}
+
+/// "no_rights  rscn                (needs CAP_NET_ADMIN)", then what is heard.
+ZTCLines describeDeafState(const ZTSStatusFacts& acrFacts) {
+    static constexpr std::size_t scStateWidth = 11;
+    static constexpr std::size_t scKindsWidth = 20;
+    const auto lPad = [](std::string aText, std::size_t aWidth) {
+        aText.resize(std::max(aText.size() + 1, aWidth), ' ');
+        return aText;
+    };
+    ZTCLines lLines;
+    for (const ZTSKindGroup& lrGroup : sGroupKinds(acrFacts, false, isDeafState)) {
+        const std::string lKinds = sJoin(lrGroup.mKinds);
+        lLines.push_back(lPad(lrGroup.mState, scStateWidth) +
+                         (lrGroup.mWords.empty() ? lKinds : lPad(lKinds, scKindsWidth) + "(" + lrGroup.mWords + ")"));
+    }
+    const auto lIsHeard = [](std::string_view aState) { return aState == getKindStateName(ZTKST_Listening); };
+    for (const ZTSKindGroup& lrGroup : sGroupKinds(acrFacts, true, lIsHeard)) {
+        lLines.push_back(lPad(lrGroup.mState, scStateWidth) + sJoin(lrGroup.mKinds));
+    }
+    return lLines;
+}
+
+std::string formatLossSpan(const ZTSStatusFacts& acrFacts) {
+    return " in the last " + (acrFacts.mLossSpan == gcLossSpan ? "24 h" : formatSpan(acrFacts.mLossSpan));
+}
+
+ZTCLines describeGapState(const ZTSStatusFacts& acrFacts) {
+    static constexpr std::size_t scMostGaps = 2;
+    const std::vector<ZTSGap>& lrGaps = acrFacts.mHistory->mGaps;
+    ZTCLines lLines;
+    for (std::size_t i = 0; i < std::min(lrGaps.size(), scMostGaps); ++i) {
+        const ZTSGap& lrGap = lrGaps[lrGaps.size() - 1 - i];
+        const std::uint64_t lCount = lrGap.getOccurrences();
+        lLines.push_back(formatShortTime(lrGap.mFrom, acrFacts.mNow) + " to " +
+                         formatShortTime(lrGap.mTo, acrFacts.mNow) + ": " +
+                         (lrGap.mIsCountKnown && lCount == 0 ? "nothing is known to be lost"
+                          : lrGap.mIsCountKnown              ? formatCount(lCount, "event") + " lost"
+                          : lCount != 0                      ? "at least " + formatCount(lCount, "event") + " lost"
+                                                             : "unknown how many events are lost") +
+                         (lrGap.mReason.empty() ? "" : "; " + lrGap.mReason));
+    }
+    if (lrGaps.size() > scMostGaps) {
+        lLines.push_back(formatCount(lrGaps.size() - scMostGaps, "earlier gap") + formatLossSpan(acrFacts) + ".");
+    }
+    return lLines;
+}
+
+ZTCLines describeRefusedState(const ZTSStatusFacts& acrFacts) {
+    const ZTSLiveLosses& lrLosses = *acrFacts.mLive->mLosses;
+    ZTCLines lParts;
+    for (const auto& [lReason, lCount] : lrLosses.mRefused) {
+        if (lCount != 0 && lReason != getRefusalName(ZTRF_CollectionOff)) {
+            lParts.push_back(formatNumber(lCount) + " refused (" + lReason + ")");
+        }
+    }
+    if (lrLosses.mDropped.value_or(0) != 0) {
+        lParts.push_back(formatNumber(*lrLosses.mDropped) + " dropped by the agent");
+    }
+    for (const ZTSLibraryLoss& lrLoss : lrLosses.mLibrary) {
+        if (lrLoss.mCount != 0) {
+            lParts.push_back(formatNumber(lrLoss.mCount) + " lost by the adapters' library (" + lrLoss.mName + ")");
+        }
+    }
+    const auto lSince = std::max(lrLosses.mSince.value_or(ZTCHistoryTime()), acrFacts.mNow - acrFacts.mLossSpan);
+    return {sJoin(lParts) + "; since " + formatShortTime(lSince, acrFacts.mNow) + "."};
+}
+
+ZTCLines describeCollectingState(const ZTSStatusFacts&) {
+    return {};
+}
