@@ -20,6 +20,7 @@
 #include <variant>
 #include <vector>
 
+#include "sensor/client/include/EventBell.h"
 #include "sensor/collector/include/HistorySink.h"
 #include "sensor/collector/include/HistoryWriter.h"
 #include "sensor/collector/include/TopologyWatch.h"
@@ -90,8 +91,8 @@ public:
     std::vector<ZTSMarkResult> takeMarkResults();
 
     ZTSHistoryState getState() const;
-    /// An eventfd that becomes readable whenever the state has changed. The caller reads it empty.
-    int getBell() const { return mBell.get(); }
+    /// Rings whenever the state has changed. The caller clears it.
+    const ZTCEventBell& getBell() const { return mBell; }
 
     /// Waits until everything is stored, at most so long; then ends the run in the history, and the thread. Returns
     /// whether everything was stored.
@@ -157,13 +158,12 @@ private:
 
     bool pause(std::chrono::milliseconds aTime);
     void setProblem(const std::string& acrProblem);
-    void ring();
 
     // ---- constant after construction ----
     ZTCSpool& mrSpool;
     const std::string mDirectory;
     const Report mReport;
-    ZTCFileDescriptor mBell;
+    const ZTCEventBell mBell;
 
     // ---- of the worker's thread ----
     std::unique_ptr<ZTCStore> mpStore;

@@ -15,6 +15,7 @@
 #include <thread>
 #include <vector>
 
+#include "sensor/client/include/EventBell.h"
 #include "sensor/store/include/HistoryTime.h"
 #include "sensor/store/include/TopologyHistory.h"
 #include "sensor/topology/include/TopologyScan.h"
@@ -77,8 +78,8 @@ public:
     std::shared_ptr<const ZTSTopology> getTopology() const;
     ZTSTopologyState getState() const;
 
-    /// An eventfd that becomes readable when the ports are new. The caller reads it empty.
-    int getBell() const;
+    /// Rings when the ports are new. The caller clears it.
+    const ZTCEventBell& getBell() const;
 
 private:
     class Thread;

@@ -157,22 +157,18 @@ void ZTCCollector::poll(ZTCTime aNow) {
     mFds.assign(ZTPD_Count, {.fd = -1, .events = POLLIN, .revents = 0});
     mFds[ZTPD_Keeper].fd = mKeeper.getDescriptor();
     mFds[ZTPD_Keeper].events = mKeeper.getEvents();
-    mFds[ZTPD_History].fd = mHistory.getBell();
+    mFds[ZTPD_History].fd = mHistory.getBell().getDescriptor();
     mFds[ZTPD_Response].fd = mAgents.getResponseFifo();
     mFds[ZTPD_AgentBell].fd = mAgents.getBell();
     mFds[ZTPD_Outputs].fd = mOutputs.getBell();
-    mFds[ZTPD_Topology].fd = mTopology.getBell();
+    mFds[ZTPD_Topology].fd = mTopology.getBell().getDescriptor();
     mControl.addTo(mFds);
     if (::poll(mFds.data(), static_cast<nfds_t>(mFds.size()), getPollTime(aNow)) <= 0) {
         return;
     }
-    // The bell of the outputs is read empty with what it rings for, at every turn.
-    for (const ZTEPolled lBell : {ZTPD_History, ZTPD_Topology}) {
-        if (mFds[lBell].revents != 0) {
-            std::uint64_t lCount = 0;
-            [[maybe_unused]] const ssize_t lRead = read(mFds[lBell].fd, &lCount, sizeof(lCount));
-        }
-    }
+    // The bell of the outputs is cleared with what it rings for, at every turn.
+    mHistory.getBell().clear();
+    mTopology.getBell().clear();
     mAgents.noteResponseEvents(mFds[ZTPD_Response].revents);
     mAgents.noteBellEvents(mFds[ZTPD_AgentBell].revents, std::chrono::steady_clock::now());
 }

@@ -1,11 +1,9 @@
 #include "sensor/collector/include/HistoryWorker.h"
 
-#include <sys/eventfd.h>
 #include <sys/statvfs.h>
 #include <unistd.h>
 
 #include <algorithm>
-#include <cerrno>
 
 using std::chrono::milliseconds;
 using std::chrono::seconds;
@@ -16,22 +14,12 @@ static constexpr milliseconds scLongestTransaction{500};
 /// A frame that waits longer than this is synced itself.
 static constexpr seconds scLongestUnsynced{1};
 static constexpr seconds scRetryPause{1};
-/// After so many tries, a pause between them, a file that cannot be read is given up: the others must not wait for
-/// ever.
-static constexpr unsigned scReadTries = 10;
 static constexpr seconds scUpkeepPeriod{60};
 static constexpr seconds scCheckpointPeriod{1};
 
 ZTCHistoryWorker::ZTCHistoryWorker(ZTCSpool& arSpool, std::string aStateDirectory, const ZTSStoreLimits& acrLimits,
                                    Report aReport)
-    : mrSpool(arSpool),
-      mDirectory(std::move(aStateDirectory)),
-      mReport(std::move(aReport)),
-      mBell(eventfd(0, EFD_CLOEXEC | EFD_NONBLOCK)),
-      mLimits(acrLimits) {
-    if (!mBell.isOpen()) {
-        throw ZTCSystemCallEx("cannot make an eventfd", errno);
-    }
+    : mrSpool(arSpool), mDirectory(std::move(aStateDirectory)), mReport(std::move(aReport)), mLimits(acrLimits) {
     mThread = std::thread([this] { run(); });
 }
 
@@ -48,71 +36,10 @@ ZTCHistoryWorker::~ZTCHistoryWorker() {
 
 // ---- for the other thread ----
 
-void ZTCHistoryWorker::submit(ZTCJob aJob) {
-    {
-        const std::lock_guard lLock(mMutex);
-        if (const auto* lpFrame = std::get_if<ZTSFrameJob>(&aJob)) {
-            ++mState.mWaitingFrames;
-            mState.mWaitingBytes += lpFrame->mEntry.mSize;
-        }
-        // Of pages in a row the last one says it all.
-        if (std::holds_alternative<ZTSPageJob>(aJob) && !mQueue.empty() &&
-            std::holds_alternative<ZTSPageJob>(mQueue.back())) {
-            mQueue.back() = std::move(aJob);
-        } else {
-            mQueue.push_back(std::move(aJob));
-        }
-    }
-    mWake.notify_all();
-}
-
-void ZTCHistoryWorker::takeIn(const ZTSSpoolEntry& acrEntry, ZTCPagePointer apPage) {
-    submit(ZTSFrameJob{.mEntry = acrEntry, .mpPage = std::move(apPage), .mSince = steady_clock::now()});
-}
-
-void ZTCHistoryWorker::notePage(ZTCPagePointer apPage) {
-    submit(ZTSPageJob{std::move(apPage)});
-}
-
-void ZTCHistoryWorker::endAgent(ZTSEndedAgent aAgent) {
-    submit(std::move(aAgent));
-}
-
-void ZTCHistoryWorker::endForgottenAgents(const std::string& acrRunningGeneration) {
-    submit(ZTSForgottenJob{acrRunningGeneration});
-}
-
-void ZTCHistoryWorker::notePorts(std::shared_ptr<const ZTSTopology> apPorts) {
-    submit(ZTSPortsJob{std::move(apPorts)});
-}
-
-void ZTCHistoryWorker::noteTopology(ZTCHistoryTime aTime, std::shared_ptr<const ZTSTopology> apTopology) {
-    {
-        const std::lock_guard lLock(mMutex);
-        mScan = {.mTime = aTime, .mpTopology = std::move(apTopology)};
-        if (std::exchange(mIsScanQueued, true)) {
-            return;
-        }
-    }
-    submit(ZTSTopologyJob{});
-}
-
-void ZTCHistoryWorker::noteCounters(std::vector<ZTSCounterSample> aSamples) {
-    submit(ZTSCountersJob{std::move(aSamples)});
-}
-
 void ZTCHistoryWorker::setLimits(const ZTSStoreLimits& acrLimits) {
     const std::lock_guard lLock(mMutex);
     mLimits = acrLimits;
     mHasNewLimits = true;
-}
-
-void ZTCHistoryWorker::setMark(std::uint64_t aTicket, const std::string& acrName, ZTCHistoryTime aTime) {
-    submit(ZTSMarkJob{{.mTicket = aTicket, .mName = acrName, .mTime = aTime, .mError = {}}});
-}
-
-void ZTCHistoryWorker::setValue(const std::string& acrName, const std::string& acrValue) {
-    submit(ZTSValueJob{acrName, acrValue});
 }
 
 std::string ZTCHistoryWorker::takeStoredLosses() {
@@ -146,11 +73,6 @@ bool ZTCHistoryWorker::finish(milliseconds aAtMost) {
 
 // ---- the thread ----
 
-void ZTCHistoryWorker::ring() {
-    const std::uint64_t lOne = 1;
-    [[maybe_unused]] const ssize_t lWritten = write(mBell.get(), &lOne, sizeof(lOne));
-}
-
 /// False: the thread is to end.
 bool ZTCHistoryWorker::pause(milliseconds aTime) {
     std::unique_lock lLock(mMutex);
@@ -170,7 +92,7 @@ void ZTCHistoryWorker::setProblem(const std::string& acrProblem) {
         mState.mProblem = acrProblem;
         mState.mIsReadOnly = lIsReadOnly;
     }
-    ring();
+    mBell.ring();
 }
 
 /// False: the thread is to end.
@@ -197,7 +119,7 @@ bool ZTCHistoryWorker::openStore() {
                 const std::lock_guard lLock(mMutex);
                 mState.mFatal = lrEx.what();
             }
-            ring();
+            mBell.ring();
             return false;
         } catch (const ZTCStoreDamagedEx& lrEx) {
             mpWriter.reset();  // the store stays: it knows that its database is damaged
@@ -261,7 +183,7 @@ void ZTCHistoryWorker::run() {
         mIsDone = lIsFinished;
     }
     mWake.notify_all();
-    ring();
+    mBell.ring();
 }
 
 /// Stores as much of the batch as one transaction takes. What is not stored stays in the batch.
@@ -348,7 +270,7 @@ void ZTCHistoryWorker::settle(std::deque<ZTCJob>& arBatch, std::size_t aCount) {
         }
         arBatch.pop_front();
     }
-    ring();
+    mBell.ring();
 }
 
 /// What other agents counted changes only when this one begins or ends.
@@ -410,62 +332,4 @@ void ZTCHistoryWorker::closeRun() {
     } catch (const ZTCStoreEx& lrEx) {
         mReport(std::string("the end of this run is not in the history: ") + lrEx.what());
     }
-}
-
-// ---- each within the batch's transaction ----
-
-void ZTCHistoryWorker::store(ZTSFrameJob& arJob) {
-    try {
-        if (const auto lRecords = mpWriter->takeIn(arJob.mEntry, arJob.mpPage, arJob.mTries >= scReadTries)) {
-            ++mBatchFrames;
-            mBatchRecords += *lRecords;
-        }
-    } catch (const ZTCSpoolTroubleEx&) {
-        ++arJob.mTries;
-        throw;
-    }
-}
-
-void ZTCHistoryWorker::store(ZTSPageJob& arJob) {
-    mpWriter->notePage(arJob.mpPage);
-}
-
-void ZTCHistoryWorker::store(ZTSEndedAgent& arAgent) {
-    mpWriter->endAgent(arAgent);
-}
-
-void ZTCHistoryWorker::store(ZTSForgottenJob& arJob) {
-    mpWriter->endForgottenAgents(arJob.mRunningGeneration);
-}
-
-void ZTCHistoryWorker::store(ZTSPortsJob& arJob) {
-    mpWriter->notePorts(arJob.mpPorts);
-}
-
-void ZTCHistoryWorker::store(ZTSTopologyJob& /*arJob*/) {
-    ZTSScan lScan;
-    {
-        const std::lock_guard lLock(mMutex);
-        lScan = mScan;
-        mIsScanQueued = false;
-    }
-    if (!mpStore->noteTopology(toMicroseconds(lScan.mTime), *lScan.mpTopology)) {
-        // The rest is for a later transaction, behind the frames that wait.
-        const std::lock_guard lLock(mMutex);
-        if (!std::exchange(mIsScanQueued, true)) {
-            mQueue.emplace_back(ZTSTopologyJob{});
-        }
-    }
-}
-
-void ZTCHistoryWorker::store(ZTSCountersJob& arJob) {
-    mpStore->noteCounters(arJob.mSamples);
-}
-
-void ZTCHistoryWorker::store(ZTSMarkJob& arJob) {
-    mpStore->setMark(arJob.mMark.mName, arJob.mMark.mTime);
-}
-
-void ZTCHistoryWorker::store(ZTSValueJob& arJob) {
-    mpStore->setValue(arJob.mName, arJob.mValue);
 }

@@ -1,16 +1,10 @@
 #include "sensor/collector/include/TopologyWatch.h"
 
-#include <sys/eventfd.h>
-#include <unistd.h>
-
 #include <algorithm>
-#include <cerrno>
 #include <condition_variable>
 #include <cstdlib>
 #include <mutex>
 
-#include "sensor/client/include/ClientErrors.h"
-#include "sensor/client/include/FileDescriptor.h"
 #include "sensor/topology/include/CounterDifferences.h"
 
 using std::chrono::milliseconds;
@@ -33,14 +27,7 @@ ZTSTopologyWatchSetup makeTopologyWatchSetup() {
 class ZTCTopologyWatch::Thread {
 public:
     Thread(ZTCTopologySink& arSink, ZTSTopologyWatchSetup aSetup)
-        : mSetup(std::move(aSetup)),
-          mReader(mSetup.mPatience),
-          mBell(eventfd(0, EFD_CLOEXEC | EFD_NONBLOCK)),
-          mpSink(&arSink) {
-        if (!mBell.isOpen()) {
-            throw ZTCSystemCallEx("cannot make an eventfd", errno);
-        }
-    }
+        : mSetup(std::move(aSetup)), mReader(mSetup.mPatience), mpSink(&arSink) {}
 
     void run();
     bool stop();
@@ -48,7 +35,7 @@ public:
     std::shared_ptr<const ZTSTopology> getPorts() const;
     std::shared_ptr<const ZTSTopology> getTopology() const;
     ZTSTopologyState getState() const;
-    int getBell() const { return mBell.get(); }
+    const ZTCEventBell& getBell() const { return mBell; }
 
 private:
     bool wait();
@@ -62,7 +49,7 @@ private:
     // ---- constant after construction, or with a lock of its own ----
     const ZTSTopologyWatchSetup mSetup;
     ZTCPatientReader mReader;
-    const ZTCFileDescriptor mBell;
+    const ZTCEventBell mBell;
 
     // ---- of the thread ----
     ZTCCounterDifferences mDifferences;
@@ -162,8 +149,7 @@ void ZTCTopologyWatch::Thread::publishPorts(const ZTSTopology& acrPorts) {
     if (mpSink != nullptr) {
         mpSink->notePorts(std::move(lpPorts));
     }
-    const std::uint64_t lOne = 1;
-    [[maybe_unused]] const ssize_t lWritten = write(mBell.get(), &lOne, sizeof(lOne));
+    mBell.ring();
 }
 
 /// A difference belongs to the minute that has just ended.
@@ -260,6 +246,6 @@ ZTSTopologyState ZTCTopologyWatch::getState() const {
     return mpThread->getState();
 }
 
-int ZTCTopologyWatch::getBell() const {
+const ZTCEventBell& ZTCTopologyWatch::getBell() const {
     return mpThread->getBell();
 }

@@ -16,6 +16,7 @@
 #include <utility>
 #include <vector>
 
+#include "sensor/client/include/EventBell.h"
 #include "sensor/settings/include/Settings.h"
 #include "sensor/store/include/History.h"
 #include "sensor/views/include/LiveState.h"
@@ -64,7 +65,7 @@ public:
     std::chrono::milliseconds test(std::uint64_t aTicket);
     std::vector<ZTSHookTest> takeTests();
     /// Readable when takeTests() has something; takeTests() reads it empty.
-    int getBell() const { return mBell.get(); }
+    int getBell() const { return mBell.getDescriptor(); }
     /// The open warnings as a JSON list, as LiveState.h describes it.
     std::string describe() const;
 
@@ -101,8 +102,8 @@ private:
     void publish();
 
     const ZTSWarningsSetup mSetup;
-    ZTCFileDescriptor mBell;
-    ZTCFileDescriptor mWakeUp;  ///< an eventfd that ends the thread's poll()
+    const ZTCEventBell mBell;
+    const ZTCEventBell mWakeUp;  ///< ends the thread's poll()
     const std::chrono::steady_clock::time_point mStart;
 
     // ---- of the thread ----

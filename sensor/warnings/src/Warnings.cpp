@@ -1,8 +1,5 @@
 #include "sensor/warnings/include/Warnings.h"
 
-#include <sys/eventfd.h>
-#include <unistd.h>
-
 #include <algorithm>
 #include <cerrno>
 #include <limits>
@@ -28,21 +25,8 @@ static constexpr seconds scHistoryPatience{10};
 /// For a test beside the timeouts of its hooks.
 static constexpr seconds scTestMargin{5};
 
-static ZTCFileDescriptor sMakeBell() {
-    ZTCFileDescriptor lBell(eventfd(0, EFD_CLOEXEC | EFD_NONBLOCK));
-    if (!lBell.isOpen()) {
-        throw ZTCSystemCallEx("cannot make an eventfd", errno);
-    }
-    return lBell;
-}
-
-static void sRing(const ZTCFileDescriptor& acrBell) {
-    const std::uint64_t lOne = 1;
-    [[maybe_unused]] const ssize_t lWritten = write(acrBell.get(), &lOne, sizeof(lOne));
-}
-
 ZTCWarnings::ZTCWarnings(ZTSWarningsSetup aSetup, const ZTSSettings& acrSettings)
-    : mSetup(std::move(aSetup)), mBell(sMakeBell()), mWakeUp(sMakeBell()), mStart(steady_clock::now()) {
+    : mSetup(std::move(aSetup)), mStart(steady_clock::now()) {
     setSettings(acrSettings);
     mThread = std::thread([this] { run(); });
 }
@@ -52,7 +36,7 @@ ZTCWarnings::~ZTCWarnings() {
         const std::lock_guard lLock(mMutex);
         mIsStopping = true;
     }
-    sRing(mWakeUp);
+    mWakeUp.ring();
     mThread.join();
 }
 
@@ -68,7 +52,7 @@ void ZTCWarnings::setSettings(const ZTSSettings& acrSettings) {
             mTestTime += 2 * lrRule.mTimeout;  // a hook of a real trouble may run before it
         }
     }
-    sRing(mWakeUp);
+    mWakeUp.ring();
 }
 
 void ZTCWarnings::setLive(std::string aLive) {
@@ -79,7 +63,7 @@ void ZTCWarnings::setLive(std::string aLive) {
             return;
         }
     }
-    sRing(mWakeUp);
+    mWakeUp.ring();
 }
 
 void ZTCWarnings::openHistory() {
@@ -94,13 +78,12 @@ milliseconds ZTCWarnings::test(std::uint64_t aTicket) {
         mNewTests.push_back(aTicket);
         lTime = mTestTime;
     }
-    sRing(mWakeUp);
+    mWakeUp.ring();
     return lTime;
 }
 
 std::vector<ZTSHookTest> ZTCWarnings::takeTests() {
-    std::uint64_t lCount = 0;
-    [[maybe_unused]] const ssize_t lRead = ::read(mBell.get(), &lCount, sizeof(lCount));
+    mBell.clear();
     const std::lock_guard lLock(mMutex);
     return std::exchange(mDoneTests, {});
 }
@@ -131,7 +114,7 @@ void ZTCWarnings::run() {
 
 /// False: it is over.
 bool ZTCWarnings::wait() {
-    std::vector<pollfd> lFds{{.fd = mWakeUp.get(), .events = POLLIN, .revents = 0}};
+    std::vector<pollfd> lFds{{.fd = mWakeUp.getDescriptor(), .events = POLLIN, .revents = 0}};
     const auto lNow = steady_clock::now();
     auto lNext = mpBook->isEmpty() ? steady_clock::time_point::max() : lNow + scLookPeriod;
     for (const ZTSHook& lrHook : mHooks) {
@@ -144,8 +127,7 @@ bool ZTCWarnings::wait() {
     const bool lIsEndless = lNext == steady_clock::time_point::max();
     poll(lFds.data(), static_cast<nfds_t>(lFds.size()),
          lIsEndless ? -1 : static_cast<int>(std::clamp<long long>(lTime, 0, 60000)));
-    std::uint64_t lCount = 0;
-    [[maybe_unused]] const ssize_t lRead = ::read(mWakeUp.get(), &lCount, sizeof(lCount));
+    mWakeUp.clear();
     const std::lock_guard lLock(mMutex);
     return !mIsStopping;
 }
@@ -171,7 +153,7 @@ void ZTCWarnings::applySettings() {
         mDoneTests.push_back(
             {mTest->mTicket, dumpJson({{"error", "the settings have changed while the hooks were tested"}}, -1)});
         mTest.reset();
-        sRing(mBell);
+        mBell.ring();
     }
 }
 
@@ -270,114 +252,6 @@ void ZTCWarnings::warn() {
     }
 }
 
-void ZTCWarnings::beginTest() {
-    std::vector<std::uint64_t> lTickets;
-    {
-        const std::lock_guard lLock(mMutex);
-        lTickets.swap(mNewTests);
-    }
-    for (const std::uint64_t lTicket : lTickets) {
-        if (mTest) {
-            const std::lock_guard lLock(mMutex);
-            mDoneTests.push_back({lTicket, dumpJson({{"error", "the hooks are being tested already"}}, -1)});
-            sRing(mBell);
-            continue;
-        }
-        mTest = ZTSTest{lTicket, std::vector<std::optional<std::string>>(mSettings.mWarnings.size())};
-        const ZTCNameBook lNames = makeNames();
-        for (std::size_t i = 0; i < mSettings.mWarnings.size(); ++i) {
-            ZTSWarnDocument lDocument;
-            lDocument.mTrouble.mRule = i;
-            lDocument.mTrouble.mText = "a test: nothing has happened";
-            lDocument.mTrouble.mFirst = lDocument.mTrouble.mLast = getHistoryTime();
-            ZTSWarnDocument lFilled = makeDocument(lDocument.mTrouble);
-            lFilled.mIsTest = true;
-            lFilled.mEpisode.reset();
-            mHooks.push_back({.mRule = i,
-                              .mSettings = mSettings.mWarnings[i],
-                              .mTicket = lTicket,
-                              .mpProcess = nullptr,
-                              .mInput = makeInput(lFilled),
-                              .mEnvironment = toHookEnvironment(lFilled, lNames)});
-        }
-        if (mSettings.mWarnings.empty()) {
-            endTest();
-        }
-    }
-}
-
-void ZTCWarnings::startHooks() {
-    std::size_t lRunning = 0;
-    for (auto lPlace = mHooks.begin(); lPlace != mHooks.end();) {
-        if (lPlace->mpProcess == nullptr && lRunning < gcMostHooks) {
-            const ZTSHookCall lCall{.mRun = lPlace->mSettings.mRun,
-                                    .mEnvironment = std::move(lPlace->mEnvironment),
-                                    .mInput = std::move(lPlace->mInput),
-                                    .mTimeout = lPlace->mSettings.mTimeout};
-            try {
-                lPlace->mpProcess = std::make_unique<ZTCHookProcess>(lCall, steady_clock::now());
-            } catch (const ZTCSystemCallEx& lrEx) {
-                noteEnd(*lPlace, lrEx.what());
-                lPlace = mHooks.erase(lPlace);
-                continue;
-            }
-        }
-        lRunning += lPlace->mpProcess != nullptr ? 1 : 0;
-        ++lPlace;
-    }
-}
-
-void ZTCWarnings::stepHooks() {
-    for (auto lPlace = mHooks.begin(); lPlace != mHooks.end();) {
-        const std::optional<std::string> lEnd =
-            lPlace->mpProcess != nullptr ? lPlace->mpProcess->step(steady_clock::now()) : std::nullopt;
-        if (lEnd) {
-            noteEnd(*lPlace, *lEnd);
-            lPlace = mHooks.erase(lPlace);
-        } else {
-            ++lPlace;
-        }
-    }
-}
-
-void ZTCWarnings::noteEnd(const ZTSHook& acrHook, const std::string& acrProblem) {
-    if (!acrProblem.empty()) {
-        ++mFailures;
-        if (mIsLoaded) {
-            mSetup.mSetValue(mSetup.mFailuresValue, std::to_string(mFailures));
-        }
-        mSetup.mReport("the hook " + acrHook.mSettings.mRun.front() + " for " + acrHook.mSettings.mKind +
-                       " failed: " + acrProblem + "; it is run again with the next warning");
-    }
-    const bool lIsCurrent =
-        acrHook.mRule < mSettings.mWarnings.size() && mSettings.mWarnings[acrHook.mRule] == acrHook.mSettings;
-    if (lIsCurrent) {
-        mProblems[acrHook.mRule] = acrProblem;
-    }
-    if (lIsCurrent && mTest && acrHook.mTicket == mTest->mTicket) {
-        mTest->mResults[acrHook.mRule] = acrProblem;
-        if (std::ranges::all_of(mTest->mResults, [](const auto& acrResult) { return acrResult.has_value(); })) {
-            endTest();
-        }
-    }
-}
-
-void ZTCWarnings::endTest() {
-    ZTCJson lHooks = ZTCJson::array();
-    for (std::size_t i = 0; i < mSettings.mWarnings.size(); ++i) {
-        const std::string lProblem = mTest->mResults[i].value_or("");
-        lHooks.push_back({{"kind", mSettings.mWarnings[i].mKind},
-                          {"run", mSettings.mWarnings[i].mRun},
-                          {"problem", lProblem.empty() ? ZTCJson(nullptr) : ZTCJson(lProblem)}});
-    }
-    {
-        const std::lock_guard lLock(mMutex);
-        mDoneTests.push_back({mTest->mTicket, dumpJson(ZTCJson{{"hooks", std::move(lHooks)}}, -1)});
-    }
-    mTest.reset();
-    sRing(mBell);
-}
-
 ZTCNameBook ZTCWarnings::makeNames() const {
     ZTCNameBook lNames;
     for (const auto& [lWwn, lName] : mSettings.mNames) {
@@ -386,35 +260,6 @@ ZTCNameBook ZTCWarnings::makeNames() const {
         }
     }
     return lNames;
-}
-
-ZTSWarnDocument ZTCWarnings::makeDocument(const ZTSTrouble& acrTrouble) {
-    ZTSWarnDocument lDocument;
-    lDocument.mHost = mSetup.mHost;
-    lDocument.mRule = mpBook->getRule(acrTrouble.mRule);
-    lDocument.mTrouble = acrTrouble;
-    const std::optional<ZTCKindKey> lKind = findKind(lDocument.mRule.mKind);
-    try {
-        if (mpHistory == nullptr) {
-            return lDocument;
-        }
-        lDocument.mStoreId = mpHistory->getStoreId();
-        ZTSHistoryFilter lFilter;
-        lFilter.mLimit = 1;
-        lFilter.mKinds = {lKind.value_or(0)};
-        if (lDocument.mRule.mPer == "port" && acrTrouble.mRemotePort) {
-            lFilter.mPorts = {acrTrouble.mRemotePort->mWwpn};
-        } else if (lDocument.mRule.mPer != "host" && acrTrouble.mInitiator.mWwpn) {
-            lFilter.mInitiators = {*acrTrouble.mInitiator.mWwpn};
-        }
-        if (lKind) {
-            const std::vector<ZTSEpisode> lNewest = mpHistory->readEpisodes(lFilter);
-            lDocument.mEpisode = lNewest.empty() ? std::nullopt : std::optional(lNewest.back());
-        }
-    } catch (const ZTCStoreEx&) {
-        mpHistory.reset();
-    }
-    return lDocument;
 }
 
 /// With the devices of the episode, where the history can say them.

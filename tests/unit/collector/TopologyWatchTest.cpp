@@ -90,7 +90,7 @@ TEST_F(TopologyWatchTest, TheHostIsScannedAtTheStart) {
     const ZTSTopologyState lState = mWatch->getState();
     EXPECT_EQ(lState.mScanned, fromMicroseconds(mNow));
     EXPECT_FALSE(lState.mIsStale);
-    pollfd lBell{.fd = mWatch->getBell(), .events = POLLIN, .revents = 0};
+    pollfd lBell{.fd = mWatch->getBell().getDescriptor(), .events = POLLIN, .revents = 0};
     EXPECT_EQ(poll(&lBell, 1, 0), 1) << "the ports are new";
 }
 
