@@ -2,6 +2,7 @@
 
 #include <gmock/gmock.h>
 #include <gtest/gtest.h>
+#include <poll.h>
 #include <sys/stat.h>
 
 #include <fstream>
@@ -216,6 +217,19 @@ TEST_F(Warnings, AHookThatWorksAgainIsNoLongerAWarning) {
 TEST_F(Warnings, ATestWithoutHooksSaysSo) {
     start({});
     EXPECT_EQ(test()["hooks"].size(), 0U);
+}
+
+TEST_F(Warnings, TheBellRingsForTheAnswerToATestAndIsSilentOnceTheAnswerIsTaken) {
+    start({});
+    const auto lIsRung = [this] {
+        pollfd lBell{.fd = mpWarnings->getBell(), .events = POLLIN, .revents = 0};
+        return poll(&lBell, 1, 0) == 1;
+    };
+    EXPECT_FALSE(lIsRung());
+    mpWarnings->test(7);
+    waitUntil(lIsRung, "the bell");
+    EXPECT_EQ(mpWarnings->takeTests().size(), 1U);
+    EXPECT_FALSE(lIsRung()) << "a thread that polls it would spin";
 }
 
 TEST_F(Warnings, NewRulesTakeEffectAtOnceAndEndATestOfTheOldOnes) {
