@@ -172,7 +172,7 @@ class Prometheus:
         for name in ("recording.yml", "alerts.yml"):
             with open(f"deploy/prometheus/{name}") as source, open(f"{folder}/{name}", "w") as file:
                 for line in source:
-                    file.write("        for: 5s\n" if line.startswith("        for: ") else line)
+                    file.write("        for: 5s\n" if line.startswith("        for: 2m") else line)
         with open(f"{folder}/prometheus.yml", "w") as file:
             file.write(f"global: {{scrape_interval: {interval}s, scrape_timeout: {interval}s, evaluation_interval: {interval}s}}\n"
                        "rule_files: [recording.yml, alerts.yml]\n"
