@@ -8,6 +8,7 @@
 
 #include <cstdint>
 #include <functional>
+#include <map>
 #include <memory>
 #include <optional>
 #include <string>
@@ -116,6 +117,9 @@ public:
     /// What changed later than `aFrom` and not later than `aTo`, by time, then thing and key. What the first
     /// scan found was there before, so it is not a change.
     std::vector<ZTSTopologyChange> readTopologyChanges(std::int64_t aFrom, std::int64_t aTo) const;
+    /// The most ways that led to each logical unit, by its wwid, at one time from `aFrom` to `aTo`: whatever the paths'
+    /// states were. Of very many changes only the newest are looked at.
+    std::map<std::string, ZTSLunWays> readMostWays(std::int64_t aFrom, std::int64_t aTo) const;
     /// How far counters rose in the minutes from that of `aFrom` to that of `aTo`, by minute: the oldest `aMost`.
     std::vector<ZTSCounterSample> readCounters(std::int64_t aFrom, std::int64_t aTo, std::size_t aMost) const;
 

@@ -5,6 +5,8 @@
 #ifndef SENSOR_STORE_INCLUDE_TOPOLOGYHISTORY_H
 #define SENSOR_STORE_INCLUDE_TOPOLOGYHISTORY_H
 
+#include <algorithm>
+#include <cstddef>
 #include <cstdint>
 #include <optional>
 #include <string>
@@ -45,6 +47,23 @@ struct ZTSTopologyChange {
 
     bool operator==(const ZTSTopologyChange&) const = default;
 };
+
+/// How many ways led to a logical unit.
+struct ZTSLunWays {
+    std::size_t mPaths = 0;
+    std::size_t mInitiators = 0;
+    std::size_t mRemotePorts = 0;
+
+    void raise(const ZTSLunWays& acrOther) {
+        mPaths = std::max(mPaths, acrOther.mPaths);
+        mInitiators = std::max(mInitiators, acrOther.mInitiators);
+        mRemotePorts = std::max(mRemotePorts, acrOther.mRemotePorts);
+    }
+    bool operator==(const ZTSLunWays&) const = default;
+};
+
+/// The mark behind which redundancy is measured anew: what is there then is what is meant.
+inline constexpr const char* gcBaselineMark = "baseline";
 
 /// How far one counter of a port rose within one minute.
 struct ZTSCounterSample {

@@ -152,5 +152,5 @@ std::vector<std::string> ZTCHistory::getQueries() {
     return {gcEpisodeRange, gcOpenEpisodes,  gcEpisode,      gcChanges,     gcChangedEpisode, gcFirstEpisodeSince,
             gcFirstEpisode, gcLastEpisode,   gcRecords,      gcMinutes,     gcDays,           gcGaps,
             gcGapCounts,    gcEndedCoverage, gcOpenCoverage, gcRuns,        gcScan,           gcFirstScan,
-            gcOpenThings,   gcEndedThings,   gcThingsBegun,  gcThingsEnded, gcCounters};
+            gcOpenThings,   gcEndedThings,   gcThingsBegun,  gcThingsEnded, gcThingsLately,   gcCounters};
 }

@@ -59,6 +59,8 @@ inline constexpr const char* gcThingsBegun =
     "SELECT " ZT_THING_COLUMNS " FROM topology WHERE timeFrom > ? AND timeFrom <= ? ORDER BY timeFrom LIMIT ?";
 inline constexpr const char* gcThingsEnded =
     "SELECT " ZT_THING_COLUMNS " FROM topology WHERE timeTo > ? AND timeTo <= ? ORDER BY timeTo LIMIT ?";
+inline constexpr const char* gcThingsLately =
+    "SELECT " ZT_THING_COLUMNS " FROM topology WHERE timeTo > ? AND timeFrom <= ? ORDER BY timeTo DESC LIMIT ?";
 #undef ZT_THING_COLUMNS
 inline constexpr const char* gcCounters =
     "SELECT p.slot, p.initiator, p.port, n.name, p.difference FROM portCounter p "

@@ -215,6 +215,102 @@ std::vector<ZTSTopologyChange> ZTCHistory::readTopologyChanges(std::int64_t aFro
     return lChanges;
 }
 
+/// The ways to one logical unit while time passes.
+class ZTCWaysCounter {
+public:
+    void add(const std::string& acrInitiator, const std::string& acrRemotePort) {
+        ++mPaths;
+        ++mInitiators[acrInitiator];
+        ++mRemotePorts[acrRemotePort];
+        mMost.raise({.mPaths = mPaths, .mInitiators = mInitiators.size(), .mRemotePorts = mRemotePorts.size()});
+    }
+    void remove(const std::string& acrInitiator, const std::string& acrRemotePort) {
+        --mPaths;
+        sTakeOne(mInitiators, acrInitiator);
+        sTakeOne(mRemotePorts, acrRemotePort);
+    }
+    const ZTSLunWays& getMost() const { return mMost; }
+
+private:
+    static void sTakeOne(std::map<std::string, std::size_t>& arCounts, const std::string& acrKey) {
+        const auto lFound = arCounts.find(acrKey);
+        if (lFound != arCounts.end() && --lFound->second == 0) {
+            arCounts.erase(lFound);
+        }
+    }
+
+    std::size_t mPaths = 0;
+    std::map<std::string, std::size_t> mInitiators;
+    std::map<std::string, std::size_t> mRemotePorts;
+    ZTSLunWays mMost;
+};
+
+/// Versions that have ended and are looked at for it, the newest ones.
+static constexpr std::uint64_t scMostEndedPaths = 20000;
+
+/// A path that begins or ends.
+struct ZTSPathTurn {
+    std::int64_t mTime;
+    bool mBegins;  ///< at one time, what ends comes first: a version follows the one before it
+    std::size_t mPath;
+
+    auto operator<=>(const ZTSPathTurn&) const = default;
+};
+
+std::map<std::string, ZTSLunWays> ZTCHistory::readMostWays(std::int64_t aFrom, std::int64_t aTo) const {
+    ZTCDatabase& lrDatabase = mpImplementation->mDatabase;
+    // Where a remote port's name stood for several ports they count as one: that expects too little, never too much.
+    std::map<std::string, std::string> lPortNames;
+    ZTSTopology lVersions;
+    std::vector<ZTSPathTurn> lTurns;
+    const auto lRead = [&](ZTCStatement& arRows) {
+        while (arRows.step()) {
+            const auto lThing = static_cast<ZTETopologyThing>(arRows.number(1));
+            const std::string lKey = arRows.text(2);
+            if (lThing == ZTTT_RemotePort) {
+                const std::size_t lBlank = lKey.find(' ');
+                lPortNames.emplace(lKey.substr(0, lBlank), lBlank == std::string::npos ? lKey : lKey.substr(lBlank));
+            } else if (lThing == ZTTT_Path) {
+                const std::int64_t lBegin = std::max(arRows.number(4), aFrom);
+                const std::int64_t lEnd = arRows.isNull(5) ? aTo + 1 : arRows.number(5);
+                if (lEnd > lBegin) {
+                    addThing(lVersions, lThing, lKey, arRows.blob(3));
+                    lTurns.push_back({lBegin, true, lVersions.mPaths.size() - 1});
+                    lTurns.push_back({lEnd, false, lVersions.mPaths.size() - 1});
+                }
+            }
+        }
+    };
+    ZTCStatement lOpen(lrDatabase, HistoryQueries::gcOpenThings);
+    lOpen.query(aTo);
+    lRead(lOpen);
+    ZTCStatement lEnded(lrDatabase, HistoryQueries::gcThingsLately);
+    lEnded.query(aFrom, aTo, scMostEndedPaths);
+    lRead(lEnded);
+
+    std::ranges::sort(lTurns);
+    std::map<std::string, ZTCWaysCounter> lLuns;
+    for (const ZTSPathTurn& lrTurn : lTurns) {
+        const ZTSTopologyPath& lrPath = lVersions.mPaths[lrTurn.mPath];
+        if (!lrPath.mWwid) {
+            continue;
+        }
+        const auto lPort = lPortNames.find(lrPath.mRemotePort);
+        const std::string& lrPort = lPort == lPortNames.end() ? lrPath.mRemotePort : lPort->second;
+        ZTCWaysCounter& lrLun = lLuns[*lrPath.mWwid];
+        if (lrTurn.mBegins) {
+            lrLun.add(lrPath.mHost, lrPort);
+        } else {
+            lrLun.remove(lrPath.mHost, lrPort);
+        }
+    }
+    std::map<std::string, ZTSLunWays> lMost;
+    for (const auto& [lWwid, lLun] : lLuns) {
+        lMost.emplace(lWwid, lLun.getMost());
+    }
+    return lMost;
+}
+
 std::vector<ZTSCounterSample> ZTCHistory::readCounters(std::int64_t aFrom, std::int64_t aTo, std::size_t aMost) const {
     mpImplementation->loadNames();
     std::vector<ZTSCounterSample> lSamples;

@@ -7,6 +7,7 @@
 #include <algorithm>
 #include <array>
 #include <filesystem>
+#include <map>
 
 #include "sensor/store/src/DamageCheck.h"
 #include "tests/unit/store/Integrity.h"
@@ -101,6 +102,46 @@ TEST_F(SchemaTest, StepsThatAreMissingAreMadeInOneTransaction) {
     EXPECT_EQ(lDatabase.readNumber("PRAGMA user_version"), 3);
     EXPECT_NO_THROW(checkSchema(lDatabase, scLater));
     EXPECT_THROW(migrateSchema(lDatabase, scFirst), ZTCStoreNewerEx);
+}
+
+TEST_F(SchemaTest, AHistoryOfTheFirstVersionKeepsAllItsRowsAndGetsTheNewTables) {
+    writeFile(path(), "");
+    execute(readFile(TAVIK_FIRST_HISTORY));
+    ASSERT_EQ(queryNumber(path(), "PRAGMA user_version"), 1);
+    EXPECT_THROW(ZTCHistory(mDirectory.path()), ZTCNoHistoryEx) << "a reader does not change it";
+    const auto lCountRows = [this] {
+        std::map<std::string, std::int64_t> lRows;
+        for (const char* const lpTable : {"initiator", "port", "generation", "frame", "episode", "change", "record",
+                                          "minute", "day", "total", "ledger", "run", "coverage", "value"}) {
+            lRows[lpTable] = queryNumber(path(), std::string("SELECT count(*) FROM ") + lpTable);
+        }
+        return lRows;
+    };
+    const std::map<std::string, std::int64_t> lBefore = lCountRows();
+    ASSERT_EQ(lBefore.at("episode"), 2);
+    ASSERT_EQ(lBefore.at("record"), 3);
+
+    EXPECT_EQ(store().getStoreId(), "0d8280fdd503dad45bafaa8325b13390");
+    closeStore();
+    EXPECT_TRUE(mReports.empty()) << mReports.front();
+    EXPECT_EQ(lCountRows(), lBefore);
+    EXPECT_EQ(queryNumber(path(), "PRAGMA user_version"), static_cast<std::int64_t>(getSchemaSteps().size()));
+    for (const char* const lpTable : {"topology", "scan", "counterName", "portCounter"}) {
+        EXPECT_EQ(queryNumber(path(), std::string("SELECT count(*) FROM ") + lpTable), 0) << lpTable;
+    }
+    const std::vector<ZTSEpisode> lEpisodes = episodes();
+    ASSERT_EQ(lEpisodes.size(), 2U);
+    EXPECT_EQ(getKindName(lEpisodes[0].mKind), "queue-full");
+    EXPECT_EQ(lEpisodes[0].mCount, 1000U);
+    EXPECT_EQ(getKindName(lEpisodes[1].mKind), "check-condition");
+    EXPECT_EQ(lEpisodes[1].mCount, 8U);
+    EXPECT_EQ(records().size(), 3U);
+
+    // It goes on with it.
+    take({makeQueueFull(gcPortA, gcBase, gcBase)});
+    EXPECT_EQ(episodes().size(), 3U);
+    inTransaction([this] { EXPECT_TRUE(store().noteTopology(gcBase, {})); });
+    EXPECT_TRUE(history().readTopology(gcBase));
 }
 
 TEST_F(SchemaTest, AReaderSaysWhenThereIsNoHistoryYet) {

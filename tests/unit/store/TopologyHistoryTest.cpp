@@ -1,6 +1,7 @@
 // What hung on the ports at a time: intervals, changes between scans, and what a scan that could not read everything
 // leaves alone.
 #include <algorithm>
+#include <map>
 
 #include "sensor/store/src/Database.h"
 #include "tests/unit/store/Integrity.h"
@@ -92,6 +93,35 @@ TEST_F(TopologyHistoryTest, AnEventOfLastWeekHasTheNamesOfLastWeek) {
                                                 {gcBase + scWeek, ZTTT_Mapping, "dm-3", "slaves", "sdc", "sdd"},
                                                 {gcBase + scWeek, ZTTT_Mount, "dm-4", "", "", std::nullopt},
                                             }));
+}
+
+TEST_F(TopologyHistoryTest, TheMostWaysToALunAreThoseThatWereThereAtOneTime) {
+    using ZTCWays = std::map<std::string, ZTSLunWays>;
+    const auto lMost = [this](std::int64_t aFrom, std::int64_t aTo) { return history().readMostWays(aFrom, aTo); };
+    EXPECT_TRUE(lMost(0, gcBase).empty());
+    // host8 sees the same port under another name.
+    ZTSTopology lTwo = sTopology();
+    lTwo.mRemotePorts.push_back(lTwo.mRemotePorts[0]);
+    lTwo.mRemotePorts[1].mName = "rport-8:0-3";
+    lTwo.mRemotePorts[1].mHost = "host8";
+    lTwo.mPaths.push_back(lTwo.mPaths[0]);
+    lTwo.mPaths[1].mAddress = "8:0:3:12";
+    lTwo.mPaths[1].mHost = "host8";
+    lTwo.mPaths[1].mRemotePort = "rport-8:0-3";
+    ZTSTopology lOther = lTwo;
+    lOther.mPaths.erase(lOther.mPaths.begin());
+    note(gcBase, sTopology());
+    note(gcBase + scSecond, lTwo);
+    for (std::uint32_t lDepth = 31; lDepth > 28; --lDepth) {  // versions of a path that is there all the time
+        lTwo.mPaths[0].mQueueDepth = lDepth;
+        note(gcBase + (40 - lDepth) * scSecond, lTwo);
+    }
+    note(gcBase + 20 * scSecond, lOther);
+    EXPECT_EQ(lMost(0, gcBase), (ZTCWays{{"naa.600a", {1, 1, 1}}}));
+    EXPECT_EQ(lMost(0, gcBase + scWeek), (ZTCWays{{"naa.600a", {2, 2, 1}}}));
+    EXPECT_EQ(lMost(gcBase + 20 * scSecond, gcBase + scWeek), (ZTCWays{{"naa.600a", {1, 1, 1}}}));
+    note(gcBase + 30 * scSecond, sTopology());  // one path goes and the other comes: never three
+    EXPECT_EQ(lMost(gcBase + 20 * scSecond, gcBase + scWeek), (ZTCWays{{"naa.600a", {1, 1, 1}}}));
 }
 
 TEST_F(TopologyHistoryTest, ALunThatIsRemappedKeepsItsAddressAndChangesItsWwid) {
