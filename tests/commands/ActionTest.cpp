@@ -53,6 +53,7 @@ static std::vector<ZTSAdvice> sAllAdvice() {
         lAll.push_back({lrRow.mpId, lrRow.mpAction});
         lAll.push_back({lrRow.mpId, lrRow.mpSee});
     }
+    lAll.push_back({"names that are stale", gcStaleNamesAction});
     for (const ZTSSanTroubleRow& lrRow : getSanTroubleTable()) {
         lAll.push_back({lrRow.mpId, getSanAction(lrRow)});
         lAll.push_back(
@@ -98,6 +99,9 @@ protected:
             ASSERT_EQ(acrWords.size(), 3U) << acrPart;
             EXPECT_THAT((std::vector<std::string>{"start", "restart", "edit"}), Contains(acrWords[1]));
             checkUnit(acrWords[2]);
+        } else if (lrProgram == "journalctl" && acrWords.size() == 4) {
+            EXPECT_EQ(acrWords[1], "-k") << acrPart;  // the kernel's log
+            EXPECT_TRUE(acrWords[2] == "-n" && std::stoi(acrWords[3]) > 0) << acrPart;
         } else if (lrProgram == "journalctl") {
             ASSERT_EQ(acrWords.size(), 5U) << acrPart;
             EXPECT_EQ(acrWords[1], "-u");

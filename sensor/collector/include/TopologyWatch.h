@@ -53,6 +53,7 @@ struct ZTSTopologyState {
     std::optional<ZTCHistoryTime> mScanned{};         ///< the last whole scan; absent: none is finished yet
     std::optional<std::chrono::milliseconds> mAge{};  ///< since then, by a clock that nobody sets
     bool mIsStale = true;                             ///< none is finished, the last is old, or files block
+    std::optional<ZTCHistoryTime> mStaleSince{};      ///< present where they are stale
     std::vector<std::string> mBlocked{};              ///< files that do not answer now
 };
 

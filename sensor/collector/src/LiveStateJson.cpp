@@ -204,6 +204,7 @@ static ZTCJson sTopology(const ZTSTopologyState& acrState) {
         {"scanned", acrState.mScanned ? sTime(*acrState.mScanned) : ZTCJson(nullptr)},
         {"ageSeconds", acrState.mAge ? ZTCJson(static_cast<double>(acrState.mAge->count()) / 1000) : ZTCJson(nullptr)},
         {"stale", acrState.mIsStale},
+        {"staleSince", acrState.mStaleSince ? sTime(*acrState.mStaleSince) : ZTCJson(nullptr)},
         {"blocked", acrState.mBlocked}};
 }
 

@@ -50,6 +50,7 @@ private:
     const ZTSTopologyWatchSetup mSetup;
     ZTCPatientReader mReader;
     const ZTCEventBell mBell;
+    const ZTCHistoryTime mBegun = mSetup.mClock();
 
     // ---- of the thread ----
     ZTCCounterDifferences mDifferences;
@@ -68,6 +69,7 @@ private:
     std::shared_ptr<const ZTSTopology> mpTopology;
     std::optional<ZTCHistoryTime> mScanned;
     ZTCTime mScannedAt{};
+    std::optional<ZTCHistoryTime> mBlockedSince;  ///< the look after which files blocked, and have since
 };
 
 void ZTCTopologyWatch::Thread::run() {
@@ -125,7 +127,9 @@ void ZTCTopologyWatch::Thread::scanWhole() {
     mNextWhole = mLastWhole + mSetup.mWholePeriod;
     mNextPorts = mLastWhole + mSetup.mPortsPeriod;
     publishPorts(*lpTopology);
+    const bool lIsBlocked = !lpTopology->mBlocked.empty();
     const std::lock_guard lLock(mMutex);
+    mBlockedSince = lIsBlocked ? std::optional(mBlockedSince.value_or(lTime)) : std::nullopt;
     mpTopology = lpTopology;
     mScanned = lTime;
     mScannedAt = mLastWhole;
@@ -206,6 +210,9 @@ ZTSTopologyState ZTCTopologyWatch::Thread::getState() const {
         lState.mAge = std::chrono::duration_cast<milliseconds>(std::chrono::steady_clock::now() - mScannedAt);
     }
     lState.mIsStale = !mScanned || *lState.mAge > mSetup.mStaleAfter || !lState.mBlocked.empty();
+    if (lState.mIsStale) {
+        lState.mStaleSince = mBlockedSince ? *mBlockedSince : mScanned.value_or(mBegun);
+    }
     return lState;
 }
 

@@ -19,6 +19,7 @@
 ///      "ledger": [{"initiator": {…}, "kind": "rscn", "received": 9, "refused": {"total-limit": 0}, "consolidated": 9,
 ///                  "handedOver": 9, "held": 0, "dropped": 0}],
 ///      "losses": {"since": "…", "refused": {"total-limit": 0}, "dropped": 0, "library": [{"name": "…", "count": 0}]},
+///      "topology": {"scanned": "…", "ageSeconds": 12.5, "stale": true, "staleSince": "…", "blocked": ["/sys/…"]},
 ///      "warnings": [{"kind": "queue-full", "text": "queue-full of array7 ctrl-A: 120 within 300.0 s", "since": "…",
 ///                    "given": 2, "next": "…"}]}
 ///
@@ -36,6 +37,8 @@
 /// - `ledger`: the totals of all agents that the database has seen, the running one's up to now. Where it is missing
 /// the
 ///   reader takes the rows that the history holds.
+/// - `topology`: when the names of ports and disks were last read, and since when they are not as of now: files of the
+///   kernel in `blocked` do not answer, or the whole reading hangs.
 /// - `losses`: what was refused or dropped in the last 24 hours, as far back as `since` where the collector knows less.
 ///
 /// - `warnings` are the open ones of the configuration's rules: `given` so often, `next` time if the trouble goes on. A
@@ -149,6 +152,14 @@ struct ZTSLiveLosses {
     std::vector<ZTSLibraryLoss> mLibrary;
 };
 
+/// How current the names of ports and disks are.
+struct ZTSLiveTopology {
+    std::optional<ZTCHistoryTime> mScanned;
+    std::optional<bool> mIsStale;
+    std::optional<ZTCHistoryTime> mStaleSince;
+    std::vector<std::string> mBlocked;  ///< files that do not answer
+};
+
 /// A warning that is open.
 struct ZTSLiveWarning {
     std::string mKind;
@@ -168,6 +179,7 @@ struct ZTSLiveState {
     std::optional<std::vector<ZTSLiveKinds>> mKinds;
     std::optional<std::vector<ZTSLiveLedgerRow>> mLedger;
     std::optional<ZTSLiveLosses> mLosses;
+    std::optional<ZTSLiveTopology> mTopology;
     std::optional<std::vector<ZTSLiveWarning>> mWarnings;
     std::vector<std::string> mProblems;  ///< members that could not be read, one line each
 };

@@ -90,6 +90,13 @@ ZTSLastEvent findLastEvent(const ZTSStatusFacts& acrFacts);
 /// A topology that is older than this, while the sensor runs, is not as of now.
 inline constexpr std::chrono::minutes gcScanSpan{5};
 
+/// What to do where names are stale: a command.
+inline constexpr const char* gcStaleNamesAction = "journalctl -k -n 50";
+
+/// That the running sensor's names are not as of now, since when, why, and what to do. Empty: they are, or it did not
+/// say.
+std::string describeStaleNames(const ZTSStatusFacts& acrFacts);
+
 /// One line for each thing that could not be learned.
 std::vector<std::string> listUnknown(const ZTSStatusFacts& acrFacts);
 

@@ -241,6 +241,15 @@ static ZTSLiveLosses sReadLosses(const ZTCLiveObject& acrObject) {
     return lLosses;
 }
 
+static ZTSLiveTopology sReadTopology(const ZTCLiveObject& acrObject) {
+    ZTSLiveTopology lTopology;
+    acrObject.read("scanned", lTopology.mScanned);
+    acrObject.read("stale", lTopology.mIsStale);
+    acrObject.read("staleSince", lTopology.mStaleSince);
+    acrObject.read("blocked", lTopology.mBlocked);
+    return lTopology;
+}
+
 static ZTSLiveWarning sReadWarning(const ZTCLiveObject& acrObject) {
     ZTSLiveWarning lWarning;
     acrObject.read("kind", lWarning.mKind);
@@ -299,6 +308,9 @@ ZTSLiveState readLiveState(const ZTCJson& acrDocument) {
     lRoot.readList("ledger", lState.mLedger, sReadLedgerRow);
     if (lRoot.has("losses")) {
         lState.mLosses = sReadLosses(lRoot.object("losses"));
+    }
+    if (lRoot.has("topology")) {
+        lState.mTopology = sReadTopology(lRoot.object("topology"));
     }
     lRoot.readList("warnings", lState.mWarnings, sReadWarning);
     return lState;

@@ -37,6 +37,31 @@ ZTSLastEvent findLastEvent(const ZTSStatusFacts& acrFacts) {
     return {};
 }
 
+std::string describeStaleNames(const ZTSStatusFacts& acrFacts) {
+    // Right after its start the sensor has looked at nothing yet: that is no trouble.
+    static constexpr std::chrono::seconds scFirstScan(30);
+    if (!acrFacts.mLive || !acrFacts.mLive->mTopology || !acrFacts.mLive->mTopology->mIsStale.value_or(false)) {
+        return {};
+    }
+    const ZTSLiveTopology& lrTopology = *acrFacts.mLive->mTopology;
+    const ZTCHistoryTime lSince = lrTopology.mStaleSince.value_or(acrFacts.mNow);
+    if (lrTopology.mBlocked.empty() && !lrTopology.mScanned && acrFacts.mNow - lSince < scFirstScan) {
+        return {};
+    }
+    std::string lText =
+        "names and states of ports and disks are stale since " + formatShortTime(lSince, acrFacts.mNow) + ": ";
+    if (lrTopology.mBlocked.empty()) {
+        lText += "the kernel does not answer when they are read";
+    } else {
+        lText += lrTopology.mBlocked.front() +
+                 (lrTopology.mBlocked.size() == 1
+                      ? std::string(" does not answer")
+                      : " and " + formatCount(lrTopology.mBlocked.size() - 1, "more file") + " do not answer");
+    }
+    return lText +
+           "; events are collected all the same. Look at that adapter in the kernel's log: " + gcStaleNamesAction;
+}
+
 std::vector<std::string> listUnknown(const ZTSStatusFacts& acrFacts) {
     std::vector<std::string> lUnknown;
     const auto lAdd = [&lUnknown](bool aIsUnknown, const std::string& acrText) {
@@ -46,7 +71,9 @@ std::vector<std::string> listUnknown(const ZTSStatusFacts& acrFacts) {
     };
     lAdd(!acrFacts.mHistory && !acrFacts.mHistoryProblem.empty(), acrFacts.mHistoryProblem);
     lAdd(acrFacts.mAnswer == ZTAN_NoSensor && !acrFacts.mPageProblem.empty(), acrFacts.mPageProblem);
-    if (acrFacts.mLive && acrFacts.mHistory && acrFacts.mHistory->mSan) {
+    const std::string lStale = describeStaleNames(acrFacts);
+    lAdd(!lStale.empty(), lStale);
+    if (lStale.empty() && acrFacts.mLive && acrFacts.mHistory && acrFacts.mHistory->mSan) {
         const ZTSSanView& lrSan = *acrFacts.mHistory->mSan;
         lAdd(lrSan.mIsStale, "the paths are not whole: " + formatCount(lrSan.mFacts.mBlocked, "file") +
                                  " of /sys did not answer; of them earlier values are shown");

@@ -188,6 +188,20 @@ static void sAddLiveRows(const ZTSStatusFacts& acrFacts, ZTCJson& arLedger) {
     }
 }
 
+static ZTCJson sTopology(const ZTSStatusFacts& acrFacts) {
+    if (!acrFacts.mLive || !acrFacts.mLive->mTopology) {
+        return nullptr;
+    }
+    const ZTSLiveTopology& lrTopology = *acrFacts.mLive->mTopology;
+    const std::string lText = describeStaleNames(acrFacts);
+    return {{"scanned", sTime(lrTopology.mScanned)},
+            {"stale", sValue(lrTopology.mIsStale)},
+            {"since", sTime(lrTopology.mStaleSince)},
+            {"blocked", lrTopology.mBlocked},
+            {"text", sText(lText)},
+            {"action", lText.empty() ? ZTCJson(nullptr) : ZTCJson(gcStaleNamesAction)}};
+}
+
 static ZTCJson sLosses(const ZTSStatusFacts& acrFacts) {
     const ZTSLossSum lSum = sumLosses(acrFacts);
     ZTCJson lLosses{{"inGaps", acrFacts.mHistory ? ZTCJson(lSum.mInGaps) : ZTCJson(nullptr)},
@@ -272,6 +286,7 @@ ZTCJson makeStatusDocument(const ZTSStatusFacts& acrFacts) {
     lDocument["san"] =
         lHasSan ? sTroubles(describeSanTroubles(acrFacts.mHistory->mSan->mFacts, acrFacts.mNames, acrFacts.mNow))
                 : ZTCJson(nullptr);
+    lDocument["topology"] = sTopology(acrFacts);
     lDocument["unknown"] = listUnknown(acrFacts);
     return lDocument;
 }
