@@ -11,6 +11,7 @@
 #include <vector>
 
 #include "sensor/store/include/Episode.h"
+#include "sensor/store/include/TopologyHistory.h"
 #include "sensor/topology/include/Topology.h"
 
 enum ZTEPathHealth : std::uint8_t {
@@ -58,7 +59,7 @@ struct ZTSSanLun {
     std::vector<ZTSSanPath> mPaths;  ///< of a unit that is gone: its last known ones, all down
     bool mIsGone = false;            ///< the kernel has no path of it left, and its ports went away with it
     std::size_t mRunning = 0;
-    std::size_t mExpected = 0;  ///< most paths that it had at one of the moments that are known
+    std::size_t mExpected = 0;  ///< most paths that it had, as far as that is known
     ZTERedundancy mRedundancy = ZTRD_Whole;
 };
 
@@ -91,16 +92,18 @@ struct ZTSSanTrouble {
     ZTESanSeverity mSeverity = ZTSS_Notice;
     std::vector<ZTSInitiator> mInitiators{};
     std::vector<ZTSRemotePort> mRemotePorts{};
-    std::string mState{};                    ///< of the link or the remote port; empty: several, or not known
-    std::optional<ZTCHistoryTime> mSince{};  ///< when that state began
-    std::vector<std::size_t> mLuns{};        ///< concerned, by their place in the facts
-    std::size_t mChanges = 0;                ///< of ZTST_Flapping: changes of state in the last hour
+    std::string mState{};                     ///< of the link or the remote port; empty: several, or not known
+    std::optional<ZTCHistoryTime> mSince{};   ///< when that state began
+    std::vector<std::size_t> mLuns{};         ///< concerned, by their place in the facts
+    std::size_t mChanges = 0;                 ///< of ZTST_Flapping: changes of state in the last hour
+    std::optional<std::uint64_t> mEpisode{};  ///< the number of an episode that shows it best
     std::size_t mOtherPorts = 0;  ///< of ZTST_PathLost from one initiator: its target ports that are Online still
 };
 
 /// What is known of earlier. Without it only what the kernel still shows is expected.
 struct ZTSSanPast {
-    std::vector<ZTSTopology> mEarlier{};  ///< in any order
+    std::vector<ZTSTopology> mEarlier{};            ///< in any order
+    std::map<std::string, ZTSLunWays> mMostWays{};  ///< that led to a unit, by its wwid
 
     struct States {
         std::optional<ZTCHistoryTime> mSince{};  ///< when the state that it has now began

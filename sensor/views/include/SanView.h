@@ -17,8 +17,8 @@ struct ZTSSanView {
     bool mIsStale = false;    ///< files of the kernel did not answer: what they say is as of earlier
 };
 
-/// The moments that redundancy is measured by: what was there then is expected to be there now. After the longest of
-/// them what is left counts as the new state.
+/// The moments at which links and remote ports that are away now count as missing if they were up then. The paths of a
+/// LUN are measured by the most that it ever had, as far back as the history and the newest mark "baseline" reach.
 inline constexpr std::array<std::chrono::hours, 3> gcEarlierMoments{std::chrono::hours(1), std::chrono::hours(24),
                                                                     std::chrono::hours(7 * 24)};
 

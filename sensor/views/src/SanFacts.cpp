@@ -31,7 +31,7 @@ std::optional<ZTESanSeverity> ZTSSanFacts::getWorst() const {
 class ZTCSanJudge {
 public:
     ZTCSanJudge(const ZTSTopology& acrNow, const ZTSSanPast& acrPast) : mrNow(acrNow), mrPast(acrPast) {
-        mFacts.mLuns = findLuns(acrNow, acrPast.mEarlier);
+        mFacts.mLuns = findLuns(acrNow, acrPast);
         mFacts.mBlocked = acrNow.mBlocked.size();
         findWays();
     }

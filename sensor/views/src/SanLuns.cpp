@@ -82,21 +82,8 @@ static std::map<std::string, ZTSSanLun> sCollect(const ZTSTopology& acrTopology)
 
 // ---- redundancy ----
 
-/// How many ways lead to a unit.
-struct ZTSWays {
-    std::size_t mPaths = 0;
-    std::size_t mInitiators = 0;
-    std::size_t mRemotePorts = 0;
-
-    void raise(const ZTSWays& acrOther) {
-        mPaths = std::max(mPaths, acrOther.mPaths);
-        mInitiators = std::max(mInitiators, acrOther.mInitiators);
-        mRemotePorts = std::max(mRemotePorts, acrOther.mRemotePorts);
-    }
-};
-
-static ZTSWays sCountWays(const ZTSSanLun& acrLun, ZTEPathHealth aWorst) {
-    ZTSWays lWays;
+static ZTSLunWays sCountWays(const ZTSSanLun& acrLun, ZTEPathHealth aWorst) {
+    ZTSLunWays lWays;
     std::set<std::string> lInitiators;
     std::set<std::string> lPorts;
     for (const ZTSSanPath& lrPath : acrLun.mPaths) {
@@ -111,7 +98,7 @@ static ZTSWays sCountWays(const ZTSSanLun& acrLun, ZTEPathHealth aWorst) {
     return lWays;
 }
 
-static ZTERedundancy sCompare(const ZTSWays& acrLeft, const ZTSWays& acrExpected) {
+static ZTERedundancy sCompare(const ZTSLunWays& acrLeft, const ZTSLunWays& acrExpected) {
     const auto lIsLast = [](std::size_t aLeft, std::size_t aExpected) { return aLeft == 1 && aExpected > 1; };
     if (acrLeft.mPaths == 0) {
         return ZTRD_None;
@@ -123,7 +110,7 @@ static ZTERedundancy sCompare(const ZTSWays& acrLeft, const ZTSWays& acrExpected
     return acrLeft.mPaths < acrExpected.mPaths ? ZTRD_Reduced : ZTRD_Whole;
 }
 
-static void sJudge(ZTSSanLun& arLun, const ZTSWays& acrExpected) {
+static void sJudge(ZTSSanLun& arLun, const ZTSLunWays& acrExpected) {
     arLun.mRunning = sCountWays(arLun, ZTPH_Running).mPaths;
     arLun.mExpected = acrExpected.mPaths;
     // Paths of an unknown state count as running where that keeps the judgement mild: silence proves no loss.
@@ -168,16 +155,16 @@ static void sAddGone(const ZTSTopology& acrNow, const std::map<std::string, ZTSS
     }
 }
 
-std::vector<ZTSSanLun> findLuns(const ZTSTopology& acrNow, const std::vector<ZTSTopology>& acrEarlier) {
+std::vector<ZTSSanLun> findLuns(const ZTSTopology& acrNow, const ZTSSanPast& acrPast) {
     std::map<std::string, ZTSSanLun> lLuns = sCollect(acrNow);
-    std::map<std::string, ZTSWays> lExpected;
+    std::map<std::string, ZTSLunWays> lExpected = acrPast.mMostWays;
     const auto lExpect = [&lExpected](const std::map<std::string, ZTSSanLun>& acrLuns) {
         for (const auto& [lId, lLun] : acrLuns) {
             lExpected[lId].raise(sCountWays(lLun, ZTPH_Down));
         }
     };
     lExpect(lLuns);
-    for (const ZTSTopology& lrEarlier : acrEarlier) {
+    for (const ZTSTopology& lrEarlier : acrPast.mEarlier) {
         const std::map<std::string, ZTSSanLun> lBefore = sCollect(lrEarlier);
         lExpect(lBefore);
         sAddGone(acrNow, lBefore, lLuns);

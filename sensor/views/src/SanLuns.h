@@ -19,6 +19,6 @@ bool isTarget(const ZTSTopologyRemotePort& acrPort);
 
 /// By id; each with its redundancy, measured by what it had earlier. Units that went away with their ports are among
 /// them.
-std::vector<ZTSSanLun> findLuns(const ZTSTopology& acrNow, const std::vector<ZTSTopology>& acrEarlier);
+std::vector<ZTSSanLun> findLuns(const ZTSTopology& acrNow, const ZTSSanPast& acrPast);
 
 #endif

@@ -30,8 +30,8 @@ static constexpr std::array<ZTSSanTroubleRow, ZTST_Count> scTable{{
                 "fault there stops it.",
      .mpCauses = "A link or a fabric is down; a controller of the array is down; only one of several paths was "
                  "brought back after a maintenance.",
-     .mpLookAt = "The links and remote ports that are down. Paths are compared with what was there an hour, a day and "
-                 "a week ago."},
+     .mpLookAt = "The links and remote ports that are down. Paths are compared with the most that the LUN had, as far "
+                 "back as the history reaches. Where fewer are meant from now on: tavik mark baseline."},
     {.mKind = ZTST_LinkDown,
      .mpId = "link-down",
      .mpTitle = "LINK DOWN",
@@ -58,7 +58,8 @@ static constexpr std::array<ZTSSanTroubleRow, ZTST_Count> scTable{{
      .mpCauses = "The kernel or a person set a device offline; a LUN is not mapped to all of the array's ports; a "
                  "path was deleted and not scanned anew.",
      .mpLookAt = "The state of the devices. The kernel sets one offline after errors that it could not recover from: "
-                 "its log says why. A scan of the host finds paths that were deleted."},
+                 "its log says why. A scan of the host finds paths that were deleted. Where fewer paths are meant from "
+                 "now on: tavik mark baseline."},
     {.mKind = ZTST_InitiatorWithoutPath,
      .mpId = "initiator-without-path",
      .mpTitle = "INITIATOR WITHOUT PATH",
@@ -302,7 +303,7 @@ ZTSTroubleText describeSanTrouble(const ZTSSanTrouble& acrTrouble, const ZTSSanF
             .mSeverity = getSanSeverityName(acrTrouble.mSeverity),
             .mStatus = sStatus(acrTrouble, acrFacts, acrNames, aNow),
             .mAction = {getSanAction(lrRow, sNamePort(acrTrouble, acrNames))},
-            .mSee = std::string("tavik explain ") + lrRow.mpId};
+            .mSee = "tavik explain " + (acrTrouble.mEpisode ? std::to_string(*acrTrouble.mEpisode) : lrRow.mpId)};
 }
 
 std::vector<ZTSTroubleText> describeSanTroubles(const ZTSSanFacts& acrFacts, const ZTCNameBook& acrNames,

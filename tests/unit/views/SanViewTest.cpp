@@ -36,7 +36,7 @@ TEST_F(SanView, WithoutATopologyNothingIsKnown) {
     EXPECT_EQ(lDocument["luns"], nullptr);
 }
 
-TEST_F(SanView, ALostPortIsMeasuredByTheDayBeforeAndForgottenAfterAWeek) {
+TEST_F(SanView, ALostPortIsMissedUntilAMarkSaysThatThisIsMeant) {
     ZTSTopology lLess = makeSan({});
     removePort(lLess, "rport-8:0-1");
     note(gcBase - 2 * gcDay, makeSan({}));
@@ -46,8 +46,29 @@ TEST_F(SanView, ALostPortIsMeasuredByTheDayBeforeAndForgottenAfterAWeek) {
     EXPECT_EQ(lView.mFacts.mTroubles[0].mKind, ZTST_PathLost);
     EXPECT_EQ(lView.mFacts.mTroubles[0].mSince, fromMicroseconds(gcBase - gcMinute));
     EXPECT_EQ(at(gcBase + 5 * gcDay).mFacts.getWorst(), ZTSS_Warning);
-    EXPECT_EQ(at(gcBase + 8 * gcDay).mFacts.getWorst(), ZTSS_Notice);
+    // After a week too, and after a month.
+    for (const std::int64_t lDays : {8, 30}) {
+        EXPECT_EQ(at(gcBase + lDays * gcDay).mFacts.getWorst(), ZTSS_Warning);
+        EXPECT_EQ(at(gcBase + lDays * gcDay).mFacts.countLuns(ZTRD_Reduced), 4U);
+        EXPECT_EQ(at(gcBase + lDays * gcDay).mFacts.mLuns[0].mExpected, 8U);
+    }
+    inTransaction([&] { store().setMark("before update", fromMicroseconds(gcBase + 9 * gcDay)); });
+    EXPECT_EQ(at(gcBase + 30 * gcDay).mFacts.getWorst(), ZTSS_Warning);
+    inTransaction([&] { store().setMark(gcBaselineMark, fromMicroseconds(gcBase + 10 * gcDay)); });
+    EXPECT_EQ(at(gcBase + 10 * gcDay).mFacts.getWorst(), ZTSS_Notice);
+    EXPECT_EQ(at(gcBase + 30 * gcDay).mFacts.mLuns[0].mExpected, 7U);
+    EXPECT_EQ(at(gcBase + 9 * gcDay).mFacts.getWorst(), ZTSS_Warning) << "the mark came later";
     EXPECT_THAT(at(gcBase - gcDay).mFacts.mTroubles, IsEmpty());
+}
+
+TEST_F(SanView, LunsThatWereLostInTheFirstHourOfAHistoryAreMissed) {
+    ZTSTopology lNothing = makeSan({.mHosts = 1, .mPortsOfAHost = 1});
+    note(gcBase - 10 * gcMinute, lNothing);
+    removePort(lNothing, "rport-7:0-0");
+    note(gcBase - 5 * gcMinute, lNothing);
+    EXPECT_EQ(at(gcBase).mFacts.countLuns(ZTRD_None), 4U);
+    EXPECT_EQ(at(gcBase).mFacts.getWorst(), ZTSS_Critical);
+    EXPECT_THAT(at(gcBase - 6 * gcMinute).mFacts.mTroubles, IsEmpty());
 }
 
 TEST_F(SanView, APortThatWentAndCameTwiceInAnHourFlaps) {
