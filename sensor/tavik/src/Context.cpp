@@ -44,6 +44,7 @@ ZTCNameBook ZTCContext::makeNames(const ZTCHistory* apHistory) const {
     }
     if (apHistory != nullptr) {
         lNames.setTopology(readTopologyOf(*apHistory));
+        lNames.setCounters(readCountersOf(*apHistory));
         for (const ZTSInitiator& lrInitiator : apHistory->readInitiators()) {
             lNames.addInitiator(lrInitiator);
         }
@@ -86,6 +87,7 @@ ZTSStatusFacts ZTCContext::gatherFacts(std::optional<ZTCHistoryTime> aLossesSinc
     }
     lFacts.mNames = makeNames(lpHistory.get());
     lFacts.mNames.setTopology(nullptr);  // the history ends here
+    lFacts.mNames.setCounters(nullptr);
     if (lFacts.mAnswer == ZTAN_NoSensor) {
         addLeftPage(lFacts);
     }

@@ -58,7 +58,15 @@ ZTSPortView findPortView(const ZTSPortSummary& acrPort, const ZTCNameBook& acrNa
 std::string formatDevices(const std::vector<ZTSPlaceDevice>& acrDevices);
 
 /// The counters of the same ports that rose in the minutes of the episode, each summed up: those of its initiator, and
-/// of its remote port as that initiator sees it. `mMinute` is the first minute in which it rose.
-std::vector<ZTSCounterSample> countersBeside(const ZTSEpisode& acrEpisode, const ZTCHistory& acrHistory);
+/// of its remote port as that initiator sees it. `mMinute` is the first minute in which it rose. As many as the names
+/// know counters.
+std::vector<ZTSCounterSample> countersBeside(const ZTSEpisode& acrEpisode, const ZTCNameBook& acrNames);
+
+/// The counters of a remote port that rose in the last 24 hours, each summed up over the initiators that see it.
+std::vector<ZTSCounterSample> countersOf(const ZTSRemotePort& acrPort, const ZTCNameBook& acrNames,
+                                         ZTCHistoryTime aNow);
+
+/// "invalid_crc_count +7, port's fpin_cn +2" for one line. Empty: none rose.
+std::string formatCounters(const std::vector<ZTSCounterSample>& acrCounters);
 
 #endif

@@ -20,8 +20,14 @@ using ZTCTopologyAt = std::function<const ZTSTopology*(ZTCHistoryTime aTime)>;
 /// of up to a minute before it.
 ZTCTopologyAt readTopologyOf(const ZTCHistory& acrHistory);
 
+/// How far counters rose in the minutes from one time to another. Lives until the next call.
+using ZTCCountersAt = std::function<const std::vector<ZTSCounterSample>&(ZTCHistoryTime aFrom, ZTCHistoryTime aTo)>;
+
+/// Reads them from a history, which outlives the result. Cheap where times rise.
+ZTCCountersAt readCountersOf(const ZTCHistory& acrHistory);
+
 /// Names of ports and nodes, and the ports that are known. Filled once, then only read; by any thread, or with a
-/// topology by the one that may use its history.
+/// topology or counters by the one that may use its history.
 class ZTCNameBook {
 public:
     /// The administrator's name of a port or a node.
@@ -30,9 +36,14 @@ public:
     void addRemotePort(const ZTSRemotePort& acrPort) { mRemotePorts.push_back(acrPort); }
 
     void setTopology(ZTCTopologyAt aTopology) { mTopology = std::move(aTopology); }
+    void setCounters(ZTCCountersAt aCounters) { mCounters = std::move(aCounters); }
 
     /// What hung on the ports at that time; null: not known. Lives until the next call.
     const ZTSTopology* findTopology(ZTCHistoryTime aTime) const { return mTopology ? mTopology(aTime) : nullptr; }
+
+    bool hasCounters() const { return mCounters != nullptr; }
+    /// Where there are none, an empty list.
+    const std::vector<ZTSCounterSample>& findCounters(ZTCHistoryTime aFrom, ZTCHistoryTime aTo) const;
 
     /// The name of the port, else that of its node; empty: it has none.
     std::string findName(const std::optional<ZTSFcName>& acrWwpn, const std::optional<ZTSFcName>& acrWwnn) const;
@@ -55,6 +66,7 @@ private:
     std::vector<ZTSInitiator> mInitiators;
     std::vector<ZTSRemotePort> mRemotePorts;
     ZTCTopologyAt mTopology;
+    ZTCCountersAt mCounters;
 };
 
 /// A WWN from its text; nothing where the text is no WWN.

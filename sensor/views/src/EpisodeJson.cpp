@@ -73,6 +73,20 @@ static ZTCJson sDevices(const std::vector<ZTSPlaceDevice>& acrDevices) {
     return lList;
 }
 
+/// Null where counters were not looked for.
+static ZTCJson sCounters(const std::vector<ZTSCounterSample>& acrCounters, const ZTCNameBook& acrNames) {
+    if (!acrNames.hasCounters()) {
+        return nullptr;
+    }
+    ZTCJson lList = ZTCJson::array();
+    for (const ZTSCounterSample& lrSample : acrCounters) {
+        lList.push_back({{"of", lrSample.mRemotePort ? "remotePort" : "initiator"},
+                         {"counter", lrSample.mCounter},
+                         {"difference", lrSample.mDifference}});
+    }
+    return lList;
+}
+
 static ZTCJson sLuns(const std::optional<ZTSLunSet>& acrLuns) {
     if (!acrLuns) {
         return nullptr;
@@ -176,6 +190,7 @@ ZTCJson toJson(const ZTSEpisode& acrEpisode, const ZTCNameBook& acrNames) {
             {"last", toRfc3339(acrEpisode.mLast)},
             {"luns", sLuns(acrEpisode.mDetail.mLuns)},
             {"devices", acrEpisode.mDetail.mLuns && lPlace.mRport ? sDevices(lPlace.mDevices) : ZTCJson(nullptr)},
+            {"counters", sCounters(countersBeside(acrEpisode, acrNames), acrNames)},
             {"detail", std::move(lDetail)}};
 }
 
@@ -223,5 +238,6 @@ ZTCJson toJson(const ZTSPortSummary& acrPort, const ZTCNameBook& acrNames) {
             {"rports", std::move(lRports)},
             {"count", acrPort.mOccurrences},
             {"kinds", std::move(lKinds)},
+            {"counters", sCounters(countersOf(acrPort.mPort, acrNames, getHistoryTime()), acrNames)},
             {"last", toRfc3339(acrPort.mLastEvent)}};
 }

@@ -4,8 +4,7 @@
 #include <map>
 #include <set>
 
-/// Most samples that are read for one episode.
-static constexpr std::size_t scMostSamples = 100000;
+#include "sensor/client/include/NumberText.h"
 
 static const ZTSTopologyInitiator* sFindInitiator(const ZTSTopology& acrTopology, const ZTSInitiator& acrInitiator) {
     const auto lFound = std::ranges::find(acrTopology.mInitiators, acrInitiator.mWwpn, &ZTSTopologyInitiator::mWwpn);
@@ -154,24 +153,54 @@ std::string formatDevices(const std::vector<ZTSPlaceDevice>& acrDevices) {
     return lText;
 }
 
-std::vector<ZTSCounterSample> countersBeside(const ZTSEpisode& acrEpisode, const ZTCHistory& acrHistory) {
-    std::map<std::pair<bool, std::string>, ZTSCounterSample> lSums;
-    for (const ZTSCounterSample& lrSample :
-         acrHistory.readCounters(toMicroseconds(acrEpisode.mFirst), toMicroseconds(acrEpisode.mLast), scMostSamples)) {
-        const bool lIsOfPort = lrSample.mRemotePort.has_value();
-        const bool lIsSamePort =
-            !lIsOfPort || (acrEpisode.mRemotePort && *lrSample.mRemotePort == acrEpisode.mRemotePort->mWwpn);
-        if (acrEpisode.mInitiator.mWwpn != lrSample.mInitiator || !lIsSamePort) {
-            continue;
-        }
-        const auto [lPlace, lIsNew] = lSums.try_emplace({lIsOfPort, lrSample.mCounter}, lrSample);
-        if (!lIsNew) {
-            lPlace->second.mDifference += lrSample.mDifference;
-        }
+/// Adds a sample to the sum of its counter: those of the initiator come first, then those of the remote port.
+using ZTCCounterSums = std::map<std::pair<bool, std::string>, ZTSCounterSample>;
+
+static void sAddSample(const ZTSCounterSample& acrSample, ZTCCounterSums& arSums) {
+    const auto [lPlace, lIsNew] =
+        arSums.try_emplace({acrSample.mRemotePort.has_value(), acrSample.mCounter}, acrSample);
+    if (!lIsNew) {
+        lPlace->second.mDifference += acrSample.mDifference;
     }
+}
+
+static std::vector<ZTSCounterSample> sListSums(ZTCCounterSums& arSums) {
     std::vector<ZTSCounterSample> lCounters;
-    for (auto& [lrKey, lrSample] : lSums) {
-        lCounters.push_back(std::move(lrSample));
+    for (auto& [lKey, lSample] : arSums) {
+        lCounters.push_back(std::move(lSample));
     }
     return lCounters;
+}
+
+std::vector<ZTSCounterSample> countersBeside(const ZTSEpisode& acrEpisode, const ZTCNameBook& acrNames) {
+    ZTCCounterSums lSums;
+    for (const ZTSCounterSample& lrSample : acrNames.findCounters(acrEpisode.mFirst, acrEpisode.mLast)) {
+        const bool lIsSamePort =
+            !lrSample.mRemotePort || (acrEpisode.mRemotePort && *lrSample.mRemotePort == acrEpisode.mRemotePort->mWwpn);
+        if (acrEpisode.mInitiator.mWwpn == lrSample.mInitiator && lIsSamePort) {
+            sAddSample(lrSample, lSums);
+        }
+    }
+    return sListSums(lSums);
+}
+
+std::vector<ZTSCounterSample> countersOf(const ZTSRemotePort& acrPort, const ZTCNameBook& acrNames,
+                                         ZTCHistoryTime aNow) {
+    static constexpr std::chrono::hours scSpan(24);
+    ZTCCounterSums lSums;
+    for (const ZTSCounterSample& lrSample : acrNames.findCounters(aNow - scSpan, aNow)) {
+        if (lrSample.mRemotePort == acrPort.mWwpn) {
+            sAddSample(lrSample, lSums);
+        }
+    }
+    return sListSums(lSums);
+}
+
+std::string formatCounters(const std::vector<ZTSCounterSample>& acrCounters) {
+    std::string lText;
+    for (const ZTSCounterSample& lrSample : acrCounters) {
+        lText += (lText.empty() ? "" : ", ") + std::string(lrSample.mRemotePort ? "port's " : "") + lrSample.mCounter +
+                 " +" + formatNumber(lrSample.mDifference);
+    }
+    return lText;
 }

@@ -112,8 +112,9 @@ ZTCTextTable makeEpisodeTable(std::size_t aWidth) {
             aWidth};
 }
 
-/// What an episode holds, the disks behind its LUNs, and how many ports an area or domain has.
-static std::string sDetailWithNames(const ZTSEpisode& acrEpisode, const ZTSPlace& acrPlace) {
+/// What an episode holds, the disks behind its LUNs, how many ports an area or domain has, and the ports' counters.
+static std::string sDetailWithNames(const ZTSEpisode& acrEpisode, const ZTSPlace& acrPlace,
+                                    const ZTCNameBook& acrNames) {
     std::string lText = formatDetail(acrEpisode);
     const std::string lDevices = formatDevices(acrPlace.mDevices);
     lText += lDevices.empty() ? "" : (lText.empty() ? "" : "; ") + lDevices;
@@ -121,6 +122,8 @@ static std::string sDetailWithNames(const ZTSEpisode& acrEpisode, const ZTSPlace
         lText += "; " + std::to_string(acrPlace.mAffected->size()) +
                  (acrPlace.mAffected->size() == 1 ? " known port" : " known ports");
     }
+    const std::string lCounters = formatCounters(countersBeside(acrEpisode, acrNames));
+    lText += lCounters.empty() ? "" : (lText.empty() ? "" : "; ") + lCounters;
     return lText;
 }
 
@@ -129,7 +132,7 @@ void addRow(ZTCTextTable& arTable, const ZTSEpisode& acrEpisode, const ZTCNameBo
     arTable.addRow({std::to_string(acrEpisode.mEpisode), formatShortTime(acrEpisode.mLast, aNow),
                     acrEpisode.isOpen() ? "open" : "closed", formatNumber(acrEpisode.mCount),
                     getKindName(acrEpisode.mKind), acrNames.describe(lPlace.mInitiator),
-                    describePort(lPlace.mRemotePort, acrNames), sDetailWithNames(acrEpisode, lPlace)});
+                    describePort(lPlace.mRemotePort, acrNames), sDetailWithNames(acrEpisode, lPlace, acrNames)});
 }
 
 ZTCTextTable makeRecordTable(std::size_t aWidth) {
@@ -178,6 +181,8 @@ void addRow(ZTCTextTable& arTable, const ZTSPortSummary& acrPort, const ZTCNameB
     for (const ZTSPortSummary::Count& lrCount : lCounts) {
         lKinds += (lKinds.empty() ? "" : ", ") + getKindName(lrCount.mKind) + " " + formatNumber(lrCount.mOccurrences);
     }
+    const std::string lCounters = formatCounters(countersOf(acrPort.mPort, acrNames, aNow));
+    lKinds += lCounters.empty() ? "" : (lKinds.empty() ? "" : "; ") + lCounters;
     const std::string lName = acrNames.findName(acrPort.mPort.mWwpn, acrPort.mPort.mWwnn);
     arTable.addRow({acrPort.mPort.mWwpn.toText(), lName.empty() ? "-" : lName,
                     lView.mState.empty() ? "-" : lView.mState, formatNumber(acrPort.mOccurrences),

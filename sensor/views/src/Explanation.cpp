@@ -7,6 +7,7 @@
 
 #include "sensor/views/include/DiagnosisView.h"
 #include "sensor/views/include/EpisodeJson.h"
+#include "sensor/views/include/EpisodePlace.h"
 #include "sensor/views/include/EpisodeText.h"
 #include "sensor/views/include/KindTexts.h"
 #include "sensor/views/include/SanTroubles.h"
@@ -123,6 +124,27 @@ std::optional<ZTSExplanation> explainTopic(std::string_view aText) {
     return std::nullopt;
 }
 
+/// "LUN 12: mpatha (sdc), ACME ARRAY-9, on /srv/data.", a line each.
+static void sAddDevices(const std::vector<ZTSPlaceDevice>& acrDevices, std::vector<std::string>& arFacts) {
+    static constexpr std::size_t scMostDevices = 8;
+    for (std::size_t i = 0; i < std::min(acrDevices.size(), scMostDevices); ++i) {
+        const ZTSPlaceDevice& lrDevice = acrDevices[i];
+        const std::string lDisk = lrDevice.mDisk.value_or("no disk");
+        std::string lText = "LUN " + std::to_string(lrDevice.mLun) + ": ";
+        lText += lrDevice.mMultipath ? *lrDevice.mMultipath + " (" + lDisk + ")" : lDisk;
+        lText += lrDevice.mVendor || lrDevice.mModel ? "," : "";
+        lText += (lrDevice.mVendor ? " " + *lrDevice.mVendor : "") + (lrDevice.mModel ? " " + *lrDevice.mModel : "");
+        for (std::size_t j = 0; j < lrDevice.mMounts.size(); ++j) {
+            lText += (j == 0 ? ", on " : " and ") + lrDevice.mMounts[j];
+        }
+        arFacts.push_back(lText + ".");
+    }
+    if (acrDevices.size() > scMostDevices) {
+        arFacts.push_back("And " + formatCount(acrDevices.size() - scMostDevices, "more LUN") +
+                          ": tavik --json events.");
+    }
+}
+
 static std::vector<std::string> sFactsOf(const ZTSEpisode& acrEpisode, const ZTCNameBook& acrNames,
                                          ZTCHistoryTime aNow) {
     std::vector<std::string> lFacts;
@@ -141,6 +163,11 @@ static std::vector<std::string> sFactsOf(const ZTSEpisode& acrEpisode, const ZTC
     const std::string lDetail = formatDetail(acrEpisode);
     if (!lDetail.empty()) {
         lFacts.push_back(lDetail + ".");
+    }
+    sAddDevices(findPlace(acrEpisode, acrNames).mDevices, lFacts);
+    const std::string lCounters = formatCounters(countersBeside(acrEpisode, acrNames));
+    if (!lCounters.empty()) {
+        lFacts.push_back("Counters that rose in the same minutes: " + lCounters + ".");
     }
     return lFacts;
 }

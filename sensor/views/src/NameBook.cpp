@@ -43,6 +43,43 @@ ZTCTopologyAt readTopologyOf(const ZTCHistory& acrHistory) {
     };
 }
 
+/// The counters of the stretch that was read last, and of the one that was asked for last.
+struct ZTSCounterCursor {
+    ZTCHistoryTime mFrom{};
+    ZTCHistoryTime mTo{};
+    std::vector<ZTSCounterSample> mRead;
+    std::vector<ZTSCounterSample> mAnswer;
+};
+
+ZTCCountersAt readCountersOf(const ZTCHistory& acrHistory) {
+    static constexpr std::size_t scMostSamples = 100000;
+    using std::chrono::hours;
+    using std::chrono::minutes;
+    return [&acrHistory, lpCursor = std::make_shared<ZTSCounterCursor>()](
+               ZTCHistoryTime aFrom, ZTCHistoryTime aTo) -> const std::vector<ZTSCounterSample>& {
+        ZTSCounterCursor& lrCursor = *lpCursor;
+        // Whole hours at a time: one reading serves many short episodes. Those of the last minutes are still to come.
+        if (aFrom < lrCursor.mFrom || aTo >= lrCursor.mTo) {
+            const ZTCHistoryTime lEnd = std::chrono::floor<hours>(aTo) + hours(1);
+            lrCursor.mFrom = std::chrono::floor<hours>(aFrom);
+            lrCursor.mTo = std::min(lEnd, getHistoryTime() - minutes(2));
+            lrCursor.mRead =
+                acrHistory.readCounters(toMicroseconds(lrCursor.mFrom), toMicroseconds(lEnd), scMostSamples);
+        }
+        const std::int64_t lFrom = toMicroseconds(std::chrono::floor<minutes>(aFrom));
+        const std::int64_t lTo = toMicroseconds(aTo);
+        const auto lBegin = std::ranges::lower_bound(lrCursor.mRead, lFrom, {}, &ZTSCounterSample::mMinute);
+        const auto lEnd = std::ranges::upper_bound(lrCursor.mRead, lTo, {}, &ZTSCounterSample::mMinute);
+        lrCursor.mAnswer.assign(lBegin, std::max(lBegin, lEnd));
+        return lrCursor.mAnswer;
+    };
+}
+
+const std::vector<ZTSCounterSample>& ZTCNameBook::findCounters(ZTCHistoryTime aFrom, ZTCHistoryTime aTo) const {
+    static const std::vector<ZTSCounterSample> scNone;
+    return mCounters ? mCounters(aFrom, aTo) : scNone;
+}
+
 std::string ZTCNameBook::findName(const std::optional<ZTSFcName>& acrWwpn,
                                   const std::optional<ZTSFcName>& acrWwnn) const {
     for (const std::optional<ZTSFcName>& lrWwn : {acrWwpn, acrWwnn}) {

@@ -78,6 +78,7 @@ ZTCNameBook ZTCApi::makeNames(const ZTCHistory& acrHistory) const {
     ZTCNameBook lNames;
     mSources.mAddNames(lNames);
     lNames.setTopology(readTopologyOf(acrHistory));
+    lNames.setCounters(readCountersOf(acrHistory));
     for (const ZTSInitiator& lrInitiator : acrHistory.readInitiators()) {
         lNames.addInitiator(lrInitiator);
     }

@@ -6,6 +6,7 @@
 #include "sensor/store/include/Store.h"
 #include "sensor/views/include/EpisodeJson.h"
 #include "sensor/views/include/EpisodeText.h"
+#include "sensor/views/include/Explanation.h"
 #include "tests/support/TemporaryDirectory.h"
 #include "tests/unit/views/ViewSamples.h"
 
@@ -75,6 +76,8 @@ TEST_F(EpisodePlace, TheDisksBehindTheLunsAreNamedWithWhatIsBuiltOnThem) {
     ZTCTextTable lTable = makeEpisodeTable(0);
     addRow(lTable, makeQueueFullEpisode(), mNames, timeOf("2026-11-21T10:04:12+01:00"));
     EXPECT_THAT(lTable.takeText(), HasSubstr("LUNs 0,1,40; mpatha (/srv/data), sdd"));
+    EXPECT_THAT(formatExplanation(explainEpisode(makeQueueFullEpisode(), {}, {}, mNames, {}), {}, {}),
+                HasSubstr("\n  LUN 0: mpatha (sdb), ACME Array, on /srv/data.\n  LUN 40: sdd, ACME Array.\n"));
 }
 
 TEST_F(EpisodePlace, AnEventOfLastWeekHasTheNamesOfLastWeek) {
@@ -232,7 +235,15 @@ TEST_F(PlaceFromHistory, CountersOfTheSamePortsAndMinutesStandBeside) {
             {lFirst + scMinute, lInitiator, std::nullopt, "invalid_crc_count", 4}});
     });
     const ZTCHistory lHistory(mDirectory.path());
-    EXPECT_THAT(countersBeside(lEpisode, lHistory),
+    ZTCNameBook lNames;
+    EXPECT_TRUE(countersBeside(lEpisode, lNames).empty());
+    EXPECT_TRUE(toJson(lEpisode, lNames)["counters"].is_null()) << "not looked for";
+    lNames.setCounters(readCountersOf(lHistory));
+    EXPECT_EQ(formatCounters(countersBeside(lEpisode, lNames)), "invalid_crc_count +7, port's fpin_cn +2");
+    EXPECT_EQ(toJson(lEpisode, lNames)["counters"].dump(),
+              R"([{"of":"initiator","counter":"invalid_crc_count","difference":7},)"
+              R"({"of":"remotePort","counter":"fpin_cn","difference":2}])");
+    EXPECT_THAT(countersBeside(lEpisode, lNames),
                 ElementsAre(ZTSCounterSample{lFirst, lInitiator, std::nullopt, "invalid_crc_count", 7},
                             ZTSCounterSample{lFirst, lInitiator, lPort, "fpin_cn", 2}));
 }
