@@ -6,6 +6,7 @@
 #include <filesystem>
 #include <fstream>
 #include <set>
+#include <sstream>
 
 #include "sensor/diagnosis/include/Diagnosis.h"
 #include "tests/sensor/SensorProcess.h"
@@ -39,9 +40,41 @@ static void sBuildSan(const ZTCFakeSysfs& acrTree) {
     acrTree.addRemotePort(8, 0, 0);
 }
 
+/// Names of the ports, as an administrator of that SAN would give them.
+static constexpr const char* scSettings = R"(collect.period = 0.1
+[names]
+"50:06:01:60:00:00:00:00" = "array7 A0"
+"50:06:01:60:00:00:00:01" = "array7 A1"
+"50:06:01:60:00:00:00:04" = "array7 B0"
+"50:06:01:60:00:00:00:05" = "array7 B1"
+"50:06:01:60:00:00:00:08" = "shelf3"
+)";
+
+/// The lines from a finding's heading to its last one, which names the rule. Its number, its times and the numbers of
+/// its evidence are of the moment, and are left out.
+static std::vector<std::string> sFindingOf(const std::string& acrText, const std::string& acrRule) {
+    std::vector<std::string> lLines;
+    std::istringstream lText(acrText);
+    for (std::string lLine; std::getline(lText, lLine);) {
+        if (lLine.starts_with('[')) {
+            lLines.assign(1, lLine.substr(lLine.find(']')));
+        } else if (lLine.starts_with("    when: ")) {
+            lLines.emplace_back("when");
+        } else if (lLine.starts_with("evidence: ")) {
+            lLines.emplace_back("evidence");
+        } else {
+            lLines.push_back(lLine);
+        }
+        if (lLine == "     see: tavik explain " + acrRule) {
+            return lLines;
+        }
+    }
+    return {};
+}
+
 class RuleScenario : public testing::TestWithParam<std::string> {
 protected:
-    RuleScenario() : mSensor("collect.period = 0.1\n") {
+    RuleScenario() : mSensor(scSettings) {
         sBuildSan(mTree);
         for (unsigned lLun = 0; lLun < 12; ++lLun) {
             mTree.addPath(7, 0, lLun, "naa.6006016000000000" + std::to_string(lLun));
@@ -114,6 +147,8 @@ TEST_P(RuleScenario, IsRecognizedAndItsEpisodesLeadToIt) {
     const std::string lTitle = lFinding["title"];
     EXPECT_EQ(explain({}).find(lTitle) == std::string::npos, lIsNoise) << explain({});
     EXPECT_NE(explain({"--all"}).find(lTitle), std::string::npos);
+    EXPECT_EQ(sFindingOf(readFile(TAVIK_TROUBLESHOOTING), GetParam()), sFindingOf(explain({"--all"}), GetParam()))
+        << "docs/troubleshooting.md shows what is printed";
     for (const nlohmann::json& lrEpisode : lFinding["episodes"]) {
         const auto lEpisode = nlohmann::json::parse(explain({std::to_string(lrEpisode.get<int>()), "--json"}));
         EXPECT_FALSE(find(lEpisode, GetParam()).is_null()) << lEpisode.dump(1);
