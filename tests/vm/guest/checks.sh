@@ -2,6 +2,7 @@
 # expectation to the second serial port: ok or FAIL, the check, what was looked at, what was expected, what came, with the
 # character 037 in between.
 . /vm/agent.sh
+. /vm/sensor-checks.sh
 exec 3>/dev/ttyS1
 gBad=0
 
@@ -651,7 +652,7 @@ check_lockdown() { # where the kernel is locked down there are no SCSI outcomes,
 
 fabric_up || exit 1
 gCheck=fabric
-lAll=$(sed -n 's/^check_\([a-z_]*\)().*/\1/p' /vm/checks.sh)
+lAll=$(sed -n 's/^check_\([a-z_]*\)().*/\1/p' /vm/sensor-checks.sh /vm/checks.sh)
 for gCheck in $(echo "${gOnly:-$lAll}" | tr , ' '); do
   lBegin=$(cut -d. -f1 /proc/uptime)
   if start_agent; then

@@ -71,6 +71,7 @@ backstore_memory() {
   mkdir -p $gConfig/core/$lStore
   echo rd_pages=256 >$gConfig/core/$lStore/control
   echo 1 >$gConfig/core/$lStore/enable
+  echo "memory-$1" >$gConfig/core/$lStore/wwn/vpd_unit_serial
   echo $lStore
 }
 backstore_scripted() {
