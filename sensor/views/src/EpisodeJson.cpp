@@ -73,18 +73,18 @@ static ZTCJson sDevices(const std::vector<ZTSPlaceDevice>& acrDevices) {
     return lList;
 }
 
-/// Null where counters were not looked for.
-static ZTCJson sCounters(const std::vector<ZTSCounterSample>& acrCounters, const ZTCNameBook& acrNames) {
+/// Only where counters were looked for.
+static void sAddCounters(ZTCJson& arJson, const std::vector<ZTSCounterSample>& acrCounters,
+                         const ZTCNameBook& acrNames) {
     if (!acrNames.hasCounters()) {
-        return nullptr;
+        return;
     }
-    ZTCJson lList = ZTCJson::array();
+    ZTCJson& lrList = arJson["counters"] = ZTCJson::array();
     for (const ZTSCounterSample& lrSample : acrCounters) {
-        lList.push_back({{"of", lrSample.mRemotePort ? "remotePort" : "initiator"},
-                         {"counter", lrSample.mCounter},
-                         {"difference", lrSample.mDifference}});
+        lrList.push_back({{"of", lrSample.mRemotePort ? "remotePort" : "initiator"},
+                          {"counter", lrSample.mCounter},
+                          {"difference", lrSample.mDifference}});
     }
-    return lList;
 }
 
 static ZTCJson sLuns(const std::optional<ZTSLunSet>& acrLuns) {
@@ -179,19 +179,20 @@ ZTCJson toJson(const ZTSEpisode& acrEpisode, const ZTCNameBook& acrNames) {
             lDetail["ports"].push_back(toJson(std::optional(lrPort), acrNames));
         }
     }
-    return {{"seq", acrEpisode.mSeq},
-            {"episode", acrEpisode.mEpisode},
-            {"phase", getPhaseName(acrEpisode.mPhase)},
-            {"kind", getKindName(acrEpisode.mKind)},
-            {"initiator", toJson(lPlace.mInitiator)},
-            {"remotePort", sPortOf(lPlace, acrNames)},
-            {"count", acrEpisode.mCount},
-            {"first", toRfc3339(acrEpisode.mFirst)},
-            {"last", toRfc3339(acrEpisode.mLast)},
-            {"luns", sLuns(acrEpisode.mDetail.mLuns)},
-            {"devices", acrEpisode.mDetail.mLuns && lPlace.mRport ? sDevices(lPlace.mDevices) : ZTCJson(nullptr)},
-            {"counters", sCounters(countersBeside(acrEpisode, acrNames), acrNames)},
-            {"detail", std::move(lDetail)}};
+    ZTCJson lJson{{"seq", acrEpisode.mSeq},
+                  {"episode", acrEpisode.mEpisode},
+                  {"phase", getPhaseName(acrEpisode.mPhase)},
+                  {"kind", getKindName(acrEpisode.mKind)},
+                  {"initiator", toJson(lPlace.mInitiator)},
+                  {"remotePort", sPortOf(lPlace, acrNames)},
+                  {"count", acrEpisode.mCount},
+                  {"first", toRfc3339(acrEpisode.mFirst)},
+                  {"last", toRfc3339(acrEpisode.mLast)},
+                  {"luns", sLuns(acrEpisode.mDetail.mLuns)},
+                  {"devices", acrEpisode.mDetail.mLuns && lPlace.mRport ? sDevices(lPlace.mDevices) : ZTCJson(nullptr)},
+                  {"detail", std::move(lDetail)}};
+    sAddCounters(lJson, countersBeside(acrEpisode, acrNames), acrNames);
+    return lJson;
 }
 
 /// The time that the agent's clock showed, whatever its local fields say.
@@ -232,12 +233,13 @@ ZTCJson toJson(const ZTSPortSummary& acrPort, const ZTCNameBook& acrNames) {
     for (const ZTSPortSummary::Count& lrCount : acrPort.mCounts) {
         lKinds[getKindName(lrCount.mKind)] = lrCount.mOccurrences;
     }
-    return {{"remotePort", toJson(std::optional(acrPort.mPort), acrNames)},
-            {"state", sText(lView.mState)},
-            {"initiators", std::move(lInitiators)},
-            {"rports", std::move(lRports)},
-            {"count", acrPort.mOccurrences},
-            {"kinds", std::move(lKinds)},
-            {"counters", sCounters(countersOf(acrPort.mPort, acrNames, getHistoryTime()), acrNames)},
-            {"last", toRfc3339(acrPort.mLastEvent)}};
+    ZTCJson lJson{{"remotePort", toJson(std::optional(acrPort.mPort), acrNames)},
+                  {"state", sText(lView.mState)},
+                  {"initiators", std::move(lInitiators)},
+                  {"rports", std::move(lRports)},
+                  {"count", acrPort.mOccurrences},
+                  {"kinds", std::move(lKinds)},
+                  {"last", toRfc3339(acrPort.mLastEvent)}};
+    sAddCounters(lJson, countersOf(acrPort.mPort, acrNames, getHistoryTime()), acrNames);
+    return lJson;
 }
