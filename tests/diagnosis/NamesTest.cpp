@@ -34,12 +34,12 @@ protected:
         mSensor.setScenario(scAdapters);
     }
 
-    struct ZTSTavikRun {
+    struct ZTSShownRun {
         int mExit;
         std::string mOutput;
     };
     /// `tavik` as a person runs it, on the sensor's clock.
-    ZTSTavikRun tavik(const std::vector<std::string>& acrArguments) {
+    ZTSShownRun tavik(const std::vector<std::string>& acrArguments) {
         ZTSChildProcessSetup lSetup;
         lSetup.mProgram = TAVIK_PROGRAM;
         lSetup.mArguments = {"--config", mSensor.configPath()};
@@ -54,7 +54,7 @@ protected:
     }
     nlohmann::json tavikJson(std::vector<std::string> aArguments) {
         aArguments.insert(aArguments.begin(), "--json");
-        const ZTSTavikRun lRun = tavik(aArguments);
+        const ZTSShownRun lRun = tavik(aArguments);
         return lRun.mOutput.starts_with('{') ? nlohmann::json::parse(lRun.mOutput) : nlohmann::json();
     }
     std::string scanned() { return mSensor.status()["topology"].value("scanned", nlohmann::json()).dump(); }
@@ -145,7 +145,7 @@ TEST_F(NamesOverTheChain, AnAttributeThatBlocksMakesNamesStaleInWordsAndCollecti
     start();
     mSensor.simulate("queue-full board=hba7 port=a0 lun=3 times=4");
     mSensor.waitUntilAllIsStored();
-    const ZTSTavikRun lRun = tavik({"status"});
+    const ZTSShownRun lRun = tavik({"status"});
     EXPECT_EQ(lRun.mExit, 0) << lRun.mOutput;
     EXPECT_THAT(lRun.mOutput, HasSubstr("COLLECTING"));
     EXPECT_THAT(lRun.mOutput, HasSubstr("names and states of ports and disks are stale since "));
@@ -171,10 +171,10 @@ TEST_F(NamesOverTheChain, AMarkOfATimeThatIsPastServesADiff) {
     mTree.write(mState, "Blocked");
     waitForNextScan();
     waitUntil([&] { return lState() == "\"Blocked\""; }, "the port's new state", ZTCDeadline(scScanPatience));
-    const ZTSTavikRun lMark = tavik({"mark", "before", "--at", lBefore});
+    const ZTSShownRun lMark = tavik({"mark", "before", "--at", lBefore});
     EXPECT_EQ(lMark.mExit, 0) << lMark.mOutput;
     EXPECT_THAT(lMark.mOutput, HasSubstr("mark \"before\" set at "));
-    const ZTSTavikRun lDiff = tavik({"diff", "before"});
+    const ZTSShownRun lDiff = tavik({"diff", "before"});
     EXPECT_EQ(lDiff.mExit, 1) << lDiff.mOutput;
     const nlohmann::json lChanges = tavikJson({"diff", "before"});
     EXPECT_EQ(lChanges["from"]["mark"], "before");
