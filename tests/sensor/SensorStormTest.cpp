@@ -134,14 +134,15 @@ TEST_F(SensorStormTest, AnInterleavedStormAtAPaceIsStoredWhole) {
 }
 
 TEST_F(SensorStormTest, TheSameStormIsRefusedInPartWhereTheSensorAsksEvery60SecondsAndNoBellRings) {
-    const std::string lAgent = mSensor.path("agent-without-bell");
-    writeFile(lAgent, "#!/bin/sh\nunset ZT_TVK_BELL_FD\nexec '" TAVIK_AGENT_PROGRAM "' \"$@\"\n");
-    ASSERT_EQ(chmod(lAgent.c_str(), 0700), 0);
     mSensor.configure("agent.log_level = 1\ncollect.period = 60\n");
     std::string lSettings = readFile(mSensor.configPath());
-    const std::string lProgram = TAVIK_AGENT_PROGRAM;
-    lSettings.replace(lSettings.find(lProgram), lProgram.size(), lAgent);
-    writeFile(mSensor.configPath(), lSettings);
+    const std::string lKey = "agent.program = \"";
+    const std::size_t lFirst = lSettings.find(lKey) + lKey.size();
+    const std::string lProgram = lSettings.substr(lFirst, lSettings.find('"', lFirst) - lFirst);
+    const std::string lWithoutBell = mSensor.path("agent-without-bell");
+    writeFile(lWithoutBell, "#!/bin/sh\nunset ZT_TVK_BELL_FD\nexec '" + lProgram + "' \"$@\"\n");
+    ASSERT_EQ(chmod(lWithoutBell.c_str(), 0700), 0);
+    writeFile(mSensor.configPath(), lSettings.replace(lFirst, lProgram.size(), lWithoutBell));
     mSensor.start();
     sStormAtAPace(mSensor);
     EXPECT_EQ(mSensor.stop(), 0);
