@@ -160,7 +160,7 @@ int ZTCLinuxOutcomeFeed::getDescriptor(std::size_t aBuffer) const {
 
 void ZTCLinuxOutcomeFeed::serve() {
     const ZTCSenseMatcher::Clock::time_point lNow = ZTCSenseMatcher::Clock::now();
-    // Before an outcome is given up, sense data are read that no descriptor has told of.
+    // Before an outcome goes without its sense data, their buffers are read once more.
     const bool lIsLastCall = mMatcher.getNextTime().value_or(lNow + ZTCSenseMatcher::scWait) <= lNow;
     for (Buffer& lrBuffer : mBuffers) {
         if (lrBuffer.mState == ZTBS_Ready || (lIsLastCall && lrBuffer.mIsOfProbe)) {
@@ -250,7 +250,7 @@ void ZTCLinuxOutcomeFeed::readOutcome(ZTCByteSpan aRecord, std::uint64_t aTime) 
         handle(*lOutcome);
         return;
     }
-    // What the trace itself says, where it says it, does not count while the probe is in use.
+    // Newer kernels put sense data into the trace, too. While the probe is in use, only its own count.
     lOutcome->mSenseKey = lOutcome->mAsc = lOutcome->mAscq = gcUnknownSense;
     readCommandTags(aRecord, lrLayout, *lOutcome);
     bool lWaits = false;

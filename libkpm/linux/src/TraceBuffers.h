@@ -21,7 +21,7 @@ inline constexpr std::size_t gcTraceDescriptorReserve = 64;
 
 enum ZTETraceRead : std::uint8_t { ZTTR_Page, ZTTR_Empty, ZTTR_Failed };
 
-/// What a read of a buffer that gave nothing means: what it returned, and the error number where that is negative.
+/// Why a read of a buffer gave nothing. `aRead` is its result; `aError` is the error number where that is negative.
 ZTETraceRead judgeEmptyTraceRead(std::int64_t aRead, int aError);
 
 /// The problem that an error number of tracefs is: what could not be done, why, and what would help.

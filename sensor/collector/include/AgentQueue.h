@@ -60,7 +60,7 @@ public:
     ZTSLosses getLosses(ZTCHistoryTime aNow, ZTCHistoryTime aSince = {}) { return mLosses.get(aNow, aSince); }
 
     // ---- what outlives this process ----
-    /// What another one told of last. To be called before run().
+    /// Takes over the losses that an earlier process has stored. Call it before run().
     void restoreLosses(const std::string& acrText) { mLosses.restore(acrText); }
     /// To be stored, where something was lost since the last call.
     std::optional<std::string> takeNewLosses();

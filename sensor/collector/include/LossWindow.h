@@ -25,8 +25,8 @@ public:
     /// @param aNow  nothing is known of the time before
     explicit ZTCLossWindow(ZTCHistoryTime aNow) : mBegin(aNow) {}
 
-    /// Goes on where the window stopped that toText() made the text of. To be called before the first page. Any other
-    /// text changes nothing; returns false.
+    /// Goes on where the window stopped whose toText() made this text. Call it before the first page. Returns false,
+    /// and changes nothing, for any other text.
     bool restore(const std::string& acrText);
     /// JSON of one line.
     std::string toText() const;
@@ -45,7 +45,7 @@ private:
 
         bool operator==(const ZTSCounts&) const = default;
     };
-    /// What was lost between two pages or more.
+    /// The losses between two pages, or more than two.
     struct ZTSSlot {
         ZTCHistoryTime mBegin;
         ZTCHistoryTime mEnd;

@@ -62,9 +62,11 @@ public:
     ZTCSpoolingConversation(ZTCSpool& arSpool, std::string aDirectory)
         : mrSpool(arSpool), mDirectory(std::move(aDirectory)) {}
 
-    /// Begins to read from an agent. @param acrPart  the `.part` that an earlier collector left for this agent
+    /// Begins to read from an agent.
+    /// @param arResponseFifo  taken over; it stays the caller's where this throws, for the next try
+    /// @param acrPart  the `.part` that an earlier collector left for this agent
     /// Throws ZTCSpoolTroubleEx, and is not attached then.
-    void attach(ZTCFileDescriptor aResponseFifo, std::string aGeneration,
+    void attach(ZTCFileDescriptor&& arResponseFifo, std::string aGeneration,
                 const std::optional<ZTSSpoolName>& acrPart = std::nullopt);
     bool isAttached() const { return mResponseFifo.isOpen(); }
     const std::string& getGeneration() const { return mGeneration; }

@@ -273,7 +273,7 @@ void ZTCHistoryWorker::settle(std::deque<ZTCJob>& arBatch, std::size_t aCount) {
     mBell.ring();
 }
 
-/// What other agents counted changes only when this one begins or ends.
+/// The counts of other agents change only when this one begins or ends.
 void ZTCHistoryWorker::noteGeneration() {
     const std::string lGeneration = mpWriter->getGeneration();
     {

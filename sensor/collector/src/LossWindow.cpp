@@ -8,7 +8,7 @@ using std::chrono::minutes;
 using ZTCJson = nlohmann::json;
 
 static constexpr hours scWindow{24};
-/// What lies further back than this is kept by the hour.
+/// Older losses are kept by the hour.
 static constexpr hours scFineWindow{1};
 static constexpr hours scWidestSlot{1};
 

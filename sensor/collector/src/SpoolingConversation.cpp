@@ -19,7 +19,7 @@ const char* getRequestName(ZTERequest aRequest) {
     return scNames[aRequest];
 }
 
-void ZTCSpoolingConversation::attach(ZTCFileDescriptor aResponseFifo, std::string aGeneration,
+void ZTCSpoolingConversation::attach(ZTCFileDescriptor&& arResponseFifo, std::string aGeneration,
                                      const std::optional<ZTSSpoolName>& acrPart) {
     std::optional<ZTSSpoolPart> lPart;
     if (acrPart) {
@@ -32,7 +32,7 @@ void ZTCSpoolingConversation::attach(ZTCFileDescriptor aResponseFifo, std::strin
     }
     mPart = std::move(lPart);
     mGeneration = std::move(aGeneration);
-    mResponseFifo = std::move(aResponseFifo);
+    mResponseFifo = std::move(arResponseFifo);
     mCommandFifo.reset();
 }
 

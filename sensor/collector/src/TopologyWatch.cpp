@@ -77,8 +77,8 @@ void ZTCTopologyWatch::Thread::run() {
         try {
             turn();
         } catch (const std::exception&) {
-            // No memory, or no thread for a file that blocks. What is due is tried again at its next time, and the age
-            // of the last scan tells.
+            // No memory, or no thread for a file that blocks. The next try comes at the next time. Until then the age
+            // of the last scan shows it.
             mLastMinute = getMinute();
         }
     } while (wait());
@@ -87,7 +87,7 @@ void ZTCTopologyWatch::Thread::run() {
     mChanged.notify_all();
 }
 
-/// All that is due. What throws is not due again at once.
+/// Does all that is due. A part that throws is tried again at its next time, not at once.
 void ZTCTopologyWatch::Thread::turn() {
     const ZTCTime lNow = std::chrono::steady_clock::now();
     if (lNow >= mNextPorts) {
@@ -138,7 +138,7 @@ void ZTCTopologyWatch::Thread::scanWhole() {
     }
 }
 
-/// What is new with the ports is a reason to look at everything.
+/// A change of the ports is a reason to read everything.
 void ZTCTopologyWatch::Thread::publishPorts(const ZTSTopology& acrPorts) {
     const std::lock_guard lLock(mMutex);
     if (mpPorts != nullptr && mpPorts->mInitiators == acrPorts.mInitiators &&

@@ -1,7 +1,8 @@
 /// An outlet that is given every change of an episode, in the order of the history, at least once.
 ///
 /// The history keeps a number for each outlet: the last change that it has. So an outlet that was away goes on where it
-/// stopped. What retention took before is counted in the history, and given to the outlet as a number.
+/// stopped. Changes that retention took before are counted in the history, and the outlet gets their
+/// number.
 #ifndef SENSOR_OUTLETS_INCLUDE_CHANGEOUTLET_H
 #define SENSOR_OUTLETS_INCLUDE_CHANGEOUTLET_H
 

@@ -111,6 +111,18 @@ protected:
     ZTSProgress mProgress;
 };
 
+TEST_F(SpoolingConversationTest, ABeginThatFailsLeavesTheFifoForTheNextTry) {
+    ZTCSpoolingConversation lTalk(mSpool, mDirectory.path("agent"));
+    ZTCFileDescriptor lFifo = openResponseFifo();
+    const ZTSSpoolName lMissing{.mNumber = 7, .mGeneration = "ab", .mState = ZTSPS_Part};
+    EXPECT_THROW(lTalk.attach(std::move(lFifo), "ab", lMissing), ZTCSpoolTroubleEx);
+    EXPECT_FALSE(lTalk.isAttached());
+    // NOLINTNEXTLINE(bugprone-use-after-move): that it is still there is the promise.
+    ASSERT_TRUE(lFifo.isOpen());
+    lTalk.attach(std::move(lFifo), "ab");
+    EXPECT_TRUE(lTalk.isAttached());
+}
+
 TEST_F(SpoolingConversationTest, ScopeDataBecomeAFrameAndOtherAnswersLeaveNoFile) {
     startAgent({ZTCFakeAgent::answering(scSuccess), ZTCFakeAgent::answering(sScopeData(1))});
     newCollector();
