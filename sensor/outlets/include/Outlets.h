@@ -60,7 +60,7 @@ public:
     /// The port of the web server; 0: none, or a Unix socket.
     unsigned getPort() const;
 
-    /// What does not work now, as a JSON list of open warnings, as LiveState.h describes it.
+    /// The outputs that do not work now: a JSON list of open warnings, as LiveState.h describes it.
     std::string describe() const;
 
 private:
@@ -92,7 +92,7 @@ private:
     ZTCNameBook makeNames() const;
     /// Reports a problem of one outlet when it is new, and its end.
     void report(std::string& arLast, const std::string& acrProblem, const char* apOutlet);
-    /// What is switched off or changed has no problem any more.
+    /// Forgets the problems of outputs that are switched off or changed.
     void forget(std::string& arLast, const char* apOutlet);
     std::string readLive() const;
     void giveSeries(ZTSMetricFacts& arFacts);

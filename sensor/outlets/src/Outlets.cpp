@@ -26,7 +26,7 @@ static constexpr seconds scServerPause{10};
 /// Changes in one writing: each is a part of an answer in memory.
 static constexpr std::uint64_t scMostChanges = 1000;
 
-/// What works or fails here beside the table of outlets, for people.
+/// The outputs that are not in the table of outlets, named for people.
 static constexpr const char* scServerTitle = "the web server";
 static constexpr const char* scMetricsTitle = "the metrics file";
 static constexpr const char* scHistoryTitle = "the outlets' reading of the history";

@@ -118,7 +118,7 @@ public:
     /// scan found was there before, so it is not a change.
     std::vector<ZTSTopologyChange> readTopologyChanges(std::int64_t aFrom, std::int64_t aTo) const;
     /// The most ways that led to each logical unit, by its wwid, at one time from `aFrom` to `aTo`: whatever the paths'
-    /// states were. Of very many changes only the newest are looked at.
+    /// states were. Of very many changes it reads only the newest.
     std::map<std::string, ZTSLunWays> readMostWays(std::int64_t aFrom, std::int64_t aTo) const;
     /// How far counters rose in the minutes from that of `aFrom` to that of `aTo`, by minute: the oldest `aMost`.
     std::vector<ZTSCounterSample> readCounters(std::int64_t aFrom, std::int64_t aTo, std::size_t aMost) const;

@@ -245,7 +245,7 @@ private:
     ZTSLunWays mMost;
 };
 
-/// Versions that have ended and are looked at for it, the newest ones.
+/// Most ended versions that are read for it: the newest.
 static constexpr std::uint64_t scMostEndedPaths = 20000;
 
 /// A path that begins or ends.

@@ -90,7 +90,7 @@ ZTSLastEvent findLastEvent(const ZTSStatusFacts& acrFacts);
 /// A topology that is older than this, while the sensor runs, is not as of now.
 inline constexpr std::chrono::minutes gcScanSpan{5};
 
-/// What to do where names are stale: a command.
+/// The command to run where names are stale.
 inline constexpr const char* gcStaleNamesAction = "journalctl -k -n 50";
 
 /// That the running sensor's names are not as of now, since when, why, and what to do. Empty: they are, or it did not
