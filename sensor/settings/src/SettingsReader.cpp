@@ -168,7 +168,8 @@ public:
         const toml::parse_result lResult = toml::parse(mReading.mContent);
         if (!lResult) {
             const toml::parse_error& lcrError = lResult.error();
-            addError(lcrError.source().begin.line, "syntax", std::string(lcrError.description()));
+            // The parser's words can hold a line break of the file.
+            addError(lcrError.source().begin.line, "syntax", escaped(lcrError.description()));
             return std::move(mReading);
         }
         for (const auto& [lName, lNode] : lResult.table()) {

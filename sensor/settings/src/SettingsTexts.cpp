@@ -125,10 +125,10 @@ const ZTSTextRule gcWarnPerRule{
     [](std::string_view aText) { return aText == "port" || aText == "initiator" || aText == "host"; },
     "\"port\", \"initiator\" or \"host\""};
 
-std::string quoted(std::string_view aText) {
+std::string escaped(std::string_view aText) {
     static constexpr char scDigits[] = "0123456789abcdef";
-    std::string lText = "\"";
-    for (const char lByte : aText.substr(0, scMaxQuoted)) {
+    std::string lText;
+    for (const char lByte : aText) {
         if (sIsPrintable({&lByte, 1})) {
             lText += lByte;
         } else {
@@ -137,5 +137,9 @@ std::string quoted(std::string_view aText) {
             lText += scDigits[lByte & 0x0F];
         }
     }
-    return lText + (aText.size() > scMaxQuoted ? "...\"" : "\"");
+    return lText;
+}
+
+std::string quoted(std::string_view aText) {
+    return '"' + escaped(aText.substr(0, scMaxQuoted)) + (aText.size() > scMaxQuoted ? "...\"" : "\"");
 }

@@ -28,7 +28,10 @@ extern const ZTSTextRule gcWarnPerRule;          ///< what it counts by
 /// Whether others than this host's users can connect to a good http.listen.
 bool isPublicListen(std::string_view aListen);
 
-/// The text in quotes, cut where it is long; what does not print as \xNN.
+/// The text on one line: bytes that do not print as \xNN.
+std::string escaped(std::string_view aText);
+
+/// The text in quotes, escaped, and cut where it is long.
 std::string quoted(std::string_view aText);
 
 #endif

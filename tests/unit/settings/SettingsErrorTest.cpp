@@ -4,8 +4,10 @@
 #include "sensor/settings/include/Settings.h"
 #include "sensor/settings/src/SettingsTable.h"
 
+using testing::AllOf;
 using testing::ElementsAre;
 using testing::HasSubstr;
+using testing::Not;
 using testing::StartsWith;
 
 static std::vector<std::string> sErrors(const std::string& acrText) {
@@ -145,6 +147,11 @@ TEST(SettingsErrors, ABrokenFileIsNamedWithTheLineAndTheReason) {
     EXPECT_THAT(sErrors("[agent\n"), ElementsAre(StartsWith("t.toml:1: syntax: ")));
     EXPECT_THAT(sErrors("a = 1\na = 2\n"), ElementsAre(StartsWith("t.toml:2: syntax: ")));
     EXPECT_THAT(sErrors("a = \"\xFF\"\n"), ElementsAre(StartsWith("t.toml:1: syntax: ")));
+}
+
+TEST(SettingsErrors, ALineBreakThatTheParserMetIsEscapedSoThatAnErrorStaysOneLine) {
+    EXPECT_THAT(sErrors("a = t\nb = 1\n"),
+                ElementsAre(AllOf(StartsWith("t.toml:1: syntax: "), HasSubstr("\\x0a"), Not(HasSubstr("\n")))));
 }
 
 TEST(SettingsErrors, ACharacterBeyondAsciiIsRefusedOutsideOfQuotesAndCommentsAlone) {
