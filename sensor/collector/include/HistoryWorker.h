@@ -141,7 +141,7 @@ private:
     void work(std::deque<ZTCJob>& arBatch);
     void storeBatch(std::deque<ZTCJob>& arBatch);
     void settle(std::deque<ZTCJob>& arBatch, std::size_t aCount);
-    void noteGeneration();
+    bool noteGeneration();
     void syncWaiting(std::deque<ZTCJob>& arBatch);
     void upkeep();
     void closeRun();

@@ -244,7 +244,7 @@ void ZTCHistoryWorker::storeBatch(std::deque<ZTCJob>& arBatch) {
 /// Behind the commit: removes what is stored from the spool and from the batch.
 void ZTCHistoryWorker::settle(std::deque<ZTCJob>& arBatch, std::size_t aCount) {
     const std::size_t lOpenEpisodes = mpStore->countOpenEpisodes();
-    noteGeneration();
+    bool lIsAwaited = noteGeneration();
     {
         const std::lock_guard lLock(mMutex);
         mState.mTakenFrames += mBatchFrames;
@@ -255,6 +255,7 @@ void ZTCHistoryWorker::settle(std::deque<ZTCJob>& arBatch, std::size_t aCount) {
         }
     }
     for (; aCount > 0; --aCount) {
+        lIsAwaited = lIsAwaited || !std::holds_alternative<ZTSPageJob>(arBatch.front());
         if (const auto* lpFrame = std::get_if<ZTSFrameJob>(&arBatch.front())) {
             mrSpool.remove(lpFrame->mEntry.mName);
             const std::lock_guard lLock(mMutex);
@@ -270,22 +271,25 @@ void ZTCHistoryWorker::settle(std::deque<ZTCJob>& arBatch, std::size_t aCount) {
         }
         arBatch.pop_front();
     }
-    mBell.ring();
+    if (lIsAwaited) {
+        mBell.ring();  // not for the counts of an idle agent's page, which come at every look
+    }
 }
 
-/// The counts of other agents change only when this one begins or ends.
-void ZTCHistoryWorker::noteGeneration() {
+/// The counts of other agents change only when this one begins or ends. True: they were read again.
+bool ZTCHistoryWorker::noteGeneration() {
     const std::string lGeneration = mpWriter->getGeneration();
     {
         const std::lock_guard lLock(mMutex);
         if (mState.mpOthers != nullptr && mState.mGeneration == lGeneration) {
-            return;
+            return false;
         }
     }
     auto lpOthers = std::make_shared<const std::vector<ZTSPageCounts>>(mpStore->sumCountsOfOthers(lGeneration));
     const std::lock_guard lLock(mMutex);
     mState.mGeneration = lGeneration;
     mState.mpOthers = std::move(lpOthers);
+    return true;
 }
 
 /// A power cut must not cost more than the last second: what has to wait longer is written to the disk as it is.

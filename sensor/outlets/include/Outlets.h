@@ -54,7 +54,7 @@ public:
     void openHistory();
     /// The running sensor's live state, as JSON in one line.
     void setLive(std::string aLive);
-    /// Something new is in the history.
+    /// Something new may be in the history, or somebody may have begun to read: everything that is due is fed.
     void wake();
 
     /// The port of the web server; 0: none, or a Unix socket.

@@ -74,9 +74,10 @@ void ZTCOutlets::setSettings(const ZTSSettings& acrSettings) {
 
 void ZTCOutlets::openHistory() {
     const std::lock_guard lLock(mMutex);
-    mHasWork = mHasWork || !mMayRead;
-    mMayRead = true;
-    mWake.notify_all();
+    if (!std::exchange(mMayRead, true)) {
+        mHasWork = true;
+        mWake.notify_all();
+    }
 }
 
 void ZTCOutlets::setLive(std::string aLive) {
@@ -85,9 +86,11 @@ void ZTCOutlets::setLive(std::string aLive) {
 }
 
 void ZTCOutlets::wake() {
-    const std::lock_guard lLock(mMutex);
-    mHasWork = true;
-    mWake.notify_all();
+    {
+        const std::lock_guard lLock(mMutex);
+        mHasWork = true;
+    }
+    mWake.notify_all();  // behind the lock: the thread would wake up twice
 }
 
 unsigned ZTCOutlets::getPort() const {
@@ -121,10 +124,8 @@ bool ZTCOutlets::waitForWork() {
         mWake.wait_for(lLock, scFeedPeriod, lIsDue);
     } else if (!mSettings.mMetricsTextfile.empty()) {
         mWake.wait_until(lLock, mNextMetrics, lIsDue);
-    } else if (mpServer != nullptr) {
-        mWake.wait_for(lLock, 5 * scFeedPeriod, lIsDue);  // a reader of the stream may have come
     } else {
-        mWake.wait(lLock, lIsDue);
+        mWake.wait(lLock, lIsDue);  // a reader of the stream that comes meanwhile is seen at the next wake()
     }
     mHasWork = false;
     return !mIsStopping;
