@@ -43,6 +43,11 @@ bool ZTCHttpClient::send(const std::string& acrBytes) {
     return true;
 }
 
+bool ZTCHttpClient::isHungUpOn() const {
+    pollfd lSocket{.fd = mSocket.get(), .events = POLLRDHUP, .revents = 0};
+    return poll(&lSocket, 1, 0) == 1;
+}
+
 bool ZTCHttpClient::readSome(const ZTCDeadline& acrDeadline) {
     pollfd lSocket{.fd = mSocket.get(), .events = POLLIN, .revents = 0};
     if (poll(&lSocket, 1, acrDeadline.remainingMilliseconds()) == 0) {

@@ -16,6 +16,8 @@ public:
 
     /// Sends all of it; false where the server has closed the connection.
     bool send(const std::string& acrBytes);
+    /// Whether the server has closed the connection, whatever it has sent before.
+    bool isHungUpOn() const;
     /// Everything up to the end of the connection.
     std::string readToEnd();
     /// Everything up to a text, that text included.

@@ -115,6 +115,27 @@ TEST_F(WebServer, ATargetOrAHeaderThatIsTooLongIsRefusedAndTheNextRequestIsServe
     EXPECT_THAT(ZTCHttpClient::get(lPort, "/next"), EndsWith("/next"));
 }
 
+TEST_F(WebServer, ARequestBelowTheBoundOf16KiBIsServedAndOneAboveItRefused) {
+    const unsigned lPort = start().getPort();
+    const std::string lAllowed(12000, 'a');
+    const std::string lTooLong(16384, 'a');
+    const auto lAskWithHeader = [lPort](const std::string& acrValue) {
+        return ZTCHttpClient::get(lPort, "/", "localhost\r\nX-Long: " + acrValue);
+    };
+    EXPECT_THAT(ZTCHttpClient::get(lPort, "/" + lAllowed), EndsWith("\r\n\r\n/" + lAllowed));
+    EXPECT_THAT(ZTCHttpClient::get(lPort, "/" + lTooLong), StartsWith("HTTP/1.1 414 "));
+    EXPECT_THAT(lAskWithHeader(lAllowed), StartsWith("HTTP/1.1 200 "));
+    EXPECT_THAT(lAskWithHeader(lTooLong), StartsWith("HTTP/1.1 431 "));
+}
+
+TEST_F(WebServer, ARequestWithABodyWithoutEndIsHungUpOn) {
+    const unsigned lPort = start(ZTSWebLimits{.mRequestTime = milliseconds(300)}).getPort();
+    ZTCHttpClient lEndless(lPort);
+    ASSERT_TRUE(lEndless.send("GET / HTTP/1.1\r\nHost: localhost\r\nContent-Length: 1000000000000\r\n\r\n"));
+    waitUntil([&] { return !lEndless.send(std::string(1000, 'b')); }, "the end of the connection");
+    EXPECT_THAT(ZTCHttpClient::get(lPort, "/next"), EndsWith("/next"));
+}
+
 TEST_F(WebServer, AClientThatSendsItsRequestByteByByteIsHungUpOn) {
     const unsigned lPort = start(ZTSWebLimits{.mRequestTime = milliseconds(300)}).getPort();
     ZTCHttpClient lSlow(lPort);
@@ -182,22 +203,22 @@ TEST_F(WebServer, AStreamGetsItsBeginningAndThenEveryEvent) {
     }
 }
 
-TEST_F(WebServer, AStreamMoreThanTheLimitGets503AndAPlaceThatIsFreeAgainIsGiven) {
-    ZTCWebServer& lrServer = start(ZTSWebLimits{.mStreams = 2});
-    auto lpFirst = std::make_unique<ZTCHttpClient>(lrServer.getPort());
-    ZTCHttpClient lSecond(lrServer.getPort());
-    for (ZTCHttpClient* lpClient : {lpFirst.get(), &lSecond}) {
-        ASSERT_TRUE(lpClient->send(scStreamRequest));
-        lpClient->readUntil(": begin\n\n");
+TEST_F(WebServer, TheNinthStreamGets503AndAPlaceThatIsFreeAgainIsGiven) {
+    ZTCWebServer& lrServer = start();
+    std::vector<std::unique_ptr<ZTCHttpClient>> lReaders;
+    for (int i = 0; i < 8; ++i) {
+        lReaders.push_back(std::make_unique<ZTCHttpClient>(lrServer.getPort()));
+        ASSERT_TRUE(lReaders.back()->send(scStreamRequest));
+        lReaders.back()->readUntil(": begin\n\n");
     }
     EXPECT_THAT(ZTCHttpClient::get(lrServer.getPort(), "/stream"), StartsWith("HTTP/1.1 503 "));
-    lpFirst.reset();
+    lReaders.front().reset();
     waitUntil(
         [&] {
             lrServer.publish("tick", "{}");
-            ZTCHttpClient lThird(lrServer.getPort());
-            lThird.send(scStreamRequest);
-            return lThird.readUntil("\r\n").find(" 200 ") != std::string::npos;
+            ZTCHttpClient lNinth(lrServer.getPort());
+            lNinth.send(scStreamRequest);
+            return lNinth.readUntil("\r\n").find(" 200 ") != std::string::npos;
         },
         "the place of the client that has gone");
 }
