@@ -1,6 +1,4 @@
-"""Compares the files for fleets with each other and with a real scrape. Called by scripts/check-fleet: METRICS NDJSON QUERIES COMMAND...
-
-The queries of the dashboard are written to the file QUERIES as recording rules, so that promtool can parse them.
+"""Compares the files for fleets with each other and with a real scrape. Called by scripts/check-fleet: METRICS NDJSON COMMAND...
 """
 
 import json
@@ -69,7 +67,7 @@ def check_alert(aAlert):
     for lNeeded in (f"# {lName}\n", "## What it means\n", "## How to see it\n", "## What to do\n", "## When it is silent\n"):
         if lNeeded not in lText:
             problem(f"{lRunbook}: has no line {lNeeded.strip()!r}")
-    for lCommand in set(re.findall(r"^    tavik (?:--json )?(\w+)", lText, re.M)) - set(sys.argv[4:]):
+    for lCommand in set(re.findall(r"^    tavik (?:--json )?(\w+)", lText, re.M)) - set(sys.argv[3:]):
         problem(f"{lRunbook}: tavik has no command {lCommand}")
     lTests = pathlib.Path("deploy/prometheus/tests", lName + ".yml")
     lCases = yaml.safe_load(lTests.read_text())["tests"] if lTests.exists() else []
@@ -83,18 +81,11 @@ def check_alert(aAlert):
             problem(f"{lTests}: the case {lCaseName!r} expects the opposite of its name")
 
 
-def check_dashboard(aKnown, aQueries):
+def check_dashboard(aKnown):
+    """Each name in its queries exists. check_dashboard.py looks at the rest of it."""
     lPath = pathlib.Path("deploy/grafana/tavik.json")
-    if not lPath.exists():
-        return
     lBoard = json.loads(lPath.read_text())
-    lIds = [lPanel["id"] for lPanel in lBoard["panels"]]
-    if len(lIds) != len(set(lIds)):
-        problem(f"{lPath}: two panels have one id")
     lQueries = [(lPanel["title"], lTarget["expr"]) for lPanel in lBoard["panels"] for lTarget in lPanel.get("targets", [])]
-    lRules = [{"record": "query", "expr": lQuery.replace("$__rate_interval", "5m")} for _, lQuery in lQueries]
-    lGroups = [{"name": str(lIndex), "rules": [lRule]} for lIndex, lRule in enumerate(lRules)]
-    pathlib.Path(aQueries).write_text(yaml.safe_dump({"groups": lGroups}))
     lQueries += [(lVariable["name"], lVariable["query"]) for lVariable in lBoard["templating"]["list"] if lVariable["type"] == "query"]
     for lTitle, lExpression in lQueries:
         lNames = names_in(lExpression)
@@ -104,6 +95,22 @@ def check_dashboard(aKnown, aQueries):
             problem(f"{lPath}: {lTitle}: no metric and no rule has the name {lName}")
     if not lQueries:
         problem(f"{lPath}: no query")
+
+
+def check_collector():
+    """The OpenTelemetry snippet: each part that its pipelines name is there, and each part is used."""
+    lPath = pathlib.Path("deploy/opentelemetry/tavik.yaml")
+    lSnippet = yaml.safe_load(lPath.read_text())
+    lUsed = {"extensions": set(lSnippet["service"]["extensions"]), "receivers": set(), "exporters": set()}
+    for lPipeline in lSnippet["service"]["pipelines"].values():
+        for lPart in ("receivers", "exporters"):
+            lUsed[lPart] |= set(lPipeline[lPart])
+    for lPart, lNames in lUsed.items():
+        if lNames != set(lSnippet[lPart]):
+            problem(f"{lPath}: {lPart}: defined are {sorted(lSnippet[lPart])}, used are {sorted(lNames)}")
+    for lName, lReceiver in lSnippet["receivers"].items():
+        if lReceiver["storage"] not in lSnippet["extensions"]:
+            problem(f"{lPath}: {lName}: no extension {lReceiver['storage']}")
 
 
 def check_metrics_page(aSource, aScrape):
@@ -141,10 +148,9 @@ def main():
     for lName in lSource - lScrape.keys():
         problem(f"the sensor does not serve {lName}, which is in Metrics.cpp")
     lRecorded = check_rules(lSource)
-    check_dashboard(lSource | lRecorded, sys.argv[3])
+    check_dashboard(lSource | lRecorded)
     check_metrics_page(lSource, lScrape)
-    for lPath in pathlib.Path("deploy/opentelemetry").glob("*.yaml"):
-        yaml.safe_load(lPath.read_text())
+    check_collector()
     check_lines(sys.argv[2])
     for lText in gProblems:
         print(f"check-fleet: {lText}", file=sys.stderr)

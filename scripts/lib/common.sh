@@ -18,7 +18,7 @@ gPagePackages=(chromium chromium-driver python3 python3-selenium)
 gPackagePackages=(dpkg-dev debhelper lintian fakeroot lowdown git systemd)
 gVmPackages=(make qemu-system-x86 busybox-static kmod cpio xz-utils iproute2 jq sg3-utils)
 gTreePackages=(debootstrap systemd-container dpkg-dev e2fsprogs git)
-gFleetPackages=(prometheus prometheus-alertmanager prometheus-node-exporter rsyslog curl python3 python3-yaml)
+gFleetPackages=(prometheus prometheus-alertmanager prometheus-node-exporter rsyslog curl python3 python3-yaml python3-jsonschema)
 gJournalPackages=(systemd util-linux)
 
 # Presets and checks compile the same sources again and again: a compiler's cache that is there is used. Paths are taken

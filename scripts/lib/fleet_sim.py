@@ -1,8 +1,8 @@
 """Serves the metrics of many simulated hosts from one process, lets a real Prometheus scrape them, and measures that.
 
 Each host is a state machine of its own, from the seed and its number: its array ports are quiet or busy, and its links now and then
-change. Hosts share the ports of arrays. Every metric that a sensor serves is there, with realistic label sets. Called by
-scripts/fleet-sim.
+change. Hosts share the ports of arrays. Every metric that makes many series is there, with realistic label sets; a real sensor has
+some twenty series more: the rest of tavik_state, tavik_luns and tavik_open_warnings. Called by scripts/fleet-sim.
 """
 import http.server
 import json
