@@ -39,7 +39,7 @@ public:
     void addTo(std::vector<pollfd>& arFds) const;
     /// Accepts, reads, answers, writes and disconnects whatever is due. To be called after each poll().
     void serve(ZTCTime aNow);
-    /// When serve() is to be called at the latest; empty: no client is there.
+    /// When serve() is to be called at the latest; empty: no client is there, and none is kept waiting.
     std::optional<ZTCTime> getNextDeadline() const;
     /// A request that is put off takes so long at most, instead of gcControlPatience. To be called by the handler.
     void allow(std::uint64_t aTicket, std::chrono::milliseconds aTime);
@@ -59,6 +59,7 @@ private:
     ZTCFileDescriptor mSocket;
     const Handler mHandler;
     std::list<ZTSClient> mClients;
+    std::optional<ZTCTime> mAcceptAgain;  ///< accepting has failed: not before this time again
     std::uint64_t mNextTicket = 1;
     std::uint64_t mAllowedTicket = 0;  ///< of the last allow()
     std::chrono::milliseconds mAllowedTime{};

@@ -142,7 +142,7 @@ private:
     void storeBatch(std::deque<ZTCJob>& arBatch);
     void settle(std::deque<ZTCJob>& arBatch, std::size_t aCount);
     bool noteGeneration();
-    void syncWaiting(std::deque<ZTCJob>& arBatch);
+    void syncWaiting(std::deque<ZTCJob>& arBatch, std::chrono::milliseconds aAge);
     void upkeep();
     void closeRun();
 

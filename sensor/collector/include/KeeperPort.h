@@ -19,7 +19,7 @@ public:
     /// To be polled for these events.
     int getDescriptor() const { return mLink.getDescriptor(); }
     short getEvents() const;
-    /// The keeper has ended.
+    /// The keeper has ended, or nothing can be received from it any more.
     bool isGone() const { return mIsGone; }
 
     /// Hands every message that has come to the function. Returns a line for the log for each that is no message.

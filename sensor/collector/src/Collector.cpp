@@ -163,7 +163,11 @@ void ZTCCollector::poll(ZTCTime aNow) {
     mFds[ZTPD_Outputs].fd = mOutputs.getBell();
     mFds[ZTPD_Topology].fd = mTopology.getBell().getDescriptor();
     mControl.addTo(mFds);
-    if (::poll(mFds.data(), static_cast<nfds_t>(mFds.size()), getPollTime(aNow)) <= 0) {
+    const int lCount = ::poll(mFds.data(), static_cast<nfds_t>(mFds.size()), getPollTime(aNow));
+    if (lCount < 0 && errno != EINTR) {
+        throw ZTCSystemCallEx("cannot wait", errno);  // the keeper starts the next one, later and later
+    }
+    if (lCount <= 0) {
         return;
     }
     // The bell of the outputs is cleared with what it rings for, at every turn.

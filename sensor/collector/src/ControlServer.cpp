@@ -7,6 +7,9 @@
 #include <array>
 #include <cerrno>
 
+/// Until the next try to accept a client, where one waits and there is no descriptor or no memory for it.
+static constexpr std::chrono::seconds scAcceptPause{1};
+
 struct ZTCControlServer::ZTSClient {
     ZTCFileDescriptor mSocket;
     ZTCTime mDeadline;
@@ -21,7 +24,7 @@ ZTCControlServer::ZTCControlServer(ZTCFileDescriptor aSocket, Handler aHandler)
 ZTCControlServer::~ZTCControlServer() = default;
 
 void ZTCControlServer::addTo(std::vector<pollfd>& arFds) const {
-    if (mSocket.isOpen() && mClients.size() < gcMaxControlClients) {
+    if (mSocket.isOpen() && !mAcceptAgain && mClients.size() < gcMaxControlClients) {
         arFds.push_back({.fd = mSocket.get(), .events = POLLIN, .revents = 0});
     }
     for (const ZTSClient& lrClient : mClients) {
@@ -32,15 +35,25 @@ void ZTCControlServer::addTo(std::vector<pollfd>& arFds) const {
 }
 
 std::optional<ZTCControlServer::ZTCTime> ZTCControlServer::getNextDeadline() const {
-    const auto lpFirst = std::ranges::min_element(mClients, {}, &ZTSClient::mDeadline);
-    return lpFirst == mClients.end() ? std::nullopt : std::optional(lpFirst->mDeadline);
+    std::optional<ZTCTime> lNext = mAcceptAgain;
+    for (const ZTSClient& lrClient : mClients) {
+        lNext = std::min(lNext.value_or(lrClient.mDeadline), lrClient.mDeadline);
+    }
+    return lNext;
 }
 
 void ZTCControlServer::accept(ZTCTime aNow) {
+    if (mAcceptAgain && aNow < *mAcceptAgain) {
+        return;
+    }
+    mAcceptAgain.reset();
     while (mSocket.isOpen() && mClients.size() < gcMaxControlClients) {
         ZTCFileDescriptor lSocket(accept4(mSocket.get(), nullptr, nullptr, SOCK_NONBLOCK | SOCK_CLOEXEC));
         if (!lSocket.isOpen()) {
-            return;  // none waits, or there is no descriptor left: the next one is tried after the next poll()
+            if (errno != EAGAIN && errno != EINTR && errno != ECONNABORTED) {
+                mAcceptAgain = aNow + scAcceptPause;  // one waits: polling would return at once
+            }
+            return;
         }
         ZTSClient& lrClient = mClients.emplace_back();
         lrClient.mSocket = std::move(lSocket);

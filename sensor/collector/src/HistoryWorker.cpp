@@ -11,8 +11,9 @@ using std::chrono::steady_clock;
 
 /// A transaction is committed at the latest so long after it began.
 static constexpr milliseconds scLongestTransaction{500};
-/// A frame that waits longer than this is synced itself.
-static constexpr seconds scLongestUnsynced{1};
+/// A frame that is older than this when a transaction is over is synced itself. A younger one is committed or synced at
+/// the end of the next transaction. So nothing is unsynced for much more than a second.
+static constexpr milliseconds scLongestUnsynced{500};
 static constexpr seconds scRetryPause{1};
 static constexpr seconds scUpkeepPeriod{60};
 static constexpr seconds scCheckpointPeriod{1};
@@ -219,7 +220,7 @@ void ZTCHistoryWorker::work(std::deque<ZTCJob>& arBatch) {
     } catch (const ZTCSpoolTroubleEx& lrEx) {
         setProblem(lrEx.what());
     }
-    syncWaiting(arBatch);
+    syncWaiting(arBatch, milliseconds(0));
     pause(scRetryPause);
 }
 
@@ -238,7 +239,7 @@ void ZTCHistoryWorker::storeBatch(std::deque<ZTCJob>& arBatch) {
     }
     lTransaction.commit();
     settle(arBatch, lCount);
-    syncWaiting(arBatch);
+    syncWaiting(arBatch, scLongestUnsynced);
 }
 
 /// Behind the commit: removes what is stored from the spool and from the batch.
@@ -292,12 +293,13 @@ bool ZTCHistoryWorker::noteGeneration() {
     return true;
 }
 
-/// A power cut must not cost more than the last second: what has to wait longer is written to the disk as it is.
-void ZTCHistoryWorker::syncWaiting(std::deque<ZTCJob>& arBatch) {
+/// A power cut must not cost more than the last second: frames that have waited for at least this time, and are not
+/// committed, are written to the disk as they are.
+void ZTCHistoryWorker::syncWaiting(std::deque<ZTCJob>& arBatch, milliseconds aAge) {
     const auto lNow = steady_clock::now();
     for (ZTCJob& lrJob : arBatch) {
         auto* lpFrame = std::get_if<ZTSFrameJob>(&lrJob);
-        if (lpFrame == nullptr || lpFrame->mIsSynced || lNow - lpFrame->mSince < scLongestUnsynced) {
+        if (lpFrame == nullptr || lpFrame->mIsSynced || lNow - lpFrame->mSince < aAge) {
             continue;
         }
         try {

@@ -21,6 +21,10 @@ std::vector<std::string> ZTCKeeperPort::receive(const std::function<void(ZTSLink
                 return lLines;
             }
             acrHandle(std::move(lMessage));
+        } catch (const ZTCSystemCallEx& lrEx) {
+            // The next try could fail for ever. A new collector gets a new link, and is told everything anew.
+            lLines.emplace_back(lrEx.what());
+            mIsGone = true;
         } catch (const ZTCClientEx& lrEx) {
             lLines.push_back(std::string("a message of the keeper is passed over: ") + lrEx.what());
         }

@@ -18,6 +18,7 @@
 #include "tests/support/TemporaryDirectory.h"
 #include "tests/support/Waiting.h"
 #include "tests/unit/client/FakeAgent.h"
+#include "tests/unit/collector/NotingHistory.h"
 
 using std::chrono::milliseconds;
 using std::chrono::seconds;
@@ -28,18 +29,6 @@ using testing::IsEmpty;
 static const ZTCWireBytes scSuccess{0, 0, 0, 0, 0};
 static const ZTCWireBytes scScopeData{2, 0, 0, 0, 0};
 static constexpr int scKilled = SIGKILL;  // as waitpid() gives it
-
-/// Notes what it is handed.
-class ZTCNotingHistory : public ZTCHistorySink {
-public:
-    void takeIn(const ZTSSpoolEntry& acrEntry, ZTCPagePointer) override { mFiles.push_back(acrEntry.mName.toText()); }
-    void notePage(ZTCPagePointer apPage) override { mPages.push_back(apPage); }
-    void endAgent(ZTSEndedAgent aAgent) override { mEnded.push_back(aAgent); }
-
-    std::vector<std::string> mFiles;
-    std::vector<ZTCPagePointer> mPages;
-    std::vector<ZTSEndedAgent> mEnded;
-};
 
 class AgentSessionTest : public testing::Test {
 protected:

@@ -8,6 +8,7 @@
 #include <array>
 #include <cstring>
 
+#include "tests/support/ResourceLimit.h"
 #include "tests/support/TemporaryDirectory.h"
 #include "tests/support/Waiting.h"
 
@@ -131,6 +132,25 @@ TEST_F(ControlServerTest, MoreClientsThanItServesWaitAndAreServedThen) {
     serve();
     serve();
     EXPECT_EQ(take(lClient), "<one>\n");
+}
+
+TEST_F(ControlServerTest, WithoutADescriptorForAClientItIsNotPolledForOneUntilTheNextTry) {
+    const ZTCFileDescriptor lClient = connectClient();
+    put(lClient, "one\n");
+    {
+        const ZTCResourceLimit lNoMore(RLIMIT_NOFILE, 0);
+        serve();
+    }
+    std::vector<pollfd> lFds;
+    mServer->addTo(lFds);
+    EXPECT_TRUE(lFds.empty()) << "poll() would return at once, again and again";
+    ASSERT_TRUE(mServer->getNextDeadline());
+    EXPECT_EQ(take(lClient), "");
+    mAhead = seconds(2);
+    serve();
+    EXPECT_EQ(take(lClient), "<one>\n");
+    mServer->addTo(lFds);
+    EXPECT_EQ(lFds.size(), 2U);
 }
 
 TEST_F(ControlServerTest, AClientThatHasGoneLeavesNothing) {

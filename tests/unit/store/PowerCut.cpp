@@ -3,6 +3,7 @@
 #include <sqlite3.h>
 
 #include <algorithm>
+#include <atomic>
 #include <cstdio>
 #include <cstring>
 #include <map>
@@ -29,9 +30,9 @@ struct ZTSFileState {
 
 struct ZTSDisk {
     std::map<std::string, ZTSFileState> mFiles;
-    std::uint64_t mOperations = 0;
-    std::uint64_t mFailFrom = 0;
-    bool mHasFailed = false;
+    std::atomic<std::uint64_t> mOperations = 0;
+    std::atomic<std::uint64_t> mFailFrom = 0;
+    std::atomic<bool> mHasFailed = false;
 };
 
 ZTSDisk* gpDisk = nullptr;

@@ -2,7 +2,8 @@
 ///
 /// From a chosen operation on, every write, truncation and sync fails, as on a machine that has lost its power. cut()
 /// then takes the files back to what was synced, together with any part of what was written since: whole writes, and
-/// the first sectors of a write.
+/// the first sectors of a write. One thread opens, writes and closes databases; the functions below but cut() are for
+/// any.
 #ifndef TESTS_UNIT_STORE_POWERCUT_H
 #define TESTS_UNIT_STORE_POWERCUT_H
 
