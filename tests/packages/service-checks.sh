@@ -18,11 +18,12 @@ said_lately() { journalctl -b -u tavik --since -1min | grep -q -F -- "$1"; }
 
 has_journal_entry() { journalctl -b --no-pager "$1" | grep -q .; }
 
-# sandbox_lines: KEY=VALUE of each line of the unit's sandbox that systemd shows as it stands in the file.
-sandbox_lines() {
-  sed -n '/^NoNewPrivileges=/,/^\[Install\]/p' /usr/lib/systemd/system/tavik.service /lib/systemd/system/tavik.service 2>/dev/null |
-    grep '^[A-Z]' | grep -v '^SystemCall\|^Restrict[AN][da]\|^IPAddress' | sort -u
-}
+# all_sandbox_lines: KEY=VALUE of each line of the unit's sandbox. sandbox_lines: those that systemd shows as they stand there.
+all_sandbox_lines() { sed -n '/^AmbientCapabilities=/,/^\[Install\]/{/^[A-Z]/p}' /lib/systemd/system/tavik.service; }
+sandbox_lines() { all_sandbox_lines | sed '1,/^CapabilityBoundingSet=/d' | grep -v '^SystemCall\|^Restrict[AN][da]\|^IPAddress'; }
+
+# packed_unit WHEN KEY: the value in the unit of the packages of /packages/WHEN.
+packed_unit() { dpkg-deb --fsys-tarfile "/packages/$1"/tavik_*.deb | tar -xO ./lib/systemd/system/tavik.service | sed -n "s/^$2=//p"; }
 
 keeper_pid() { systemctl show -p MainPID --value tavik; }
 agent_pid() { cat /run/tavik/agent/qrv-tvk.pid; }

@@ -1,16 +1,18 @@
 #!/bin/sh
-# Runs where systemd has booted the tree: the service is installed, started without an adapter and over the simulated library,
-# reloaded, hung, killed, upgraded and removed. Its sandbox is in force all the time. /packages holds before/ and now/.
+# Runs where systemd has booted the tree: the service is installed and started without an adapter; the version before runs over
+# the simulated library and is upgraded; the new one is reloaded, hung, killed and removed. Its sandbox is in force all the time.
+# /packages holds before/ and now/.
 set -u
 . /tests/checks.sh
 . /tests/service-checks.sh
+. /tests/sandbox.sh
 export DEBIAN_FRONTEND=noninteractive LC_ALL=C.UTF-8 SYSTEMD_PAGER=cat
 trap 'journalctl -b >/out/journal; cp /var/log/tavik/* /out/ 2>/dev/null' EXIT
 export KPM_SIM_SOCKET=/run/tavik/sim.sock
 lLibrary=$(echo /usr/lib/*-linux-gnu)/tavik/libkpm-sim.so
 
 step "Installing, on a host without adapters"
-expect_true "dpkg --install" dpkg --install /packages/before/tavik_*.deb /packages/before/tavik-sim_*.deb
+expect_true "dpkg --install" dpkg --install /packages/now/tavik_*.deb
 expect "enabled" enabled "$(systemctl is-enabled tavik)"
 expect "started by the installation" active "$(systemctl is-active tavik)"
 expect_true "says that there are no adapters" wait_until 90 has_state no-adapters
@@ -20,17 +22,35 @@ expect "restarts, result" "NRestarts=0 Result=success" "$(properties NRestarts R
 expect "failed units" "" "$(systemctl list-units --failed --plain --no-legend tavik.service)"
 expect "systemd-analyze verify" "" "$(systemd-analyze verify --man=no tavik.service 2>&1)"
 expect "what systemd does not know or ignores" "" "$(journalctl -b _PID=1 | grep 'tavik.service:[0-9]')"
+expect_true "purge" dpkg --purge tavik
 
-step "Over the simulated library"
+step "The version before, over the simulated library"
+expect_true "dpkg --install" dpkg --install /packages/before/tavik_*.deb /packages/before/tavik-sim_*.deb
 drop_in simulation "Environment=KPM_SIM_SCENARIO=/opt/scenario.kpm KPM_SIM_SOCKET=$KPM_SIM_SOCKET"
 install -m 644 /tests/scenario.kpm /opt/
 configure "s|^#library = .*|library = \"$lLibrary\"|; s|^#log_level = .*|log_level = 63|"
 expect_true "restart" systemctl restart tavik
-expect "the type of the start" "Type=notify NotifyAccess=main" "$(properties Type NotifyAccess)"
 expect_true "collects" wait_until 90 is_collecting
 kpm-sim wait --timeout 90 >/dev/null
 expect_occurrences "QUEUE FULL" queue-full 1000
 expect_occurrences "check conditions" check-condition 8
+expect "the unit of the version before" "Description=$(packed_unit before Description)" "$(properties Description)"
+
+step "Upgrading a service that runs"
+lPids=$(pids)
+lStore=$(store_id)
+expect_true "dpkg --install" dpkg --force-confdef --force-confold --install /packages/now/tavik_*.deb /packages/now/tavik-sim_*.deb
+expect_true "collects again" wait_until 90 is_collecting
+expect "processes of before that still run" "" "$(echo "$lPids" | while read -r lPid; do pids | grep -x "$lPid"; done)"
+expect "the unit of the new version" "Description=$(packed_unit now Description) NeedDaemonReload=no" "$(properties Description NeedDaemonReload)"
+expect "the time of the watchdog, as the sensor got it" "$(packed_unit now WatchdogSec)" \
+  "$(tr '\0' '\n' <"/proc/$(keeper_pid)/environ" | sed -n 's/^WATCHDOG_USEC=\(.*\)000000$/\1s/p')"
+expect "files that are not those of the new version" "/etc/tavik/tavik.toml" "$(dpkg --verify tavik | cut -c 13-)"
+kpm-sim wait --timeout 90 >/dev/null
+expect_occurrences "the history goes on" queue-full 2000
+expect_occurrences "check conditions" check-condition 16
+expect "the history's id" "$lStore" "$(store_id)"
+expect "the type of the start" "Type=notify NotifyAccess=main" "$(properties Type NotifyAccess)"
 expect "the HTTP interface answers" "HTTP/1.1 200 OK" "$(http_status 127.0.0.1 9632 /healthz)"
 expect_rights
 
@@ -43,6 +63,9 @@ grep -v '^ok' /tmp/sandbox
 expect_true "more than fifteen lines" test "$(grep -c '^ok' /tmp/sandbox)" -gt 15
 expect "the seccomp filter, the address families" "" "$(properties SystemCallFilter RestrictAddressFamilies | grep -wo 'mount\|reboot\|AF_PACKET')"
 
+step "Every line of the sandbox does something"
+expect_sandbox /tests/sandbox.sh
+
 step "All outlets work within it"
 cp -p /etc/tavik/tavik.toml /opt/tavik.toml
 sed -i '/^\[ndjson\]/,/^\[/s|^#path = .*|path = "/var/lib/tavik/events.ndjson"|
@@ -51,7 +74,7 @@ printf '[[warn]]\nkind = "queue-full"\ncount = 1\nwithin = "5m"\nrun = ["/usr/bi
 expect_true "restart" systemctl restart tavik
 expect_true "collects" wait_until 90 is_collecting
 kpm-sim wait --timeout 90 >/dev/null
-expect_occurrences "QUEUE FULL, once more" queue-full 2000
+expect_occurrences "QUEUE FULL, once more" queue-full 3000
 expect_true "lines of JSON" wait_until 90 grep -q '"kind":"queue-full"' /var/lib/tavik/events.ndjson
 expect_true "the journal" wait_until 90 has_journal_entry TAVIK_KIND=queue-full
 expect_true "a warning's program, run by an event" wait_until 90 grep -q '"queue-full"' /var/lib/tavik/warned
@@ -63,7 +86,7 @@ cp -p /opt/tavik.toml /etc/tavik/tavik.toml
 expect_true "restart" systemctl restart tavik
 expect_true "collects" wait_until 90 is_collecting
 kpm-sim wait --timeout 90 >/dev/null
-expect_occurrences "QUEUE FULL, once more" queue-full 3000
+expect_occurrences "QUEUE FULL, once more" queue-full 4000
 
 step "Reloading the configuration"
 lPids=$(pids)
@@ -88,7 +111,7 @@ kill -KILL "$lAgent"
 expect_true "another agent" wait_until 90 is_other_agent "$lAgent"
 expect_true "collects again" wait_until 90 is_collecting
 kpm-sim wait --timeout 90 >/dev/null
-expect_occurrences "the scenario, once more" queue-full 4000
+expect_occurrences "the scenario, once more" queue-full 5000
 expect_rights
 expect "restarts by systemd" "NRestarts=0" "$(properties NRestarts)"
 # The sensor feeds it with each look of the collector, every five seconds.
@@ -96,14 +119,14 @@ drop_in watchdog "WatchdogSec=20s"
 expect_true "restart" systemctl restart tavik
 expect_true "collects" wait_until 90 is_collecting
 kpm-sim wait --timeout 90 >/dev/null
-expect_occurrences "the scenario, once more" queue-full 5000
+expect_occurrences "the scenario, once more" queue-full 6000
 sleep 22 # longer than the watchdog: a sensor that is well feeds it in time
 expect "restarts of a sensor that is well" "NRestarts=0" "$(properties NRestarts)"
 kill -STOP "$(keeper_pid)"
 expect_true "a sensor that hangs is replaced" wait_until 90 has_restarted
 expect_true "collects again" wait_until 90 is_collecting
 kpm-sim wait --timeout 90 >/dev/null
-expect_occurrences "the scenario, once more" queue-full 6000
+expect_occurrences "the scenario, once more" queue-full 7000
 rm /etc/systemd/system/tavik.service.d/watchdog.conf
 
 step "A textfile, and an address for everybody"
@@ -125,19 +148,6 @@ configure 's|^textfile = .*|#textfile = ""|; s|^listen = .*|#listen = "127.0.0.1
 systemctl daemon-reload
 systemctl restart tavik
 expect_true "collects" wait_until 90 is_collecting
-
-step "Upgrading a service that runs"
-# Each start brings 1,000: they are delivered, and then stored.
-has_stored_all() { [ $(($(occurrences queue-full) % 1000)) -eq 0 ]; }
-kpm-sim wait --timeout 90 >/dev/null
-wait_until 90 has_stored_all
-lBefore=$(occurrences queue-full)
-lPids=$(pids)
-expect_true "dpkg --install" dpkg --force-confdef --force-confold --install /packages/now/tavik_*.deb /packages/now/tavik-sim_*.deb
-expect_true "collects again" wait_until 90 is_collecting
-expect "restarted" 0 "$(echo "$lPids" | grep -cx "$(keeper_pid)")"
-kpm-sim wait --timeout 90 >/dev/null
-expect_occurrences "the history goes on" queue-full $((lBefore + 1000))
 
 step "A configuration that cannot be used"
 configure 's|^#gap = .*|gap = "never"|'

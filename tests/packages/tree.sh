@@ -1,6 +1,7 @@
 #!/bin/sh
-# Runs in a fresh Debian tree in which no systemd runs: the packages are installed, configured, run over the simulated library,
-# upgraded from an earlier version with a history of the first schema, removed and purged. /packages holds before/ and now/.
+# Runs in a fresh Debian tree in which no systemd runs: the packages are installed and purged; the version before is installed,
+# configured, run over the simulated library with a history of the first schema, and upgraded; the new one is run, removed and
+# purged. /packages holds before/ and now/; what is not the same in both is taken from the packages themselves.
 set -u
 . /tests/checks.sh
 export DEBIAN_FRONTEND=noninteractive LC_ALL=C.UTF-8
@@ -8,9 +9,19 @@ export DEBIAN_FRONTEND=noninteractive LC_ALL=C.UTF-8
 export KPM_SIM_SCENARIO=/tests/scenario.kpm KPM_SIM_SOCKET=/run/tavik/sim.sock
 lLibrary=$(echo /usr/lib/*-linux-gnu)/tavik/libkpm-sim.so
 
+lVersionBefore=$(dpkg-deb --field /packages/before/tavik_*.deb Version)
+lVersionNow=$(dpkg-deb --field /packages/now/tavik_*.deb Version)
+# packed WHEN FILE: the file as the packages of /packages/WHEN have it. names_of WHEN: all files of the package tavik.
+packed() { dpkg-deb --fsys-tarfile "/packages/$1"/tavik_*.deb | tar -xO "./$2"; }
+names_of() { dpkg-deb --contents "/packages/$1"/tavik_*.deb | awk '{ print $6 }' | sed 's/^\.//' | grep -v '/$' | sort; }
+versions() { dpkg-query -W -f '${Version}\n' tavik tavik-sim libkpm-dev | sort -u; }
+schema() { sqlite3 -readonly /var/lib/tavik/history.db 'pragma user_version'; }
+
+# make_folders: as the package says, or by hand where an early version does not.
+make_folders() { systemd-tmpfiles --create tavik.conf 2>/dev/null || install -d -o tavik -g tavik /run/tavik /var/lib/tavik /var/log/tavik; }
 # start_sensor: as its user, with the one capability that it passes on, as the service does.
 start_sensor() {
-  systemd-tmpfiles --create tavik.conf
+  make_folders
   setpriv --reuid=tavik --regid=tavik --init-groups --inh-caps=-all,+net_admin --ambient-caps=-all,+net_admin \
     --bounding-set=-all,+net_admin --no-new-privs tavik-sensor >>/out/sensor.log 2>&1 &
   gSensor=$!
@@ -29,8 +40,8 @@ list_files >/out/files-before
 getent passwd >/out/users-before
 getent group >/out/groups-before
 
-step "Installing the version before"
-expect_true "dpkg --install" dpkg --install /packages/before/tavik_*.deb /packages/before/tavik-sim_*.deb /packages/before/libkpm-dev_*.deb
+step "Installing"
+expect_true "dpkg --install" dpkg --install /packages/now/tavik_*.deb /packages/now/tavik-sim_*.deb /packages/now/libkpm-dev_*.deb
 expect "the user" "/var/lib/tavik /usr/sbin/nologin" "$(getent passwd tavik | cut -d: -f6,7 | tr : ' ')"
 expect "what systemd-sysusers would still do" "" "$(systemd-sysusers --dry-run tavik.conf 2>&1)"
 expect_true "systemd-tmpfiles --create" systemd-tmpfiles --create tavik.conf
@@ -41,10 +52,17 @@ expect "the configuration as installed" "" "$(tavik-sensor --check 2>&1)"
 expect "a line of the configuration that sets something" "" "$(grep -v '^#' /etc/tavik/tavik.toml | grep =)"
 tavik status >/dev/null 2>&1
 expect "tavik status without a sensor" 3 $?
+expect_true "dpkg --purge" dpkg --purge tavik tavik-sim libkpm-dev
+
+step "Installing the version before, $lVersionBefore"
+expect_true "it is lower than $lVersionNow" dpkg --compare-versions "$lVersionBefore" lt "$lVersionNow"
+names_of before >/tmp/names-before
+expect_true "dpkg --install" dpkg --install /packages/before/tavik_*.deb /packages/before/tavik-sim_*.deb /packages/before/libkpm-dev_*.deb
 
 step "Configuring"
 sed -i "s|^#library = .*|library = \"$lLibrary\"|; s|^#days = .*|days = 3650|; s|^#log_level = .*|log_level = 63|" /etc/tavik/tavik.toml
 expect "tavik-sensor --check" "" "$(tavik-sensor --check 2>&1)"
+make_folders
 sqlite3 /var/lib/tavik/history.db </tests/history-1.sql
 chown tavik:tavik /var/lib/tavik/history.db
 chmod 640 /var/lib/tavik/history.db
@@ -55,6 +73,36 @@ kpm-sim wait --timeout 90 >/dev/null
 expect_occurrences "QUEUE FULL: 1,000 of the history, 1,000 new ones" queue-full 2000
 expect_occurrences "check conditions: 8 and 8" check-condition 16
 lStore=$(store_id)
+stop_sensor
+
+step "Upgrading to $lVersionNow: what changes in the configuration is shown, and what we have changed is kept"
+lSchema=$(schema)
+# The answers: show the differences, then keep ours.
+printf 'D\nN\n' | PAGER=cat dpkg --install /packages/now/tavik_*.deb /packages/now/tavik-sim_*.deb /packages/now/libkpm-dev_*.deb >/out/upgrade 2>&1
+expect "dpkg --install" 0 $?
+expect "the versions" "$lVersionNow" "$(versions)"
+expect "what dpkg asks about" "Configuration file '/etc/tavik/tavik.toml'" "$(grep '^Configuration file' /out/upgrade | sort -u)"
+packed before etc/tavik/tavik.toml >/tmp/toml-before
+packed now etc/tavik/tavik.toml >/tmp/toml-now
+grep -vxFf /tmp/toml-now /tmp/toml-before | sort -u >/tmp/toml-gone
+expect_true "something in it has changed" test -s /tmp/toml-gone
+expect "what the new version has no longer, and is not shown" "" \
+  "$(while read -r lLine; do grep -qxF -- "-$lLine" /out/upgrade || echo "$lLine"; done </tmp/toml-gone)"
+expect_true "it shows what we have changed" grep -qx -- '-days = 3650' /out/upgrade
+expect "our changes of the configuration" 3 "$(grep -c '^library = \|^days = \|^log_level = ' /etc/tavik/tavik.toml)"
+expect_true "the new configuration, beside it" cmp /tmp/toml-now /etc/tavik/tavik.toml.dpkg-dist
+expect "files that are not those of the new version" "/etc/tavik/tavik.toml" "$(dpkg --verify tavik | cut -c 13-)"
+names_of now >/tmp/names-now
+expect "files that went with the version before, and are still there" "" \
+  "$(comm -23 /tmp/names-before /tmp/names-now | while read -r lFile; do ls -d "$lFile" 2>/dev/null; done)"
+start_sensor
+kpm-sim wait --timeout 90 >/dev/null
+expect_occurrences "QUEUE FULL: 2,000 of the history, 1,000 new ones" queue-full 3000
+expect "the history's id" "$lStore" "$(store_id)"
+expect_true "the schema was $lSchema, is $(schema)" test "$lSchema" -gt 0 -a "$(schema)" -ge "$lSchema"
+expect "what is lost, dropped and refused; gaps" "0 0 0 0" \
+  "$(tavik --json status | jq -r '"\(.losses.inGaps) \(.losses.dropped) \([.losses.refused[]] | add) \(.gaps | length)"')"
+expect_true "the database is whole" test "$(sqlite3 -readonly /var/lib/tavik/history.db 'pragma integrity_check')" = ok
 
 step "Rotating the agent's log"
 lPids=$(pgrep -u tavik)
@@ -65,25 +113,6 @@ expect "the agent's own file" "what the agent rotated by itself" "$(cat /var/log
 expect "rotated logs" "/var/log/tavik/qrv-tvk.log-$(date +%Y%m%d)" "$(ls /var/log/tavik/qrv-tvk.log-*)"
 expect "the processes" "$lPids" "$(pgrep -u tavik)"
 expect "messages about settings that were read again" "" "$(grep 'read again' /out/sensor.log)"
-stop_sensor
-
-step "Upgrading: what changes in the configuration is shown, and what we have changed is kept"
-# The answers: show the differences, then keep ours.
-printf 'D\nN\n' | PAGER=cat dpkg --install /packages/now/tavik_*.deb /packages/now/tavik-sim_*.deb /packages/now/libkpm-dev_*.deb >/out/upgrade 2>&1
-expect "dpkg --install" 0 $?
-expect_true "dpkg asks" grep -q "Configuration file '/etc/tavik/tavik.toml'" /out/upgrade
-expect_true "it shows what the new version has no longer" grep -qx -- '-# As the version before had it.' /out/upgrade
-expect_true "it shows what we have changed" grep -qx -- '-days = 3650' /out/upgrade
-expect "our changes of the configuration" 3 "$(grep -c '^library = \|^days = \|^log_level = ' /etc/tavik/tavik.toml)"
-expect "the new configuration, beside it" "#library = \"\"" "$(grep '^#library' /etc/tavik/tavik.toml.dpkg-dist)"
-expect "the history" 2000 "$(occurrences queue-full)"
-start_sensor
-kpm-sim wait --timeout 90 >/dev/null
-expect_occurrences "QUEUE FULL: 2,000 of the history, 1,000 new ones" queue-full 3000
-expect "the history's id" "$lStore" "$(store_id)"
-expect "what is lost, dropped and refused; gaps" "0 0 0 0" \
-  "$(tavik --json status | jq -r '"\(.losses.inGaps) \(.losses.dropped) \([.losses.refused[]] | add) \(.gaps | length)"')"
-expect_true "the database is whole" test "$(sqlite3 -readonly /var/lib/tavik/history.db 'pragma integrity_check')" = ok
 stop_sensor
 
 step "Removing"

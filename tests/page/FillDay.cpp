@@ -141,6 +141,7 @@ private:
         ZTCPatientReader lReader;
         ZTSTopologyRoots lRoots;
         lRoots.mSysfs = apSysfs;
+        lRoots.mProcfs = lRoots.mSysfs + "/proc";
         ZTSTopology lTopology = scanTopology(lRoots, lReader);
         const auto lNote = [&](std::int64_t aTime) { inTransaction([&] { mrStore.noteTopology(aTime, lTopology); }); };
         lNote(at(8, 0));

@@ -84,6 +84,9 @@ class Browser:
     def wait_text(self, name, part):
         return self.wait(f"\"{part}\" in {name}", lambda: part in self.text(name))
 
+    def wait_loaded(self):
+        self.wait("the chart's data", lambda: self.find("chart").get_attribute("aria-busy") == "false")
+
     def address(self):
         return self.run("return decodeURIComponent(location.hash)")
 

@@ -2,7 +2,8 @@
 // what it promises and gives back what is wrong, or nothing.
 
 const { arrayOf, makeModel, findBlind, whyBlind } = await import("/model.js");
-const { layOut, drawLanes, xOf, leastCellWidth } = await import("/lanes.js");
+const { layOut, drawLanes, xOf, gutter, columnPixels, leastCellWidth } = await import("/lanes.js");
+const { drawCounters } = await import("/counters.js");
 const { makeGrid } = await import("/grid.js");
 const { families, kinds, kindOf, worstOf } = await import("/kinds.js");
 const { strengthOf, familyColor, mix, readColors } = await import("/palette.js");
@@ -11,7 +12,7 @@ const minute = 60000;
 const start = Date.parse("2026-03-04T00:00:00Z");
 const at = (minutes) => new Date(start + minutes * minute).toISOString();
 const columns = 60;
-const width = 1000;
+const usualWidth = 1000;
 
 const port = (number, name) => ({ wwpn: `50:00:00:00:00:00:00:${number}`, wwnn: null, fcId: null, name });
 const initiator = { wwpn: "10:00:00:00:00:00:00:01", wwnn: null, host: "host7" };
@@ -23,7 +24,7 @@ function makeDocument(more = {}) {
 }
 const row = (kind, owner, cells) => ({ kind, initiator, remotePort: owner, cells });
 
-function show(document, more = {}) {
+function show(document, { width = usualWidth, ...more } = {}) {
   const options = { filter: { families: null, text: "" }, before: null, unfolded: new Set(), now: start + 60 * minute, ...more };
   const model = makeModel(document, options);
   const layout = layOut(model, width);
@@ -73,6 +74,20 @@ const checks = {
     const blank = blankest(shown, shown.columnAt(31));
     return blank > 3 && blank <= 10 ? same(shown.model.blind.map(({ why }) => why), ["deaf for rscn, link (no rights)"]) : `${blank} lines are blank`;
   },
+  async "the hatching goes on through the counters"() {
+    const counters = [{ counter: "invalid_crc_count", initiator, remotePort: null, cells: [[5, 3]] }];
+    drawCounters(show(makeDocument({ runs: [{ from: at(-60), to: at(20) }, { from: at(40), to: at(60) }], counters })).model, usualWidth);
+    await new Promise((done) => { setTimeout(done); });
+    const canvas = document.querySelector("#counters canvas");
+    const colorsAt = (minutes) => {
+      const x = gutter(usualWidth) + (minutes / 60) * (usualWidth - gutter(usualWidth));
+      const { data } = canvas.getContext("2d").getImageData(x * (canvas.width / usualWidth), 8, 12, canvas.height - 20);
+      return new Set(new Uint32Array(data.buffer)).size;
+    };
+    const [dark, light] = [colorsAt(31), colorsAt(11)];
+    drawCounters(show(makeDocument()).model, usualWidth);
+    return dark > 2 && light <= 2 ? "" : `${dark} colors in the outage, ${light} beside it`;
+  },
   "the right edge of a run that goes on is not taken for an outage"() {
     return same(findBlind(makeDocument({ runs: [{ from: at(-60), to: at(59) }] }), start, start + 60 * minute, start + 60 * minute), []);
   },
@@ -109,6 +124,20 @@ const checks = {
     const colored = across(shown, place.y + 9, shown.columnAt(1500) - 4, 12).filter((color) => color !== readColors().ground).length;
     return colored >= 3 && leastCellWidth === 3 ? "" : `${colored} pixels`;
   },
+  "one event among millions shows at 30 days, at every width"() {
+    const days = 30 * 1440 * minute;
+    return [360, 1280, 2560].filter((width) => {
+      const grid = makeGrid(start, start + days, width - gutter(width), columnPixels);
+      const middle = Math.floor(grid.columns / 2);
+      const document = { ...makeDocument({ runs: [], rows: [row("logo", ports[0], [[middle, 1, 0]]), row("queue-full", ports[1], [[1, 5000000, 0]])] }),
+        from: new Date(grid.from).toISOString(), to: new Date(grid.to).toISOString(), columns: grid.columns };
+      const shown = show(document, { width, now: grid.from });
+      const place = shown.rowOf(ports[0].wwpn);
+      const wanted = mix(familyColor(kindOf("logo").family), readColors().ground, strengthOf(1, shown.model.most));
+      const x = xOf(shown.layout, shown.model, grid.from + middle * grid.width);
+      return across(shown, place.y + 3, Math.floor(x) - 2, 16).filter((color) => color === wanted).length < 3;
+    }).map((width) => `not on ${width} pixels`).join(", ");
+  },
   "columns have room for a cell at every range and width"() {
     const narrow = [5, 15, 60, 1440, 10080, 43200].flatMap((minutes) => [250, 800, 2400].filter((pixels) => {
       const grid = makeGrid(start, start + minutes * minute, pixels, 10);
@@ -135,6 +164,14 @@ const checks = {
     return picture("queue-full", "queue-depth") !== alone ? "queue-depth shows over queue-full"
       : picture("queue-full", "lun-reset") !== picture("lun-reset") ? "lun-reset does not show over queue-full"
         : picture("device-busy") === alone ? "queue-full and device-busy look the same" : "";
+  },
+  "each family looks different from the others, on a screen and on paper"() {
+    const pictures = families.map((family) => {
+      const shown = show(makeDocument({ rows: [row(kinds.find((kind) => kind.family === family).name, ports[0], [[30, 100, 0]])] }));
+      const place = shown.rowOf(ports[0].wwpn);
+      return Array.from({ length: 6 }, (_, line) => across(shown, place.y + place.height - 9 + line, shown.columnAt(30) + 2, 8)).join();
+    });
+    return same(new Set(pictures).size, families.length);
   },
   "there are five families, and each of the twenty kinds has one and a letter of its own"() {
     return same([families.length, kinds.length, new Set(kinds.map(({ letter }) => letter)).size, new Set(kinds.map(({ family }) => family)).size], [5, 20, 20, 5]);
@@ -189,10 +226,8 @@ const checks = {
   },
 };
 
-return Object.entries(checks).map(([name, check]) => {
-  try {
-    return [name, check()];
-  } catch (problem) {
-    return [name, String(problem)];
-  }
-});
+const results = [];
+for (const [name, check] of Object.entries(checks)) {
+  results.push([name, await Promise.resolve().then(check).catch(String)]);
+}
+return results;

@@ -2,6 +2,7 @@
 from selenium.webdriver.common.keys import Keys
 
 from browser import require
+from check_cells import check_cells, check_command
 from palette import LEAST, closest
 
 TIMELINE = "#timeline;range=15m"
@@ -28,15 +29,11 @@ def check_now(browser):
     browser.wait_text("live", "Live")
     browser.wait_text("open-troubles", "queue is full")
     browser.wait("the disks of an open trouble", lambda: "sda" in browser.text("open-troubles"))
-    for what, name in (("port", "array7 ctrl-A port 0"), ("LUNs", "LUNs 0-3"), ("multipath device", "mpatha")):
+    for what, name in (("port", "array7 ctrl-A port 0"), ("LUNs", "LUNs 0-3"), ("multipath device", "mpatha"), ("mount", "/srv/orders")):
         require(f"an open trouble does not name its {what}", name in browser.text("open-troubles"))
     require("an open trouble does not say what to look at", "What to look at next" in browser.text("open-troubles"))
     worst = browser.run("return [...document.querySelectorAll('#open-troubles .trouble')].map((e) => e.className.includes('level-3'))")
     require("the worst trouble does not stand first", worst == sorted(worst, reverse=True))
-
-
-def wait_loaded(browser):
-    browser.wait("the chart's data", lambda: browser.find("chart").get_attribute("aria-busy") == "false")
 
 
 def open_timeline(browser, address=TIMELINE):
@@ -64,7 +61,7 @@ def check_presets(browser):
     for minutes, name in ((15, "15m"), (60, "1h"), (360, "6h"), (1440, "24h"), (10080, "7d"), (43200, "30d")):
         browser.run(f"document.querySelector('[data-minutes=\"{minutes}\"]').click()")
         browser.wait(f"the range {name} in the address", lambda: f";range={name}" in browser.address() + ";")
-        wait_loaded(browser)
+        browser.wait_loaded()
         pressed = browser.run("return [...document.querySelectorAll('#ranges [aria-pressed=true]')].map((e) => e.textContent)")
         require(f"the button of {name} is not the one that is pressed: {pressed}", pressed == [name])
         require(f"{name} is not live", browser.text("pause") == "Live")
@@ -75,7 +72,7 @@ def check_presets(browser):
 def check_fold(browser):
     """Ports without an event that is shown are one row of their array, which Enter opens."""
     open_timeline(browser, "#timeline;range=6h;families=load")
-    wait_loaded(browser)
+    browser.wait_loaded()
     tall = browser.find("chart").size["height"]
     for _ in range(30):
         browser.keys("chart", Keys.ARROW_DOWN)
@@ -132,7 +129,7 @@ def check_pointer(browser):
     browser.wait("its summary", lambda: ":" in browser.text("cell-text"))
     browser.drag("chart", (0, 0), (wide // 4, 0))
     browser.wait("the range of the drag", lambda: "fixed" in browser.text("range-text"))
-    wait_loaded(browser)
+    browser.wait_loaded()
     browser.drag("chart", (0, 0), (wide // 4, 0), Keys.SHIFT)
     browser.wait("the second range", lambda: browser.find("compare").is_displayed())
     require("the address does not hold the second range", ";compare=" in browser.address())
@@ -149,18 +146,28 @@ def check_pointer(browser):
     return address[address.index("#"):]
 
 
+def open_highest(browser, wwpn):
+    open_timeline(browser, "#timeline;range=6h")
+    browser.wait_loaded()
+    browser.click("chart", browser.driver.execute_async_script(HIGHEST_CELL, 360, wwpn))
+
+
 def check_panel(browser):
     """A click on a cell opens all that is known of it."""
-    open_timeline(browser, "#timeline;range=6h")
-    wait_loaded(browser)
-    browser.click("chart", browser.driver.execute_async_script(HIGHEST_CELL, 360, "30:00:00:00:00:02:00:00"))
+    open_highest(browser, "30:00:00:00:00:02:00:00")
     browser.wait_text("panel-sentence", "array7 ctrl-A port 0 said that its queue is full")
     browser.wait_text("panel-explanation", "What speaks against it")
     browser.wait_text("panel-explanation", "Evidence")
     facts = browser.text("panel-facts")
-    for name, part in (("LUNs", "0-3"), ("disks", "sda"), ("multipath devices", "mpatha")):
+    for name, part in (("LUNs", "0-3"), ("disks", "sda"), ("multipath devices", "mpatha"), ("mounts", "/srv/orders")):
         require(f"the panel does not name the {name}: {facts}", part in facts)
-    require("the panel names no command", "tavik events --since" in browser.text("panel-command"))
+    check_command(browser)
+    open_highest(browser, "30:00:00:00:00:04:00:00")
+    browser.wait_text("panel-sentence", "array9 port 0")
+    browser.wait_text("panel-facts", "sense key 0x06, ASC 0x29")
+    browser.wait_text("panel-facts", "/srv/archive")
+    browser.wait_text("panel-explanation", "What to look at next")
+    check_command(browser)
 
 
 def check_filter(browser):
@@ -197,7 +204,7 @@ def check_pictures(browser):
     """The two of the README."""
     browser.resize(1280, 860)
     open_timeline(browser, "#timeline;range=690m")
-    wait_loaded(browser)
+    browser.wait_loaded()
     for counter in ("CRC errors", "Loss of sync"):
         browser.wait_text("counters", counter)
     require("a counter's chart is blank", browser.run(
@@ -280,6 +287,7 @@ def check_demo(browser, inject):
     check_live(browser, inject)
     check_pictures(browser)
     check_compare(browser, address)
+    check_cells(browser)
     browser.open("#paths")
     browser.wait_text("paths-text", "LUNs of 6 with trouble")
     check_palette(browser)

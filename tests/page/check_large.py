@@ -1,6 +1,7 @@
 """Every view with a large history: answers in time, charts with something in them, accessible in light and dark, at all
 widths, and on paper. Keeps a picture of each."""
 from browser import require
+from check_cells import check_table
 
 MOST_MILLISECONDS = 1000
 VIEWS = {
@@ -95,6 +96,7 @@ def check_large(browser, checker, episodes):
     browser.open("#now")
     check_times(browser, episodes)
     check_hatching(browser)
+    check_table(browser)
     check_views(browser, checker)
     check_widths(browser)
     check_paper(browser)

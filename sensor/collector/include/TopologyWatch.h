@@ -22,6 +22,8 @@
 
 /// Environment variable with another root than "/sys", for tests.
 inline constexpr const char* gcSysfsVariable = "TAVIK_SYSFS_ROOT";
+/// Environment variable with another folder than "/proc/self" for `mountinfo`, for tests.
+inline constexpr const char* gcProcfsVariable = "TAVIK_PROCFS_ROOT";
 
 /// Takes what the watch finds, on the watch's thread; no function waits. Outlives the watch.
 class ZTCTopologySink {

@@ -16,10 +16,14 @@ static constexpr std::chrono::microseconds scMinute = std::chrono::minutes(1);
 
 ZTSTopologyWatchSetup makeTopologyWatchSetup() {
     ZTSTopologyWatchSetup lSetup;
-    const char* const lpRoot = std::getenv(gcSysfsVariable);
-    if (lpRoot != nullptr && *lpRoot != '\0') {
-        lSetup.mRoots.mSysfs = lpRoot;
-    }
+    const auto lTake = [](const char* apVariable, std::string& arRoot) {
+        const char* const lpRoot = std::getenv(apVariable);
+        if (lpRoot != nullptr && *lpRoot != '\0') {
+            arRoot = lpRoot;
+        }
+    };
+    lTake(gcSysfsVariable, lSetup.mRoots.mSysfs);
+    lTake(gcProcfsVariable, lSetup.mRoots.mProcfs);
     return lSetup;
 }
 

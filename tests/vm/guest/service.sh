@@ -8,6 +8,7 @@ stty -F /dev/ttyS1 raw -echo
 . /vm/fabric.sh
 . /vm/packages/checks.sh
 . /vm/packages/service-checks.sh
+. /vm/packages/sandbox.sh
 gTracing=/sys/kernel/tracing
 
 finish() {
@@ -33,6 +34,9 @@ expect "the step for tracefs" "711 root / tavik" "$(stat -c '%a %U' $gTracing) /
 expect "trace instances of the agent" 1 "$(ls $gTracing/instances | grep -c .)"
 expect "kinds without rights" "" "$(tavik --json status | jq -r '.kinds[]? | .. | objects | select(.state? == "no_rights") | .kind')"
 expect_rights
+
+step "Every line of the sandbox does something"
+expect_sandbox /vm/packages/sandbox.sh
 
 step "Events of the fabric, the ports and the LUNs"
 answered 2 0c 28 >/dev/null 2>&1
