@@ -79,14 +79,14 @@ const checks = {
     drawCounters(show(makeDocument({ runs: [{ from: at(-60), to: at(20) }, { from: at(40), to: at(60) }], counters })).model, usualWidth);
     await new Promise((done) => { setTimeout(done); });
     const canvas = document.querySelector("#counters canvas");
-    const colorsAt = (minutes) => {
+    const linesAt = (minutes) => {
       const x = gutter(usualWidth) + (minutes / 60) * (usualWidth - gutter(usualWidth));
-      const { data } = canvas.getContext("2d").getImageData(x * (canvas.width / usualWidth), 8, 12, canvas.height - 20);
-      return new Set(new Uint32Array(data.buffer)).size;
+      const { data } = canvas.getContext("2d").getImageData(x * (canvas.width / usualWidth), 12, 12, canvas.height - 24);
+      return new Set(Array.from({ length: canvas.height - 24 }, (_, line) => data.slice(line * 48, (line + 1) * 48).join())).size;
     };
-    const [dark, light] = [colorsAt(31), colorsAt(11)];
+    const [dark, light] = [linesAt(31), linesAt(11)];
     drawCounters(show(makeDocument()).model, usualWidth);
-    return dark > 2 && light <= 2 ? "" : `${dark} colors in the outage, ${light} beside it`;
+    return dark > 3 && light === 1 ? "" : `${dark} different lines in the outage, ${light} beside it`;
   },
   "the right edge of a run that goes on is not taken for an outage"() {
     return same(findBlind(makeDocument({ runs: [{ from: at(-60), to: at(59) }] }), start, start + 60 * minute, start + 60 * minute), []);
