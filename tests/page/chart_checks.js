@@ -208,6 +208,20 @@ const checks = {
     const other = lines.filter((color) => color === readColors().ground).length;
     return other === 0 ? "" : `${other} lines of ${lines.length} are blank`;
   },
+  "the name of a mark ends before the next mark"() {
+    const marksAt = (...minutes) => {
+      const shown = show(makeDocument({ marks: minutes.map((minute, index) => ({ name: `${index} before-the-new-firmware-of-array7`, time: at(minute) })) }));
+      const { ground, line } = readColors();
+      const colors = (from, to) => Array.from({ length: 12 }, (_, step) => across(shown, shown.layout.marks.y + 2 + step, from, to - from)).flat();
+      return { shown, hasInk: (from, to) => colors(from, to).some((color) => color !== ground && color !== line) };
+    };
+    const one = marksAt(30.5);
+    const x = Math.round(one.shown.columnAt(30.5));
+    const wide = Array.from({ length: 400 }, (_, step) => x + 12 + step).filter((place) => one.hasInk(place, place + 1)).length;
+    const two = marksAt(30.5, 34.5);
+    const next = Math.round(two.shown.columnAt(34.5));
+    return wide > 60 && !two.hasInk(next - 3, next - 1) ? "" : `a name alone has ${wide} columns of ink, and runs into the next mark`;
+  },
   "what is later than now is not called quiet"() {
     const shown = show(makeDocument(), { now: start + 30 * minute });
     const y = shown.layout.coverage.y + 1;

@@ -27,6 +27,12 @@ def check_now(browser):
     browser.wait_text("headline", "COLLECTING")
     browser.wait_text("ports", "queue-full")
     browser.wait_text("live", "Live")
+    host = browser.text("host")
+    browser.open("#events")
+    browser.wait("the host's name above another view", lambda: host != "" and browser.text("host") == host)
+    browser.open("#now")
+    browser.wait_text("ports", "queue-full")
+    browser.wait_text("open-troubles", "queue is full")
     browser.wait_text("open-troubles", "queue is full")
     browser.wait("the disks of an open trouble", lambda: "sda" in browser.text("open-troubles"))
     for what, name in (("port", "array7 ctrl-A port 0"), ("LUNs", "LUNs 0-3"), ("multipath device", "mpatha"), ("mount", "/srv/orders")):

@@ -86,7 +86,11 @@ def check_paper(browser):
     browser.media(media="print")
     browser.wait("patterns in place of colors", lambda: browser.most_saturated("chart") <= 8)
     require("the chart is blank on paper", browser.colors("chart") > 5)
-    require("the range's buttons are on paper", not browser.find("ranges").is_displayed())
+    for name in ("ranges", "pause", "cell-text"):
+        require(f"{name} is on paper", not browser.find(name).is_displayed())
+    for name, what in (("legend", "load"), ("letters", "queue-full")):
+        require(f"what the {name} say is not on paper", browser.find(name).is_displayed() and what in browser.text(name))
+    require("the host's name is not on paper", browser.text("host") != "")
     browser.picture("timeline-paper")
     browser.media()
     browser.wait("colors again", lambda: browser.most_saturated("chart") > 60)

@@ -28,6 +28,9 @@ function showView() {
   }
   const shows = { timeline: timeline.open, events: events.open, paths: paths.open, compare: compare.open, now: now.show };
   shows[view](parameters);
+  if (view !== "now") {
+    now.showHost();
+  }
 }
 
 let gathered = 0;
@@ -38,6 +41,8 @@ function showChanges() {
   const [view] = readAddress();
   if (view === "now") {
     now.show();
+  } else {
+    now.showHost();
   }
   timeline.noteChanges(gathered);
   gathered = 0;

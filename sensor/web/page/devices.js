@@ -47,9 +47,11 @@ export async function devicesOf(episodes) {
   return found;
 }
 
+const byName = (one, other) => one.localeCompare(other, "en", { numeric: true });
+
 /** [["Disks", [...]], ...]: those that there are, each list cut to so many. */
 export function listDevices(found, most) {
   const names = [["Multipath devices", found.multipaths], ["Disks", found.disks], ["Mounts", found.mounts]];
   return names.filter(([, values]) => values.size > 0)
-    .map(([name, values]) => [name, `${[...values].slice(0, most).join(", ")}${values.size > most ? ` and ${values.size - most} more` : ""}`]);
+    .map(([name, values]) => [name, `${[...values].sort(byName).slice(0, most).join(", ")}${values.size > most ? ` and ${values.size - most} more` : ""}`]);
 }

@@ -132,8 +132,10 @@ function drawCoverage(context, model, layout, colors) {
 function drawMarks(context, model, layout, colors) {
   context.font = font(11);
   let free = layout.gutter;
-  for (const mark of model.marks.filter(({ at }) => at >= model.from && at <= model.to)) {
-    const x = Math.round(xOf(layout, model, mark.at)) + 0.5;
+  const marks = model.marks.filter(({ at }) => at >= model.from && at <= model.to).sort((one, other) => one.at - other.at);
+  const places = marks.map(({ at }) => Math.round(xOf(layout, model, at)) + 0.5);
+  for (const [index, mark] of marks.entries()) {
+    const x = places[index];
     context.strokeStyle = colors.accent;
     context.fillStyle = colors.accent;
     context.beginPath();
@@ -145,11 +147,15 @@ function drawMarks(context, model, layout, colors) {
     context.lineTo(x + 7, layout.marks.y + 7);
     context.lineTo(x, layout.marks.y + 11);
     context.fill();
+    // Up to the next mark, cut where that is near; the last one may stand on the other side of its line.
     const wide = context.measureText(mark.name).width;
-    const at = x + 10 + wide < layout.width ? x + 10 : x - 4 - wide;
-    if (at >= free) {
-      context.fillText(mark.name, at, layout.marks.y + 8);
-      free = at + wide + 8;
+    const room = (places[index + 1] ?? layout.width) - 4 - (x + 10);
+    if (wide <= room || (room > 40 && index + 1 < marks.length)) {
+      context.fillText(cut(context, mark.name, room), x + 10, layout.marks.y + 8);
+      free = x + 10 + Math.min(wide, room) + 8;
+    } else if (x - 4 - wide >= Math.max(free, (places[index - 1] ?? 0) + 10)) {
+      context.fillText(mark.name, x - 4 - wide, layout.marks.y + 8);
+      free = x + 8;
     }
   }
 }

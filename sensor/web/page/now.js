@@ -182,6 +182,20 @@ async function showPorts() {
 
 // ---- the view ----
 
+function showStatus(status) {
+  element("host").textContent = status.host;
+  document.title = `${status.host}: ${status.verdict.toLowerCase()} – Tavik`;
+}
+
+/** The host's name stands above every view. */
+export async function showHost() {
+  try {
+    showStatus(await api.status());
+  } catch {
+    // The view says what is wrong.
+  }
+}
+
 async function part(id, show) {
   try {
     await show();
@@ -200,8 +214,7 @@ export async function show() {
     element("troubles").replaceChildren(make("p", ["Look on the host: ", code("systemctl status tavik"), " and ", code("tavik status"), ". The page asks again by itself."]));
     return;
   }
-  element("host").textContent = status.host;
-  document.title = `${status.host}: ${status.verdict.toLowerCase()} – Tavik`;
+  showStatus(status);
   element("headline").textContent = status.text;
   element("headline").className = `headline ${status.exit === 0 ? "good" : "bad"}`;
   element("troubles").replaceChildren(...status.troubles.map(troubleBox));

@@ -43,7 +43,8 @@ export function drawMap(place, units) {
     .filter((path) => path.remotePort);
   const byInitiator = group(paths, (path) => initiatorName(path.initiator));
   const byPort = group(paths, (path) => path.remotePort.wwpn);
-  if (paths.length === 0 || byPort.size > 48) {
+  place.hidden = paths.length === 0 || byPort.size > 48;
+  if (place.hidden) {
     return;
   }
   const ports = [...byPort].sort(([, [one]], [, [other]]) => one.array.localeCompare(other.array) || portName(one.remotePort).localeCompare(portName(other.remotePort)));

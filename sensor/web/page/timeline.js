@@ -453,6 +453,9 @@ export function start(whenAddressChanges) {
     canvas.focus();
   });
   watchWidth();
+  matchMedia("print").addEventListener("change", ({ matches }) => {
+    element("letters").parentElement.open = matches; // what the letters mean is on paper too
+  });
   for (const query of ["(prefers-color-scheme: dark)", "print"]) {
     matchMedia(query).addEventListener("change", () => {
       fillLegend();

@@ -3,6 +3,8 @@
 import { make } from "./dom.js";
 
 const code = (text) => make("code", text);
+/** Of what to do, some is a command and some is for people. */
+const doing = (text) => (/^(sudo|tavik|systemctl|journalctl)\b/.test(text) ? code(text) : text);
 
 export function troubleBox(trouble) {
   const box = make("article", "", `trouble level-${trouble.severity === "notice" ? 1 : trouble.severity === "warning" ? 2 : 3}`);
@@ -12,7 +14,7 @@ export function troubleBox(trouble) {
   }
   box.append(...(trouble.status ?? []).map((text) => make("p", text)));
   if ((trouble.action ?? []).length > 0) {
-    box.append(make("p", [make("b", "What to do: "), ...trouble.action.flatMap((text, index) => (index === 0 ? [code(text)] : [make("br"), code(text)]))]));
+    box.append(make("p", [make("b", "What to do: "), ...trouble.action.flatMap((text, index) => (index === 0 ? [doing(text)] : [make("br"), doing(text)]))]));
   }
   if (trouble.see) {
     box.append(make("p", [make("b", "More: "), code(trouble.see)], "quiet"));
