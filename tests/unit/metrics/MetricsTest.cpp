@@ -5,6 +5,9 @@
 #include <sys/stat.h>
 #include <unistd.h>
 
+#include <fstream>
+#include <sstream>
+
 #include "sensor/client/include/ClientErrors.h"
 #include "tests/support/TemporaryDirectory.h"
 
@@ -139,9 +142,14 @@ TEST(MetricsFile, IsReplacedWholeAndReadableByAll) {
     const std::string lPath = lDirectory.path("tavik.prom");
     const mode_t lMask = umask(0077);
     writeMetricsFile(lPath, "one 1\n");
+    std::ifstream lReader(lPath);
     writeMetricsFile(lPath, "two 2\n");
     umask(lMask);
     EXPECT_EQ(readFile(lPath), "two 2\n");
+    // A program that has opened the file reads to the end of what it has opened.
+    std::ostringstream lOld;
+    lOld << lReader.rdbuf();
+    EXPECT_EQ(lOld.str(), "one 1\n");
     struct stat lStatus {};
     ASSERT_EQ(stat(lPath.c_str(), &lStatus), 0);
     EXPECT_EQ(lStatus.st_mode & 0777U, 0644U);

@@ -2,7 +2,10 @@
 
 #include <gmock/gmock.h>
 #include <gtest/gtest.h>
+#include <sqlite3.h>
 
+#include <filesystem>
+#include <memory>
 #include <nlohmann/json.hpp>
 #include <regex>
 #include <set>
@@ -143,6 +146,35 @@ TEST_F(Api, WithoutAHistoryStatusAndMetricsStillAnswerAndTheRestGets503) {
     EXPECT_THAT(ask("/metrics").mBody, HasSubstr("tavik_build_info{version=\"9.8.7\"} 1\n"));
     fill();  // it is there now: no restart is needed
     EXPECT_EQ(askJson("/api/v1/events")["episodes"].size(), 3U);
+}
+
+TEST_F(Api, HealthzIs200WhileTavikCollectsAnd503WithTheStateOtherwise) {
+    fill();
+    const ZTSWebResponse lWell = ask("/healthz");
+    EXPECT_EQ(lWell.mStatus, 200U) << lWell.mBody;
+    EXPECT_EQ(lWell.mBody, "collecting\n");
+    mLive["agent"]["running"] = false;
+    const ZTSWebResponse lUnwell = ask("/healthz");
+    EXPECT_EQ(lUnwell.mStatus, 503U);
+    EXPECT_EQ(lUnwell.mBody, "agent-down\n");
+}
+
+TEST_F(Api, NoAnswerWritesToTheHistoryOrLeavesATransactionBehind) {
+    fill();
+    sqlite3* lpHandle = nullptr;
+    ASSERT_EQ(sqlite3_open(path().c_str(), &lpHandle), SQLITE_OK);
+    const std::unique_ptr<sqlite3, int (*)(sqlite3*)> lpDatabase(lpHandle, &sqlite3_close);
+    // A first look: before it, the library does not know that there is a write-ahead log.
+    ASSERT_EQ(sqlite3_exec(lpHandle, "SELECT count(*) FROM sqlite_master", nullptr, nullptr, nullptr), SQLITE_OK);
+    for (const char* const lpPath : {"/healthz", "/metrics", "/api/v1/status", "/api/v1/events", "/api/v1/ports",
+                                     "/api/v1/paths", "/api/v1/diff", "/api/v1/explain", "/api/v1/timeline"}) {
+        EXPECT_NE(ask(lpPath).mStatus, 400U) << lpPath;
+        // Empties the write-ahead log; that fails while somebody still reads there.
+        EXPECT_EQ(sqlite3_wal_checkpoint_v2(lpHandle, nullptr, SQLITE_CHECKPOINT_TRUNCATE, nullptr, nullptr), SQLITE_OK)
+            << lpPath;
+        ask(lpPath);
+        EXPECT_EQ(std::filesystem::file_size(path() + "-wal"), 0U) << lpPath << " writes";
+    }
 }
 
 TEST_F(Api, MetricsCountWhatTheHistoryHolds) {
