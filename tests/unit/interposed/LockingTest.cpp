@@ -63,6 +63,31 @@ TEST_F(Locking, EachPageOfAnRscnTakesTheLockAnew) {
     EXPECT_EQ(lOfOne + 4, lHoldsOf({1, 2, 3, 4, 5}));
 }
 
+TEST_F(Locking, AnRscnEndsAtTheFirstPageWhoseBoardHasLostItsListAndThatIsSaidOnce) {
+    collect(1);
+    constexpr unsigned lcPages = 4;
+    const ZTCBytes lPayload = makeRscn({1, 2, 3, 4});
+    const unsigned lHoldsOfAll = countHolds([&] { deliverRscn(0, lPayload); });
+    // The hold of a page is one of the last: one for each of them.
+    for (unsigned lLeft = 1; lLeft <= lcPages; ++lLeft) {
+        SCOPED_TRACE(std::to_string(lLeft) + " pages left");
+        mSystem->exchangeRecordLists(1);
+        mLog.forget();
+        const unsigned lTaken = lHoldsOfAll - lLeft;
+        unsigned lHolds = 0;
+        const ZTCReplacement lLeave(gReplaced.mBeforeLock, [&](const ZTSOsMutex& acrMutex) {
+            if (&acrMutex == &lock() && lHolds++ == lTaken) {
+                mSystem->exchangeRecordLists(0);  // takes the lock once itself
+            }
+        });
+        deliverRscn(0, lPayload);
+        EXPECT_EQ(lTaken + 2, lHolds) << "no page behind the one that found no list";
+        const std::vector<std::string> lErrors = mLog.texts("-E-");
+        ASSERT_EQ(1u, lErrors.size());
+        EXPECT_EQ(0u, lErrors[0].find("-E- Bad boardid 0 in event has been recieved. Event: wwn "));
+    }
+}
+
 TEST_F(Locking, ATargetsNoticesComeAfterTheLockWasGivenBack) {
     bringUp();
     setLogCode(255);
