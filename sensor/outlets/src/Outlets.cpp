@@ -45,11 +45,7 @@ ZTCOutlets::ZTCOutlets(ZTSOutletsSetup aSetup, const ZTSSettings& acrSettings)
     lSources.mGiveSeries = [this](ZTSMetricFacts& arFacts) { giveSeries(arFacts); };
     lSources.mAddNames = [this](ZTCNameBook& arNames) {
         const std::lock_guard lLock(mMutex);
-        for (const auto& [lWwn, lName] : mNames) {
-            if (const auto lParsed = parseWwn(lWwn)) {
-                arNames.addName(*lParsed, lName);
-            }
-        }
+        arNames.addNames(mNames);
     };
     mpApi = std::make_unique<ZTCApi>(lSources);
     mpFileApi = std::make_unique<ZTCApi>(std::move(lSources));
@@ -292,11 +288,7 @@ ZTCNameBook ZTCOutlets::makeNames() const {
     if (mpHistory != nullptr) {
         lNames.setTopology(readTopologyOf(*mpHistory));
     }
-    for (const auto& [lWwn, lName] : mSettings.mNames) {
-        if (const auto lParsed = parseWwn(lWwn)) {
-            lNames.addName(*lParsed, lName);
-        }
-    }
+    lNames.addNames(mSettings.mNames);
     return lNames;
 }
 

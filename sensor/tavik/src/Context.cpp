@@ -37,11 +37,7 @@ std::unique_ptr<ZTCHistory> ZTCContext::openHistory() const {
 
 ZTCNameBook ZTCContext::makeNames(const ZTCHistory* apHistory) const {
     ZTCNameBook lNames;
-    for (const auto& [lWwn, lName] : mSettings.mNames) {
-        if (const auto lParsed = parseWwn(lWwn)) {
-            lNames.addName(*lParsed, lName);
-        }
-    }
+    lNames.addNames(mSettings.mNames);
     if (apHistory != nullptr) {
         lNames.setTopology(readTopologyOf(*apHistory));
         lNames.setCounters(readCountersOf(*apHistory));

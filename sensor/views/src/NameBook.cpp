@@ -75,6 +75,14 @@ ZTCCountersAt readCountersOf(const ZTCHistory& acrHistory) {
     };
 }
 
+void ZTCNameBook::addNames(const std::map<std::string, std::string>& acrNames) {
+    for (const auto& [lWwn, lName] : acrNames) {
+        if (const auto lParsed = parseWwn(lWwn)) {
+            addName(*lParsed, lName);
+        }
+    }
+}
+
 const std::vector<ZTSCounterSample>& ZTCNameBook::findCounters(ZTCHistoryTime aFrom, ZTCHistoryTime aTo) const {
     static const std::vector<ZTSCounterSample> scNone;
     return mCounters ? mCounters(aFrom, aTo) : scNone;

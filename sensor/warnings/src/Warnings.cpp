@@ -254,11 +254,7 @@ void ZTCWarnings::warn() {
 
 ZTCNameBook ZTCWarnings::makeNames() const {
     ZTCNameBook lNames;
-    for (const auto& [lWwn, lName] : mSettings.mNames) {
-        if (const auto lParsed = parseWwn(lWwn)) {
-            lNames.addName(*lParsed, lName);
-        }
-    }
+    lNames.addNames(mSettings.mNames);
     return lNames;
 }
 
