@@ -17,6 +17,7 @@
 #include "sensor/metrics/include/SeriesPorts.h"
 #include "sensor/outlets/include/ChangeOutlet.h"
 #include "sensor/outlets/include/JournalSocket.h"
+#include "sensor/outlets/include/OutputProblems.h"
 #include "sensor/settings/include/Settings.h"
 #include "sensor/store/include/History.h"
 #include "sensor/views/include/NameBook.h"
@@ -61,19 +62,14 @@ public:
     unsigned getPort() const;
 
     /// The outputs that do not work now: a JSON list of open warnings, as LiveState.h describes it.
-    std::string describe() const;
+    std::string describe() const { return mProblems.describe(); }
 
 private:
-    struct ZTSFailing {
-        ZTCHistoryTime mSince;
-        std::string mProblem;
-    };
     /// An outlet with what it has.
     struct ZTSFedOutlet {
         std::unique_ptr<ZTCChangeOutlet> mpOutlet;
         std::optional<std::uint64_t> mSeq;  ///< the last change that it has; absent: to be read from the history
         std::uint64_t mTold = 0;            ///< missed changes that it has reported
-        std::string mProblem;
     };
 
     void run();
@@ -90,14 +86,11 @@ private:
     void writeMetrics();
     std::string toLine(const ZTSEpisode& acrEpisode, const ZTCNameBook& acrNames) const;
     ZTCNameBook makeNames() const;
-    /// Reports a problem of one outlet when it is new, and its end.
-    void report(std::string& arLast, const std::string& acrProblem, const char* apOutlet);
-    /// Forgets the problems of outputs that are switched off or changed.
-    void forget(std::string& arLast, const char* apOutlet);
     std::string readLive() const;
     void giveSeries(ZTSMetricFacts& arFacts);
 
     const ZTSOutletsSetup mSetup;
+    ZTCOutputProblems mProblems;  ///< of any thread
 
     // ---- of the outlets' thread ----
     ZTSSettings mSettings;
@@ -106,9 +99,6 @@ private:
     std::optional<std::uint64_t> mStreamSeq;  ///< what the streams have; absent: nobody listens
     std::chrono::steady_clock::time_point mNextMetrics{};
     std::chrono::steady_clock::time_point mNextServer{};
-    std::string mHistoryProblem;
-    std::string mServerProblem;
-    std::string mMetricsProblem;
 
     // ---- guarded by mMutex ----
     mutable std::mutex mMutex;
@@ -123,7 +113,6 @@ private:
     ZTCSeriesPorts mSeriesPorts;  ///< of the database with this id
     std::string mSeriesStoreId;
     unsigned mPort = 0;
-    std::map<std::string, ZTSFailing> mFailing;  ///< by title
 
     std::unique_ptr<ZTCApi> mpApi;           ///< of the server's thread; outlives the server
     std::unique_ptr<ZTCApi> mpFileApi;       ///< of the outlets' thread

@@ -12,7 +12,6 @@
 #include "sensor/outlets/include/NdjsonOutlet.h"
 #include "sensor/views/include/EpisodeJson.h"
 #include "sensor/views/include/StatusView.h"
-#include "sensor/views/include/TimeText.h"
 
 using std::chrono::seconds;
 using std::chrono::steady_clock;
@@ -32,7 +31,7 @@ static constexpr const char* scMetricsTitle = "the metrics file";
 static constexpr const char* scHistoryTitle = "the outlets' reading of the history";
 
 ZTCOutlets::ZTCOutlets(ZTSOutletsSetup aSetup, const ZTSSettings& acrSettings)
-    : mSetup(std::move(aSetup)), mNewSettings(acrSettings) {
+    : mSetup(std::move(aSetup)), mProblems(mSetup.mReport), mNewSettings(acrSettings) {
     ZTSApiSources lSources;
     lSources.mStateDirectory = mSetup.mStateDirectory;
     lSources.mHost = mSetup.mHost;
@@ -114,7 +113,7 @@ bool ZTCOutlets::waitForWork() {
     const bool lHasReaders = mpServer != nullptr && mpServer->hasStreams();
     std::unique_lock lLock(mMutex);
     const auto lIsDue = [this] { return mIsStopping || mHasWork; };
-    if (!mServerProblem.empty() || isFailing() || !mHistoryProblem.empty()) {
+    if (mProblems.has(scServerTitle) || isFailing() || mProblems.has(scHistoryTitle)) {
         mWake.wait_for(lLock, scServerPause, lIsDue);
     } else if (lHasReaders) {
         mWake.wait_for(lLock, scFeedPeriod, lIsDue);
@@ -143,11 +142,11 @@ void ZTCOutlets::applySettings() {
     if (lNew->mHttpListen != mSettings.mHttpListen || lNew->mHttpHosts != mSettings.mHttpHosts) {
         mpServer.reset();
         mNextServer = {};
-        forget(mServerProblem, scServerTitle);
+        mProblems.forget(scServerTitle);
     }
     if (lNew->mMetricsTextfile != mSettings.mMetricsTextfile) {
         mNextMetrics = {};
-        forget(mMetricsProblem, scMetricsTitle);
+        mProblems.forget(scMetricsTitle);
     }
     makeOutlets(*lNew);
     mSettings = std::move(*lNew);
@@ -164,7 +163,7 @@ void ZTCOutlets::makeOutlets(const ZTSSettings& acrNew) {
     std::map<std::string, std::pair<std::optional<std::uint64_t>, std::uint64_t>> lHad;
     for (ZTSFedOutlet& lrOutlet : mOutlets) {
         lHad[lrOutlet.mpOutlet->getName()] = {lrOutlet.mSeq, lrOutlet.mTold};  // what is stored may be older
-        forget(lrOutlet.mProblem, lrOutlet.mpOutlet->getTitle());
+        mProblems.forget(lrOutlet.mpOutlet->getTitle());
     }
     mOutlets.clear();
     if (!acrNew.mNdjsonPath.empty()) {
@@ -180,41 +179,8 @@ void ZTCOutlets::makeOutlets(const ZTSSettings& acrNew) {
 }
 
 bool ZTCOutlets::isFailing() const {
-    return std::ranges::any_of(mOutlets, [](const ZTSFedOutlet& acrOutlet) { return !acrOutlet.mProblem.empty(); });
-}
-
-void ZTCOutlets::report(std::string& arLast, const std::string& acrProblem, const char* apOutlet) {
-    if (acrProblem != arLast) {
-        mSetup.mReport(acrProblem.empty() ? std::string(apOutlet) + " works again" : acrProblem + "; trying on");
-        arLast = acrProblem;
-    }
-    const std::lock_guard lLock(mMutex);
-    if (acrProblem.empty()) {
-        mFailing.erase(apOutlet);
-    } else {
-        const auto lAdded =
-            mFailing.try_emplace(apOutlet, ZTSFailing{.mSince = getHistoryTime(), .mProblem = acrProblem});
-        lAdded.first->second.mProblem = acrProblem;
-    }
-}
-
-void ZTCOutlets::forget(std::string& arLast, const char* apOutlet) {
-    arLast.clear();
-    const std::lock_guard lLock(mMutex);
-    mFailing.erase(apOutlet);
-}
-
-std::string ZTCOutlets::describe() const {
-    nlohmann::ordered_json lWarnings = nlohmann::ordered_json::array();
-    const std::lock_guard lLock(mMutex);
-    for (const auto& [lOutlet, lrFailing] : mFailing) {
-        lWarnings.push_back({{"kind", "output"},
-                             {"text", lOutlet + " does not work: " + lrFailing.mProblem},
-                             {"since", toRfc3339(lrFailing.mSince)},
-                             {"given", nullptr},
-                             {"next", nullptr}});
-    }
-    return dumpJson(lWarnings, -1);
+    return std::ranges::any_of(
+        mOutlets, [this](const ZTSFedOutlet& acrOutlet) { return mProblems.has(acrOutlet.mpOutlet->getTitle()); });
 }
 
 void ZTCOutlets::openServer() {
@@ -226,11 +192,11 @@ void ZTCOutlets::openServer() {
         mpServer = std::make_unique<ZTCWebServer>(
             ZTSWebOptions{.mListen = mSettings.mHttpListen, .mHosts = mSettings.mHttpHosts},
             [this](const ZTSWebRequest& acrRequest) { return mpApi->answer(acrRequest); });
-        report(mServerProblem, "", scServerTitle);
+        mProblems.note(scServerTitle, "");
         const std::lock_guard lLock(mMutex);
         mPort = mpServer->getPort();
     } catch (const ZTCClientEx& lrEx) {
-        report(mServerProblem, lrEx.what(), scServerTitle);
+        mProblems.note(scServerTitle, lrEx.what());
     }
 }
 
@@ -255,10 +221,10 @@ void ZTCOutlets::feedHistory() {
         for (ZTSFedOutlet& lrOutlet : mOutlets) {
             feed(lrOutlet);
         }
-        report(mHistoryProblem, "", scHistoryTitle);
+        mProblems.note(scHistoryTitle, "");
     } catch (const ZTCStoreEx& lrEx) {
         mpHistory.reset();  // it may have been replaced
-        report(mHistoryProblem, std::string("the outlets cannot read the history: ") + lrEx.what(), scHistoryTitle);
+        mProblems.note(scHistoryTitle, std::string("the outlets cannot read the history: ") + lrEx.what());
     }
 }
 
@@ -371,9 +337,9 @@ void ZTCOutlets::feed(ZTSFedOutlet& arOutlet) {
                 return;
             }
             arOutlet.mpOutlet->write(lChanges);
-            report(arOutlet.mProblem, "", arOutlet.mpOutlet->getTitle());
+            mProblems.note(arOutlet.mpOutlet->getTitle(), "");
         } catch (const ZTCSystemCallEx& lrEx) {
-            report(arOutlet.mProblem, lrEx.what(), arOutlet.mpOutlet->getTitle());
+            mProblems.note(arOutlet.mpOutlet->getTitle(), lrEx.what());
             return;
         }
         // They are out: what is stored too late only makes them come twice.
@@ -390,9 +356,9 @@ void ZTCOutlets::writeMetrics() {
     const ZTSWebResponse lMetrics = mpFileApi->answer({.mPath = "/metrics", .mParameters = {}});
     try {
         writeMetricsFile(mSettings.mMetricsTextfile, lMetrics.mBody);
-        report(mMetricsProblem, "", scMetricsTitle);
+        mProblems.note(scMetricsTitle, "");
     } catch (const ZTCSystemCallEx& lrEx) {
-        report(mMetricsProblem, lrEx.what(), scMetricsTitle);
+        mProblems.note(scMetricsTitle, lrEx.what());
         mNextMetrics = steady_clock::now() + scFeedPeriod;
     }
 }
