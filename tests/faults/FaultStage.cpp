@@ -14,7 +14,7 @@
 #include "libkpm/common/include/Descriptor.h"
 
 /// One of them is the last word of an agent that ends in order.
-static const char* const sLastWords[] = {
+static const char* const scLastWords[] = {
     "Exit condition",
     "Failed with error - ",
     "Tavik System exiting",
@@ -151,7 +151,7 @@ ZTEFaultEnd ZTCFaultStage::waitForEnd() {
     // may have no standard error.
     const bool lCannotWrite = mFaults.isArmed() && mFaults.hasFired() && mPlan.mIsLasting && mPlan.mCall == "write";
     bool lHasLastWord = !mHasStandardError || lCannotWrite || !exists(mAgent.agentLogPath());
-    for (const char* lpWord : sLastWords) {
+    for (const char* lpWord : scLastWords) {
         lHasLastWord = lHasLastWord || lText.find(lpWord) != std::string::npos;
     }
     if (!lHasLastWord) {

@@ -1,4 +1,4 @@
-#include "tests/support/LogTexts.h"
+#include "tests/support/LogTextsSeen.h"
 
 #include <gtest/gtest.h>
 #include <sys/stat.h>

@@ -9,12 +9,12 @@
 
 #include "tests/unit/linux/EngineFixture.h"
 
-static const pthread_t sMain = pthread_self();
+static const pthread_t scMain = pthread_self();
 static std::atomic<bool> sIsShort{false};
 static std::atomic<unsigned> sDenied{0};
 
 static void* sAllocate(std::size_t aSize) {
-    if (sIsShort.load() && pthread_equal(pthread_self(), sMain) == 0 && !ZTCTestsOwn::isHere()) {
+    if (sIsShort.load() && pthread_equal(pthread_self(), scMain) == 0 && !ZTCTestsOwn::isHere()) {
         sDenied.fetch_add(1);
         throw std::bad_alloc();
     }

@@ -1,6 +1,6 @@
 #include <gtest/gtest.h>
 
-#include "tests/support/LogTexts.h"
+#include "tests/support/LogTextsSeen.h"
 
 TEST(LogTextsSeen, AFormatFitsTheTextsThatItPrintsAndNoOther) {
     EXPECT_TRUE(isOfFormat("Plain", "Plain"));
