@@ -11,35 +11,14 @@
 #include "tests/support/TemporaryDirectory.h"
 #include "tests/unit/topology/FakeSysfs.h"
 
-static constexpr unsigned scHosts = 8;
-static constexpr unsigned scPortsOfAHost = 8;
 static constexpr unsigned scLuns = 200;
 static constexpr std::int64_t scHour = 3'600'000'000;
 static constexpr unsigned scHours = 7 * 24;
 
-static void sWriteHost(ZTCFakeSysfs& arTree) {
-    for (unsigned lHost = 0; lHost < scHosts; ++lHost) {
-        arTree.addHost(lHost);
-        for (unsigned lTarget = 0; lTarget < scPortsOfAHost; ++lTarget) {
-            arTree.addRemotePort(lHost, lTarget, lHost * scPortsOfAHost + lTarget);
-        }
-    }
-    for (unsigned lLun = 0; lLun < scLuns; ++lLun) {
-        std::vector<std::string> lDisks;
-        for (unsigned lHost = 0; lHost < scHosts; ++lHost) {
-            lDisks.push_back("sd" + std::to_string(lLun) + "x" + std::to_string(lHost));
-            arTree.addPath(lHost, lLun % scPortsOfAHost, lLun, "naa." + std::to_string(lLun), lDisks.back());
-        }
-        const std::string lNumber = std::to_string(lLun);
-        arTree.addMapping(lLun, "mpath" + lNumber, "mpath-" + lNumber, lDisks);
-        arTree.mount("dm-" + lNumber, "/data/" + lNumber);
-    }
-}
-
 /// The tree has many files: it is written once, however often a benchmark is called.
 static ZTSTopologyRoots sLargeHost() {
     static ZTCFakeSysfs lTree;
-    static const bool lIsWritten = (sWriteHost(lTree), true);
+    static const bool lIsWritten = (lTree.addLargeHost(scLuns), true);
     benchmark::DoNotOptimize(lIsWritten);
     return lTree.roots();
 }

@@ -8,7 +8,7 @@
 
 #include "tests/support/TemporaryDirectory.h"
 #include "tests/support/Waiting.h"
-#include "tests/unit/topology/FakeSysfs.h"
+#include "tests/unit/collector/TopologyWatchFixture.h"
 
 using std::chrono::seconds;
 using testing::ElementsAre;
@@ -30,16 +30,9 @@ public:
     std::atomic<int> mScans = 0;
 };
 
-class PortWatchTest : public testing::Test {
+class PortWatchTest : public ZTCTopologyWatchFixture {
 protected:
     PortWatchTest() {
-        mTree.addHost(7);
-        mTree.addRemotePort(7, 3, 9);
-        // Nothing happens by itself in the time of a test.
-        mSetup.mRoots = mTree.roots();
-        mSetup.mPortsPeriod = mSetup.mWholePeriod = mSetup.mStaleAfter = std::chrono::hours(1);
-        mSetup.mHurryPause = std::chrono::milliseconds(1);
-        mSetup.mPatience = std::chrono::milliseconds(50);
         mSettings.mTargetsSysfs = true;
         mTopology.emplace(mSink, mSetup);
         mWatch.emplace(*mTopology, [this](const std::string& acrLine) { mLines.push_back(acrLine); });
@@ -60,8 +53,6 @@ protected:
     }
 
     ZTCTemporaryDirectory mDirectory;
-    ZTCFakeSysfs mTree;
-    ZTSTopologyWatchSetup mSetup;
     ZTCCountingSink mSink;
     std::optional<ZTCTopologyWatch> mTopology;
     std::vector<std::string> mLines;

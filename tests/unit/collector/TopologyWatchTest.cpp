@@ -12,7 +12,7 @@
 #include <mutex>
 
 #include "tests/support/Waiting.h"
-#include "tests/unit/topology/FakeSysfs.h"
+#include "tests/unit/collector/TopologyWatchFixture.h"
 
 using testing::ElementsAre;
 
@@ -47,16 +47,9 @@ private:
     std::atomic<int> mPorts = 0;
 };
 
-class TopologyWatchTest : public testing::Test {
+class TopologyWatchTest : public ZTCTopologyWatchFixture {
 protected:
     TopologyWatchTest() {
-        mTree.addHost(7);
-        mTree.addRemotePort(7, 3, 9);
-        // Nothing happens by itself in the time of a test.
-        mSetup.mRoots = mTree.roots();
-        mSetup.mPortsPeriod = mSetup.mWholePeriod = mSetup.mStaleAfter = std::chrono::hours(1);
-        mSetup.mHurryPause = std::chrono::milliseconds(1);
-        mSetup.mPatience = std::chrono::milliseconds(50);
         mSetup.mClock = [this] { return fromMicroseconds(mNow); };
     }
     void start() { mWatch.emplace(mSink, mSetup); }
@@ -69,8 +62,6 @@ protected:
         waitForScans(lCount + 1);
     }
 
-    ZTCFakeSysfs mTree;
-    ZTSTopologyWatchSetup mSetup;
     std::atomic<std::int64_t> mNow{600'000'000};
     ZTCSinkOfATest mSink;
     std::optional<ZTCTopologyWatch> mWatch;

@@ -4,20 +4,9 @@
 
 #include <filesystem>
 
-#include "libkpm/linux/src/KindSources.h"
-#include "libkpm/linux/src/Losses.h"
-#include "tests/unit/linux/FakeKernel.h"
+#include "tests/unit/linux/WatcherFixture.h"
 
-class HostWatcher : public testing::Test {
-protected:
-    ZTCLinuxLog mLog;
-    ZTCFakeKernel mKernel;
-    ZTCSysfs mSysfs{mKernel.sysfs()};
-    ZTCLibraryRegistry mRegistry{gcLinuxKindCount};
-    ZTCLinuxDelivery mDelivery{mRegistry};
-    ZTCLosses mLosses{gcLinuxLosses};
-    ZTCLinuxHostWatcher mWatcher{mSysfs, mDelivery, mLosses};
-};
+using HostWatcher = ZTCWatcherFixture;
 
 TEST_F(HostWatcher, AnUnknownHostIsLookedForOnceBetweenTwoRegularLooks) {
     mKernel.addHost(0);

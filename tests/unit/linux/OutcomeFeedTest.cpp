@@ -5,14 +5,12 @@
 #include <algorithm>
 #include <cerrno>
 
-#include "libkpm/linux/src/KindSources.h"
-#include "libkpm/linux/src/Losses.h"
 #include "tests/support/Waiting.h"
-#include "tests/unit/linux/FakeKernel.h"
 #include "tests/unit/linux/LinuxRecorder.h"
+#include "tests/unit/linux/WatcherFixture.h"
 
 /// A feed that nobody tells which buffers are readable.
-class OutcomeFeed : public testing::Test {
+class OutcomeFeed : public ZTCWatcherFixture {
 protected:
     void open() {
         for (const std::size_t lKind : {gcLinuxQueueFull, gcLinuxDeviceBusy, gcLinuxCheckCondition}) {
@@ -30,14 +28,7 @@ protected:
         }
     }
 
-    ZTCLinuxLog mLog;
-    ZTCFakeKernel mKernel;
     ZTCLinuxRecorder mRecorder;
-    ZTCSysfs mSysfs{mKernel.sysfs()};
-    ZTCLibraryRegistry mRegistry{gcLinuxKindCount};
-    ZTCLinuxDelivery mDelivery{mRegistry};
-    ZTCLosses mLosses{gcLinuxLosses};
-    ZTCLinuxHostWatcher mWatcher{mSysfs, mDelivery, mLosses};
     ZTCLinuxQueueDepths mDepths{mSysfs, mWatcher, mDelivery};
     ZTCLinuxOutcomeFeed mFeed{mKernel.options().mTracePlace, mKernel, mWatcher, mDepths, mDelivery, mLosses};
 };

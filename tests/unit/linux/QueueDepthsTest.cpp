@@ -4,14 +4,13 @@
 
 #include <algorithm>
 
-#include "libkpm/linux/src/KindSources.h"
-#include "libkpm/linux/src/Losses.h"
 #include "tests/unit/linux/EngineFixture.h"
+#include "tests/unit/linux/WatcherFixture.h"
 
 using ZTCDepthTime = ZTCLinuxQueueDepths::Clock::time_point;
 
 /// The object alone, with a clock that the test moves.
-class QueueDepths : public testing::Test {
+class QueueDepths : public ZTCWatcherFixture {
 protected:
     QueueDepths() {
         mKernel.addHost(0);
@@ -37,12 +36,6 @@ protected:
         mRegistry.put(0, gcLinuxQueueDepth, lRegistration);
     }
 
-    ZTCFakeKernel mKernel;
-    ZTCSysfs mSysfs{mKernel.sysfs()};
-    ZTCLibraryRegistry mRegistry{gcLinuxKindCount};
-    ZTCLinuxDelivery mDelivery{mRegistry};
-    ZTCLosses mLosses{gcLinuxLosses};
-    ZTCLinuxHostWatcher mWatcher{mSysfs, mDelivery, mLosses};
     ZTCLinuxQueueDepths mDepths{mSysfs, mWatcher, mDelivery};
     ZTCDepthTime mNow{};
     unsigned mDelivered = 0;

@@ -113,6 +113,25 @@ void ZTCFakeSysfs::mount(const std::string& acrDevice, const std::string& acrMou
     mMountInfo += "36 1 " + mNumbers.at(acrDevice) + " / " + acrMountPoint + " rw,relatime shared:1 - ext4 /dev/x rw\n";
 }
 
+void ZTCFakeSysfs::addLargeHost(unsigned aLuns) {
+    for (unsigned lHost = 0; lHost < gcLargeHosts; ++lHost) {
+        addHost(lHost);
+        for (unsigned lTarget = 0; lTarget < gcLargePortsOfAHost; ++lTarget) {
+            addRemotePort(lHost, lTarget, lHost * gcLargePortsOfAHost + lTarget);
+        }
+    }
+    for (unsigned lLun = 0; lLun < aLuns; ++lLun) {
+        const std::string lNumber = std::to_string(lLun);
+        std::vector<std::string> lDisks;
+        for (unsigned lHost = 0; lHost < gcLargeHosts; ++lHost) {
+            lDisks.push_back("sd" + lNumber + "x" + std::to_string(lHost));
+            addPath(lHost, lLun % gcLargePortsOfAHost, lLun, "naa." + lNumber, lDisks.back());
+        }
+        addMapping(lLun, "mpath" + lNumber, "mpath-" + lNumber, lDisks);
+        mount("dm-" + lNumber, "/data/" + lNumber);
+    }
+}
+
 void ZTCFakeSysfs::swapOn(const std::string& acrDevice) {
     mSwaps += "/dev/" + acrDevice + "\tpartition\t1048572\t0\t-2\n";
 }

@@ -36,6 +36,12 @@ public:
     void mount(const std::string& acrDevice, const std::string& acrMountPoint);
     void swapOn(const std::string& acrDevice);
 
+    /// A host of 8 initiators with 8 remote ports each, and so many units: each has a path through every initiator, and
+    /// a multipath device that is mounted.
+    void addLargeHost(unsigned aLuns);
+    static constexpr unsigned gcLargeHosts = 8;
+    static constexpr unsigned gcLargePortsOfAHost = 8;
+
     static std::string initiatorName(unsigned aHost);
     static std::string remotePortName(unsigned aPort);
 
