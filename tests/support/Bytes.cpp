@@ -13,7 +13,7 @@ ZTSWwn makeWwn(std::uint64_t aValue) {
     return lName;
 }
 
-static const char* const sHexDigits = "0123456789abcdef";
+static const char* const scHexDigits = "0123456789abcdef";
 
 std::string wwnText(const ZTSWwn& acrName) {
     std::string lText;
@@ -21,8 +21,8 @@ std::string wwnText(const ZTSWwn& acrName) {
         if (!lText.empty()) {
             lText += ':';
         }
-        lText += sHexDigits[lByte >> 4];
-        lText += sHexDigits[lByte & 0x0F];
+        lText += scHexDigits[lByte >> 4];
+        lText += scHexDigits[lByte & 0x0F];
     }
     return lText;
 }
@@ -31,8 +31,8 @@ std::string hexOf(const ZTCBytes& acrBytes) {
     std::string lText;
     lText.reserve(acrBytes.size() * 2);
     for (unsigned char lByte : acrBytes) {
-        lText += sHexDigits[lByte >> 4];
-        lText += sHexDigits[lByte & 0x0F];
+        lText += scHexDigits[lByte >> 4];
+        lText += scHexDigits[lByte & 0x0F];
     }
     return lText;
 }

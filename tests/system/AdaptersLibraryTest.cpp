@@ -6,7 +6,7 @@
 
 #include "tests/support/AgentProcess.h"
 
-static const char* const sNoLibrary = "No Libkpm Found or Disabled.. Tavik would exit";
+static const char* const scNoLibrary = "No Libkpm Found or Disabled.. Tavik would exit";
 
 /// Runs an agent that is bound to refuse, and checks what every refusal has in common.
 static void sExpectRefusal(ZTCAgentProcess& arAgent, const char* apNotice) {
@@ -37,7 +37,7 @@ static void sExpectFailure(ZTCAgentProcess& arAgent, const std::vector<std::stri
 TEST(AdaptersLibrary, AMissingLibraryIsAnExitCondition) {
     ZTCAgentProcess lAgent;
     lAgent.setEnvironment("ZT_LIBKPM_PATH", lAgent.workingDirectory() + "/no-such-library.so");
-    sExpectRefusal(lAgent, sNoLibrary);
+    sExpectRefusal(lAgent, scNoLibrary);
     EXPECT_FALSE(lAgent.log().containing("no-such-library.so").empty()) << "the loader's reason is missing";
 }
 
@@ -46,14 +46,14 @@ TEST(AdaptersLibrary, AFileThatIsNoLibraryIsAnExitCondition) {
     const std::string lPath = lAgent.workingDirectory() + "/text.so";
     writeFile(lPath, "this is no shared object");
     lAgent.setEnvironment("ZT_LIBKPM_PATH", lPath);
-    sExpectRefusal(lAgent, sNoLibrary);
+    sExpectRefusal(lAgent, scNoLibrary);
     EXPECT_FALSE(lAgent.log().containing("text.so").empty());
 }
 
 TEST(AdaptersLibrary, AnEmptyPathDisablesTheLibrary) {
     ZTCAgentProcess lAgent;
     lAgent.setEnvironment("ZT_LIBKPM_PATH", "");
-    sExpectRefusal(lAgent, sNoLibrary);
+    sExpectRefusal(lAgent, scNoLibrary);
     EXPECT_TRUE(lAgent.library().calls().empty());
 }
 
@@ -61,7 +61,7 @@ TEST(AdaptersLibrary, WithoutAPathTheLoaderSearchesForTheUsualName) {
     ZTCAgentProcess lAgent;
     lAgent.unsetEnvironment("ZT_LIBKPM_PATH");
     lAgent.setEnvironment("LD_LIBRARY_PATH", lAgent.workingDirectory());
-    sExpectRefusal(lAgent, sNoLibrary);
+    sExpectRefusal(lAgent, scNoLibrary);
     EXPECT_FALSE(lAgent.log().containing("libkpm.so.1").empty());
 }
 
@@ -78,7 +78,7 @@ TEST(AdaptersLibrary, WithoutAPathTheLibraryIsFoundByTheLoader) {
 TEST(AdaptersLibrary, ALibraryWithoutTheSymbolIsAnExitCondition) {
     ZTCAgentProcess lAgent;
     lAgent.setEnvironment("ZT_LIBKPM_PATH", "libm.so.6");
-    sExpectRefusal(lAgent, sNoLibrary);
+    sExpectRefusal(lAgent, scNoLibrary);
     EXPECT_FALSE(lAgent.log().containing("KPM_GetFunctionList").empty());
 }
 
@@ -87,7 +87,7 @@ TEST(AdaptersLibrary, ALibraryOfAnotherVersionIsAnExitCondition) {
         SCOPED_TRACE(lpLine);
         ZTCAgentProcess lAgent;
         lAgent.library().configure(lpLine);
-        sExpectRefusal(lAgent, sNoLibrary);
+        sExpectRefusal(lAgent, scNoLibrary);
         const auto lCalls = lAgent.library().calls();
         ASSERT_FALSE(lCalls.empty());
         EXPECT_EQ(lCalls[0], "KPM_GetFunctionList version=1");
@@ -101,7 +101,7 @@ TEST(AdaptersLibrary, ATableWithANullEntryIsAnExitCondition) {
         SCOPED_TRACE(lEntry);
         ZTCAgentProcess lAgent;
         lAgent.library().configure("null-entry " + std::to_string(lEntry));
-        sExpectRefusal(lAgent, sNoLibrary);
+        sExpectRefusal(lAgent, scNoLibrary);
         EXPECT_TRUE(lAgent.library().callsOf("Init").empty());
     }
 }

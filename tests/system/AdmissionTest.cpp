@@ -9,8 +9,8 @@
 
 using ZTCTexts = std::vector<std::string>;
 
-static const char* const sSwitchedOff = "Ignoring the event as Scope data Collection is not enabled.";
-static const char* const sLimitReached = "Ignoring the event as the limit on the total Event Data";
+static const char* const scSwitchedOff = "Ignoring the event as Scope data Collection is not enabled.";
+static const char* const scLimitReached = "Ignoring the event as the limit on the total Event Data";
 
 /// One event through each of the four callbacks.
 static std::vector<ZTSLibraryEvent> sOneOfEach(unsigned aBoard = 0) {
@@ -25,7 +25,7 @@ TEST(Admission, EveryCallbackDropsItsEventWhileCollectionIsOff) {
     lAgent.startScope();
     EXPECT_EQ(lAgent.request(gcStopScopeHex), gcSuccessHex);
     lAgent.library().deliverAll(sOneOfEach());
-    EXPECT_EQ(lAgent.log().count(sSwitchedOff, "-N-"), 4u);
+    EXPECT_EQ(lAgent.log().count(scSwitchedOff, "-N-"), 4u);
     EXPECT_EQ(lAgent.retrieve().texts(), ZTCTexts{});
 }
 
@@ -106,7 +106,7 @@ TEST(Admission, TheEventThatReachesTheTotalLimitIsTheLastOneAdmitted) {
 
     lAgent.library().deliverAll(sOneOfEach());
     EXPECT_EQ(lAgent.log().count("Current size = 262144", "-N-"), 4u);
-    EXPECT_EQ(lAgent.log().count(sLimitReached, "-N-"), 4u);
+    EXPECT_EQ(lAgent.log().count(scLimitReached, "-N-"), 4u);
 
     const ZTSScopeDataResponse lResponse = lAgent.retrieve();
     EXPECT_EQ(lResponse.texts().size(), 2052u);
@@ -125,7 +125,7 @@ TEST(Admission, OneAdmittedEventMayCarryTheTotalPastItsLimit) {
     lAgent.library().deliver(ZTSLibraryEvent::scope(0, 4, 0x04, checkConditionData(gcRemotePort, 1, 2, 3, 4, 5)));
     lAgent.library().deliver(ZTSLibraryEvent::bare(0, 2, 1));
     EXPECT_EQ(lAgent.log().count("Current size = 262268", "-N-"), 1u);
-    EXPECT_EQ(lAgent.log().count(sLimitReached, "-N-"), 1u);
+    EXPECT_EQ(lAgent.log().count(scLimitReached, "-N-"), 1u);
     EXPECT_EQ(lAgent.retrieve().texts().size(), 2052u);
 }
 
@@ -159,6 +159,6 @@ TEST(Admission, StoppingAndStartingAgainKeepsWhatWasCollected) {
     lAgent.library().deliver(lEvent);
     lAgent.startScope();
     lAgent.library().deliver(lEvent);
-    EXPECT_EQ(lAgent.log().count(sSwitchedOff, "-N-"), 1u);
+    EXPECT_EQ(lAgent.log().count(scSwitchedOff, "-N-"), 1u);
     EXPECT_EQ(lAgent.retrieve().texts(), ZTCTexts{"4/1 x2 " + qFullRecord(gcRemotePort, {3})});
 }

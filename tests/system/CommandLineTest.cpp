@@ -6,7 +6,7 @@
 
 #include "tests/support/AgentProcess.h"
 
-static const char* const sHelp =
+static const char* const scHelp =
     "qrv-tvk -[hvsDldc] VALUE\n"
     "  -h             : Shows this help\n"
     "  -v             : Prints version\n"
@@ -27,7 +27,7 @@ TEST(CommandLine, HelpIsExact) {
     ZTCAgentProcess lAgent;
     const ZTSRunResult lResult = lAgent.run({"-h"});
     EXPECT_EQ(lResult.mStatus, 0);
-    EXPECT_EQ(lResult.mOutput, sHelp);
+    EXPECT_EQ(lResult.mOutput, scHelp);
     EXPECT_EQ(lResult.mError, "");
     sExpectNothingMade(lAgent);
 }
@@ -43,7 +43,7 @@ TEST(CommandLine, VersionIsExact) {
 
 TEST(CommandLine, HelpWinsThenVersionThenConfigurationThenShutDown) {
     ZTCAgentProcess lAgent;
-    EXPECT_EQ(lAgent.run({"-s", "-c", "file", "-v", "-h"}).mOutput, sHelp);
+    EXPECT_EQ(lAgent.run({"-s", "-c", "file", "-v", "-h"}).mOutput, scHelp);
     EXPECT_EQ(lAgent.run({"-s", "-c", "file", "-v"}).mOutput, "qrv-tvk v3.0.1.2\n");
     const ZTSRunResult lConfigured = lAgent.run({"-s", "-c", "file"});
     EXPECT_EQ(lConfigured.mStatus, 0);

@@ -41,7 +41,7 @@ struct ZTSMoment {
 };
 
 /// The storm comes last: it leaves little of the processors to what comes after it.
-static const ZTSMoment sMoments[] = {
+static const ZTSMoment scMoments[] = {
     {ZTEMoment::LibraryInit, "library's Init", false, false},
     {ZTEMoment::WaitForReader, "wait for a reader", true, false},
     {ZTEMoment::Registration, "registration", true, true},
@@ -261,7 +261,7 @@ private:
 /// All moments side by side, so that the heartbeats' seconds pass once.
 static void sExpectEndAtEveryMoment(const ZTSCause& acrCause) {
     std::vector<std::unique_ptr<ZTCEndingAgent>> lAgents;
-    for (const ZTSMoment& lcrMoment : sMoments) {
+    for (const ZTSMoment& lcrMoment : scMoments) {
         if (acrCause.mpRequest != nullptr && !lcrMoment.mServesCommands) {
             continue;
         }

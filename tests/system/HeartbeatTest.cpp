@@ -14,10 +14,10 @@
 
 // The agent's period is one second, the least there is; these tests wait for the lines of its cycles.
 
-static const char* const sChecking = "Checking the status of the actual sensor process/service";
-static const char* const sAlive = "Sensor process still running, but not updating the heartbeat";
-static const char* const sGone = "Failed in getting the status of Sensor";
-static const char* const sUpdating = "Updating the status";
+static const char* const scChecking = "Checking the status of the actual sensor process/service";
+static const char* const scAlive = "Sensor process still running, but not updating the heartbeat";
+static const char* const scGone = "Failed in getting the status of Sensor";
+static const char* const scUpdating = "Updating the status";
 
 static void sStart(ZTCAgentProcess& arAgent) {
     arAgent.startAndConnect({"-b", "1"});
@@ -43,15 +43,15 @@ TEST(Heartbeat, ASilentSensorThatLivesOnlyEarnsNotices) {
     ZTCAgentProcess lAgent;
     writeFile(lAgent.sensorPidFilePath(), std::to_string(getpid()) + "\n");
     sStart(lAgent);
-    lAgent.log().waitFor(sAlive, 2);
+    lAgent.log().waitFor(scAlive, 2);
     // First look: the time is noted. Second: counted. Third: the query. From then on: the query every time.
-    EXPECT_GE(lAgent.log().count(sUpdating, "-T-"), 4u);
-    EXPECT_EQ(lAgent.log().count(sUnchanged(lAgent), "-W-"), lAgent.log().count(sChecking, "-N-"));
-    const std::size_t lFirstQuery = *lAgent.log().find(sChecking);
+    EXPECT_GE(lAgent.log().count(scUpdating, "-T-"), 4u);
+    EXPECT_EQ(lAgent.log().count(sUnchanged(lAgent), "-W-"), lAgent.log().count(scChecking, "-N-"));
+    const std::size_t lFirstQuery = *lAgent.log().find(scChecking);
     std::size_t lCycles = 0;
     const auto lLines = lAgent.log().lines();
     for (std::size_t i = 0; i < lFirstQuery; ++i) {
-        lCycles += lLines[i].mText == sUpdating ? 1 : 0;
+        lCycles += lLines[i].mText == scUpdating ? 1 : 0;
     }
     EXPECT_EQ(lCycles, 3u);
     EXPECT_TRUE(lAgent.ping());
@@ -61,15 +61,15 @@ TEST(Heartbeat, ASensorThatLivesAndTouchesItsFileAgainIsForgiven) {
     ZTCAgentProcess lAgent;
     writeFile(lAgent.sensorPidFilePath(), std::to_string(getpid()) + "\n");
     sStart(lAgent);
-    lAgent.log().waitFor(sAlive, 1);
-    const std::size_t lQueries = lAgent.log().count(sChecking);
+    lAgent.log().waitFor(scAlive, 1);
+    const std::size_t lQueries = lAgent.log().count(scChecking);
     // An earlier time is a change like any other.
     const timespec lTimes[2] = {{1000000, 0}, {1000000, 0}};
     ASSERT_EQ(utimensat(AT_FDCWD, lAgent.sensorPidFilePath().c_str(), lTimes, 0), 0);
-    const std::size_t lCycles = lAgent.log().count(sUpdating);
-    lAgent.log().waitFor(sUpdating, lCycles + 2);
-    EXPECT_LE(lAgent.log().count(sChecking), lQueries + 1);
-    lAgent.log().waitFor(sAlive, lQueries + 1);
+    const std::size_t lCycles = lAgent.log().count(scUpdating);
+    lAgent.log().waitFor(scUpdating, lCycles + 2);
+    EXPECT_LE(lAgent.log().count(scChecking), lQueries + 1);
+    lAgent.log().waitFor(scAlive, lQueries + 1);
 }
 
 TEST(Heartbeat, ASensorThatTouchesItsFileIsNeverQueried) {
@@ -82,7 +82,7 @@ TEST(Heartbeat, ASensorThatTouchesItsFileIsNeverQueried) {
                                     {static_cast<time_t>(1000000 + lCycle), 0}};
         ASSERT_EQ(utimensat(AT_FDCWD, lAgent.sensorPidFilePath().c_str(), lTimes, 0), 0);
     }
-    EXPECT_FALSE(lAgent.log().has(sChecking));
+    EXPECT_FALSE(lAgent.log().has(scChecking));
     EXPECT_FALSE(lAgent.log().has(sUnchanged(lAgent)));
 }
 
@@ -100,9 +100,9 @@ TEST(Heartbeat, ASilentSensorThatIsGoneEndsTheAgent) {
     sStart(lAgent);
     sExpectEnded(lAgent);
     EXPECT_EQ(lAgent.log().count(sUnchanged(lAgent), "-W-"), 1u);
-    EXPECT_EQ(lAgent.log().count(sChecking, "-N-"), 1u);
-    EXPECT_EQ(lAgent.log().count(sGone, "-H-"), 1u);
-    EXPECT_EQ(lAgent.log().count(sUpdating), 3u);
+    EXPECT_EQ(lAgent.log().count(scChecking, "-N-"), 1u);
+    EXPECT_EQ(lAgent.log().count(scGone, "-H-"), 1u);
+    EXPECT_EQ(lAgent.log().count(scUpdating), 3u);
 }
 
 TEST(Heartbeat, ASensorThatIsAZombieIsGone) {
@@ -121,7 +121,7 @@ TEST(Heartbeat, ASensorThatIsAZombieIsGone) {
     writeFile(lAgent.sensorPidFilePath(), std::to_string(lSensor.getPid()) + "\n");
     sStart(lAgent);
     sExpectEnded(lAgent);
-    EXPECT_EQ(lAgent.log().count(sGone, "-H-"), 1u);
+    EXPECT_EQ(lAgent.log().count(scGone, "-H-"), 1u);
 }
 
 TEST(Heartbeat, AMissingSensorFileCountsAsSilenceAndEndsTheAgent) {
@@ -129,9 +129,9 @@ TEST(Heartbeat, AMissingSensorFileCountsAsSilenceAndEndsTheAgent) {
     sStart(lAgent);
     sExpectEnded(lAgent);
     EXPECT_EQ(lAgent.log().count(sUnreadable(lAgent), "-W-"), 2u);
-    EXPECT_EQ(lAgent.log().count(sUpdating), 2u);
-    EXPECT_EQ(lAgent.log().count(sChecking, "-N-"), 1u);
-    EXPECT_EQ(lAgent.log().count(sGone, "-H-"), 1u);
+    EXPECT_EQ(lAgent.log().count(scUpdating), 2u);
+    EXPECT_EQ(lAgent.log().count(scChecking, "-N-"), 1u);
+    EXPECT_EQ(lAgent.log().count(scGone, "-H-"), 1u);
 }
 
 TEST(Heartbeat, ASensorFileWithoutAPidEndsTheAgentOnceItIsSilent) {
@@ -144,7 +144,7 @@ TEST(Heartbeat, ASensorFileWithoutAPidEndsTheAgentOnceItIsSilent) {
     for (const auto& lcrpAgent : lAgents) {
         SCOPED_TRACE(readFile(lcrpAgent->sensorPidFilePath()));
         sExpectEnded(*lcrpAgent);
-        EXPECT_EQ(lcrpAgent->log().count(sGone, "-H-"), 1u);
+        EXPECT_EQ(lcrpAgent->log().count(scGone, "-H-"), 1u);
     }
 }
 
@@ -180,7 +180,7 @@ TEST(Heartbeat, TheOwnFileIsTouchedOnceACycleBeforeTheSensorIsLookedAt) {
     std::string lSequence;
     for (const ZTSLogLine& lcrLine : lLines) {
         lSequence += lcrLine.mText == "Going to wait for 1 seconds" ? "w" : "";
-        lSequence += lcrLine.mText == sUpdating ? "u" : "";
+        lSequence += lcrLine.mText == scUpdating ? "u" : "";
         lSequence += lcrLine.mText == lSetting ? "s" : "";
         lSequence += lcrLine.mText == lLooking ? "c" : "";
     }
@@ -193,5 +193,5 @@ TEST(Heartbeat, AnExitCutsTheWaitShortWithoutAnotherTouch) {
     EXPECT_EQ(lAgent.request(gcShutDownHex), gcSuccessHex);
     EXPECT_EQ(lAgent.waitForExit(), 0);
     EXPECT_EQ(lAgent.log().count("Exiting Heartbeat Handler Thread as it is marked for exit.", "-H-"), 1u);
-    EXPECT_FALSE(lAgent.log().has(sUpdating));
+    EXPECT_FALSE(lAgent.log().has(scUpdating));
 }

@@ -182,7 +182,7 @@ TEST(Log, LinesThatCannotBeWrittenGoToStandardErrorAndAreCounted) {
     EXPECT_TRUE(lIsReported) << "no line reports that " << lLost << " lines are lost:\n" << readFile(lLater.path());
 }
 
-static const std::uintmax_t sLimit = 64ull * 1024 * 1024;
+static const std::uintmax_t scLimit = 64ull * 1024 * 1024;
 
 /// A log file, sparse, of this size.
 static void sMakeLarge(const std::string& acrPath, std::uintmax_t aSize) {
@@ -192,28 +192,28 @@ static void sMakeLarge(const std::string& acrPath, std::uintmax_t aSize) {
 
 TEST(Log, AFullFileIsRenamedAndBegunAnew) {
     ZTCAgentProcess lAgent;
-    sMakeLarge(lAgent.agentLogPath(), sLimit);
+    sMakeLarge(lAgent.agentLogPath(), scLimit);
     writeFile(lAgent.agentLogPath() + ".1", "the one before");
     lAgent.start();
     lAgent.pipes().open();
     EXPECT_EQ(lAgent.request(gcStopScopeHex), gcSuccessHex);
     EXPECT_TRUE(lAgent.log().has("Stopping Scope Data Collection."));
-    EXPECT_LT(std::filesystem::file_size(lAgent.agentLogPath()), sLimit);
-    EXPECT_LE(std::filesystem::file_size(lAgent.agentLogPath() + ".1"), sLimit + 65536);
-    EXPECT_GE(std::filesystem::file_size(lAgent.agentLogPath() + ".1"), sLimit);
+    EXPECT_LT(std::filesystem::file_size(lAgent.agentLogPath()), scLimit);
+    EXPECT_LE(std::filesystem::file_size(lAgent.agentLogPath() + ".1"), scLimit + 65536);
+    EXPECT_GE(std::filesystem::file_size(lAgent.agentLogPath() + ".1"), scLimit);
     EXPECT_FALSE(exists(lAgent.agentLogPath() + ".2"));
 }
 
 TEST(Log, AFileThatFillsUpWhileTheAgentRunsIsRenamedThen) {
     ZTCAgentProcess lAgent;
-    sMakeLarge(lAgent.agentLogPath(), sLimit - 65536);
+    sMakeLarge(lAgent.agentLogPath(), scLimit - 65536);
     lAgent.start();
     lAgent.pipes().open();
     for (int i = 0; i < 3000 && !exists(lAgent.agentLogPath() + ".1"); ++i) {
         ASSERT_EQ(lAgent.request(gcStopScopeHex), gcSuccessHex);
     }
     EXPECT_TRUE(exists(lAgent.agentLogPath() + ".1"));
-    EXPECT_LE(std::filesystem::file_size(lAgent.agentLogPath() + ".1"), sLimit + 65536);
+    EXPECT_LE(std::filesystem::file_size(lAgent.agentLogPath() + ".1"), scLimit + 65536);
     EXPECT_LT(std::filesystem::file_size(lAgent.agentLogPath()), 65536u);
     EXPECT_EQ(lAgent.request(periodHex(7)), gcSuccessHex);
     EXPECT_TRUE(lAgent.log().has("The limit set is 262144"));
@@ -221,7 +221,7 @@ TEST(Log, AFileThatFillsUpWhileTheAgentRunsIsRenamedThen) {
 
 TEST(Log, OnlyTheRunningAgentRenamesAFullFile) {
     ZTCAgentProcess lAgent;
-    sMakeLarge(lAgent.defaultLogPath(), sLimit);
+    sMakeLarge(lAgent.defaultLogPath(), scLimit);
     EXPECT_EQ(lAgent.run({"-h"}).mStatus, 0);
     EXPECT_EQ(lAgent.run({"-x"}).mStatus, 0);
     EXPECT_FALSE(exists(lAgent.defaultLogPath() + ".1"));

@@ -18,7 +18,7 @@
 // Whatever a sensor does, the agent stays, or ends in order where its answer cannot be delivered; and the next sensor,
 // or the next start, is served.
 
-static const char* const sIdle = "Waiting for control availability...";
+static const char* const scIdle = "Waiting for control availability...";
 
 /// Waits until what came so far is served, refused or given up as a part of a message.
 static void sWaitUntilSettled(const ZTCAgentProcess& acrAgent, ZTCSensorPipes& arPipes) {
@@ -28,8 +28,8 @@ static void sWaitUntilSettled(const ZTCAgentProcess& acrAgent, ZTCSensorPipes& a
             return arPipes.hasNothingToTake();
         },
         "the agent to empty its command FIFO");
-    const std::size_t lWaits = acrAgent.log().count(sIdle);
-    acrAgent.log().waitFor(sIdle, lWaits + 1);
+    const std::size_t lWaits = acrAgent.log().count(scIdle);
+    acrAgent.log().waitFor(scIdle, lWaits + 1);
 }
 
 static void sExpectServed(ZTCAgentProcess& arAgent) {

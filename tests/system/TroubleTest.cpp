@@ -16,7 +16,7 @@
 
 // Files and directories in trouble while the agent starts or runs: each outcome is one that docs/operations.md names.
 
-static const char* const sLimitLine = "The limit set is 262144";
+static const char* const scLimitLine = "The limit set is 262144";
 
 /// One command that is answered and logs one line, however the log fares.
 static void sExpectServed(ZTCAgentProcess& arAgent) {
@@ -59,7 +59,7 @@ static void sExpectLinesOnStandardErrorAndCounted(ZTCAgentProcess& arAgent, cons
     sExpectServed(arAgent);
     EXPECT_EQ(arAgent.stop(), 0);
     const std::vector<ZTSLogLine> lErrorLines = parseLogLines(sStandardError(arAgent));
-    EXPECT_EQ(acrLog.count(sLimitLine) + sCount(lErrorLines, sLimitLine), lcCommands + 2);
+    EXPECT_EQ(acrLog.count(scLimitLine) + sCount(lErrorLines, scLimitLine), lcCommands + 2);
     const auto lReports = acrLog.containing("log lines could not be written to '" + acrLog.path() + "'");
     ASSERT_EQ(lReports.size(), 1u);
     EXPECT_TRUE(lReports[0].mText.starts_with(std::to_string(lErrorLines.size()) + " ")) << lReports[0].mText;
@@ -92,7 +92,7 @@ TEST(Trouble, ADeletedLogTakesLinesUntilAHangupMakesANewOne) {
     lAgent.process().sendSignal(SIGHUP);
     lAgent.log().waitFor("The log file was reopened");
     sExpectServed(lAgent);
-    EXPECT_EQ(lAgent.log().count(sLimitLine), 1u);
+    EXPECT_EQ(lAgent.log().count(scLimitLine), 1u);
     EXPECT_EQ(sStandardError(lAgent), "");
 }
 
@@ -111,7 +111,7 @@ TEST(Trouble, ALogDirectoryThatIsGoneKeepsTheFormerFileUntilItIsBack) {
     lFormer.waitFor("The log file was reopened");
     EXPECT_EQ(lFormer.containing("Cannot open the log file '" + lLog.path() + "' anew").size(), 1u);
     sExpectServed(lAgent);
-    EXPECT_EQ(lFormer.count(sLimitLine), 2u);
+    EXPECT_EQ(lFormer.count(scLimitLine), 2u);
 
     std::filesystem::create_directory(lDirectory);
     waitUntil(
@@ -122,7 +122,7 @@ TEST(Trouble, ALogDirectoryThatIsGoneKeepsTheFormerFileUntilItIsBack) {
         "the log in its directory");
     const std::string lContent = readFile(lAside);
     sExpectServed(lAgent);
-    EXPECT_TRUE(lLog.has(sLimitLine));
+    EXPECT_TRUE(lLog.has(scLimitLine));
     EXPECT_EQ(readFile(lAside), lContent);
     EXPECT_EQ(sStandardError(lAgent), "");
 }
@@ -170,7 +170,7 @@ TEST(Trouble, AFullFileSystemSendsLinesToStandardErrorAndTheyAreCounted) {
         sStart(lAgent, "/dev/full");
         sExpectServed(lAgent);
         EXPECT_EQ(lAgent.stop(), 0);
-        EXPECT_EQ(sCount(parseLogLines(sStandardError(lAgent)), sLimitLine), 2u);
+        EXPECT_EQ(sCount(parseLogLines(sStandardError(lAgent)), scLimitLine), 2u);
     }
 }
 

@@ -85,8 +85,8 @@ public:
     const ZTCEventBell& getBell() const;
 
 private:
-    class Thread;
-    std::shared_ptr<Thread> mpThread;
+    class ZTCThread;
+    std::shared_ptr<ZTCThread> mpThread;
     std::thread mRunner;
 };
 

@@ -28,9 +28,9 @@ ZTSTopologyWatchSetup makeTopologyWatchSetup() {
 }
 
 /// All that the thread touches. It is shared with it, since the thread may outlive the watch.
-class ZTCTopologyWatch::Thread {
+class ZTCTopologyWatch::ZTCThread {
 public:
-    Thread(ZTCTopologySink& arSink, ZTSTopologyWatchSetup aSetup)
+    ZTCThread(ZTCTopologySink& arSink, ZTSTopologyWatchSetup aSetup)
         : mSetup(std::move(aSetup)), mReader(mSetup.mPatience), mpSink(&arSink) {}
 
     void run();
@@ -76,7 +76,7 @@ private:
     std::optional<ZTCHistoryTime> mBlockedSince;  ///< the look after which files blocked, and have since
 };
 
-void ZTCTopologyWatch::Thread::run() {
+void ZTCTopologyWatch::ZTCThread::run() {
     do {
         try {
             turn();
@@ -92,7 +92,7 @@ void ZTCTopologyWatch::Thread::run() {
 }
 
 /// Does all that is due. A part that throws is tried again at its next time, not at once.
-void ZTCTopologyWatch::Thread::turn() {
+void ZTCTopologyWatch::ZTCThread::turn() {
     const ZTCTime lNow = std::chrono::steady_clock::now();
     if (lNow >= mNextPorts) {
         mNextPorts = lNow + mSetup.mPortsPeriod;
@@ -105,14 +105,14 @@ void ZTCTopologyWatch::Thread::turn() {
     sampleCounters();
 }
 
-ZTCTime ZTCTopologyWatch::Thread::getNext() const {
+ZTCTime ZTCTopologyWatch::ZTCThread::getNext() const {
     const std::chrono::microseconds lIntoMinute(toMicroseconds(mSetup.mClock()) % scMinute.count());
     const ZTCTime lMinuteEnd = std::chrono::steady_clock::now() + (scMinute - lIntoMinute);
     return std::min({mNextPorts, mNextWhole, lMinuteEnd});
 }
 
 /// Until something is due. False: the thread is to end.
-bool ZTCTopologyWatch::Thread::wait() {
+bool ZTCTopologyWatch::ZTCThread::wait() {
     std::unique_lock lLock(mMutex);
     if (!mIsHurried && mpSink != nullptr) {
         mChanged.wait_until(lLock, getNext(), [this] { return mIsHurried || mpSink == nullptr; });
@@ -124,7 +124,7 @@ bool ZTCTopologyWatch::Thread::wait() {
     return mpSink != nullptr;
 }
 
-void ZTCTopologyWatch::Thread::scanWhole() {
+void ZTCTopologyWatch::ZTCThread::scanWhole() {
     const auto lpTopology = std::make_shared<const ZTSTopology>(scanTopology(mSetup.mRoots, mReader));
     const ZTCHistoryTime lTime = mSetup.mClock();
     mLastWhole = std::chrono::steady_clock::now();
@@ -143,7 +143,7 @@ void ZTCTopologyWatch::Thread::scanWhole() {
 }
 
 /// A change of the ports is a reason to read everything.
-void ZTCTopologyWatch::Thread::publishPorts(const ZTSTopology& acrPorts) {
+void ZTCTopologyWatch::ZTCThread::publishPorts(const ZTSTopology& acrPorts) {
     const std::lock_guard lLock(mMutex);
     if (mpPorts != nullptr && mpPorts->mInitiators == acrPorts.mInitiators &&
         mpPorts->mRemotePorts == acrPorts.mRemotePorts) {
@@ -161,7 +161,7 @@ void ZTCTopologyWatch::Thread::publishPorts(const ZTSTopology& acrPorts) {
 }
 
 /// A difference belongs to the minute that has just ended.
-void ZTCTopologyWatch::Thread::sampleCounters() {
+void ZTCTopologyWatch::ZTCThread::sampleCounters() {
     const std::int64_t lMinute = getMinute();
     if (mLastMinute == lMinute) {
         return;
@@ -181,31 +181,31 @@ void ZTCTopologyWatch::Thread::sampleCounters() {
     }
 }
 
-void ZTCTopologyWatch::Thread::hurry() {
+void ZTCTopologyWatch::ZTCThread::hurry() {
     const std::lock_guard lLock(mMutex);
     mIsHurried = true;
     mChanged.notify_all();
 }
 
 /// Whether the thread is at its end.
-bool ZTCTopologyWatch::Thread::stop() {
+bool ZTCTopologyWatch::ZTCThread::stop() {
     std::unique_lock lLock(mMutex);
     mpSink = nullptr;
     mChanged.notify_all();
     return mChanged.wait_for(lLock, scStopPatience, [this] { return mIsOver; });
 }
 
-std::shared_ptr<const ZTSTopology> ZTCTopologyWatch::Thread::getPorts() const {
+std::shared_ptr<const ZTSTopology> ZTCTopologyWatch::ZTCThread::getPorts() const {
     const std::lock_guard lLock(mMutex);
     return mpPorts;
 }
 
-std::shared_ptr<const ZTSTopology> ZTCTopologyWatch::Thread::getTopology() const {
+std::shared_ptr<const ZTSTopology> ZTCTopologyWatch::ZTCThread::getTopology() const {
     const std::lock_guard lLock(mMutex);
     return mpTopology;
 }
 
-ZTSTopologyState ZTCTopologyWatch::Thread::getState() const {
+ZTSTopologyState ZTCTopologyWatch::ZTCThread::getState() const {
     ZTSTopologyState lState;
     lState.mBlocked = mReader.getBlockedPaths();
     const std::lock_guard lLock(mMutex);
@@ -223,7 +223,7 @@ ZTSTopologyState ZTCTopologyWatch::Thread::getState() const {
 // ---- the owner's side ----
 
 ZTCTopologyWatch::ZTCTopologyWatch(ZTCTopologySink& arSink, ZTSTopologyWatchSetup aSetup)
-    : mpThread(std::make_shared<Thread>(arSink, std::move(aSetup))),
+    : mpThread(std::make_shared<ZTCThread>(arSink, std::move(aSetup))),
       mRunner([lpThread = mpThread] { lpThread->run(); }) {}
 
 ZTCTopologyWatch::~ZTCTopologyWatch() {

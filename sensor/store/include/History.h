@@ -135,8 +135,8 @@ public:
     static std::vector<std::string> getQueries();
 
 private:
-    class Implementation;
-    std::unique_ptr<Implementation> mpImplementation;
+    class ZTCImplementation;
+    std::unique_ptr<ZTCImplementation> mpImplementation;
 };
 
 #endif

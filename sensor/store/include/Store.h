@@ -196,8 +196,8 @@ public:
 
 private:
     friend class ZTCStoreTransaction;
-    class Implementation;
-    std::unique_ptr<Implementation> mpImplementation;
+    class ZTCImplementation;
+    std::unique_ptr<ZTCImplementation> mpImplementation;
 };
 
 #endif

@@ -18,19 +18,19 @@ static ZTCDatabase sOpenDatabase(const std::string& acrPath) {
     return lDatabase;
 }
 
-ZTCHistory::Implementation::Implementation(const std::string& acrStateDirectory)
+ZTCHistory::ZTCImplementation::ZTCImplementation(const std::string& acrStateDirectory)
     : mDatabase(sOpenDatabase(getHistoryPath(acrStateDirectory))), mStoreId(ZTSCounter::read(mDatabase).mStoreId) {
     loadNames();
 }
 
-const ZTSInitiator& ZTCHistory::Implementation::getInitiator(std::uint32_t aId) {
+const ZTSInitiator& ZTCHistory::ZTCImplementation::getInitiator(std::uint32_t aId) {
     if (!mNames.getInitiators().contains(aId)) {
         loadNames();
     }
     return mNames.getInitiator(aId);
 }
 
-std::optional<ZTSRemotePort> ZTCHistory::Implementation::getPort(std::uint32_t aId) {
+std::optional<ZTSRemotePort> ZTCHistory::ZTCImplementation::getPort(std::uint32_t aId) {
     if (aId != 0 && !mNames.getPorts().contains(aId)) {
         loadNames();
     }
@@ -38,7 +38,7 @@ std::optional<ZTSRemotePort> ZTCHistory::Implementation::getPort(std::uint32_t a
 }
 
 ZTCHistory::ZTCHistory(const std::string& acrStateDirectory)
-    : mpImplementation(std::make_unique<Implementation>(acrStateDirectory)) {}
+    : mpImplementation(std::make_unique<ZTCImplementation>(acrStateDirectory)) {}
 
 ZTCHistory::~ZTCHistory() = default;
 

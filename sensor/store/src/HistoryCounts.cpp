@@ -13,8 +13,8 @@ static constexpr std::size_t scPageRows = 16384;
 
 static constexpr std::int64_t scMinutesADay = gcDayMicroseconds / gcMinuteMicroseconds;
 
-bool ZTCHistory::Implementation::visitSlots(const char* apSql, std::int64_t aFirst, std::int64_t aEnd,
-                                            const std::function<bool(const ZTSSlotRow&)>& acrVisitor) {
+bool ZTCHistory::ZTCImplementation::visitSlots(const char* apSql, std::int64_t aFirst, std::int64_t aEnd,
+                                               const std::function<bool(const ZTSSlotRow&)>& acrVisitor) {
     ZTCStatement lRows(mDatabase, apSql);
     ZTSSlotRow lLast;
     lLast.mSlot = aFirst - 1;
@@ -104,9 +104,9 @@ std::vector<ZTSPortSummary> ZTCHistory::readPorts(const ZTSHistoryFilter& acrFil
     return lPorts;
 }
 
-void ZTCHistory::Implementation::visitBuckets(const char* apSql, std::int64_t aSlotMicroseconds,
-                                              const ZTSHistoryFilter& acrFilter,
-                                              const std::function<bool(const ZTSBucket&)>& acrVisitor) {
+void ZTCHistory::ZTCImplementation::visitBuckets(const char* apSql, std::int64_t aSlotMicroseconds,
+                                                 const ZTSHistoryFilter& acrFilter,
+                                                 const std::function<bool(const ZTSBucket&)>& acrVisitor) {
     loadNames();
     const ZTCFilterTest lTest(acrFilter, mNames);
     const auto [lFirst, lEnd] = sSlots(acrFilter, aSlotMicroseconds);

@@ -61,8 +61,8 @@ bool ZTCFilterTest::matchesLuns(const std::optional<ZTSLunSet>& acrLuns) const {
            });
 }
 
-std::optional<ZTSEpisode> ZTCHistory::Implementation::readEpisode(const ZTCStatement& acrRow,
-                                                                  const ZTCFilterTest* apTest) {
+std::optional<ZTSEpisode> ZTCHistory::ZTCImplementation::readEpisode(const ZTCStatement& acrRow,
+                                                                     const ZTCFilterTest* apTest) {
     const auto lInitiator = acrRow.number<std::uint32_t>(1);
     const auto lPort = acrRow.number<std::uint32_t>(3);
     ZTSEpisode lEpisode;
@@ -93,8 +93,8 @@ std::optional<ZTSEpisode> ZTCHistory::Implementation::readEpisode(const ZTCState
     return lEpisode;
 }
 
-std::vector<ZTSEpisode> ZTCHistory::Implementation::readRange(std::uint64_t aFirst, std::uint64_t aEnd,
-                                                              const ZTCFilterTest& acrTest) {
+std::vector<ZTSEpisode> ZTCHistory::ZTCImplementation::readRange(std::uint64_t aFirst, std::uint64_t aEnd,
+                                                                 const ZTCFilterTest& acrTest) {
     std::vector<ZTSEpisode> lPage;
     ZTCStatement lRows(mDatabase, HistoryQueries::gcEpisodeRange);
     lRows.query(aFirst, aEnd, acrTest.getSince(), acrTest.getUntil());
@@ -106,7 +106,7 @@ std::vector<ZTSEpisode> ZTCHistory::Implementation::readRange(std::uint64_t aFir
     return lPage;
 }
 
-std::vector<ZTSEpisode> ZTCHistory::Implementation::readOpen(const ZTCFilterTest& acrTest) {
+std::vector<ZTSEpisode> ZTCHistory::ZTCImplementation::readOpen(const ZTCFilterTest& acrTest) {
     std::vector<ZTSEpisode> lOpen;
     ZTCStatement lRows(mDatabase, HistoryQueries::gcOpenEpisodes);
     lRows.query();
@@ -130,7 +130,7 @@ static bool sVisitPage(std::vector<ZTSEpisode>& arPage, bool aIsRising, std::uin
         arPage, [&](const ZTSEpisode& acrEpisode) { return acrEpisode.mSeq <= aAfterSeq || acrVisitor(acrEpisode); });
 }
 
-std::optional<std::uint64_t> ZTCHistory::Implementation::findFirst(const ZTSHistoryFilter& acrFilter) {
+std::optional<std::uint64_t> ZTCHistory::ZTCImplementation::findFirst(const ZTSHistoryFilter& acrFilter) {
     ZTCStatement lFirst(mDatabase,
                         acrFilter.mSince ? HistoryQueries::gcFirstEpisodeSince : HistoryQueries::gcFirstEpisode);
     if (acrFilter.mSince) {
@@ -139,8 +139,8 @@ std::optional<std::uint64_t> ZTCHistory::Implementation::findFirst(const ZTSHist
     return lFirst.step() && !lFirst.isNull(0) ? std::optional(lFirst.number<std::uint64_t>(0)) : std::nullopt;
 }
 
-void ZTCHistory::Implementation::visitPages(const ZTSHistoryFilter& acrFilter, bool aIsRising,
-                                            const std::function<bool(const ZTSEpisode&)>& acrVisitor) {
+void ZTCHistory::ZTCImplementation::visitPages(const ZTSHistoryFilter& acrFilter, bool aIsRising,
+                                               const std::function<bool(const ZTSEpisode&)>& acrVisitor) {
     const ZTCFilterTest lTest(acrFilter, mNames);
     if (acrFilter.mIsOpenOnly) {
         std::vector<ZTSEpisode> lOpen = readOpen(lTest);
@@ -163,9 +163,9 @@ void ZTCHistory::Implementation::visitPages(const ZTSHistoryFilter& acrFilter, b
     }
 }
 
-std::vector<ZTSStoredRecord> ZTCHistory::Implementation::readRecords(const ZTSEpisode& acrEpisode,
-                                                                     const ZTSHistoryFilter& acrFilter,
-                                                                     const ZTCFilterTest& acrTest) {
+std::vector<ZTSStoredRecord> ZTCHistory::ZTCImplementation::readRecords(const ZTSEpisode& acrEpisode,
+                                                                        const ZTSHistoryFilter& acrFilter,
+                                                                        const ZTCFilterTest& acrTest) {
     const std::uint64_t lPerEnd = ZTSCounter::read(mDatabase).mRecordsPerEnd;
     const ZTSKindShape* const lpShape = acrEpisode.mIsMalformed ? nullptr : findKindShape(acrEpisode.mKind);
     std::vector<ZTSStoredRecord> lRecords;

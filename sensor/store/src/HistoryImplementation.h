@@ -100,9 +100,9 @@ private:
     std::int64_t mUntil;
 };
 
-class ZTCHistory::Implementation {
+class ZTCHistory::ZTCImplementation {
 public:
-    explicit Implementation(const std::string& acrStateDirectory);
+    explicit ZTCImplementation(const std::string& acrStateDirectory);
 
     /// Reads the names again: they may have grown or changed.
     void loadNames() { mNames.load(); }

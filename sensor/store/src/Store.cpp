@@ -24,7 +24,7 @@ void ZTCStoreTransaction::commit() {
 }
 
 ZTCStore::ZTCStore(const std::string& acrStateDirectory, const ZTSStoreLimits& acrLimits, Report aReport)
-    : mpImplementation(std::make_unique<Implementation>(acrStateDirectory, acrLimits, std::move(aReport))) {}
+    : mpImplementation(std::make_unique<ZTCImplementation>(acrStateDirectory, acrLimits, std::move(aReport))) {}
 
 ZTCStore::~ZTCStore() = default;
 

@@ -61,22 +61,22 @@ void ZTSOpenStore::flush() {
     }
 }
 
-ZTCStore::Implementation::Implementation(const std::string& acrStateDirectory, const ZTSStoreLimits& acrLimits,
-                                         Report aReport)
+ZTCStore::ZTCImplementation::ZTCImplementation(const std::string& acrStateDirectory, const ZTSStoreLimits& acrLimits,
+                                               Report aReport)
     : mPath(getHistoryPath(acrStateDirectory)), mLimits(acrLimits), mReport(std::move(aReport)) {
     open();
 }
 
 /// Moves the journal into the database, which is then whole in one file: a copy of it, or damage to it, is seen as
 /// such.
-ZTCStore::Implementation::~Implementation() {
+ZTCStore::ZTCImplementation::~ZTCImplementation() {
     if (mpOpen != nullptr && !mIsInTransaction && !mIsDamaged) {
         sqlite3_busy_timeout(mpOpen->mDatabase.handle(), 0);  // a reader that is at it now must not hold up the end
         sqlite3_wal_checkpoint_v2(mpOpen->mDatabase.handle(), nullptr, SQLITE_CHECKPOINT_TRUNCATE, nullptr, nullptr);
     }
 }
 
-void ZTCStore::Implementation::open() {
+void ZTCStore::ZTCImplementation::open() {
     try {
         mpOpen.reset();
         mpOpen = std::make_unique<ZTSOpenStore>(mPath);
@@ -93,7 +93,7 @@ void ZTCStore::Implementation::open() {
     mpOpen->mEpisodes.setLimits(mLimits.mEpisodeGap.count(), mLimits.mRecordsPerEnd);
 }
 
-void ZTCStore::Implementation::reopen() {
+void ZTCStore::ZTCImplementation::reopen() {
     mpOpen.reset();
     mIsInTransaction = false;
     if (std::exchange(mIsDamaged, false)) {
@@ -105,7 +105,7 @@ void ZTCStore::Implementation::reopen() {
     open();
 }
 
-void ZTCStore::Implementation::loadAgain() {
+void ZTCStore::ZTCImplementation::loadAgain() {
     if (mpOpen == nullptr) {
         open();  // an earlier attempt to open it failed
     }
@@ -115,7 +115,7 @@ void ZTCStore::Implementation::loadAgain() {
     }
 }
 
-void ZTCStore::Implementation::begin() {
+void ZTCStore::ZTCImplementation::begin() {
     keepUp("begin", [&] {
         mpOpen->mDatabase.execute("BEGIN IMMEDIATE");
         mIsInTransaction = true;
@@ -124,7 +124,7 @@ void ZTCStore::Implementation::begin() {
     });
 }
 
-void ZTCStore::Implementation::commit() {
+void ZTCStore::ZTCImplementation::commit() {
     change("commit", [&] {
         mpOpen->flush();
         mpOpen->mDatabase.execute("COMMIT");
@@ -132,7 +132,7 @@ void ZTCStore::Implementation::commit() {
     });
 }
 
-void ZTCStore::Implementation::rollBack() noexcept {
+void ZTCStore::ZTCImplementation::rollBack() noexcept {
     if (mpOpen != nullptr) {
         mpOpen->mDatabase.rollBack();
     }
@@ -140,8 +140,8 @@ void ZTCStore::Implementation::rollBack() noexcept {
     mIsInTransaction = false;
 }
 
-ZTSTakenIn ZTCStore::Implementation::takeIn(std::uint64_t aNumber, const std::string& acrGeneration,
-                                            std::span<const std::uint8_t> aBody, bool aIsTorn, std::int64_t aNow) {
+ZTSTakenIn ZTCStore::ZTCImplementation::takeIn(std::uint64_t aNumber, const std::string& acrGeneration,
+                                               std::span<const std::uint8_t> aBody, bool aIsTorn, std::int64_t aNow) {
     ZTSOpenStore& lrOpen = *mpOpen;
     const bool lIsThere = lrOpen.mFindFrame.query(aNumber).step();
     lrOpen.mFindFrame.reset();
@@ -179,7 +179,7 @@ ZTSTakenIn ZTCStore::Implementation::takeIn(std::uint64_t aNumber, const std::st
     return lTaken;
 }
 
-bool ZTCStore::Implementation::retireStep(std::int64_t aNow, std::chrono::steady_clock::time_point aSteadyNow) {
+bool ZTCStore::ZTCImplementation::retireStep(std::int64_t aNow, std::chrono::steady_clock::time_point aSteadyNow) {
     begin();
     const bool lHasMore = change("retention", [&] { return mpOpen->mRetention.step(mLimits, aNow, aSteadyNow); });
     commit();
@@ -187,7 +187,7 @@ bool ZTCStore::Implementation::retireStep(std::int64_t aNow, std::chrono::steady
     return lHasMore || lHasPages;
 }
 
-void ZTCStore::Implementation::checkpoint() {
+void ZTCStore::ZTCImplementation::checkpoint() {
     if (getFileBytes(mPath + "-wal") < scJournalBytes) {
         return;
     }
@@ -200,7 +200,7 @@ void ZTCStore::Implementation::checkpoint() {
     });
 }
 
-bool ZTCStore::Implementation::hasFrame(std::uint64_t aNumber) {
+bool ZTCStore::ZTCImplementation::hasFrame(std::uint64_t aNumber) {
     return look("hasFrame", [&] {
         if (aNumber + scRememberedFrames <= mpOpen->mCounter.mLastFrame) {
             return true;

@@ -46,9 +46,9 @@ struct ZTSOpenStore {
     ZTCStatement mDeleteFrames{mDatabase, "DELETE FROM frame WHERE number <= ?"};
 };
 
-class ZTCStore::Implementation {
+class ZTCStore::ZTCImplementation {
 public:
-    Implementation(const std::string& acrStateDirectory, const ZTSStoreLimits& acrLimits, Report aReport);
+    ZTCImplementation(const std::string& acrStateDirectory, const ZTSStoreLimits& acrLimits, Report aReport);
 
     /// Runs an operation of the present transaction. An exception rolls it back.
     template <typename Call>
@@ -76,9 +76,9 @@ public:
         return watch(apName, aCall);
     }
 
-    ~Implementation();
-    Implementation(const Implementation&) = delete;
-    Implementation& operator=(const Implementation&) = delete;
+    ~ZTCImplementation();
+    ZTCImplementation(const ZTCImplementation&) = delete;
+    ZTCImplementation& operator=(const ZTCImplementation&) = delete;
 
     void open();
     void reopen();

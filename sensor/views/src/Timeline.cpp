@@ -12,10 +12,10 @@
 
 using ZTCJson = nlohmann::ordered_json;
 
-/// From this range on the columns are so wide that whole days do: the store keeps counts for both.
-static constexpr std::chrono::hours scDayColumns{24};
-
 namespace {
+
+/// From this range on the columns are so wide that whole days do: the store keeps counts for both.
+constexpr std::chrono::hours scDayColumns{24};
 
 struct ZTSCell {
     std::uint64_t mCount = 0;
@@ -74,9 +74,7 @@ private:
     std::map<Key, ZTSRow> mRows;
 };
 
-}  // namespace
-
-static ZTCJson sCoverage(const ZTCHistory& acrHistory, const ZTSTimelineRequest& acrRequest) {
+ZTCJson sCoverage(const ZTCHistory& acrHistory, const ZTSTimelineRequest& acrRequest) {
     ZTCJson lStates = ZTCJson::array();
     for (const ZTSCoverage& lrCoverage : acrHistory.readCoverage(acrRequest.mFrom, acrRequest.mTo)) {
         if (lrCoverage.mState != ZTKST_Listening && lrCoverage.mState != ZTKST_NoSource) {
@@ -89,6 +87,8 @@ static ZTCJson sCoverage(const ZTCHistory& acrHistory, const ZTSTimelineRequest&
     }
     return lStates;
 }
+
+}  // namespace
 
 ZTCJson makeTimelineDocument(const ZTCHistory& acrHistory, const ZTSTimelineRequest& acrRequest,
                              const ZTCNameBook& acrNames, const std::string& acrHost) {

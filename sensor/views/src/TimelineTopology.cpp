@@ -11,14 +11,14 @@
 
 using ZTCJson = nlohmann::ordered_json;
 
-/// A month in which each of 16 ports has a minute with errors in five.
-static constexpr std::size_t scMostSamples = 200000;
+namespace {
 
-static ZTCJson sText(const std::optional<std::string>& acrText) {
+/// A month in which each of 16 ports has a minute with errors in five.
+constexpr std::size_t scMostSamples = 200000;
+
+ZTCJson sText(const std::optional<std::string>& acrText) {
     return acrText && !acrText->empty() ? ZTCJson(*acrText) : ZTCJson(nullptr);
 }
-
-namespace {
 
 /// The states of the initiators' links, as intervals.
 class ZTCLinkStates {
@@ -90,12 +90,10 @@ private:
     std::vector<Ended> mEnded;
 };
 
-}  // namespace
-
 /// The first topology of the range, and since when it is known: exactly where it reaches back to the begin, else to the
 /// column. Absent: there is none up to the end.
-static std::optional<std::pair<ZTSTopology, ZTCHistoryTime>> sFindFirst(const ZTCHistory& acrHistory,
-                                                                        const ZTSTimelineRequest& acrRequest) {
+std::optional<std::pair<ZTSTopology, ZTCHistoryTime>> sFindFirst(const ZTCHistory& acrHistory,
+                                                                 const ZTSTimelineRequest& acrRequest) {
     const auto lAt = [&acrRequest](std::size_t aColumn) {
         return acrRequest.mFrom + (acrRequest.mTo - acrRequest.mFrom) / static_cast<std::int64_t>(acrRequest.mColumns) *
                                       static_cast<std::int64_t>(aColumn);
@@ -124,7 +122,7 @@ static std::optional<std::pair<ZTSTopology, ZTCHistoryTime>> sFindFirst(const ZT
     return std::pair(lFound->mTopology, lAt(lPresent));
 }
 
-static ZTCJson sLinks(const ZTCHistory& acrHistory, const ZTSTimelineRequest& acrRequest) {
+ZTCJson sLinks(const ZTCHistory& acrHistory, const ZTSTimelineRequest& acrRequest) {
     ZTCLinkStates lStates(acrRequest.mTo);
     const auto lFirst = sFindFirst(acrHistory, acrRequest);
     if (!lFirst) {
@@ -152,7 +150,7 @@ static ZTCJson sLinks(const ZTCHistory& acrHistory, const ZTSTimelineRequest& ac
 }
 
 /// Targets that the host knows, each once, with the words of the array behind it.
-static ZTCJson sRemotePorts(const ZTSTopology& acrTopology, const ZTCNameBook& acrNames) {
+ZTCJson sRemotePorts(const ZTSTopology& acrTopology, const ZTCNameBook& acrNames) {
     std::map<std::string, const ZTSTopologyPath*> lPaths;  // one of each remote port
     for (const ZTSTopologyPath& lrPath : acrTopology.mPaths) {
         lPaths.emplace(lrPath.mRemotePort, &lrPath);
@@ -179,8 +177,7 @@ static ZTCJson sRemotePorts(const ZTSTopology& acrTopology, const ZTCNameBook& a
     return lPorts;
 }
 
-static ZTCJson sCounters(const ZTCHistory& acrHistory, const ZTSTimelineRequest& acrRequest,
-                         const ZTCNameBook& acrNames) {
+ZTCJson sCounters(const ZTCHistory& acrHistory, const ZTSTimelineRequest& acrRequest, const ZTCNameBook& acrNames) {
     struct Counter {
         ZTSCounterSample mSample;  ///< one of its samples: it names the ports and the counter
         std::map<std::size_t, std::uint64_t> mCells;
@@ -219,6 +216,8 @@ static ZTCJson sCounters(const ZTCHistory& acrHistory, const ZTSTimelineRequest&
     }
     return lList;
 }
+
+}  // namespace
 
 void addTopology(ZTCJson& arDocument, const ZTCHistory& acrHistory, const ZTSTimelineRequest& acrRequest,
                  const ZTCNameBook& acrNames) {

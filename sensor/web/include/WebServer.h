@@ -70,8 +70,8 @@ public:
     unsigned getPort() const;
 
 private:
-    class Implementation;
-    std::unique_ptr<Implementation> mpImplementation;
+    class ZTCImplementation;
+    std::unique_ptr<ZTCImplementation> mpImplementation;
 };
 
 #endif

@@ -51,9 +51,9 @@ std::string ZTSWebRequest::get(const std::string& acrName) const {
     return lValues.empty() ? std::string() : lValues.back();
 }
 
-class ZTCWebServer::Implementation {
+class ZTCWebServer::ZTCImplementation {
 public:
-    Implementation(const ZTSWebOptions& acrOptions, Handler aHandler)
+    ZTCImplementation(const ZTSWebOptions& acrOptions, Handler aHandler)
         : mOptions(acrOptions), mHandler(std::move(aHandler)), mSocket(openListenSocket(acrOptions.mListen)) {
         mpDaemon = MHD_start_daemon(
             MHD_USE_INTERNAL_POLLING_THREAD | MHD_USE_EPOLL | MHD_USE_ITC | MHD_ALLOW_SUSPEND_RESUME, 0, nullptr,
@@ -67,7 +67,7 @@ public:
         mWatcher = std::thread([this] { watch(); });
     }
 
-    ~Implementation() {
+    ~ZTCImplementation() {
         {
             const std::lock_guard lLock(mMutex);
             mIsStopping = true;
@@ -84,8 +84,8 @@ public:
             unlink(mSocket.mUnixPath.c_str());
         }
     }
-    Implementation(const Implementation&) = delete;
-    Implementation& operator=(const Implementation&) = delete;
+    ZTCImplementation(const ZTCImplementation&) = delete;
+    ZTCImplementation& operator=(const ZTCImplementation&) = delete;
 
     unsigned getPort() const { return mSocket.mPort; }
 
@@ -116,7 +116,7 @@ private:
 
     /// One reader of the stream.
     struct Stream {
-        Implementation* mpOwner = nullptr;
+        ZTCImplementation* mpOwner = nullptr;
         MHD_Connection* mpConnection = nullptr;
         std::string mPending;
         bool mIsSuspended = false;
@@ -128,7 +128,7 @@ private:
 
     static void sConnectionChanged(void* apThis, MHD_Connection* apConnection, void**,
                                    MHD_ConnectionNotificationCode aCode) {
-        auto& lrThis = *static_cast<Implementation*>(apThis);
+        auto& lrThis = *static_cast<ZTCImplementation*>(apThis);
         const std::lock_guard lLock(lrThis.mMutex);
         if (aCode == MHD_CONNECTION_NOTIFY_CLOSED) {
             lrThis.mConnections.erase(apConnection);
@@ -141,13 +141,13 @@ private:
     }
 
     static void sRequestCompleted(void* apThis, MHD_Connection* apConnection, void**, MHD_RequestTerminationCode) {
-        auto& lrThis = *static_cast<Implementation*>(apThis);
+        auto& lrThis = *static_cast<ZTCImplementation*>(apThis);
         lrThis.setDeadline(apConnection, lrThis.mOptions.mLimits.mRequestTime);
     }
 
     static MHD_Result sAnswer(void* apThis, MHD_Connection* apConnection, const char* apPath, const char* apMethod,
                               const char*, const char*, size_t* apUploadSize, void** appState) {
-        auto& lrThis = *static_cast<Implementation*>(apThis);
+        auto& lrThis = *static_cast<ZTCImplementation*>(apThis);
         const bool lIsGet = std::strcmp(apMethod, MHD_HTTP_METHOD_GET) == 0;
         if (!lIsGet && std::strcmp(apMethod, MHD_HTTP_METHOD_HEAD) != 0) {
             return lrThis.respond(apConnection, {.mStatus = MHD_HTTP_METHOD_NOT_ALLOWED,
@@ -209,7 +209,7 @@ private:
 
     static void sFreeStream(void* apStream) {
         const auto* lpStream = static_cast<Stream*>(apStream);
-        Implementation& lrThis = *lpStream->mpOwner;
+        ZTCImplementation& lrThis = *lpStream->mpOwner;
         const std::lock_guard lLock(lrThis.mMutex);
         lrThis.mStreams.erase(lpStream->mPlace);
     }
@@ -354,7 +354,7 @@ private:
 };
 
 ZTCWebServer::ZTCWebServer(const ZTSWebOptions& acrOptions, Handler aHandler)
-    : mpImplementation(std::make_unique<Implementation>(acrOptions, std::move(aHandler))) {}
+    : mpImplementation(std::make_unique<ZTCImplementation>(acrOptions, std::move(aHandler))) {}
 
 ZTCWebServer::~ZTCWebServer() = default;
 

@@ -11,25 +11,25 @@ using testing::AllOf;
 using testing::HasSubstr;
 using testing::ThrowsMessage;
 
-static const char* const sNode = "50:06:01:60:bb:a0:12:34";
-static const char* const sPort = "50:06:01:60:3b:a0:12:34";
+static const char* const scNode = "50:06:01:60:bb:a0:12:34";
+static const char* const scPort = "50:06:01:60:3b:a0:12:34";
 
 static ZTSTargetPort sTarget(std::uint32_t aFcId) {
-    return {ZTSFcName::fromText(sNode), ZTSFcName::fromText(sPort), aFcId};
+    return {ZTSFcName::fromText(scNode), ZTSFcName::fromText(scPort), aFcId};
 }
 
 TEST(TargetText, ReadsNamesAndTheAddressInEitherBase) {
-    const std::string lNames = std::string(sNode) + "," + sPort + ",";
+    const std::string lNames = std::string(scNode) + "," + scPort + ",";
     EXPECT_EQ(parseTarget(lNames + "0x010203"), sTarget(0x010203));
     EXPECT_EQ(parseTarget(lNames + "66051"), sTarget(66051));
-    EXPECT_EQ(parseTarget(std::string(" ") + sNode + " \t" + sPort + ", 7\r"), sTarget(7));
+    EXPECT_EQ(parseTarget(std::string(" ") + scNode + " \t" + scPort + ", 7\r"), sTarget(7));
 }
 
 TEST(TargetText, NamesThePartThatIsWrong) {
-    const std::string lNames = std::string(sNode) + "," + sPort + ",";
+    const std::string lNames = std::string(scNode) + "," + scPort + ",";
     EXPECT_THAT([] { parseTarget("a,b"); },
                 ThrowsMessage<ZTCBadInputEx>(AllOf(HasSubstr("2 parts"), HasSubstr("a,b"))));
-    EXPECT_THAT([&] { parseTarget(std::string("x,") + sPort + ",1"); },
+    EXPECT_THAT([&] { parseTarget(std::string("x,") + scPort + ",1"); },
                 ThrowsMessage<ZTCBadInputEx>(HasSubstr("\"x\" is no world wide name")));
     EXPECT_THAT([&] { parseTarget(lNames + "0x1000000"); },
                 ThrowsMessage<ZTCBadInputEx>(AllOf(HasSubstr("0x1000000"), HasSubstr("16777215"))));
@@ -40,13 +40,13 @@ TEST(TargetText, NamesThePartThatIsWrong) {
 }
 
 TEST(TargetText, AFileHoldsOneTargetALineWithCommentsAndEmptyLines) {
-    std::istringstream lFile(std::string("# targets\n\n") + sNode + " " + sPort + " 1  # the first\n   \n" + sNode +
-                             "," + sPort + ",0x2");
+    std::istringstream lFile(std::string("# targets\n\n") + scNode + " " + scPort + " 1  # the first\n   \n" + scNode +
+                             "," + scPort + ",0x2");
     EXPECT_EQ(readTargets(lFile, "file"), (std::vector<ZTSTargetPort>{sTarget(1), sTarget(2)}));
 }
 
 TEST(TargetText, AnErrorInAFileNamesTheLine) {
-    std::istringstream lFile(std::string("#\n") + sNode + "," + sPort + ",1\nrubbish\n");
+    std::istringstream lFile(std::string("#\n") + scNode + "," + scPort + ",1\nrubbish\n");
     EXPECT_THAT([&] { readTargets(lFile, "ports.txt"); },
                 ThrowsMessage<ZTCBadInputEx>(AllOf(HasSubstr("ports.txt:3: "), HasSubstr("rubbish"))));
 }

@@ -21,6 +21,9 @@ namespace {
 
 using NamedPipeReading = ZTCNamedPipeFixture;
 
+/// A handler of a signal.
+void sDoNothing(int) {}
+
 }  // namespace
 
 TEST_F(NamedPipeReading, AMessageIsReadWhole) {
@@ -193,8 +196,6 @@ TEST_F(NamedPipeReading, ATrickleDoesNotHoldUpAnExit) {
     lWaiter.join();
     EXPECT_EQ(mLog.countMark("-E-"), 0u);
 }
-
-static void sDoNothing(int) {}
 
 TEST_F(NamedPipeReading, ASignalToTheThreadDoesNotEndItsWait) {
     struct sigaction lAction {};

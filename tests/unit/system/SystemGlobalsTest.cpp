@@ -84,11 +84,7 @@ static unsigned sNumberOfThreadsToEndWith() {
     return sNumberOfThreads();
 }
 
-namespace {
-
 using SystemMainTest = ZTCSystemMainFixture;
-
-}  // namespace
 
 TEST(SystemGlobals, TheHeartbeatTimeoutIsTwoHundredAndFortySecondsUntilItIsSet) {
     unsigned lSeconds = 0;
