@@ -1,8 +1,8 @@
 // The history against plainer tables, all with the same settings of SQLite:
 //
 //   TakeIn/*       a full response (65,536 records, 64 ports and 20 kinds in turn) into episodes, counts and raw
-//   records;
-//                  "new": every episode begins, "open": every episode is open already
+//   records.
+//                  "new": every episode begins. "open": every episode is open already
 //   InsertEach     the same response, one INSERT a record in one transaction
 //   Ports          remote ports of 30 days by occurrences, over a million episodes that hold ten million occurrences
 //   GroupEach      the same question to a table with one row an event

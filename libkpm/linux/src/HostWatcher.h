@@ -35,11 +35,11 @@ public:
     std::optional<std::uint32_t> findBoard(std::uint32_t aHost);
     std::optional<std::uint32_t> findKnownBoard(std::uint32_t aHost) const { return mBoards.findHost(aHost); }
 
-    /// A message told of the board's link or port: its state is read again. With `aIsUp`, the message said that the
-    /// link went up, or down.
+    /// A message reported a change of the board's link or port: its state is read again. `aIsUp`: whether the message
+    /// said that the link went up; nothing where it did not say.
     void noteLinkMessage(std::uint32_t aBoard, std::optional<bool> aIsUp);
 
-    /// No message that was sent before the last look is still to come.
+    /// To be called once all messages that were sent before the last look have been read.
     void forgetLinkMessages();
 
     /// A remote port's names may have changed.

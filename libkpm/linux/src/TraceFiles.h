@@ -1,5 +1,5 @@
-/// Writing to tracefs: the directories of instances and the control files in them. Tests replace
-/// it with a double that behaves as the kernel does.
+/// Writing to tracefs: the directories of instances and the control files in them. Tests replace it with a double that
+/// behaves as the kernel does.
 #ifndef LIBKPM_LINUX_SRC_TRACEFILES_H
 #define LIBKPM_LINUX_SRC_TRACEFILES_H
 

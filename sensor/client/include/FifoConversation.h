@@ -29,9 +29,8 @@
 class ZTCFifoConversation {
 public:
     /// @param aDirectory         the install directory
-    /// @param aCancelDescriptor  not owned; once it is readable, waiting ends with ZTCCancelledEx as long as no byte of
-    /// a
-    ///                           request has been sent. -1 = none
+    /// @param aCancelDescriptor  not owned; -1: none. Once it is readable, waiting ends with ZTCCancelledEx, as long as
+    ///                           no byte of a request has been sent.
     explicit ZTCFifoConversation(std::string aDirectory, int aCancelDescriptor = -1);
 
     /// Does nothing when connected. Throws ZTCNoAnswerEx when the limit passes first, ZTCCancelledEx, ZTCSystemCallEx.

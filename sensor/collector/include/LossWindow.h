@@ -31,8 +31,8 @@ public:
     /// JSON of one line.
     std::string toText() const;
 
-    /// Counts what is new on the page. The first page of a start that is older than this object is where counting
-    /// begins. Returns whether there was anything new: toText() has changed.
+    /// Counts what is new on the page. Of a start that is older than this object, only what comes after its first
+    /// page counts. Returns whether there was anything new: toText() has changed.
     bool note(const ZTSStatusSnapshot& acrPage, ZTCHistoryTime aNow);
     /// @param aSince  counted from then on, to the minute or to the hour; the last 24 hours at most
     ZTSLosses get(ZTCHistoryTime aNow, ZTCHistoryTime aSince = {});

@@ -22,9 +22,9 @@ std::span<const ZTSKeeperRule> keeperRules() {
         {ZTKR_CollectorFailed, "the collector ended before that", "start it after 1 s, then 2, 4 ... 60 s", seconds(1),
          seconds(60)},
         {ZTKR_CollectorRefused,
-         "the collector ended with status 2 (a history of a newer version, say), and none of this sensor has worked",
-         "what it cannot use is in its last line: the sensor stops, with status 2; later in a sensor's life it is "
-         "started again as after any other end",
+         "the collector ended with status 2, for example because a newer version has written the history",
+         "if no collector of this sensor has worked, the sensor stops with status 2: the collector's last line names "
+         "what it cannot use. Otherwise it is started again as after any other end",
          seconds(0), seconds(0)},
         {ZTKR_AgentStill, "the agent's pid file has not been touched for twice its heartbeat and 5 s",
          "the agent hangs: SIGTERM, after 15 s SIGKILL", seconds(5), seconds(15)},

@@ -1,8 +1,8 @@
 /// An outlet that is given every change of an episode, in the order of the history, at least once.
 ///
 /// The history keeps a number for each outlet: the last change that it has. So an outlet that was away goes on where it
-/// stopped. Changes that retention took before are counted in the history, and the outlet gets their
-/// number.
+/// stopped. The history counts changes that retention removed before the outlet had them, and the outlet gets
+/// their number.
 #ifndef SENSOR_OUTLETS_INCLUDE_CHANGEOUTLET_H
 #define SENSOR_OUTLETS_INCLUDE_CHANGEOUTLET_H
 
@@ -29,8 +29,8 @@ public:
 
     /// Takes all of them, or throws ZTCSystemCallEx: they are then given again.
     virtual void write(std::span<const ZTSOutletChange> aChanges) = 0;
-    /// Retention has taken so many changes before they could be given. Throws as write(). @param acrLine  the same in
-    /// JSON, without a line break
+    /// Retention has removed so many changes before they could be given. Throws as write().
+    /// @param acrLine  the same in JSON, without a line break
     virtual void writeMissed(std::uint64_t aChanges, const std::string& acrLine) = 0;
 };
 

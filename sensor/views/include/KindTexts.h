@@ -16,10 +16,9 @@ struct ZTSKindText {
     std::string mConsolidation;  ///< "The next event of the kind is counted ..."
 };
 
-/// Reads the sections of a page of this form: "## Title (`kind`)", then paragraphs, of which the one on causes begins
-/// with
-/// "*Usual causes.*", the next with "*Look at.*" and the last with "*The next event of the kind is*". The first of the
-/// others that does not begin with "Category" is the meaning. Headings without a kind are skipped.
+/// Reads the sections of a page. A section begins with "## Title (`kind`)"; headings without a kind are skipped. Its
+/// paragraph on causes begins with "*Usual causes.*", the next one with "*Look at.*", and the last one with "*The next
+/// event of the kind is*". The first of the others that does not begin with "Category" is the meaning.
 std::vector<ZTSKindText> parseKindTexts(std::string_view aPage);
 
 /// The sections of docs/events.md, in its order.

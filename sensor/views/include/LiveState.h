@@ -13,8 +13,9 @@
 ///      "collector": {"pid": 812, "since": "…", "lastAsked": "…", "lastRetrieval": "…", "lastEvent": "…",
 ///                    "lastEventKind": "rscn", "disk": "ok", "diskProblem": null, "waitingFrames": 0,
 ///                    "waitingBytes": 0},
-///      "adapters": [{"wwpn": "10:…:01", "wwnn": "20:…:01", "host": "host7", "portState": "Online", "speed": "16
-///      Gbit"}], "kinds": [{"initiator": {"wwpn": "10:…:01", "wwnn": "20:…:01", "host": "host7"},
+///      "adapters": [{"wwpn": "10:…:01", "wwnn": "20:…:01", "host": "host7", "portState": "Online",
+///                    "speed": "16 Gbit"}],
+///      "kinds": [{"initiator": {"wwpn": "10:…:01", "wwnn": "20:…:01", "host": "host7"},
 ///                 "kinds": {"rscn": "listening", "link": "no_rights"}, "words": {"link": "needs CAP_NET_ADMIN"}}],
 ///      "ledger": [{"initiator": {…}, "kind": "rscn", "received": 9, "refused": {"total-limit": 0}, "consolidated": 9,
 ///                  "handedOver": 9, "held": 0, "dropped": 0}],
@@ -34,13 +35,11 @@
 ///   line that names the folder and the reason. `waitingFrames` and `waitingBytes` are in the spool, not yet in the
 ///   history.
 /// - `kinds`: an entry an adapter. `words` are the adapters' library's own, for kinds it has said something of.
-/// - `ledger`: the totals of all agents that the database has seen, the running one's up to now. Where it is missing
-/// the
-///   reader takes the rows that the history holds.
-/// - `topology`: when the names of ports and disks were last read, and since when they are not as of now: files of the
-///   kernel in `blocked` do not answer, or the whole reading hangs.
-/// - `losses`: what was refused or dropped in the last 24 hours, as far back as `since` where the collector knows less.
-///
+/// - `ledger`: the totals of all agents that the database has seen, the running one's up to now. Where it is missing,
+///   the reader takes the rows that the history holds.
+/// - `topology`: when the names of ports and disks were last read. `staleSince`: since when they may be out of date,
+///   because the files in `blocked` do not answer, or the whole reading hangs.
+/// - `losses`: what was refused or dropped in the last 24 hours, or since `since` where the collector knows less.
 /// - `warnings` are the open ones of the configuration's rules: `given` so often, `next` time if the trouble goes on. A
 ///   hook that failed is one of the kind `hook`, an output that cannot be written one of the kind `output`, until it
 ///   works again.
