@@ -1,6 +1,7 @@
 /// A file of JSON lines, rotated by rename: NAME becomes NAME.1, NAME.1 becomes NAME.2, and so on.
 ///
-/// A line is in the file whole or not at all. Readers that follow the file by name see each line once.
+/// A line is in the file whole or not at all; what a killed process has left of one is taken away. Readers that follow
+/// the file by name see each line once.
 #ifndef SENSOR_OUTLETS_INCLUDE_NDJSONFILE_H
 #define SENSOR_OUTLETS_INCLUDE_NDJSONFILE_H
 
@@ -30,6 +31,7 @@ private:
     const std::uint64_t mKeep;
     ZTCFileDescriptor mFile;
     std::uint64_t mSize = 0;
+    bool mIsChecked = false;  ///< what mFile ends with is whole
 };
 
 #endif

@@ -4,23 +4,57 @@
 #include <sys/stat.h>
 #include <unistd.h>
 
+#include <algorithm>
+#include <array>
 #include <cerrno>
 #include <cstdio>
+#include <string_view>
 
 #include "sensor/client/include/ClientErrors.h"
 
 ZTCNdjsonFile::ZTCNdjsonFile(const std::string& acrPath, std::uint64_t aMostBytes, std::uint64_t aKeep)
     : mPath(acrPath), mMostBytes(aMostBytes), mKeep(aKeep) {}
 
+/// A process that was killed while it wrote, or a power cut, may have left a part of a line. It was not counted as
+/// written, and comes again, whole: so the part is taken away, which would spoil the next line. Returns the size of the
+/// rest.
+static off_t sRemoveTornLine(const std::string& acrPath, int aDescriptor, off_t aSize) {
+    const ZTCFileDescriptor lReader = ZTCFileDescriptor::open(acrPath.c_str(), O_RDONLY | O_NOFOLLOW | O_NONBLOCK);
+    std::array<char, 4096> lBytes;
+    off_t lEnd = aSize;  // all behind this is a part of a line
+    while (lEnd > 0) {
+        const off_t lBegin = std::max<off_t>(0, lEnd - static_cast<off_t>(lBytes.size()));
+        const ssize_t lCount = pread(lReader.get(), lBytes.data(), static_cast<std::size_t>(lEnd - lBegin), lBegin);
+        if (lCount != lEnd - lBegin) {
+            throw ZTCSystemCallEx("cannot read the end of " + acrPath + " (ndjson.path)", lCount < 0 ? errno : EIO);
+        }
+        const std::size_t lBreak = std::string_view(lBytes.data(), static_cast<std::size_t>(lCount)).rfind('\n');
+        if (lBreak != std::string_view::npos) {
+            lEnd = lBegin + static_cast<off_t>(lBreak) + 1;
+            break;
+        }
+        lEnd = lBegin;
+    }
+    if (lEnd != aSize && ftruncate(aDescriptor, lEnd) != 0) {
+        throw ZTCSystemCallEx("cannot take back a part of a line in " + acrPath, errno);
+    }
+    return lEnd;
+}
+
 void ZTCNdjsonFile::open() {
     if (mPath == "-") {
         mFile = ZTCFileDescriptor(fcntl(STDOUT_FILENO, F_DUPFD_CLOEXEC, STDERR_FILENO + 1));
     } else if (!mFile.isOpen() || !mFile.isAtPath(mPath.c_str())) {  // another program may have taken it away
         mFile = ZTCFileDescriptor::open(mPath.c_str(), O_WRONLY | O_CREAT | O_APPEND | O_NOFOLLOW | O_NONBLOCK, 0640);
+        mIsChecked = false;
     }
     struct stat lStatus {};
     if (!mFile.isOpen() || fstat(mFile.get(), &lStatus) != 0) {
         throw ZTCSystemCallEx("cannot open " + mPath + " (ndjson.path)", errno);
+    }
+    if (mPath != "-" && S_ISREG(lStatus.st_mode) && !mIsChecked) {
+        lStatus.st_size = sRemoveTornLine(mPath, mFile.get(), lStatus.st_size);
+        mIsChecked = true;
     }
     mSize = S_ISREG(lStatus.st_mode) ? static_cast<std::uint64_t>(lStatus.st_size) : 0;
 }

@@ -75,6 +75,21 @@ TEST(NdjsonFile, OnAFullDiskNoPartOfALineStays) {
     EXPECT_EQ(readFile(lPath), "first\nsecond\n");
 }
 
+TEST(NdjsonFile, WhatAKilledProcessLeftOfALineIsTakenBack) {
+    const ZTCTemporaryDirectory lDirectory;
+    const std::string lPath = lDirectory.path("events");
+    const std::string lWhole = "first\n" + std::string(5000, 'x') + "\n";
+    for (const std::string& lrBefore : {std::string(), lWhole}) {
+        for (const std::size_t lPart : {0U, 1U, 4095U, 4096U, 4097U, 20000U}) {
+            writeFile(lPath, lrBefore + std::string(lPart, 'p'));
+            ZTCNdjsonFile lFile(lPath, 1 << 20, 1);
+            lFile.append("second\n");
+            lFile.append("third\n");
+            EXPECT_EQ(readFile(lPath), lrBefore + "second\nthird\n") << lPart;
+        }
+    }
+}
+
 TEST(NdjsonFile, ASymbolicLinkIsNotFollowed) {
     const ZTCTemporaryDirectory lDirectory;
     ASSERT_EQ(symlink(lDirectory.path("elsewhere").c_str(), lDirectory.path("events").c_str()), 0);
