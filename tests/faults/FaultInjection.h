@@ -40,6 +40,8 @@ public:
     bool isArmed() const { return mpControl->mIsArmed.load() != 0; }
     /// Whether the planned failure came.
     bool hasFired() const { return mpControl->mFired.load() != 0; }
+    /// How often the program has made the call since the arming.
+    std::uint32_t countCalls() const { return mpControl->mCalls.load(); }
     /// Where from, as an offset into the agent's program.
     std::uint64_t firedAt() const { return mpControl->mPlace.load(); }
     /// Blocks of memory that the agent's process holds now.

@@ -102,11 +102,16 @@ public:
     void close() noexcept;
     bool isOpen() const { return mpMapped != nullptr; }
 
+    /// After an open() that has failed. False: the system refused, for want of descriptors or the like. So the file may
+    /// be a good page all the same, and it is to be tried again.
+    bool hasLooked() const { return mHasLooked; }
+
     /// In words; empty after a success.
     const std::string& getReason() const { return mReason; }
 
 private:
     bool fail(const std::string& acrWhat);
+    bool failToLook(const char* apWhat);
     bool map(std::size_t aSize);
     bool checkHeader();
     const ZTSStatusPage& getPage() const { return *static_cast<const ZTSStatusPage*>(mpMapped); }
@@ -114,6 +119,7 @@ private:
 
     std::string mPath;
     std::string mReason;
+    bool mHasLooked = true;
     ZTCFileDescriptor mFile;
     void* mpMapped = nullptr;
     std::size_t mMappedSize = 0;

@@ -130,14 +130,15 @@ bool ZTCStatusPageReader::open(const std::string& acrPath) {
     close();
     mPath = acrPath;
     mReason.clear();
+    mHasLooked = true;
     // Not blocking: the path may lead to a FIFO.
     mFile = ZTCFileDescriptor::open(acrPath.c_str(), O_RDONLY | O_NONBLOCK | O_NOFOLLOW);
     if (!mFile.isOpen()) {
-        return fail(std::string("cannot be opened: ") + std::strerror(errno));
+        return failToLook("cannot be opened: ");
     }
     struct stat lStatus {};
     if (fstat(mFile.get(), &lStatus) != 0) {
-        return fail(std::string("cannot be looked at: ") + std::strerror(errno));
+        return failToLook("cannot be looked at: ");
     }
     if (!S_ISREG(lStatus.st_mode)) {
         return fail("is not a regular file");
@@ -157,7 +158,7 @@ bool ZTCStatusPageReader::read(ZTSStatusSnapshot& arSnapshot) {
     // The file grows once, when the agent knows its boards.
     struct stat lStatus {};
     if (fstat(mFile.get(), &lStatus) != 0) {
-        return fail(std::string("cannot be looked at: ") + std::strerror(errno));
+        return failToLook("cannot be looked at: ");
     }
     if (const auto lSize = static_cast<std::size_t>(lStatus.st_size); lSize != mMappedSize) {
         if (lSize < mMappedSize) {
@@ -206,6 +207,12 @@ bool ZTCStatusPageReader::read(ZTSStatusSnapshot& arSnapshot) {
     return true;
 }
 
+/// errno says why.
+bool ZTCStatusPageReader::failToLook(const char* apWhat) {
+    mHasLooked = errno == ENOENT || errno == ENOTDIR || errno == ELOOP;  // no such file, or a symbolic link
+    return fail(apWhat + std::string(std::strerror(errno)));
+}
+
 bool ZTCStatusPageReader::fail(const std::string& acrWhat) {
     mReason = "Status page '" + mPath + "': " + acrWhat;
     return false;
@@ -219,7 +226,7 @@ bool ZTCStatusPageReader::map(std::size_t aSize) {
     }
     void* lpMapped = mmap(nullptr, aSize, PROT_READ, MAP_SHARED, mFile.get(), 0);
     if (lpMapped == MAP_FAILED) {
-        return fail(std::string("cannot be mapped: ") + std::strerror(errno));
+        return failToLook("cannot be mapped: ");
     }
     if (mpMapped != nullptr) {
         munmap(mpMapped, mMappedSize);

@@ -134,7 +134,8 @@ private:
     ZTCTargetBook mTargets;
     ZTCStatusPageReader mPageReader;
     ZTCPagePointer mpPage;
-    bool mHasPage = false;  ///< the generation is the page's
+    bool mHasPage = false;      ///< the generation is the page's
+    bool mHasToldPage = false;  ///< there is a line in the log: the page cannot be looked at
 
     ZTCTime mNextStep;
     ZTCTime mNotBefore{};  ///< of the next request: a try has failed

@@ -117,6 +117,14 @@ bool ZTCAgentSession::attach(ZTCTime aNow) {
         scheduleNext(aNow + scAgentPause);
         return false;
     }
+    if (!mHasPage && !mPageReader.hasLooked()) {
+        // Without its page nobody can say what the agent has lost.
+        if (!std::exchange(mHasToldPage, true)) {
+            mEvents.mLines.push_back(mPageReader.getReason() + ": the agent is not asked; tried again every second");
+        }
+        scheduleNext(aNow + scDiskPause);
+        return false;
+    }
     readPage();
     std::string lGeneration;
     if (mpPage != nullptr) {
@@ -362,7 +370,9 @@ void ZTCAgentSession::drain(ZTCTime aNow) {
 }
 
 void ZTCAgentSession::end() {
+    const ZTCPagePointer lpLast = mpPage;
     readPage();
+    mpPage = mpPage != nullptr ? mpPage : lpLast;
     ZTSEndedAgent lAgent;
     lAgent.mGeneration = mTalk.getGeneration();
     lAgent.mPagePath = mStart.mPagePath;

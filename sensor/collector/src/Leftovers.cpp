@@ -74,7 +74,12 @@ void ZTCLeftovers::endPages(const std::string& acrCurrent) {
         }
         ZTCStatusPageReader lReader;
         auto lpPage = std::make_shared<ZTSStatusSnapshot>();
-        if (!lReader.open(lrPath) || !lReader.read(*lpPage)) {
+        const bool lIsOpen = lReader.open(lrPath);
+        if (!lIsOpen && !lReader.hasLooked()) {
+            mReport(lReader.getReason() + ": tried again");
+            continue;
+        }
+        if (!lIsOpen || !lReader.read(*lpPage)) {
             mReport(lReader.getReason() + ": removed");
             unlink(lrPath.c_str());
             continue;

@@ -13,6 +13,7 @@
 
 #include "sensor/agentcommon/include/SensorAgentProtocol.h"
 #include "sensor/link/include/Link.h"
+#include "tests/support/ResourceLimit.h"
 #include "tests/support/SmallFileSystem.h"
 #include "tests/support/StatusPageFile.h"
 #include "tests/support/TemporaryDirectory.h"
@@ -285,6 +286,25 @@ TEST_F(AgentSessionTest, AnAgentWithoutAPageIsAskedEveryPeriod) {
     EXPECT_EQ(mSession->getPage(), nullptr);
     mAhead += seconds(5);
     stepUntilFrames(2);
+}
+
+TEST_F(AgentSessionTest, AnAgentWhosePageCannotBeOpenedForWantOfDescriptorsIsNotTakenForOneWithoutAPage) {
+    startAgent();
+    startSession();
+    {
+        const ZTCResourceLimit lNoMore(RLIMIT_NOFILE, 0);
+        mSession->step(now());
+        mAhead += seconds(60);
+        mSession->step(now());
+        mSession->step(now());
+        collectEvents();
+    }
+    EXPECT_TRUE(mSession->getGeneration().empty());
+    EXPECT_THAT(mLines,
+                ElementsAre(HasSubstr("page.1': cannot be opened: Too many open files: the agent is not asked")));
+    mAhead += seconds(2);
+    stepUntilFrames(1);
+    EXPECT_NE(mSession->getPage(), nullptr);
 }
 
 TEST_F(AgentSessionTest, ThePartsOfOlderAgentsAreTornWhenTheNextOneComes) {
