@@ -48,6 +48,8 @@ remove_probes() {
   rm -rf /opt/probe /usr/lib/modules/probe /root/probe /tmp/probe
 }
 
+has_removed_ipc() { [ "$(ipcs -m | grep -c ' daemon ')" -eq 0 ]; }
+
 expect_sandbox() {
   lCalls="SystemCallFilter=@system-service" lCallsLess="SystemCallFilter=~@privileged @resources"
   prepare_probes
@@ -62,7 +64,7 @@ expect_sandbox() {
   on_machine forbids "ProtectKernelLogs=yes" root 'dmesg'
   on_machine forbids "ProtectClock=yes" root 'date --set="@$(date +%s)"'
   forbids "ProtectHostname=yes" root 'hostname "$(hostname)"'
-  forbids "ProtectControlGroups=yes" root 'mkdir /sys/fs/cgroup/probe && rmdir /sys/fs/cgroup/probe'
+  on_machine forbids "ProtectControlGroups=yes" root 'mkdir /sys/fs/cgroup/probe && rmdir /sys/fs/cgroup/probe'
   forbids "ProtectProc=invisible" tavik 'test -e /proc/1/comm'
   forbids "RestrictNamespaces=yes" root 'unshare --net true'
   forbids "RestrictRealtime=yes" root 'chrt --fifo 1 true'
@@ -70,21 +72,22 @@ expect_sandbox() {
   forbids "LockPersonality=yes" root 'setarch "$(uname -m)" --addr-no-randomize true'
   forbids "MemoryDenyWriteExecute=yes" root 'perl -e "exit(syscall(9, 0, 4096, 7, 0x22, -1, 0) == -1)"' # mmap
   forbids "RestrictAddressFamilies=AF_UNIX AF_NETLINK AF_INET AF_INET6" root 'perl -e "exit(!socket(my \$s, 17, 3, 0))"' # AF_PACKET
-  forbids "IPAddressDeny=any" root 'echo probe >/dev/udp/192.0.2.7/9'
-  allows "IPAddressAllow=localhost" root 'echo probe >/dev/udp/127.0.0.1/9' "IPAddressDeny=any"
+  on_machine forbids "IPAddressDeny=any" root 'echo probe >/dev/udp/192.0.2.7/9'
+  on_machine allows "IPAddressAllow=localhost" root 'echo probe >/dev/udp/127.0.0.1/9' "IPAddressDeny=any"
   forbids "SystemCallArchitectures=native" root /opt/probe/other-calls
   forbids "SystemCallFilter=@system-service" root 'chroot / true'
   forbids "SystemCallFilter=~@privileged @resources" root 'renice -n 5 -p "$BASHPID"' "$lCalls"
   allows "SystemCallFilter=capset" tavik 'setpriv --inh-caps=-all true' "$lCalls" "$lCallsLess"
   # Without it the call ends the process.
-  allows "SystemCallErrorNumber=EPERM" root 'perl -e "syscall(161, \"/\"); exit 0"' "$lCalls"  # chroot
+  allows "SystemCallErrorNumber=EPERM" root 'perl -e "my (\$root) = qw(/); syscall(161, \$root); exit 0"' "$lCalls" # chroot
   # A key that another service of the same user has left. Without a mode of its own a service would see the user's keys.
   on_machine run_probe tavik 'perl -e "my (\$t, \$d) = qw(user probe); syscall(248, \$t, \$d, \$d, 5, -4)"' "KeyringMode=shared"  # add_key
   on_machine forbids "KeyringMode=private" tavik 'perl -e "my (\$t, \$d) = qw(user probe); exit(syscall(249, \$t, \$d, 0, 0) < 0)"' "KeyringMode=shared" # request_key
-  # What a service leaves behind.
+  # What the last service of a user leaves behind. Of the user tavik one runs.
   for lLine in "RemoveIPC=no" "RemoveIPC=yes"; do
-    run_probe tavik 'ipcmk --shmem 4096' "$lLine"
-    expect "$lLine: shared memory of a service that has ended" "${lLine#*=}" "$([ "$(ipcs -m | grep -c '^0x.* tavik ')" -eq 0 ] && echo yes || echo no)"
+    run_probe daemon 'ipcmk --shmem 4096' "$lLine"
+    [ "$lLine" = "RemoveIPC=no" ] || wait_until 60 has_removed_ipc
+    expect "$lLine: shared memory of a service that has ended is gone" "${lLine#*=}" "$(has_removed_ipc && echo yes || echo no)"
     ipcrm --all=shm
   done
   remove_probes

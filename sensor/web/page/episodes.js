@@ -25,7 +25,7 @@ export function showEpisodes(table, episodes, empty) {
     ["Kind", { text: "Count", number: true }, "First", "Last", "Remote port", "Local port", "LUNs", { text: "Episode", number: true }],
     episodes.map((episode) => [
       kindCell(episode.kind), figure(number(episode.count)), shortTime(episode.first, true),
-      episode.phase === "closed" ? shortTime(episode.last, true) : make("span", "goes on", "goes-on"),
+      episode.phase === "closed" ? shortTime(episode.last, true) : make("span", "goes on", kindOf(episode.kind).level > 1 ? "goes-on" : "quiet"),
       episode.remotePort === null ? "–" : portName(episode.remotePort), initiatorName(episode.initiator), luns(episode.luns) || "–",
       { text: link(String(episode.episode), placeOf(episode)), number: true },
     ]), empty);
