@@ -1,43 +1,16 @@
 // The shared library as a program loads it.
-#include <dlfcn.h>
 #include <gtest/gtest.h>
 
 #include <cstdlib>
-#include <memory>
 
-#include "libkpm/include/libkpm.h"
-
-static KPM_GetFunctionListType sFind(void* apLibrary) {
-    return reinterpret_cast<KPM_GetFunctionListType>(::dlsym(apLibrary, "KPM_GetFunctionList"));
-}
+#include "tests/unit/libkpm/LibraryModule.h"
 
 TEST(Library, IsLoadedOpenedClosedAndUnloadedAgainAndAgain) {
     ::unsetenv("KPM_SIM_SCENARIO");
     ::unsetenv("KPM_SIM_SOCKET");
-    for (int lRound = 0; lRound < 2; ++lRound) {
-        void* lpLibrary = ::dlopen(TAVIK_SIM_LIBRARY, RTLD_NOW | RTLD_LOCAL);
-        ASSERT_NE(lpLibrary, nullptr) << ::dlerror();
-        const KPM_GetFunctionListType lpGet = sFind(lpLibrary);
-        ASSERT_NE(lpGet, nullptr);
-        const KPM_FunctionList* lpList = nullptr;
-        ASSERT_EQ(lpGet(KPM_INTERFACE_VERSION, &lpList), 0u);
-        EXPECT_EQ(lpList->Init(), 0u);
-        EXPECT_EQ(lpList->GetNumberOfAdapters(), 2u);
-        lpList->Close();
-        EXPECT_EQ(::dlclose(lpLibrary), 0);
-        EXPECT_EQ(::dlopen(TAVIK_SIM_LIBRARY, RTLD_NOW | RTLD_NOLOAD), nullptr) << "it stays loaded";
-    }
+    expectLoadsAgainAndAgain(TAVIK_SIM_LIBRARY, 2);
 }
 
 TEST(Library, SpeaksOneVersionOnly) {
-    void* lpLibrary = ::dlopen(TAVIK_SIM_LIBRARY, RTLD_NOW | RTLD_LOCAL);
-    ASSERT_NE(lpLibrary, nullptr) << ::dlerror();
-    const KPM_GetFunctionListType lpGet = sFind(lpLibrary);
-    ASSERT_NE(lpGet, nullptr);
-    const KPM_FunctionList* lpList = nullptr;
-    EXPECT_NE(lpGet(0, &lpList), 0u);
-    EXPECT_NE(lpGet(2, &lpList), 0u);
-    EXPECT_EQ(lpList, nullptr);
-    EXPECT_NE(lpGet(1, nullptr), 0u);
-    ::dlclose(lpLibrary);
+    expectSpeaksOneVersion(ZTCLibraryModule(TAVIK_SIM_LIBRARY));
 }
