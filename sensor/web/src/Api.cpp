@@ -130,6 +130,7 @@ ZTSWebResponse ZTCApi::answerKnown(const ZTSWebRequest& acrRequest) {
         return answerMetrics();
     }
     if (lrPath == "/api/v1/status") {
+        sCheckNames(acrRequest, {});
         return sJson(makeStatus());
     }
     if (lrPath == "/api/v1/events") {
@@ -151,6 +152,7 @@ ZTSWebResponse ZTCApi::answerKnown(const ZTSWebRequest& acrRequest) {
         return sJson(makeTimeline(acrRequest));
     }
     if (lrPath == "/api/v1/stream") {
+        sCheckNames(acrRequest, {});
         return {.mType = "text/event-stream", .mBody = ": the stream begins\n\n", .mIsStream = true};
     }
     return sError(404, "there is no " + lrPath + " here");

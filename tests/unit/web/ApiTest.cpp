@@ -98,6 +98,8 @@ TEST_F(Api, AWrongParameterGets400AndSaysWhy) {
         {"/api/v1/events", {"open", "perhaps"}, "perhaps"},
         {"/api/v1/events", {"lun", "-1"}, "-1"},
         {"/api/v1/ports", {"since", "when?"}, "when?"},
+        {"/api/v1/status", {"since", "1h"}, "since"},
+        {"/api/v1/stream", {"kind", "rscn"}, "kind"},
         {"/api/v1/explain", {"subject", "nonsense"}, "nonsense"},
         {"/api/v1/explain", {"subject", "999"}, "999"},
         {"/api/v1/diff", {"from", "nonsense"}, "nonsense"},
