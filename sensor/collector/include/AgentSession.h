@@ -49,9 +49,6 @@ struct ZTSSessionEvents {
     std::vector<std::string> mLines;  ///< for the log
 };
 
-/// How an agent ended, read from the page that it left.
-ZTSEndedAgent describeEndedAgent(const ZTCPagePointer& acrPage, const std::string& acrPagePath);
-
 class ZTCAgentSession {
 public:
     using ZTCTime = std::chrono::steady_clock::time_point;

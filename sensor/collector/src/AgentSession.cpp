@@ -8,6 +8,7 @@
 #include <cstdio>
 
 #include "sensor/agentcommon/include/SensorAgentProtocol.h"
+#include "sensor/collector/include/EndedAgent.h"
 #include "sensor/collector/include/SpoolRecovery.h"
 #include "sensor/link/include/Link.h"
 
@@ -392,17 +393,4 @@ void ZTCAgentSession::end() {
     }
     mrHistory.endAgent(std::move(lAgent));
     mIsDrained = true;
-}
-
-ZTSEndedAgent describeEndedAgent(const ZTCPagePointer& acrPage, const std::string& acrPagePath) {
-    ZTSEndedAgent lAgent;
-    lAgent.mGeneration = acrPage->mStartId;
-    lAgent.mPagePath = acrPagePath;
-    lAgent.mpPage = acrPage;
-    lAgent.mFrom = fromMicroseconds(acrPage->mLastRetrieval != 0 ? acrPage->mLastRetrieval : acrPage->mStartTime);
-    lAgent.mTo = acrPage->mEndTime != 0 ? fromMicroseconds(acrPage->mEndTime) : getHistoryTime();
-    lAgent.mIsVanished = acrPage->mEndReason == ZTSE_Running;
-    lAgent.mReason = lAgent.mIsVanished ? "the agent vanished"
-                                        : std::string("the agent ended: ") + gcStatusEndNames.at(acrPage->mEndReason);
-    return lAgent;
 }

@@ -6,7 +6,7 @@
 #include <filesystem>
 
 #include "sensor/client/include/AgentState.h"
-#include "sensor/collector/include/AgentSession.h"
+#include "sensor/collector/include/EndedAgent.h"
 #include "sensor/collector/include/SpoolRecovery.h"
 
 /// How an agent of another keeper ended, read from its page. Where its keeper vanished, the next one
