@@ -2,7 +2,6 @@
 #include <gmock/gmock.h>
 #include <gtest/gtest.h>
 #include <signal.h>
-#include <sys/stat.h>
 
 #include <cerrno>
 #include <filesystem>
@@ -27,11 +26,6 @@ protected:
         mRules += "[[warn]]\nkind = \"queue-full\"\nper = \"host\"\nrun = [\"" + lPath +
                   "\", \"first argument\"]\ntimeout = 2\n";
         return lPath;
-    }
-    static void writeScript(const std::string& acrPath, const std::string& acrScript) {
-        writeFile(acrPath + ".new", "#!/bin/sh\n" + acrScript + "\n");
-        chmod((acrPath + ".new").c_str(), 0700);
-        std::filesystem::rename(acrPath + ".new", acrPath);
     }
     /// A script that keeps what it gets in a file that then appears whole.
     std::string keep(const std::string& acrName) const {

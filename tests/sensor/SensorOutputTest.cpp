@@ -48,12 +48,6 @@ static void sWaitForFailing(const ZTCSensorProcess& acrSensor, const std::vector
     waitUntil(lAreAll, "outputs that do not work: " + lParts, ZTCDeadline(3 * gcTestPatience));
 }
 
-static std::string sReadMetrics(const std::string& acrSocket) {
-    ZTCHttpClient lClient(acrSocket);
-    lClient.send("GET /metrics HTTP/1.1\r\nHost: localhost\r\nConnection: close\r\n\r\n");
-    return lClient.readToEnd();
-}
-
 TEST(SensorOutput, AFolderThatIsGoneFullOrReadOnlyIsAWarningAndNothingIsMissingAfterwards) {
     ZTCSensorProcess lSensor;
     const std::string lDisk = lSensor.path("disk");
@@ -69,8 +63,12 @@ TEST(SensorOutput, AFolderThatIsGoneFullOrReadOnlyIsAWarningAndNothingIsMissingA
     lSensor.start();
     lSensor.simulate("queue-full board=hba0 times=3");
     sWaitForFailing(lSensor, {"No such file or directory", "No such file or directory"});
-    waitUntil([&] { return sReadMetrics(lSocket).find("tavik_open_warnings{kind=\"output\"} 2") != std::string::npos; },
-              "the metric");
+    waitUntil(
+        [&] {
+            return ZTCHttpClient::get(lSocket, "/metrics").find("tavik_open_warnings{kind=\"output\"} 2") !=
+                   std::string::npos;
+        },
+        "the metric");
     EXPECT_THAT(lSensor.standardError(), HasSubstr(lFolder + "/tavik.prom"));
 
     std::filesystem::create_directory(lFolder);

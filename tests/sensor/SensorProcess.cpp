@@ -105,6 +105,13 @@ void ZTCSensorProcess::waitForMessage(const std::string& acrText, const ZTCDeadl
               "the sensor's message \"" + acrText + "\"", acrDeadline);
 }
 
+void writeScript(const std::string& acrPath, const std::string& acrScript) {
+    const std::string lNew = acrPath + ".new";
+    writeFile(lNew, "#!/bin/sh\n" + acrScript + "\n");
+    std::filesystem::permissions(lNew, std::filesystem::perms::owner_all);
+    std::filesystem::rename(lNew, acrPath);
+}
+
 void waitForEnd(pid_t aPid, const ZTCDeadline& acrDeadline) {
     waitUntil([&] { return !isProcessAlive(aPid); }, "the end of process " + std::to_string(aPid), acrDeadline);
 }

@@ -85,6 +85,9 @@ private:
     unsigned mRuns = 0;
 };
 
+/// Puts a shell script in the place of the file, whole: a process that runs the old one keeps it.
+void writeScript(const std::string& acrPath, const std::string& acrScript);
+
 /// Waits until a process is gone, or a zombie that somebody else has to reap.
 void waitForEnd(pid_t aPid, const ZTCDeadline& acrDeadline = ZTCDeadline());
 

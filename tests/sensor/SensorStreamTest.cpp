@@ -38,12 +38,6 @@ static std::size_t sCountEpisodes(const std::string& acrLines) {
     return lEpisodes.size();
 }
 
-static std::string sGet(const std::string& acrSocket, const std::string& acrTarget) {
-    ZTCHttpClient lClient(acrSocket);
-    lClient.send("GET " + acrTarget + " HTTP/1.1\r\nHost: localhost\r\nConnection: close\r\n\r\n");
-    return lClient.readToEnd();
-}
-
 TEST(SensorStream, AReaderThatStopsReadingIsHungUpOnAndTheOthersGetAll) {
     ZTCSensorProcess lSensor;
     const std::string lSocket = lSensor.path("http");
@@ -72,7 +66,7 @@ TEST(SensorStream, AReaderThatStopsReadingIsHungUpOnAndTheOthersGetAll) {
     // Nobody else notices.
     waitUntil([&] { return sCountEpisodes(readFile(lLines)) == 1 + scPorts * scKinds.size(); },
               "the line of each episode", ZTCDeadline(3 * gcTestPatience));
-    EXPECT_THAT(sGet(lSocket, "/metrics"), HasSubstr("kind=\"device-busy\""));
+    EXPECT_THAT(ZTCHttpClient::get(lSocket, "/metrics"), HasSubstr("kind=\"device-busy\""));
     ZTCHttpClient lNext(lSocket);
     ASSERT_TRUE(lNext.send("GET /api/v1/stream HTTP/1.1\r\nHost: localhost\r\n\r\n"));
     EXPECT_THAT(lNext.readUntil("begins\n\n"), HasSubstr(" 200 OK"));

@@ -1,9 +1,6 @@
 // `tavik warn --test` as a person runs it: the real program asks the real sensor, which runs the hooks.
 #include <gmock/gmock.h>
 #include <gtest/gtest.h>
-#include <sys/stat.h>
-
-#include <filesystem>
 
 #include "sensor/metrics/include/Metrics.h"
 #include "sensor/store/include/History.h"
@@ -29,11 +26,6 @@ protected:
         }
         mRules += "[[warn]]\nkind = \"" + acrKind + "\"\nrun = [\"" + lPath + "\", \"now\"]\n";
         return lPath;
-    }
-    static void writeScript(const std::string& acrPath, const std::string& acrScript) {
-        writeFile(acrPath + ".new", "#!/bin/sh\n" + acrScript + "\n");
-        chmod((acrPath + ".new").c_str(), 0700);
-        std::filesystem::rename(acrPath + ".new", acrPath);
     }
     void start() {
         mSensor.configure("http.listen = \"\"\n" + mRules);

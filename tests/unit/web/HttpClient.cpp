@@ -88,3 +88,9 @@ std::string ZTCHttpClient::ask(unsigned aPort, const std::string& acrRequest) {
 std::string ZTCHttpClient::get(unsigned aPort, const std::string& acrTarget, const std::string& acrHost) {
     return ask(aPort, "GET " + acrTarget + " HTTP/1.1\r\nHost: " + acrHost + "\r\nConnection: close\r\n\r\n");
 }
+
+std::string ZTCHttpClient::get(const std::string& acrPath, const std::string& acrTarget) {
+    ZTCHttpClient lClient(acrPath);
+    lClient.send("GET " + acrTarget + " HTTP/1.1\r\nHost: localhost\r\nConnection: close\r\n\r\n");
+    return lClient.readToEnd();
+}

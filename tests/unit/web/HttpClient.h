@@ -25,6 +25,8 @@ public:
 
     /// The whole answer to a GET on a connection of its own.
     static std::string get(unsigned aPort, const std::string& acrTarget, const std::string& acrHost = "localhost");
+    /// The same over a Unix socket.
+    static std::string get(const std::string& acrPath, const std::string& acrTarget);
     /// The same with every byte of the request as given.
     static std::string ask(unsigned aPort, const std::string& acrRequest);
 
