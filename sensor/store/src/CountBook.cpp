@@ -1,7 +1,6 @@
 #include "sensor/store/src/CountBook.h"
 
 #include <algorithm>
-#include <map>
 
 static constexpr const char* scAddMinute =
     "INSERT INTO minute(slot, initiator, kind, port, count, spread, last) VALUES (?, ?, ?, ?, ?, ?, ?) "
@@ -53,16 +52,25 @@ void ZTCCountBook::add(const ZTSCountKey& acrKey, ZTSCountPlace& arPlace, std::i
 
 /// Minutes lie within days, so the days are sums of them. The minutes are sorted.
 ZTCCountBook::Sorted ZTCCountBook::makeDays(const Sorted& acrMinutes) {
-    std::map<SlotKey, Count> lDays;
-    for (const auto& [lrKey, lrCount] : acrMinutes) {
-        const std::int64_t lDay = getSlot(lrKey.mSlot, gcDayMicroseconds / gcMinuteMicroseconds);
-        const auto [lPlace, lIsNew] = lDays.try_emplace({.mSlot = lDay, .mKey = lrKey.mKey});
-        Count& lrDay = lPlace->second;
-        lrDay.mCount += lrCount.mCount;
-        lrDay.mSpread += lrCount.mDaySpread;
-        lrDay.mLast = lIsNew ? lrCount.mLast : std::max(lrDay.mLast, lrCount.mLast);
+    Sorted lDays = acrMinutes;
+    for (auto& [lrKey, lrCount] : lDays) {
+        lrKey.mSlot = getSlot(lrKey.mSlot, gcDayMicroseconds / gcMinuteMicroseconds);
+        lrCount.mSpread = lrCount.mDaySpread;
     }
-    return {lDays.begin(), lDays.end()};
+    std::ranges::sort(lDays, {}, [](const auto& acrEntry) { return acrEntry.first; });
+    std::size_t lUsed = 0;
+    for (const auto& [lrKey, lrCount] : lDays) {
+        if (lUsed == 0 || lDays[lUsed - 1].first != lrKey) {
+            lDays[lUsed++] = {lrKey, lrCount};
+            continue;
+        }
+        Count& lrDay = lDays[lUsed - 1].second;
+        lrDay.mCount += lrCount.mCount;
+        lrDay.mSpread += lrCount.mSpread;
+        lrDay.mLast = std::max(lrDay.mLast, lrCount.mLast);
+    }
+    lDays.resize(lUsed);
+    return lDays;
 }
 
 void ZTCCountBook::write(const Sorted& acrSlots, ZTCStatement& arStatement) {

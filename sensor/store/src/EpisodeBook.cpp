@@ -21,6 +21,9 @@ ZTCEpisodeBook::ZTCEpisodeBook(ZTCDatabase& arDatabase, ZTSCounter& arCounter)
       mUpdate(arDatabase,
               "UPDATE episode SET phase = ?2, updateSeq = ?3, closeSeq = ?4, changeTime = ?5, count = ?6, "
               "records = ?7, first = ?8, last = ?9, flags = ?10, detail = ?11 WHERE id = ?1"),
+      mGrow(arDatabase,
+            "UPDATE episode SET count = ?2, records = ?3, first = ?4, last = ?5, flags = ?6, detail = ?7, "
+            "changeTime = ?8 WHERE id = ?1"),
       mInsertChange(arDatabase, "INSERT INTO change(seq, episode) VALUES (?, ?)"),
       mDeleteChange(arDatabase, "DELETE FROM change WHERE seq = ?"),
       mInsertRecords(arDatabase, "INSERT INTO record(episode, ordinal, count, data) VALUES (?, ?, ?, ?)"),
@@ -170,7 +173,12 @@ void ZTCEpisodeBook::write(Open& arEpisode) {
     arEpisode.mBody.encode(mDetail);
     const int lPhase = arEpisode.mCloseSeq != 0 ? ZTP_Closed : arEpisode.mUpdateSeq != 0 ? ZTP_Update : ZTP_Open;
     const std::span<const std::uint8_t> lDetail(mDetail);
-    if (arEpisode.mIsStored) {
+    const bool lHasSamePhase = arEpisode.mCloseSeq == 0 && arEpisode.mUpdateSeq == arEpisode.mStoredUpdateSeq;
+    if (arEpisode.mIsStored && lHasSamePhase) {
+        // The phase is in an index, whose entry SQLite would write anew for the same value.
+        mGrow.run(arEpisode.mId, arEpisode.mCount, arEpisode.mRecords, arEpisode.mFirst, arEpisode.mLast,
+                  arEpisode.mFlags, lDetail, arEpisode.mChangeTime);
+    } else if (arEpisode.mIsStored) {
         mUpdate.run(arEpisode.mId, lPhase, arEpisode.mUpdateSeq, arEpisode.mCloseSeq, arEpisode.mChangeTime,
                     arEpisode.mCount, arEpisode.mRecords, arEpisode.mFirst, arEpisode.mLast, arEpisode.mFlags, lDetail);
     } else {

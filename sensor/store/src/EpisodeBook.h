@@ -96,7 +96,7 @@ private:
     std::vector<std::unique_ptr<Open>> mClosed;  ///< in this transaction
     std::vector<Open*> mDirty;
     ZTCStoreBytes mDetail;
-    ZTCStatement mInsert, mUpdate, mInsertChange, mDeleteChange, mInsertRecords, mDeleteRecords;
+    ZTCStatement mInsert, mUpdate, mGrow, mInsertChange, mDeleteChange, mInsertRecords, mDeleteRecords;
 };
 
 #endif
