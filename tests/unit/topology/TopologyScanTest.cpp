@@ -166,26 +166,11 @@ TEST(TopologyScan, AnAttributeThatBlocksCostsOnlyItsOwnValue) {
 }
 
 TEST(TopologyScan, EveryLunOfALargeHostLeadsToItsDiskItsMultipathDeviceAndItsMount) {
-    constexpr unsigned scHosts = 8;
-    constexpr unsigned scPortsOfAHost = 8;
+    constexpr unsigned scHosts = ZTCFakeSysfs::gcLargeHosts;
+    constexpr unsigned scPortsOfAHost = ZTCFakeSysfs::gcLargePortsOfAHost;
     constexpr unsigned scLuns = 200;
     ZTCFakeSysfs lTree;
-    for (unsigned lHost = 0; lHost < scHosts; ++lHost) {
-        lTree.addHost(lHost);
-        for (unsigned lTarget = 0; lTarget < scPortsOfAHost; ++lTarget) {
-            lTree.addRemotePort(lHost, lTarget, lHost * scPortsOfAHost + lTarget);
-        }
-    }
-    for (unsigned lLun = 0; lLun < scLuns; ++lLun) {
-        std::vector<std::string> lDisks;
-        for (unsigned lHost = 0; lHost < scHosts; ++lHost) {
-            lDisks.push_back("sd" + std::to_string(lLun) + "x" + std::to_string(lHost));
-            lTree.addPath(lHost, lLun % scPortsOfAHost, lLun, "naa." + std::to_string(lLun), lDisks.back());
-        }
-        const std::string lNumber = std::to_string(lLun);
-        lTree.addMapping(lLun, "mpath" + lNumber, "mpath-" + lNumber, lDisks);
-        lTree.mount("dm-" + lNumber, "/data/" + lNumber);
-    }
+    lTree.addLargeHost(scLuns);
     ZTCPatientReader lReader;
     const ZTSTopology lTopology = scanTopology(lTree.roots(), lReader);
     // A few files for each thing, each once, however many lead to it.
