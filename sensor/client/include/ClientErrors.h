@@ -72,4 +72,7 @@ private:
     int mErrno;
 };
 
+/// Whether a call failed for want of descriptors or memory. That says nothing of the call's object, and it passes.
+bool isShortage(int aErrno);
+
 #endif

@@ -11,6 +11,7 @@
 #include <thread>
 
 #include "libkpm/include/ScopeEventKinds.h"
+#include "sensor/client/include/ClientErrors.h"
 
 static_assert(gcScopeEventKinds.size() == gcStatusKinds);
 
@@ -209,7 +210,7 @@ bool ZTCStatusPageReader::read(ZTSStatusSnapshot& arSnapshot) {
 
 /// errno says why.
 bool ZTCStatusPageReader::failToLook(const char* apWhat) {
-    mHasLooked = errno == ENOENT || errno == ENOTDIR || errno == ELOOP;  // no such file, or a symbolic link
+    mHasLooked = !isShortage(errno);
     return fail(apWhat + std::string(std::strerror(errno)));
 }
 

@@ -2,18 +2,11 @@
 // here. HistoryWorker.cpp has the thread and its transactions.
 #include "sensor/collector/include/HistoryWorker.h"
 
-#include <cerrno>
-
 using std::chrono::steady_clock;
 
 /// After so many tries, a pause between them, a file that cannot be read is given up: the others must not wait for
 /// ever.
 static constexpr unsigned scReadTries = 10;
-
-/// A lack of descriptors or memory is not the file's: no other file could be read either, and it passes.
-static bool sIsOfFile(int aErrno) {
-    return aErrno != EMFILE && aErrno != ENFILE && aErrno != ENOMEM;
-}
 
 // ---- in: any thread ----
 
@@ -87,7 +80,7 @@ void ZTCHistoryWorker::store(ZTSFrameJob& arJob) {
             mBatchRecords += *lRecords;
         }
     } catch (const ZTCSpoolTroubleEx& lrEx) {
-        arJob.mTries += sIsOfFile(lrEx.getErrno()) ? 1 : 0;
+        arJob.mTries += isShortage(lrEx.getErrno()) ? 0 : 1;  // then no other file could be read either
         throw;
     }
 }

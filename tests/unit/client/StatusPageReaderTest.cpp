@@ -11,6 +11,7 @@
 #include <thread>
 
 #include "libkpm/include/ScopeEventKinds.h"
+#include "tests/support/ResourceLimit.h"
 #include "tests/support/StatusPageFile.h"
 #include "tests/support/TemporaryDirectory.h"
 
@@ -175,6 +176,21 @@ TEST_F(StatusPageReader, RefusesAFileThatIsNotThere) {
 TEST_F(StatusPageReader, RefusesWhatIsNotARegularFile) {
     ASSERT_EQ(mkfifo(mPath.c_str(), 0600), 0);
     expectRefused("is not a regular file");
+}
+
+TEST_F(StatusPageReader, HasNotLookedOnlyWhereDescriptorsOrMemoryAreMissing) {
+    const ZTCStatusPageFile lFile(mPath);
+    {
+        const ZTCResourceLimit lNoDescriptor(RLIMIT_NOFILE, 0);
+        EXPECT_FALSE(mReader.open(mPath));
+        EXPECT_FALSE(mReader.hasLooked()) << mReader.getReason();
+    }
+    EXPECT_FALSE(mReader.open(mPath + "/below a file"));
+    EXPECT_TRUE(mReader.hasLooked()) << mReader.getReason();
+    EXPECT_FALSE(mReader.open(mPath + std::string(300, 'x')));
+    EXPECT_TRUE(mReader.hasLooked()) << mReader.getReason();
+    EXPECT_TRUE(mReader.open(mPath)) << mReader.getReason();
+    EXPECT_TRUE(mReader.hasLooked());
 }
 
 TEST_F(StatusPageReader, RefusesASymbolicLink) {
