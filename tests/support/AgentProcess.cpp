@@ -184,6 +184,10 @@ void ZTCAgentProcess::waitForIdleCommandThread() const {
         "an idle command thread");
 }
 
+void ZTCAgentProcess::waitForIdleHeartbeatThread() const {
+    waitUntil([&] { return !mLog.containing("Going to wait for ").empty(); }, "an idle heartbeat thread");
+}
+
 ZTCBytes ZTCAgentProcess::registerTargetsRequest(const std::vector<ZTSTarget>& acrTargets) {
     ZTCByteWriter lRequest;
     lRequest.u8(3).u32(acrTargets.size());

@@ -117,6 +117,9 @@ public:
     ZTSScopeDataResponse retrieve();
     /// Waits until the command thread has done with its commands and waits for the next one.
     void waitForIdleCommandThread() const;
+    /// Waits until the heartbeat thread waits for its first period to end. One that an exit meets before that has
+    /// nothing to leave, and says nothing.
+    void waitForIdleHeartbeatThread() const;
 
     static ZTCBytes startScopeRequest(unsigned aMaxEventDataSize);
     static ZTCBytes registerTargetsRequest(const std::vector<ZTSTarget>& acrTargets);

@@ -54,6 +54,7 @@ TEST(Command, AShutDownIsAnsweredAndTheLibraryClosedBeforeTheAgentEnds) {
     ZTCAgentProcess lAgent;
     lAgent.startAndConnect();
     lAgent.startScope();
+    lAgent.waitForIdleHeartbeatThread();
     EXPECT_EQ(lAgent.request("04"), "0000000000");
     EXPECT_EQ(lAgent.library().callsOf("Close").size(), 1u);
     EXPECT_EQ(lAgent.waitForExit(), 0);

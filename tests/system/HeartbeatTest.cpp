@@ -190,6 +190,7 @@ TEST(Heartbeat, TheOwnFileIsTouchedOnceACycleBeforeTheSensorIsLookedAt) {
 TEST(Heartbeat, AnExitCutsTheWaitShortWithoutAnotherTouch) {
     ZTCAgentProcess lAgent;
     lAgent.startAndConnect();
+    lAgent.waitForIdleHeartbeatThread();
     EXPECT_EQ(lAgent.request(gcShutDownHex), gcSuccessHex);
     EXPECT_EQ(lAgent.waitForExit(), 0);
     EXPECT_EQ(lAgent.log().count("Exiting Heartbeat Handler Thread as it is marked for exit.", "-H-"), 1u);

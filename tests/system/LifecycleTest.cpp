@@ -130,6 +130,7 @@ TEST(Lifecycle, TermAndIntStopTheAgentInOrder) {
         lAgent.startAndConnect();
         lAgent.startScope();
         lAgent.waitForIdleCommandThread();
+        lAgent.waitForIdleHeartbeatThread();
         lAgent.process().sendSignal(lSignal);
         EXPECT_EQ(lAgent.waitForExit(), 0);
         EXPECT_EQ(lAgent.log().count("Tavik System exiting", "-H-"), 1u);
