@@ -69,6 +69,10 @@ public:
 
     const std::string& getStoreId() const;
 
+    /// Calls it with one view of the history: of what the sensor stores meanwhile it sees nothing. Not for functions
+    /// that read the ledger or the topology, which have such a view of their own.
+    void readAsOne(const std::function<void()>& acrRead) const;
+
     /// Visits matching episodes in the order in which they began to arrive, newest last. Return false to stop.
     void visitEpisodes(const ZTSHistoryFilter& acrFilter,
                        const std::function<bool(const ZTSEpisode&)>& acrVisitor) const;

@@ -29,6 +29,17 @@ void ZTCDatabase::rollBack() noexcept {
     }
 }
 
+void ZTCDatabase::readAsOne(const std::function<void()>& acrRead) {
+    execute("BEGIN");
+    try {
+        acrRead();
+        execute("COMMIT");
+    } catch (...) {
+        rollBack();
+        throw;
+    }
+}
+
 std::int64_t ZTCDatabase::readNumber(const char* apSql) {
     ZTCStatement lStatement(*this, apSql);
     return lStatement.query().step() ? lStatement.number(0) : 0;

@@ -8,6 +8,7 @@
 
 #include <concepts>
 #include <cstdint>
+#include <functional>
 #include <memory>
 #include <optional>
 #include <span>
@@ -34,6 +35,8 @@ public:
     void execute(const char* apSql);
     /// Rolls a transaction back, where there is one. Never throws.
     void rollBack() noexcept;
+    /// Calls it in one transaction: all that it reads belongs together, whatever is written meanwhile.
+    void readAsOne(const std::function<void()>& acrRead);
     /// The first column of the first row; 0 where there is no row.
     std::int64_t readNumber(const char* apSql);
     int countChangedRows() const { return sqlite3_changes(mpHandle.get()); }

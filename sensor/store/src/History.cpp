@@ -42,6 +42,10 @@ ZTCHistory::ZTCHistory(const std::string& acrStateDirectory)
 
 ZTCHistory::~ZTCHistory() = default;
 
+void ZTCHistory::readAsOne(const std::function<void()>& acrRead) const {
+    mpImplementation->mDatabase.readAsOne(acrRead);
+}
+
 const std::string& ZTCHistory::getStoreId() const {
     return mpImplementation->mStoreId;
 }

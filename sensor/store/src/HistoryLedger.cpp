@@ -23,8 +23,7 @@ std::vector<ZTSLedgerRow> ZTCHistory::readLedger() const {
     };
     // Both tables have one row for each initiator, kind and agent or remote port, however long the history is. One
     // transaction reads both, so that the sums belong together.
-    mpImplementation->mDatabase.execute("BEGIN");
-    try {
+    mpImplementation->mDatabase.readAsOne([&] {
         ZTCStatement lCounts(
             mpImplementation->mDatabase,
             "SELECT initiator, kind, received, collectionOff, totalLimit, unknownBoard, noList, "
@@ -50,11 +49,7 @@ std::vector<ZTSLedgerRow> ZTCHistory::readLedger() const {
             lrRow.mStored += lTotals.number<std::uint64_t>(2);
             lrRow.mRetired += lTotals.number<std::uint64_t>(3);
         }
-        mpImplementation->mDatabase.execute("COMMIT");
-    } catch (...) {
-        mpImplementation->mDatabase.rollBack();
-        throw;
-    }
+    });
     std::vector<ZTSLedgerRow> lLedger;
     for (auto& [lrKey, lrRow] : lRows) {
         lLedger.push_back(std::move(lrRow));

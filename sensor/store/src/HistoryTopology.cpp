@@ -49,11 +49,11 @@ std::optional<ZTSStoredTopology> ZTCHistory::readTopology(std::int64_t aTime) co
     ZTCDatabase& lrDatabase = mpImplementation->mDatabase;
     ZTSStoredTopology lStored;
     // One transaction for all, so that a thing that changes meanwhile is seen exactly once.
-    lrDatabase.execute("BEGIN");
-    try {
-        if (!sReadScan(lrDatabase, aTime, lStored)) {
-            lrDatabase.execute("COMMIT");
-            return std::nullopt;
+    bool lHasScan = false;
+    lrDatabase.readAsOne([&] {
+        lHasScan = sReadScan(lrDatabase, aTime, lStored);
+        if (!lHasScan) {
+            return;
         }
         for (const char* const lpSql : {HistoryQueries::gcOpenThings, HistoryQueries::gcEndedThings}) {
             ZTCStatement lRows(lrDatabase, lpSql);
@@ -63,10 +63,9 @@ std::optional<ZTSStoredTopology> ZTCHistory::readTopology(std::int64_t aTime) co
                          lRows.blob(3));
             }
         }
-        lrDatabase.execute("COMMIT");
-    } catch (...) {
-        lrDatabase.rollBack();
-        throw;
+    });
+    if (!lHasScan) {
+        return std::nullopt;
     }
     sortTopology(lStored.mTopology);
     return lStored;
@@ -76,8 +75,7 @@ void ZTCHistory::advanceTopology(ZTSStoredTopology& arStored, std::int64_t aFrom
     ZTCDatabase& lrDatabase = mpImplementation->mDatabase;
     bool lIsNew = false;
     std::size_t lRowCount = 0;
-    lrDatabase.execute("BEGIN");
-    try {
+    lrDatabase.readAsOne([&] {
         sReadScan(lrDatabase, aTo, arStored);
         // First all that ended meanwhile, then all that began and is still there: of several versions one is left.
         ZTCStatement lEnded(lrDatabase, HistoryQueries::gcThingsEnded);
@@ -96,11 +94,7 @@ void ZTCHistory::advanceTopology(ZTSStoredTopology& arStored, std::int64_t aFrom
                 lIsNew = true;
             }
         }
-        lrDatabase.execute("COMMIT");
-    } catch (...) {
-        lrDatabase.rollBack();
-        throw;
-    }
+    });
     if (lRowCount >= gcMostTopologyVersions) {
         arStored = readTopology(aTo).value_or(ZTSStoredTopology());  // not all changes were looked at
     } else if (lIsNew) {
@@ -153,8 +147,7 @@ std::vector<ZTSTopologyChange> ZTCHistory::readTopologyChanges(std::int64_t aFro
 
     // By thing and begin: two versions, one of which begins when the other ends, stand side by side.
     std::map<std::pair<ZTETopologyThing, std::string>, std::map<std::int64_t, ZTSThingRow>> lThings;
-    lrDatabase.execute("BEGIN");
-    try {
+    lrDatabase.readAsOne([&] {
         for (const char* const lpSql : {HistoryQueries::gcThingsBegun, HistoryQueries::gcThingsEnded}) {
             ZTCStatement lRows(lrDatabase, lpSql);
             lRows.query(aFrom, aTo, gcMostTopologyVersions);
@@ -169,11 +162,7 @@ std::vector<ZTSTopologyChange> ZTCHistory::readTopologyChanges(std::int64_t aFro
                 }
             }
         }
-        lrDatabase.execute("COMMIT");
-    } catch (...) {
-        lrDatabase.rollBack();
-        throw;
-    }
+    });
 
     const auto lIsWithin = [&](std::int64_t aTime) { return aTime > aFrom && aTime <= aTo; };
     std::vector<ZTSTopologyChange> lChanges;

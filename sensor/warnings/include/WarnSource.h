@@ -42,6 +42,8 @@ private:
     using ZTCTotalKey = std::pair<std::string, ZTCKindKey>;
 
     void begin(const ZTCHistory& acrHistory, ZTCHistoryTime aNow, std::vector<ZTSWarnOccurrence>& arFound);
+    void readTotals(const ZTCHistory& acrHistory);
+    void readMinutes(const ZTCHistory& acrHistory, ZTCHistoryTime aNow, std::vector<ZTSWarnOccurrence>& arFound) const;
     void readEvents(const ZTCHistory& acrHistory, ZTCHistoryTime aNow, std::vector<ZTSWarnOccurrence>& arFound);
     void readGaps(const ZTCHistory& acrHistory, ZTCHistoryTime aNow, std::vector<ZTSWarnOccurrence>& arFound);
     void readRefusals(const ZTCHistory& acrHistory, ZTCHistoryTime aNow, std::vector<ZTSWarnOccurrence>& arFound);

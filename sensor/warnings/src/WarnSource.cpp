@@ -54,22 +54,34 @@ static std::map<std::string, std::uint64_t> sReadNumbers(const std::string& acrT
     return lNumbers;
 }
 
+void ZTCWarnSource::readTotals(const ZTCHistory& acrHistory) {
+    for (const ZTSTotal& lrTotal : acrHistory.readTotals()) {
+        mTotals[{sTotalName(lrTotal), lrTotal.mKind}] = lrTotal.mOccurrences;
+    }
+}
+
+void ZTCWarnSource::readMinutes(const ZTCHistory& acrHistory, ZTCHistoryTime aNow,
+                                std::vector<ZTSWarnOccurrence>& arFound) const {
+    ZTSHistoryFilter lLately;
+    lLately.mSince = aNow - mLongest;
+    lLately.mKinds = mKinds;
+    acrHistory.visitMinutes(lLately, [&](const ZTSBucket& acrBucket) {
+        arFound.push_back(sMake(getKindName(acrBucket.mKind), acrBucket.mInitiator, acrBucket.mOccurrences,
+                                std::min(aNow, acrBucket.mFrom + minutes(1))));
+        arFound.back().mRemotePort = acrBucket.mRemotePort;
+        return true;
+    });
+}
+
 /// The history is new to this object: what happened lately counts, by the minute.
 void ZTCWarnSource::begin(const ZTCHistory& acrHistory, ZTCHistoryTime aNow, std::vector<ZTSWarnOccurrence>& arFound) {
     mTotals.clear();
     mOccurrences = mGaps = 0;
-    for (const ZTSTotal& lrTotal : acrHistory.readTotals()) {
-        mTotals[{sTotalName(lrTotal), lrTotal.mKind}] = lrTotal.mOccurrences;
-    }
-    ZTSHistoryFilter lLately;
-    lLately.mSince = aNow - mLongest;
-    lLately.mKinds = mKinds;
     if (!mKinds.empty()) {
-        acrHistory.visitMinutes(lLately, [&](const ZTSBucket& acrBucket) {
-            arFound.push_back(sMake(getKindName(acrBucket.mKind), acrBucket.mInitiator, acrBucket.mOccurrences,
-                                    std::min(aNow, acrBucket.mFrom + minutes(1))));
-            arFound.back().mRemotePort = acrBucket.mRemotePort;
-            return true;
+        // What is stored between the two would be in the minutes, and then rise above the totals: it would count twice.
+        acrHistory.readAsOne([&] {
+            readTotals(acrHistory);
+            readMinutes(acrHistory, aNow, arFound);
         });
     }
     const std::string lGap = acrHistory.getValue(gcWarnGapValue);

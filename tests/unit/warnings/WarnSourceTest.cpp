@@ -3,7 +3,10 @@
 #include <gmock/gmock.h>
 #include <gtest/gtest.h>
 
+#include <atomic>
+#include <list>
 #include <nlohmann/json.hpp>
+#include <thread>
 
 #include "tests/unit/store/StoreFixture.h"
 
@@ -81,6 +84,37 @@ TEST_F(WarnSource, ANewProcessFindsWhatCameLatelyAndNotWhatIsOld) {
     EXPECT_EQ(lFound[0].mCount, 5U);
     EXPECT_LE(lFound[0].mTime, mNow);
     EXPECT_GE(lFound[0].mTime, mNow - minutes(2));
+}
+
+TEST_F(WarnSource, WhatIsStoredWhileANewProcessBeginsCountsOnce) {
+    static constexpr std::uint64_t scEvents = 200;
+    take({makeQueueFull(gcPortA, gcBase, gcBase, 1)});
+    const ZTCHistory lReader(mDirectory.path());
+    std::atomic<bool> lIsOver{false};
+    std::thread lWriter([&] {
+        for (std::uint64_t i = 1; i < scEvents; ++i) {
+            take({makeQueueFull(gcPortA, gcBase, gcBase, 1)});
+        }
+        lIsOver = true;
+    });
+    std::list<ZTCWarnSource> lSources;
+    std::vector<std::uint64_t> lCounts;
+    const auto lAdd = [&](ZTCWarnSource& arSource, std::uint64_t& arCount) {
+        for (const ZTSWarnOccurrence& lrOccurrence : arSource.read(lReader, mNow)) {
+            arCount += lrOccurrence.mCount;
+        }
+    };
+    while (!lIsOver) {
+        lAdd(lSources.emplace_back(std::vector{rule("queue-full")}), lCounts.emplace_back());
+    }
+    lWriter.join();
+    ASSERT_FALSE(lSources.empty());
+    std::size_t lIndex = 0;
+    for (ZTCWarnSource& lrSource : lSources) {
+        lAdd(lrSource, lCounts[lIndex]);
+        EXPECT_EQ(lCounts[lIndex], scEvents) << "the source that began as number " << lIndex;
+        ++lIndex;
+    }
 }
 
 TEST_F(WarnSource, AGapIsFoundOnceEvenWhereANewProcessWroteItBeforeItLooked) {
