@@ -207,7 +207,7 @@ protected:
         EXPECT_EQ(mSensor.stop(), 0);
         expectSoundHistory(mSensor.stateDirectory());
     }
-    /// What agents held when they were ended without a collector, as the gaps say.
+    /// Events in gaps: agents held them when they were ended without a collector.
     std::uint64_t countInGaps() const {
         std::uint64_t lSum = 0;
         for (const ZTSGap& lrGap : ZTCHistory(mSensor.stateDirectory()).readGaps()) {

@@ -32,7 +32,7 @@ class ZTCNameBook {
 public:
     /// The administrator's name of a port or a node.
     void addName(const ZTSFcName& acrWwn, const std::string& acrName) { mNames[acrWwn.mBytes] = acrName; }
-    /// The administrator's names by WWN, as the settings hold them. What is not a WWN is skipped.
+    /// The administrator's names by WWN, from the settings. A key that is no WWN is skipped.
     void addNames(const std::map<std::string, std::string>& acrNames);
     void addInitiator(const ZTSInitiator& acrInitiator) { mInitiators.push_back(acrInitiator); }
     void addRemotePort(const ZTSRemotePort& acrPort) { mRemotePorts.push_back(acrPort); }

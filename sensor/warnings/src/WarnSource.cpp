@@ -78,7 +78,7 @@ void ZTCWarnSource::begin(const ZTCHistory& acrHistory, ZTCHistoryTime aNow, std
     mTotals.clear();
     mOccurrences = mGaps = 0;
     if (!mKinds.empty()) {
-        // What is stored between the two would be in the minutes, and then rise above the totals: it would count twice.
+        // An event that is stored between the two reads would count twice: in the minutes, and as growth of the totals.
         acrHistory.readAsOne([&] {
             readTotals(acrHistory);
             readMinutes(acrHistory, aNow, arFound);

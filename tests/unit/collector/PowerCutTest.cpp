@@ -1,6 +1,6 @@
 // Random schedules of storms, kills, power cuts, full disks and restarts, against a small model. Spool and database are
-// on layers that drop what was not synced, and one cut of the power hits both at the same moment. What was committed or
-// synced is there afterwards, once; of the rest any part may be missing.
+// on layers that drop what was not synced, and one cut of the power hits both at the same moment. Afterwards
+// all that was committed or synced is there, once. Any part of the rest may be missing.
 #include <gmock/gmock.h>
 #include <gtest/gtest.h>
 #include <unistd.h>
@@ -195,7 +195,7 @@ protected:
         ++mGaps;  // with the power the agent went
         start();
     }
-    /// What was not synced is whole, missing, or there in part, perhaps under the name that it had before.
+    /// A file that was not synced is left whole, in part or not at all, perhaps under its former name.
     void cutSpool() {
         const ZTCStore lStore(state(), {}, nullptr);
         if (mPart) {
