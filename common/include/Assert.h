@@ -7,9 +7,9 @@
 
 #include "common/include/Log.h"
 
-/// Logs that the assertion of this text failed, and ends the process through exit(1). Where several threads come here,
-/// one runs exit and the others wait for the end; a thread that comes here out of its own exit ends the process at
-/// once. Its calls are kept out of the way of the code around them.
+/// Logs the text of the assertion that failed, and ends the process through exit(1). If several threads fail, one runs
+/// exit and the others wait for the end. A thread that fails again while it runs exit ends the process at once. Marked
+/// as cold, so that the code around a call stays fast.
 [[noreturn, gnu::cold]] void failAssertion(unsigned aLine, const char* apFunction, const char* apFile,
                                            const char* apText) noexcept;
 

@@ -39,7 +39,7 @@ public:
         }
     }
 
-    /// Adds so many bytes at the end, which are for the caller to write; their address. Grows as append does.
+    /// Adds aCount bytes at the end and returns their address. The caller writes them. Grows as append does.
     unsigned char* extend(Size aCount) {
         if (aCount > mCapacity - mSize) {
             makeRoomFor(std::uint64_t{mSize} + aCount);

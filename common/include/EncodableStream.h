@@ -1,8 +1,8 @@
 /// Typed fields to and from the bytes of a message.
 ///
 /// Fields follow each other without tags or padding; numbers are in network byte order; a string is its 32-bit byte
-/// count and its bytes. What has no width of its own on the wire (bool, char, enumerations, pointers) is refused at
-/// compile time: the writer states the width.
+/// count and its bytes. Types without a fixed width on the wire (bool, char, enumerations, pointers) do not compile:
+/// the caller converts them first.
 
 #ifndef COMMON_INCLUDE_ENCODABLESTREAM_H
 #define COMMON_INCLUDE_ENCODABLESTREAM_H
@@ -34,10 +34,10 @@ public:
     /// Writes bytes as they are, without a count.
     ZTCEncodableOutStream& writeBytes(const void* apBytes, Size aCount);
 
-    /// Adds so many bytes, which are for the caller to write at once; their address.
+    /// Adds aCount bytes and returns their address. The caller writes them at once.
     unsigned char* extend(Size aCount) { return mBuffer->extend(aCount); }
 
-    /// Makes room for so many bytes more.
+    /// Makes room for aCount more bytes.
     void reserve(Size aCount) { mBuffer->reserve(mBuffer->getSize() + aCount); }
 
     /// The buffer that holds what was written so far; shared with the stream.
@@ -47,8 +47,8 @@ private:
     ZTCPointer<ZTCBuffer> mBuffer;
 };
 
-/// Reads fields from a shared buffer, from its first byte on. A field that is not there whole is
-/// ZTCInvalidEx("Not enough data in stream", 6): nothing is read then, and the target is unchanged.
+/// Reads fields from a shared buffer, from its first byte on. Where fewer bytes are left than a field has, it throws
+/// ZTCInvalidEx("Not enough data in stream", 6) and changes nothing.
 class ZTCEncodableInStream {
 public:
     explicit ZTCEncodableInStream(const ZTCPointer<ZTCBuffer>& acrBuffer) : mBuffer(acrBuffer) {}

@@ -1,7 +1,7 @@
 /// Error codes: what an exception carries beside its text.
 ///
-/// The code space is cut into segments of equal length, one for each source of errors, so that a number alone tells
-/// where it comes from.
+/// The code space is cut into segments of equal length, one for each source of errors, so that the number shows where
+/// an error comes from.
 
 #ifndef COMMON_INCLUDE_ERRORCODES_H
 #define COMMON_INCLUDE_ERRORCODES_H

@@ -1,7 +1,7 @@
 /// The name of a source file as the log shows it, made at compile time.
 ///
 /// The build gives __FILE__ as a path from the root of the sources, or, where a compiler cache has made the paths
-/// relative, from the build directory within it. The label is that path without what leads up to the root and without
+/// relative, from the build directory within it. The label is that path without the `../` at its beginning and without
 /// its extension; the agent's own sources, tavik/src/NAME.cpp, are labelled .//NAME.
 
 #ifndef COMMON_INCLUDE_FILELABEL_H

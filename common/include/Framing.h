@@ -5,7 +5,7 @@
 
 #include <cstdint>
 
-/// Bytes of the length in front of every frame, which they do not count themselves.
+/// Bytes of the length field in front of every frame. The length does not count them.
 inline constexpr std::uint32_t gcFrameHeaderSize = 4;
 
 /// Largest body of a request frame in bytes; the least is 1. A response frame has no bound but its 32-bit length.

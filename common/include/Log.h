@@ -53,7 +53,7 @@ void PrintLogMessage(unsigned aLevel, const char* apMark, const char* apFormat, 
 /// Directs all further lines to this file, and writes to it what was held so far. A relative path is made absolute at
 /// once. The file is made with mode 0640 less the umask; a symbolic link, and whatever is neither a regular file nor a
 /// character device, is refused: the lines go to standard error then and are counted, and the opening is tried again
-/// with later lines, at most once a second. A null or empty path changes nothing but says so on standard error.
+/// with later lines, at most once a second. A null or empty path changes nothing; a line on standard error says so.
 void setLogFilePath(const char* apPath) noexcept;
 
 /// Sets the log code: the OR of the enabled levels.
@@ -62,8 +62,8 @@ void setLogCode(unsigned aMask) noexcept;
 /// Reads the log code.
 void getLogCode(unsigned& arMask) noexcept;
 
-/// Closes the log file and opens its path anew, for the one who has renamed or removed it. Until then, lines go to the
-/// file that was opened, under whatever name. If the path cannot be opened, the former file is kept and the opening
+/// Closes the log file and opens its path anew. Called after the file was renamed or removed. Until then, lines go to
+/// the file that was opened, under whatever name. If the path cannot be opened, the former file is kept and the opening
 /// tried again with later lines. Does nothing where no path is set.
 void reopenLogFile() noexcept;
 

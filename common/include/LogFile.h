@@ -76,8 +76,8 @@ private:
     bool rotate() noexcept;
     void closeDescriptor() noexcept;
 
-    /// Within so many bytes of the bound, and after so many nanoseconds, the file's size is asked for anew: other
-    /// processes may write to it too. In between it is the size that was found and what was written since.
+    /// The size is read anew this near to the bound, and when this much time has passed: other processes may write to
+    /// the file too. In between it is estimated: the size that was read plus the bytes written since.
     static constexpr std::uint64_t gcSizeSlack = std::uint64_t{64} * 1024;
     static constexpr std::int64_t gcSizeAgeNs = 1000000;
 

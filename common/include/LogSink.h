@@ -32,8 +32,8 @@ private:
     pthread_mutex_t mMutex = PTHREAD_MUTEX_INITIALIZER;
 };
 
-/// All operations are safe from any thread, none throws, and there is no destructor to run at exit: the owner of one
-/// that is to go away calls close().
+/// All operations are safe from any thread, and none throws. There is no destructor to run at exit: an owner that gives
+/// up a sink calls close().
 class ZTCLogSink {
 public:
     constexpr ZTCLogSink() noexcept = default;

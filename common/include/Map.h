@@ -42,7 +42,7 @@ public:
         return *lpValue;
     }
 
-    /// The same without an exception: null for a key that is absent, which is logged all the same.
+    /// The same without an exception: null for an absent key, which is logged too.
     const V* get(const K& acrKey, std::nothrow_t) const noexcept {
         const const_iterator lFound = mMap.find(acrKey);
         if (mMap.end() == lFound) {

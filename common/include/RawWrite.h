@@ -10,7 +10,7 @@
 int writeAll(int aDescriptor, const char* apBytes, std::size_t aCount, std::size_t& arWritten) noexcept;
 
 /// Writes to standard error what finds room there at once, and drops the rest: a standard error that nobody reads
-/// delays no thread. One whose reader has gone ends nothing.
+/// delays no thread. A reader that has gone is no error: the process goes on.
 void writeToStandardError(const char* apBytes, std::size_t aCount) noexcept;
 
 #endif

@@ -19,7 +19,7 @@ public:
         mCount.fetch_add(1, std::memory_order_relaxed);
     }
 
-    /// Subtracts one and returns the new count. Who gets zero releases the object.
+    /// Subtracts one and returns the new count. The caller that gets zero releases the object.
     std::size_t decrement() noexcept {
         // Release: what this thread did to the object comes before its release. Acquire: the last owner sees it.
         return mCount.fetch_sub(1, std::memory_order_acq_rel) - 1;

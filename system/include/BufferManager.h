@@ -21,7 +21,7 @@ public:
     /// Puts an empty buffer with room for aSize bytes into arBuffer. Throws ZTCNoMemoryEx.
     void getBuffer(unsigned aSize, ZTCPointer<ZTCBuffer>& arBuffer);
 
-    /// Takes the buffer back, of which the caller holds the one pointer, and leaves another, empty one there.
+    /// Takes the buffer back and puts an empty one in its place. The caller holds the only pointer to it.
     void reuseBuffer(ZTCPointer<ZTCBuffer>& arBuffer);
 
     /// Empties the buffer; it stays the caller's.

@@ -1,7 +1,7 @@
 /// Reads a command line by the table of its options.
 ///
-/// The whole line is read and checked before anything of it is used. What is known of an option's value (a number and
-/// its limits, true or false) stands in one table in the source, a row for each option.
+/// The whole line is read and checked before anything of it is used. One table in the source says which value each
+/// option takes: a number and its limits, or true or false.
 
 #ifndef SYSTEM_INCLUDE_COMMANDLINEPARSER_H
 #define SYSTEM_INCLUDE_COMMANDLINEPARSER_H
@@ -18,7 +18,7 @@ enum ZTEParsingState : unsigned char {
     ZTPS_Max = 4
 };
 
-/// What a command line asks for. A value is valid where its flag is set; of an option given twice the last one.
+/// The options of a command line. A value is valid where its flag is set. Of an option given twice, the last counts.
 struct ZTSCommandLineOptions {
     bool mShowHelp = false;       ///< -h
     bool mShowVersion = false;    ///< -v
@@ -41,9 +41,9 @@ public:
     ZTCCommandLineParser() = default;
 
     /// Reads the arguments from the second on; the first is the program's name. An argument is an identifier of the
-    /// table, to the letter, or the value that one wants. An argument that names an option is never taken for a value.
-    /// Throws ZTCInvalidEx, whose text is one line that names the option, its value and the limits, for an option that
-    /// is not in the table, a value that is missing, and one that is out of its limits.
+    /// table, letter for letter, or the value of the one before it. An argument that names an option is never taken for
+    /// a value. Throws ZTCInvalidEx, whose text is one line that names the option, its value and the limits, for an
+    /// option that is not in the table, a value that is missing, and one that is out of its limits.
     void parse(const ZTCVector<ZTSCommandLineArgumentDesc>& acrDescs, int aArgc, const char* const* apArgv);
 
     ZTEParsingState getState() const { return mState; }

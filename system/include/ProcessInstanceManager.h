@@ -1,9 +1,9 @@
-/// Sees to it that one process runs for each pid file, and knows the processes that pid files name.
+/// Makes sure that only one process runs for each pid file, and looks up the processes that pid files name.
 ///
-/// What decides is a lock on the pid file that the kernel drops with its process, so that neither a pid file left
-/// behind nor a pid used again fools it. The file is emptied as soon as it is locked, and holds the process id, in
-/// decimal with a line break behind it, once the process is marked as running: an empty file under a lock means a
-/// process that is starting.
+/// A lock on the pid file decides. The kernel drops it when the process ends, so that neither a pid file left behind
+/// nor a pid used again misleads. The file is emptied as soon as it is locked, and holds the process id, in decimal
+/// with a line break behind it, once the process is marked as running: an empty file under a lock means a process that
+/// is starting.
 
 #ifndef SYSTEM_INCLUDE_PROCESSINSTANCEMANAGER_H
 #define SYSTEM_INCLUDE_PROCESSINSTANCEMANAGER_H
@@ -30,9 +30,9 @@ public:
     ZTCProcessInstanceManager(const ZTCProcessInstanceManager&) = delete;
     ZTCProcessInstanceManager& operator=(const ZTCProcessInstanceManager&) = delete;
 
-    /// Takes the lock, which is kept over a fork, and empties the file, made with mode 0644 where there is none: false.
-    /// True, with nothing touched, while another process holds the lock; getProcessId() is then what the file names, or
-    /// -1. Throws ZTCInvalidEx where the path is not a regular file, ZTCClibEx for the rest.
+    /// Takes the lock, which a fork keeps, and empties the file, or makes it with mode 0644: returns false. While
+    /// another process holds the lock it changes nothing and returns true: getProcessId() is then what the file names,
+    /// or -1. Throws ZTCInvalidEx where the path is not a regular file, ZTCClibEx for the rest.
     bool isAnInstanceRunning();
 
     /// Writes this process's id into the file, after taking the lock if isAnInstanceRunning() was not called. From here
@@ -40,8 +40,8 @@ public:
     void markAsRunning();
 
     /// Asks the process that holds the lock to stop (SIGTERM) and waits until it is gone; waits for one that is
-    /// starting. A process that does not belong to the file's owner is left alone: the file may be forged. Says on
-    /// standard output what came of it, also that none is running. Throws ZTCClibKillFailedEx where it may not be
+    /// starting. A process that does not belong to the file's owner is left alone: the file may be forged. Prints
+    /// the outcome on standard output, also that none is running. Throws ZTCClibKillFailedEx where it may not be
     /// asked.
     void killRunningInstance();
 

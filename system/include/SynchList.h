@@ -11,8 +11,8 @@
 #include "os/common/include/Mutex.h"
 #include "system/include/Queueable.h"
 
-/// Every operation may be called from any thread, except walking with begin(), end() and erase(): nobody else touches
-/// the list meanwhile. Taking from an empty list throws ZTCNotFoundEx, a failed allocation ZTCNoMemoryEx.
+/// Every operation may be called from any thread. But while one walks it with begin(), end() and erase(), no other
+/// touches the list. Taking from an empty list throws ZTCNotFoundEx, a failed allocation ZTCNoMemoryEx.
 class ZTCSynchList {
 public:
     using ZTItem = ZTCPointer<ZTCQueueable>;

@@ -254,15 +254,15 @@ public:
         mSettings.insert(acrKey, acrValue);
     }
 
-    /// Applies what processCommandLine() has read. -h and -v end the process, -c hands the file to processConfigFile(),
-    /// -s stops the running instance and ends the process, in this order; -l and -d are applied before -c, so that the
-    /// lines about the refused file can be seen, and -b, -S and -D at the end.
+    /// Applies what processCommandLine() has read, in this order. -h and -v end the process. -l and -d come before -c,
+    /// so that the log has the lines about a refused file. -c hands the file to processConfigFile(). -s stops the
+    /// running instance and ends the process. -b, -S and -D come last.
     virtual void processCommandLineArguments();
 
     virtual void createStartUpEvent() {}
     virtual void createShutDownEvent() {}
 
-    /// Goes on in a process of its own session and ends the calling one, silently. The working directory becomes
+    /// Goes on as a new process in its own session, and ends the calling one silently. The working directory becomes
     /// aDirectory unless that is empty; standard input, output and error become the three paths.
     virtual void systemDaemonize(ZTCString aDirectory, ZTCString aInput, ZTCString aOutput, ZTCString aError);
 

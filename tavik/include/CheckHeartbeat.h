@@ -9,7 +9,7 @@
 #include "common/include/String.h"
 #include "os/common/include/SystemInterface.h"
 
-/// Looks without progress that make the other process suspect.
+/// After this many looks without progress the other process is suspect.
 inline constexpr unsigned int MAX_HEARTBEAT_RETRIES = 2;
 
 /// Used by one thread.
@@ -23,9 +23,9 @@ public:
     }
     virtual ~ZTCCheckHeartbeat() = default;
 
-    /// One look at the file. The first one never fails; the second look in a row without progress (the file cannot be
-    /// read, or its time has not changed), and every further one until the time changes, throws ZTCHeartbeatFailedEx. A
-    /// modification time of 0 counts as nothing seen yet.
+    /// Looks at the file. Without progress means that it cannot be read, or that its time has not changed. The first
+    /// look never fails. The second in a row without progress throws ZTCHeartbeatFailedEx, and so does every further
+    /// one until the time changes. A time of 0 counts as not seen yet.
     void CheckStatus();
 
     /// Returns where the process named by the file runs, throws ZTCClibGetProcStatusFailedEx where it does not.

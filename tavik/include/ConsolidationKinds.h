@@ -1,5 +1,5 @@
-/// The kinds of event that carry data, in one table: what their payload is, what of it makes a record, which fields
-/// tell one record from another, and how a record goes on when the next event matches it.
+/// The table of the event kinds that carry data: the payload, the part of it that makes a record, the fields in which
+/// two records differ, and how a record continues when the next event matches it.
 #ifndef TAVIK_INCLUDE_CONSOLIDATIONKINDS_H
 #define TAVIK_INCLUDE_CONSOLIDATIONKINDS_H
 
@@ -12,8 +12,8 @@ enum ZTEContinuation : std::uint8_t {
     ZTCN_SetBits  ///< sets bits in place, and counts
 };
 
-/// A field of the payload that is taken over into a record: a world wide name where it has 8 bytes, else an integer
-/// of 4.
+/// A field of the payload that is copied into a record. 8 bytes are a world wide name, 4 bytes an
+/// integer.
 struct ZTSFieldCopy {
     std::uint16_t mPayloadOffset;
     std::uint16_t mRecordOffset;

@@ -13,8 +13,8 @@
 #include "tavik/include/TavikSystem.h"
 #include "tavik/include/TavikTargetIndex.h"
 
-/// Where one consolidation member keeps the identity of the last record it started, in the order of the kind's table
-/// row. Names are made once and then assigned in place, so that noting a new identity cannot fail.
+/// Points to the system's members with the identity of the last record of a kind, in the order of the kind's row. Names
+/// are made once and then assigned in place, so that noting a new identity cannot fail.
 struct ZTSPrevIdentity {
     ZTCWorldWideName* mpNames[gcMaxIdentityNames];
     unsigned int* mpNumbers[gcMaxIdentityNumbers];

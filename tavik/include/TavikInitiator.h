@@ -30,7 +30,7 @@ public:
     const ZTCPointer<ZTCWorldWideName>& getWwnn() const { return mWwnn; }
     const ZTCPointer<ZTCWorldWideName>& getWwpn() const { return mWwpn; }
 
-    /// The node name, a dot and the port name: by this the sensor tells the boards' record lists apart.
+    /// The node name, a dot and the port name. The sensor knows the record list of a board by it.
     ZTCString getKey() const {
         ZT_ENTRY();
         char lKey[ZTCWorldWideName::gcStringLength + 1 + ZTCWorldWideName::gcStringLength];

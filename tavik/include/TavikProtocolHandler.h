@@ -53,7 +53,7 @@ public:
     virtual void handleRegisterTargetsCommand(const ZTCPointer<ZTCBuffer>& acrRequest,
                                               ZTCPointer<ZTCBuffer>& arResponse);
 
-    /// Tells zero, which is refused, from any other period. Stores nothing.
+    /// Refuses a period of zero and accepts any other. Stores nothing.
     virtual void handleSetCollectionPeriodCommand(const ZTCPointer<ZTCBuffer>& acrRequest,
                                                   ZTCPointer<ZTCBuffer>& arResponse);
 

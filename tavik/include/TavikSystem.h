@@ -125,11 +125,11 @@ public:
         return mRecordsMap.get(aBoardId);
     }
 
-    /// Only the command thread, which is the one that changes it, asks for the number of lists.
+    /// Called by the command thread alone, which is also the only one that changes the map.
     unsigned int getNumRecordLists() const ZT_NO_THREAD_SAFETY_ANALYSIS { return mRecordsMap.size(); }
 
-    /// Makes an empty list for every board that the library has now. Nothing of the system changes, so that what can
-    /// fail is done before the lists are exchanged.
+    /// Makes an empty list for every board that the library has now, and changes nothing else. So what can fail is done
+    /// before the lists are exchanged.
     void makeRecordLists(ZTCTavikRecordsMap& arLists);
 
     /// Empties the records map: its lists go to arTaken, whose own are dropped.

@@ -38,8 +38,8 @@ private:
 
     static constexpr unsigned long gcHashFactor = 0x9e3779b97f4a7c15;
 
-    /// A slot whose port name is that of no port is free, so that a port of that name is kept by itself. The number of
-    /// slots is a power of 2, and at most two thirds of them are taken.
+    /// A slot with the zero port name is free. So a port that has this name is kept in mNoPort. The number of slots is
+    /// a power of 2, and at most two thirds of them are taken.
     std::vector<ZTSRemotePortNames> mSlots;
     ZTSRemotePortNames mNoPort;
     bool mHasNoPort = false;

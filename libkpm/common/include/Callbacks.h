@@ -14,8 +14,8 @@ inline void callScope(const ZTSLibraryRegistration& acrRegistration, std::uint32
     acrRegistration.mpScopeCallback(aBoard, acrPort, aCategory, aSubcategory, acrRegistration.mpContext, apEvent);
 }
 
-/// The callback as the type of its event. The detour over void(*)(): the compiler knows that type as a generic function
-/// pointer and does not warn of it.
+/// Converts the callback to the type of its event. It goes through void(*)(), which compilers accept as a generic
+/// function pointer without a warning.
 template <class Callback>
 Callback restoreCallback(KPM_EventCallback apCallback) {
     return reinterpret_cast<Callback>(reinterpret_cast<void (*)()>(apCallback));

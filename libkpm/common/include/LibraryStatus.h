@@ -5,8 +5,8 @@
 
 #include <cstdint>
 
-/// Statuses of their own, beside those of KPM_STATUS_...; none counts as success with an agent but the first. 1 to 3
-/// are the simulated library's.
+/// Statuses of their own, beside those of KPM_STATUS_... An agent takes only 0 for success. 1 to 3 are those of the
+/// simulated library.
 enum ZTELibraryStatus : std::uint32_t {
     ZTLST_Success = 0,
     ZTLST_NoScenario = 1,    ///< Init: the scenario's file cannot be read

@@ -31,7 +31,7 @@ public:
     /// stays new.
     void tell(Clock::time_point aNow);
 
-    /// Tells what is new of every kind.
+    /// Reports what is new of every kind at once.
     void tellAll();
 
 private:

@@ -45,14 +45,14 @@ public:
         return true;
     }
 
-    /// The library is open with this session, or, without one, as it was before.
+    /// Opens the library with this session. Null: opening has failed, and the library stays closed.
     void endOpening(std::shared_ptr<Session> apSession) {
         const std::lock_guard<std::mutex> lGuard(mLock);
         mpSession = std::move(apSession);
         mIsOpening = false;
     }
 
-    /// Closes the library; the session is for the caller to stop, null where there was none.
+    /// Closes the library and returns its session, which the caller stops; null where there was none.
     std::shared_ptr<Session> takeSession() {
         const std::lock_guard<std::mutex> lGuard(mLock);
         return std::exchange(mpSession, nullptr);
@@ -66,7 +66,7 @@ private:
     bool mIsOpening = false;             // guarded by mLock: an Init is under way
 };
 
-/// The entries of KPM_FunctionList that ask the engine. tReport is told what an exception says, which ends here.
+/// The entries of KPM_FunctionList that ask the engine. No exception leaves them: tReport gets its text.
 template <class Session, void (*tReport)(const char*) noexcept>
 class ZTCEngineEntries {
 public:

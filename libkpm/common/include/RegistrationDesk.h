@@ -57,12 +57,12 @@ public:
 protected:
     const ZTCLibraryRegistry& getRegistry() const { return mRegistry; }
 
-    // What a library says. The board is one there is, the kind one of its numbers.
+    // Answered by the library. They are called only with boards and kinds that there are.
 
-    /// The number of boards that registrations can be ended for; more than there are now where boards have gone.
+    /// The number of boards, with those that have gone: their registrations can still be ended.
     virtual std::uint32_t getNumberOfBoardsEver() const { return getNumberOfAdapters(); }
 
-    /// Writes the names; another status than success where it refuses.
+    /// Writes the names. Where the library refuses, returns another status than success.
     virtual std::uint32_t answerAdapterInfo(std::uint32_t aBoard, ZTSBoardNames& arNames) = 0;
 
     virtual bool isPortOf(std::uint32_t aBoard, const HBA_wwn& acrPort) const = 0;
@@ -75,7 +75,7 @@ protected:
     /// Called after a registration was made.
     virtual void noteRegistration(std::uint32_t /*aBoard*/, std::size_t /*aKind*/) {}
 
-    /// Another status than success where it refuses.
+    /// Where the library refuses, returns another status than success.
     virtual std::uint32_t answerUnregistration(std::uint32_t /*aBoard*/, std::size_t /*aKind*/) {
         return ZTLST_Success;
     }

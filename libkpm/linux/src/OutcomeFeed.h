@@ -59,8 +59,8 @@ public:
     /// Why check conditions come without sense data; empty where they have them, or nothing is open.
     const std::string& getSenseProblem() const { return mSenseProblem; }
 
-    /// Why outcomes of this host do not come while the feed works: it came after the last filter that the kernel took.
-    /// Empty where they come.
+    /// Why outcomes of this host are missing while the feed works: the host came after the last filter that the kernel
+    /// accepted. Empty where they come.
     std::string getHostProblem(std::uint32_t aHost) const;
 
     /// Counts the changes of what the three above say.

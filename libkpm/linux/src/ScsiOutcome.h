@@ -15,10 +15,10 @@
 /// Status bytes of SCSI (SAM) that are events here.
 enum ZTELinuxScsiStatus : std::uint8_t { ZTLSS_CheckCondition = 0x02, ZTLSS_Busy = 0x08, ZTLSS_TaskSetFull = 0x28 };
 
-/// What a sense value is that the kernel does not tell.
+/// Stands for a sense value that the kernel does not give.
 inline constexpr std::uint32_t gcUnknownSense = 0xFFFFFFFFu;
 
-/// What names a command among those that are under way. Tags that the kernel does not tell, or that were not read, are
+/// Identifies one of the commands that are under way. Tags that the kernel does not give, or that were not read, are
 /// 0.
 struct ZTSCommandName {
     std::uint32_t mHost = 0;

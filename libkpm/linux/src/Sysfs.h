@@ -18,8 +18,8 @@
 /// `aLimit`.
 std::optional<std::string> readSmallFile(const std::string& acrPath, std::size_t aLimit);
 
-/// The names in a directory, without those that begin with a dot, in no order. None where there is no such directory;
-/// nothing where it cannot be read, as with descriptors or memory short.
+/// The names in a directory, without those that begin with a dot, in no order. Empty where there is no such directory.
+/// Nothing where it cannot be read, for example for lack of descriptors.
 std::optional<std::vector<std::string>> listDirectory(const std::string& acrPath);
 
 /// The directory that a path's last name is in. By the text alone: the path need not be there.

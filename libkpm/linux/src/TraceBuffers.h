@@ -58,7 +58,7 @@ public:
     /// Takes a page off a buffer, never waiting. `aPage` has room for a page.
     ZTETraceRead read(std::size_t aBuffer, std::span<std::uint8_t> aPage, std::size_t& arSize);
 
-    /// Records that the buffer has lost since the last call; nothing where the kernel does not tell.
+    /// Records that the buffer has lost since the last call; nothing where the kernel does not say.
     std::optional<std::uint64_t> takeLosses(std::size_t aBuffer);
 
 private:

@@ -84,7 +84,7 @@ struct ZTSTraceFieldRow {
     bool mIsNeeded;
 };
 
-/// Fills in the places of integers. The problem of the first field that is needed and cannot be used.
+/// Fills in the places of integers. Returns the problem of the first needed field that cannot be used.
 std::optional<ZTSTraceProblem> fillTracePlaces(const ZTSTraceFormat& acrFormat,
                                                std::span<const ZTSTraceFieldRow> aRows);
 

@@ -31,7 +31,7 @@ public:
     /// The data of the next record; nothing when the page is at its end.
     std::optional<ZTCByteSpan> next();
 
-    /// When the last record was written, in nanoseconds of the instance's clock; 0 where pages do not tell.
+    /// When the last record was written, in nanoseconds of the instance's clock; 0 where pages do not have it.
     std::uint64_t getTime() const { return mHasTime ? mTime : 0; }
 
     /// Whether the page did not parse to its end.

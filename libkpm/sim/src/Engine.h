@@ -49,7 +49,7 @@ public:
     /// std::bad_alloc, with none left running.
     void start();
 
-    /// Tells the threads and inject() to end after the callback they are in. Does not wait.
+    /// Asks the threads and inject() to end after the callback they are in. Does not wait.
     void requestStop();
 
     /// Ends and joins the threads. Not to be called from a callback. More than once does no harm.

@@ -52,10 +52,10 @@ private:
 /// Reports a state that the kind is in on this board.
 void reportSimSource(std::uint32_t aBoard, std::size_t aKind, const ZTSSimSource& acrSource);
 
-/// How the registration of a kind is answered that is in this state.
+/// The answer to the registration of a kind that is in this state.
 ZTSSimAnswer answerSimSource(std::size_t aKind, std::uint32_t aState);
 
-/// The state to report of a kind whose registration a scenario's line answers so.
+/// The state to report for a kind whose registration a line of the scenario answers like this.
 ZTSSimSource describeSimAnswer(const ZTSSimAnswer& acrAnswer);
 
 #endif

@@ -1,10 +1,10 @@
 /// C-library calls behind one thin layer.
 ///
-/// A wrapper reports failure by throwing; the texts name the object and the system's reason. The calls on descriptors
-/// return their ordinary outcomes instead, each one apart: a positive count, 0 (end of file, nothing written,
-/// time-out), or the negated error number of those that the wrapper lists. Every descriptor made here is close-on-exec
-/// and above the three standard ones, so that a process started without them, or one that replaces them, never mistakes
-/// one for the other.
+/// A wrapper reports failure by throwing; the texts name the object and the system's reason. The calls on
+/// descriptors return ordinary outcomes instead: a positive count, 0 (end of file, nothing written, time-out), or
+/// a negated error number that the wrapper lists. Every descriptor made here is close-on-exec and above the three
+/// standard ones. So no file gets the number of a standard stream, even in a process that was started without
+/// one.
 ///
 /// All functions may be called from any thread.
 
@@ -72,7 +72,7 @@ void ClibUtime(const char* apPath);
 /// Removes the name; false where there was none. Throws ZTCClibUnlinkFailedEx.
 bool ClibUnlink(const char* apPath);
 
-/// What a file of this mode is, for messages: "a FIFO", "a regular file", "a symbolic link" and so on.
+/// The kind of a file of this mode, for messages: "a FIFO", "a regular file", "a symbolic link" and so on.
 const char* ClibFileKind(::mode_t aMode);
 
 /// The system's text for an error number.
@@ -91,7 +91,7 @@ private:
 /// descriptor, 3 or higher. Throws ZTCClibOpenFailedEx.
 int ClibOpen(const char* apPath, int aFlags, ::mode_t aMode = 0);
 
-/// The same, but the negated error number in place of an exception.
+/// The same, but returns the negated error number instead of throwing.
 int ClibTryOpen(const char* apPath, int aFlags, ::mode_t aMode = 0) noexcept;
 
 /// An event counter (eventfd), non-blocking. Throws ZTCClibEventFailedEx.
@@ -101,8 +101,8 @@ int ClibEventFd();
 void ClibRaiseEvent(int aDescriptor) noexcept;
 void ClibResetEvent(int aDescriptor) noexcept;
 
-/// Makes an inherited event counter this process's own: sets close-on-exec. Returns null, or in words why the
-/// descriptor cannot be used: it is not open, no event counter, or blocking.
+/// Takes over an inherited event counter: sets close-on-exec. Returns null, or a text that says why the descriptor
+/// cannot be used: it is not open, it is not an event counter, or it is blocking.
 const char* ClibAdoptEventFd(int aDescriptor) noexcept;
 
 /// Moves a descriptor above the three standard ones, close-on-exec; the negated error number on failure. A descriptor
@@ -164,8 +164,8 @@ void ClibSetsid();
 /// Changes the working directory. Throws ZTCClibOpenFailedEx.
 void ClibChdir(const char* apPath);
 
-/// Makes the path, opened with the flags, stand for the descriptor (of a standard stream). Throws ZTCClibOpenFailedEx
-/// or ZTCClibDupFailedEx.
+/// Opens the path with the flags and puts it in the place of the descriptor (of a standard stream). Throws
+/// ZTCClibOpenFailedEx or ZTCClibDupFailedEx.
 void ClibRedirect(int aDescriptor, const char* apPath, int aFlags);
 
 /// Milliseconds on a clock that never steps.

@@ -10,9 +10,9 @@
 #include "common/include/ThreadAnnotations.h"
 #include "os/common/include/Mutex.h"
 
-/// A signal wakes every thread that waits when it comes; where none does, one signal is kept for the next wait. A wait
-/// takes nothing else for a signal. The clock of the timed waits never steps. All operations may be called from any
-/// thread; nobody waits any more when the conditional is destroyed.
+/// A signal wakes every thread that is waiting. If none is, one signal is kept for the next wait. There are no spurious
+/// wake-ups. Timed waits use a clock that never steps. All operations may be called from any thread. No thread may be
+/// waiting when the conditional is destroyed.
 class ZTCConditional {
 public:
     ZTCConditional() { OsInitConditional(mConditional); }

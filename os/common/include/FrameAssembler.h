@@ -33,8 +33,8 @@ public:
 
     ZTEFrameState getState() const { return mState; }
 
-    /// How many bytes come next, and where they go. 0 unless the state is incomplete. Asking for the space of a body's
-    /// first bytes allocates it: ZTCNoMemoryEx, after which it can be asked for again.
+    /// How many bytes come next, and where they go. 0 unless the state is incomplete. The first getSpace() of a body
+    /// allocates its memory. After ZTCNoMemoryEx it may be called again.
     Size getWanted() const;
     unsigned char* getSpace();
 

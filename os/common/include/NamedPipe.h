@@ -25,10 +25,10 @@ enum ZTEFileMode : unsigned char {
 
 enum ZTEConnectionMode : unsigned char { ZTCM_Client = 0, ZTCM_Server = 1 };
 
-/// One end of a FIFO. open(), close(), create() and destroy() belong to the main thread, before and after the others
-/// run; read() and waitForActivity(), or write(), to one thread between. SIGPIPE is ignored by the process.
+/// One end of a FIFO. open(), close(), create() and destroy() belong to the main thread while no other runs. In between
+/// one thread calls read() and waitForActivity(), or write(). SIGPIPE is ignored by the process.
 ///
-/// The exit event (getExitEvent) cuts every wait short, the stop event (getStopEvent) that of open().
+/// The exit event (getExitEvent) ends every wait. The stop event (getStopEvent) ends the wait of open().
 class ZTCNamedPipe : public ZTCIpc {
 public:
     /// Nothing is made or opened yet. The mode is ZTFM_Read or ZTFM_Write; every other one is refused by open() with
@@ -69,8 +69,8 @@ public:
 
     /// Waits until a whole message is there or the exit event is raised, and returns; throws ZTCTimeOutEx when the time
     /// passes without one. While a message is arriving the time counts from its last byte.
-    /// What is broken ends in here, with one error line each: a length of 0 or above 1048576, with which everything
-    /// that waits in the pipe is thrown away; a message whose rest does not come within the time, whose part is.
+    /// Broken input is thrown away, with one error line each. A length of 0 or above 1048576: everything that waits in
+    /// the pipe. A message whose rest does not come within the time: its part.
     void waitForActivity(unsigned aSeconds);
     void waitForActivity(std::chrono::milliseconds aTime);
 

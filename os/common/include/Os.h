@@ -36,11 +36,11 @@ void OsUnlockMutex(ZTSOsMutex& arMutex);
 void OsInitConditional(ZTSOsConditional& arConditional);
 void OsDestroyConditional(ZTSOsConditional& arConditional);
 
-/// Waits with the mutex held by the caller, who tests the reason in a loop: it may return without one.
+/// The caller holds the mutex and tests its condition in a loop: the wait may return without a signal.
 void OsWaitConditional(ZTSOsConditional& arConditional, ZTSOsMutex& arMutex);
 
-/// The same until the monotonic clock shows aDeadline (milliseconds, as ClibMonotonicMilliseconds counts); false when
-/// it does.
+/// The same, at most until the monotonic clock shows aDeadline (milliseconds, as ClibMonotonicMilliseconds counts):
+/// then false.
 bool OsTimedWaitConditional(ZTSOsConditional& arConditional, ZTSOsMutex& arMutex, std::int64_t aDeadline);
 
 /// Wakes every thread that waits.

@@ -29,8 +29,8 @@ private:
     const int mDescriptor;
 };
 
-// Each is made when it is first asked for, which throws ZTCClibEventFailedEx where no descriptor can be had; the driver
-// asks for both before there is a thread.
+// Each is made at its first use. That throws ZTCClibEventFailedEx where no descriptor can be had. So the driver uses
+// both before there is a thread.
 
 /// Somebody outside asked the process to stop (SIGTERM, SIGINT).
 ZTCProcessEvent& getStopEvent();

@@ -18,7 +18,7 @@ inline constexpr const char* gcLibkpmPathVariable = "ZT_LIBKPM_PATH";
 inline constexpr const char* gcDefaultLibkpm = "libkpm.so.1";
 
 /// Takes the reports of the adapters' library. Called on any thread, also from inside of an operation of ZTCLibkpmAbs;
-/// it does not call back into the library and lets nothing out. The texts are never null and live for the call alone.
+/// it does not call back into the library and throws nothing. The texts are never null and live for the call alone.
 class ZTCLibkpmReports {
 public:
     virtual ~ZTCLibkpmReports() = default;
@@ -42,8 +42,8 @@ public:
     ZTCLibkpmAbs& operator=(const ZTCLibkpmAbs&) = delete;
 
     /// Throws ZTCNotFoundEx, after logging the reason, where the library is missing, disabled, without its function, of
-    /// another version, or with an incomplete table of functions. A library that takes a log function is given one; so
-    /// is, with apReports, one that takes functions for reports. apReports must outlive the library, its threads too.
+    /// another version, or with an incomplete table of functions. Gives the library a log
+    /// function and, with apReports, functions for reports if it takes them. apReports outlives the library's threads.
     void LIBKPM_LoadLibrary(ZTCLibkpmReports* apReports = nullptr);
 
     /// Unloads the library, which must have been closed.

@@ -10,7 +10,7 @@
 #include "sensor/agentcommon/include/ScopeEvent.h"
 #include "sensor/agentcommon/include/WorldWideName.h"
 
-/// Largest scope record that a sensor of this generation stores; the agent holds its records against the limit of the
+/// Largest scope record that a sensor of this generation stores; the agent compares its records with the limit of the
 /// start command instead.
 inline constexpr Size MAX_SCOPERECORD_SIZE = 900;
 
@@ -26,8 +26,8 @@ public:
     static constexpr Size gcFixedSizeWithNames = gcFixedSize + 2 * ZTCWorldWideName::gcLength;
 
     /// A record without names. Copies aLength bytes of event data. aCapacity is the size in bytes up to which the event
-    /// data are meant to grow: a bound that the holder tests before it appends, not a reservation; it may be smaller
-    /// than the first data, 0 included. Throws ZTCNoMemoryEx.
+    /// data are meant to grow. It reserves nothing: the holder tests it before it appends. It may be smaller than the
+    /// first data, even 0. Throws ZTCNoMemoryEx.
     ZTCScopeData(const ZTCPointer<ZTCScopeEvent>& acrEvent, const unsigned char* apData, unsigned int aLength,
                  unsigned int aCapacity);
 
@@ -36,7 +36,7 @@ public:
                  unsigned int aCapacity, const ZTCPointer<ZTCWorldWideName>& acrWwpn,
                  const ZTCPointer<ZTCWorldWideName>& acrWwnn);
 
-    /// Likewise, with names that are copied.
+    /// The same with names that are copied.
     ZTCScopeData(const ZTCPointer<ZTCScopeEvent>& acrEvent, const unsigned char* apData, unsigned int aLength,
                  unsigned int aCapacity, const ZTCWorldWideName& acrWwpn, const ZTCWorldWideName& acrWwnn);
 
@@ -54,7 +54,7 @@ public:
     /// Category, subcategory, names (0 or 1), with 1 port name and node name, then the data's length and the data.
     void encode(ZTCEncodableOutStream& arStream) const;
 
-    /// The bytes that encode writes, and storing them where there is room for so many; returns the address behind them.
+    /// The number of bytes that encode writes. store() writes them where there is room, and returns the address behind.
     Size getEncodedSize() const noexcept {
         return (mHasNames ? gcFixedSizeWithNames : gcFixedSize) + mEventData.getSize();
     }

@@ -23,8 +23,8 @@
 /// MEMORY ORDER
 /// Counters are stored with relaxed order, except mHandedOver and mDropped, whose release order makes sure that a
 /// reader which reads them with acquire order reads an mConsolidated afterwards that is at least as large as their sum.
-/// What changes together changes between two stores of a sequence number: it is odd meanwhile, and even, and another
-/// one, afterwards. A reader compares the sequence numbers before and after, and reads again where they differ.
+/// Fields that change together have a sequence number. It is odd while they change, and a new even number afterwards. A
+/// reader compares the numbers before and after. It reads again where they differ or are odd.
 ///
 /// EQUATIONS
 /// Every event is counted once, where its outcome is decided: in mConsolidated, or in one of mRefused. So
@@ -74,7 +74,7 @@ inline constexpr std::array<const char*, 7> gcStatusRefusalNames{
 inline constexpr std::uint32_t gcStatusRefusals = gcStatusRefusalNames.size();
 static_assert(ZTSR_Failed + 1 == gcStatusRefusals);
 
-/// What the agent gets to hear of a kind on a board: an index into gcStatusStateNames.
+/// Whether events of a kind on a board reach the agent: an index into gcStatusStateNames.
 enum ZTEStatusState : std::uint32_t {
     ZTSS_Off,        ///< not registered: before a start command, and after a stop command
     ZTSS_Listening,  ///< events of this kind arrive

@@ -17,7 +17,7 @@ struct ZTSAgentState {
 };
 
 /// The agent holds a flock on its pid file as long as it lives. The lock is only tried where the recorded process
-/// exists, or where none has been recorded for a moment, so that a look never stands in the way of a start. Throws
+/// exists, or where none has been recorded for a moment, so that a look never gets in the way of a start. Throws
 /// ZTCSystemCallEx where the file cannot be read.
 ZTSAgentState lookAtAgent(const std::string& acrDirectory);
 

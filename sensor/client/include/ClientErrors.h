@@ -18,7 +18,7 @@ public:
     using ZTCClientEx::ZTCClientEx;
 };
 
-/// Bytes that are no response. Carries the offset of the field that could not be read.
+/// Bytes that are not a response. Carries the offset of the field that could not be read.
 class ZTCDecodeEx : public ZTCClientEx {
 public:
     ZTCDecodeEx(std::size_t aOffset, const std::string& acrText) : ZTCClientEx(acrText), mOffset(aOffset) {}
@@ -72,7 +72,7 @@ private:
     int mErrno;
 };
 
-/// Whether a call failed for want of descriptors or memory. That says nothing of the call's object, and it passes.
+/// Whether a call failed for lack of descriptors or memory. That says nothing about the call's object, and may pass.
 bool isShortage(int aErrno);
 
 #endif

@@ -20,8 +20,8 @@ public:
     /// Writes the own pid into the lock that is held. A sensor does that, which holds it as long as it runs; a client
     /// that talks for a moment does not. Throws ZTCSystemCallEx.
     void nameHolder();
-    /// The process that has written its pid there, runs, and is not this one; 0 where the holder is only a client, or
-    /// nobody. Ask when tryAcquire() has said false.
+    /// The pid in the lock file, if another process of that pid runs. Otherwise 0: only a client holds the lock, or
+    /// nobody. To be called after tryAcquire() has returned false.
     long getNamedHolder() const;
     /// One line about who holds the lock.
     std::string describeHolder() const;

@@ -78,7 +78,7 @@ struct ZTSDecodedData {
     const ZTSFieldValue* find(const char* apName) const;
 };
 
-/// Never throws for what the bytes are: fields that are not there are left out, and the problem says so.
+/// Never throws, whatever the bytes are: missing fields are left out, and the problem says so.
 ZTSDecodedData decodeEventData(std::uint8_t aCategory, std::uint8_t aSubcategory, std::span<const std::uint8_t> aData);
 
 #endif

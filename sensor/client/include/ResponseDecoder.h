@@ -17,8 +17,8 @@ struct ZTSDecodeResult {
     std::optional<ZTCDecodeEx> mProblem;  ///< nothing: the whole body was decoded
 };
 
-/// Decodes as much as there is: scope data is handed out once, so that what did arrive must not be lost. A payload that
-/// ends where a list would begin is whole, whatever the announced count.
+/// Decodes as much as there is: the agent hands scope data out only once, so nothing that has arrived may be lost. A
+/// payload that ends where a list would begin is whole, whatever the announced count.
 ZTSDecodeResult decodeAsFarAsPossible(std::span<const std::uint8_t> aBody);
 
 /// The whole body, or ZTCDecodeEx naming the offset, what was wanted there and what was found.

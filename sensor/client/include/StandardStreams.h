@@ -12,8 +12,8 @@ bool reserveStandardStreams();
 /// The same for a program that is of no use without standard output: throws ZTCSystemCallEx where it was closed.
 void requireStandardOutput();
 
-/// One write to standard output, from the place on that is reached, at most so many bytes. Returns the bytes written,
-/// 0 after an interruption or where a descriptor that does not block is full. Throws ZTCSystemCallEx.
+/// Makes one write to standard output, from the offset aWritten on, of at most so many bytes. Returns the bytes
+/// written; 0 after an interruption, or where a descriptor that does not block is full. Throws ZTCSystemCallEx.
 std::size_t writeSomeOutput(const std::string& acrText, std::size_t aWritten, std::size_t aMost);
 
 /// Writes all of it to standard output, and waits where it is full. Throws ZTCSystemCallEx.

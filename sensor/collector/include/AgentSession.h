@@ -73,7 +73,7 @@ public:
 
     void setSettings(const ZTSSessionSettings& acrSettings, ZTCTime aNow);
     void offerTargets(const std::vector<ZTSTargetPort>& acrTargets, ZTCTime aNow);
-    /// @param aPatience  for how long a full disk may hold the shut-down up
+    /// @param aPatience  how long a full disk may delay the shut-down
     void requestStop(ZTCTime aNow, std::chrono::milliseconds aPatience);
     void noteEnded(int aWaitStatus, ZTCTime aNow);
 

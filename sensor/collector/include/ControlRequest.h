@@ -14,14 +14,14 @@ struct ZTSControlRequest {
     ZTEControlRequest mKind = ZTCR_Wrong;
     std::string mName;   ///< of a mark
     std::string mError;  ///< of a wrong request: one line
-    /// Of a mark; absent: now. Of a status: losses are told from then on; absent: of the last 24 hours.
+    /// Of a mark; absent: now. Of a status: losses are counted from then on; absent: those of the last 24 hours.
     std::optional<ZTCHistoryTime> mTime{};
 };
 
 /// Longest name of a mark in bytes.
 inline constexpr std::size_t gcMaxMarkName = 200;
 
-/// Never throws for what the line holds.
+/// Never throws, whatever the line holds.
 ZTSControlRequest parseControlRequest(const std::string& acrLine);
 
 std::string toErrorJson(const std::string& acrError);

@@ -30,7 +30,7 @@
 /// The value that holds the losses of the last day: the text of a ZTCLossWindow.
 inline constexpr const char* gcLossesValue = "collector.losses";
 
-/// What can be seen of the worker at any time.
+/// The worker's state, to be read at any time.
 struct ZTSHistoryState {
     bool mIsOpen = false;  ///< the database is open: numbers and id below are known
     std::string mStoreId;
@@ -74,12 +74,12 @@ public:
 
     // ---- ZTCTopologySink ----
     void notePorts(std::shared_ptr<const ZTSTopology> apPorts) override;
-    /// Of scans that wait for the disk the last one says it all.
+    /// Where several scans wait for the disk, only the last one is stored.
     void noteTopology(ZTCHistoryTime aTime, std::shared_ptr<const ZTSTopology> apTopology) override;
     void noteCounters(std::vector<ZTSCounterSample> aSamples) override;
 
-    /// An agent that another process of this kind saw last, and that nobody has heard of since. Does nothing when it is
-    /// one that runs, or when there is none.
+    /// Ends the agents that an earlier collector saw running and that nobody has heard of since. Does nothing where
+    /// there is none. The agent that runs stays.
     void endForgottenAgents(const std::string& acrRunningGeneration);
     void setLimits(const ZTSStoreLimits& acrLimits);
     void setMark(std::uint64_t aTicket, const std::string& acrName, ZTCHistoryTime aTime);

@@ -1,4 +1,4 @@
-/// Stores one thing that has happened with each function. The caller has begun a transaction of the store. If that
+/// Each function stores one thing that has happened. The caller has begun a transaction of the store. If that
 /// transaction fails, the same call may be made again in the next one. One thread.
 #ifndef SENSOR_COLLECTOR_INCLUDE_HISTORYWRITER_H
 #define SENSOR_COLLECTOR_INCLUDE_HISTORYWRITER_H
@@ -28,14 +28,14 @@ public:
     std::optional<std::uint64_t> takeIn(const ZTSSpoolEntry& acrEntry, const ZTCPagePointer& acrPage, bool aIsLastTry);
     /// A look at the running agent's page.
     void notePage(const ZTCPagePointer& acrPage);
-    /// Of an agent whose files are all taken in.
+    /// Ends an agent whose files are all taken in.
     void endAgent(const ZTSEndedAgent& acrAgent);
-    /// Agents that were seen running, of which nobody has heard since.
+    /// Ends the agents that were seen running and that nobody has heard of since.
     void endForgottenAgents(const std::string& acrRunningGeneration);
     void notePorts(std::shared_ptr<const ZTSTopology> apPorts);
     /// The agent whose page was stored last, and that has not ended since; empty: none.
     std::string getGeneration() const { return mpPage != nullptr ? mpPage->mStartId : std::string(); }
-    /// Those that are over, by the last page.
+    /// Closes the episodes that are over by the last page.
     void closeEpisodes();
 
 private:

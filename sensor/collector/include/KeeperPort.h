@@ -26,7 +26,7 @@ public:
     std::vector<std::string> receive(const std::function<void(ZTSLinkMessage)>& acrHandle);
 
     void send(ZTELinkMessageType aType, std::uint64_t aStart, const std::string& acrText = {});
-    /// The same text is sent once.
+    /// A text that is the same as the last one is not sent again.
     void sendText(const std::string& acrText);
     /// One Look waits at most.
     void sendLook(ZTCTime aNow);

@@ -1,5 +1,5 @@
 /// What the agent refused and dropped, and what its library reported as lost, in the last 24 hours: from the pages of
-/// one start after the other. Losses of the last hour are told apart by the minute, earlier ones by the hour.
+/// one start after the other. Losses of the last hour are kept by the minute, earlier ones by the hour.
 ///
 /// It can be kept as text, so that the next process of this kind goes on where this one stopped.
 #ifndef SENSOR_COLLECTOR_INCLUDE_LOSSWINDOW_H
@@ -25,7 +25,7 @@ public:
     /// @param aNow  nothing is known of the time before
     explicit ZTCLossWindow(ZTCHistoryTime aNow) : mBegin(aNow) {}
 
-    /// Goes on where the window stopped whose toText() made this text. Call it before the first page. Returns false,
+    /// Continues from a text that toText() of an earlier window has made. Call it before the first page. Returns false,
     /// and changes nothing, for any other text.
     bool restore(const std::string& acrText);
     /// JSON of one line.

@@ -24,7 +24,7 @@
 ///
 /// A `.part` is created before each request, so a `.part` in the folder says that a request may be on its way. If it
 /// holds bytes, an answer has begun, and its rest will come. If it is empty, the collector died before or after it sent
-/// the request, and nothing on the disk can tell which. Then the next collector sends a request that the agent always
+/// the request, and nothing on the disk says which. Then the next collector sends a request that the agent always
 /// refuses with a known status, and takes in every frame up to that refusal. Answers come in the order of the requests:
 /// behind the refusal nothing is left over. Scope data in front of it are kept like any other.
 ///

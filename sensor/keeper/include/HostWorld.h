@@ -44,7 +44,7 @@ public:
 
     const ZTSSettings& getSettings() const { return mReading.mSettings; }
     const std::string& getConfigOption() const { return mConfigOption; }
-    /// For what is started from now on. sensor.directory and sensor.state stay. Returns the text for the collector.
+    /// For processes started from now on. sensor.directory and sensor.state stay. Returns the text for the collector.
     ZTCFileDescriptor setSettings(const ZTSSettingsReading& acrReading);
 
     /// To be polled: readable once the process has ended. -1 where there is none.

@@ -1,5 +1,5 @@
-/// The keeper's rules (KeeperRules.h), as a machine without a process, a clock or a file of its own: it is told what
-/// has happened and when, and acts through a ZTCKeeperWorld.
+/// The keeper's rules (KeeperRules.h), as a machine without a process, a clock or a file of its own: its owner reports
+/// what has happened and when, and it acts through a ZTCKeeperWorld.
 ///
 /// After each call, getNextTime() says when handleTime() is to be called at the latest.
 #ifndef SENSOR_KEEPER_INCLUDE_KEEPER_H

@@ -6,7 +6,7 @@
 #include "sensor/client/include/FileDescriptor.h"
 #include "sensor/keeper/include/HostWorld.h"
 
-/// Blocks SIGTERM, SIGINT and SIGHUP, and returns a descriptor that tells them. Throws ZTCSystemCallEx.
+/// Blocks SIGTERM, SIGINT and SIGHUP, and returns a descriptor that reports them. Throws ZTCSystemCallEx.
 ZTCFileDescriptor openSignals();
 
 /// Runs until a stop is complete. Returns the exit status. Throws ZTCSystemCallEx where waiting itself fails.

@@ -30,10 +30,10 @@ class ZTCKeeperWorld {
 public:
     virtual ~ZTCKeeperWorld() = default;
 
-    /// Makes a new response FIFO and starts an agent. Returns the message AgentStarted but for mRestarts; nothing where
-    /// that failed, which has been said then.
+    /// Makes a new response FIFO and starts an agent. Returns the message AgentStarted without mRestarts; nothing where
+    /// that failed, after saying why.
     virtual std::optional<ZTSLinkMessage> startAgent(std::uint64_t aStart) = 0;
-    /// Starts a collector on a new link. False where that failed, which has been said then.
+    /// Starts a collector on a new link. False where that failed, after saying why.
     virtual bool startCollector() = 0;
     /// Does nothing where the process is gone.
     virtual void sendSignal(ZTEWatched aProcess, int aSignal) = 0;

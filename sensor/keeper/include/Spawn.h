@@ -38,7 +38,7 @@ ZTSProcess spawn(const ZTSSpawn& acrSpawn);
 /// started with ZTPV_PassOn. Does nothing as root. Throws ZTCSystemCallEx.
 void keepCapabilitiesForOthers();
 
-/// A descriptor that tells the end of any process; not open where there is no such process.
+/// A descriptor that is readable once the process has ended; not open where there is no such process.
 ZTCFileDescriptor openPidFd(pid_t aPid);
 
 /// Sends a signal to the very process that the descriptor was opened for. Does nothing where that has ended.

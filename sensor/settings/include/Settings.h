@@ -23,8 +23,8 @@ struct ZTSWarnRule {
     bool operator==(const ZTSWarnRule&) const = default;
 };
 
-/// What holds: the values of the file, and the defaults of what the file does not name. An object made without reading
-/// is blank: take defaultSettings().
+/// The settings in force: the values of the file, and the defaults of the keys that it does not name. A new object is
+/// blank: use defaultSettings() instead.
 struct ZTSSettings {
     std::string mAgentProgram;  ///< a name or an absolute path
     std::string mAgentLibrary;  ///< empty: the agent's own default
@@ -94,7 +94,7 @@ ZTSSettingsReading readSettings(const std::string& acrOption);
 /// Reads a text. `acrFile` is named in problems.
 ZTSSettingsReading parseSettings(const std::string& acrText, const std::string& acrFile);
 
-/// What holds without a file.
+/// The settings without a file: every default.
 ZTSSettings defaultSettings();
 
 /// The keys whose values differ, as "agent.log", in the order of the table; "names" and "warn" as a whole.

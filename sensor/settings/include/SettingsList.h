@@ -11,7 +11,7 @@
 /// program is named: its arguments may hold a secret.
 std::string listSettings(const ZTSSettings& acrSettings);
 
-/// What must not leave this host: the arguments of all hooks that are long enough to be one.
+/// What must not leave this host: the arguments of all hooks that are long enough to be a secret.
 std::vector<std::string> listSecrets(const ZTSSettings& acrSettings);
 
 #endif

@@ -69,8 +69,8 @@ public:
 
     const std::string& getStoreId() const;
 
-    /// Calls it with one view of the history: of what the sensor stores meanwhile it sees nothing. Not for functions
-    /// that read the ledger or the topology, which have such a view of their own.
+    /// Calls acrRead with one view of the history, which has nothing of what is stored meanwhile. Not for functions
+    /// that read the ledger or the topology: each has a view of its own.
     void readAsOne(const std::function<void()>& acrRead) const;
 
     /// Visits matching episodes in the order in which they began to arrive, newest last. Return false to stop.

@@ -52,8 +52,8 @@ struct ZTSPageCounts {
 
 /// One row of the ledger, over all agents that this database has seen.
 ///
-/// stored + retired + lost = handedOver, where lost is what gaps know to have been handed over and never to have
-/// arrived. `held` is of the running agent; what an ended agent still held is in its gap.
+/// stored + retired + lost = handedOver. `lost` are occurrences that were handed over and never arrived, as gaps count
+/// them. `held` is of the running agent; what an ended agent still held is in its gap.
 struct ZTSLedgerRow {
     ZTSInitiator mInitiator;
     ZTCKindKey mKind = 0;

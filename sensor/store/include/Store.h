@@ -34,7 +34,7 @@ struct ZTSStoreLimits {
 /// Rows of the topology that one transaction writes, so that frames do not wait for a large host's first scan.
 inline constexpr std::uint32_t gcMostTopologyRows = 10000;
 
-/// What was taken in out of one frame.
+/// What was taken in from one frame.
 struct ZTSTakenIn {
     std::uint64_t mRecords = 0;
     std::uint64_t mOccurrences = 0;
@@ -128,7 +128,7 @@ public:
 
     // ---- names ----
 
-    /// What is known of a local or remote port beside its WWPN. Fields that are absent leave what is stored.
+    /// Stores what is known of a port beside its WWPN. A field that is absent leaves the stored value.
     void noteInitiator(const ZTSInitiator& acrInitiator);
     void noteRemotePort(const ZTSRemotePort& acrPort);
 
@@ -160,7 +160,7 @@ public:
     /// Returns whether it was written.
     bool noteGap(const ZTSGap& acrGap);
 
-    /// Begins a run of Tavik: now, and what was left open by an earlier run ends where that was last seen.
+    /// Begins a run of Tavik now. What an earlier run left open ends where that run was last seen.
     void beginRun(ZTCHistoryTime aNow);
     /// Tavik still runs. Call about once a minute.
     void noteRunning(ZTCHistoryTime aNow);

@@ -62,7 +62,7 @@ struct ZTSLunWays {
     bool operator==(const ZTSLunWays&) const = default;
 };
 
-/// The mark behind which redundancy is measured anew: what is there then is what is meant.
+/// The mark from which on redundancy is measured anew: the paths at its time are the wanted ones.
 inline constexpr const char* gcBaselineMark = "baseline";
 
 /// How far one counter of a port rose within one minute.

@@ -20,7 +20,7 @@ constexpr std::int64_t getSlot(std::int64_t aTime, std::int64_t aSlotMicrosecond
     return aTime % aSlotMicroseconds < 0 ? lQuotient - 1 : lQuotient;
 }
 
-/// What a count is of.
+/// The initiator, kind and remote port that a count is of.
 struct ZTSCountKey {
     std::uint32_t mInitiator = 0;
     std::uint32_t mPort = 0;

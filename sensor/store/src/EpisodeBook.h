@@ -47,8 +47,8 @@ public:
     ZTSCountPlace& add(const ZTSEpisodeKey& acrKey, const ZTSKindShape* apShape, const ZTSRecordView& acrRecord,
                        std::int64_t aBegin, std::int64_t aEnd, std::int64_t aNow);
 
-    /// Returns how many were closed. An episode whose last event lies far ahead of the clock, which has then been set
-    /// back, is closed when the gap has passed since that was first seen.
+    /// Returns how many were closed. After the clock was set back, an episode's last event may lie far ahead of it.
+    /// Such an episode is closed when the gap has passed since that was first seen.
     std::size_t close(std::int64_t aNow, const NothingHeld& acrNothingHeld);
 
     void flush();

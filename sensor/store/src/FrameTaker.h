@@ -29,7 +29,7 @@ public:
     void visitList(std::string_view aInitiatorKey) override;
     void visitRecord(const ZTSRecordView& acrRecord) override;
 
-    /// Adds to the ledger what it has not got yet. The last call.
+    /// Adds to the ledger what is not in it yet. To be called last.
     void finish();
     const ZTSTakenIn& getTakenIn() const { return mTaken; }
     std::optional<ZTEResponseOutcome> getOutcome() const { return mOutcome; }

@@ -27,7 +27,7 @@ public:
     /// The names of the settings, and the ports and the topology that the history knows. @param apHistory  null: none;
     /// otherwise it outlives the names
     ZTCNameBook makeNames(const ZTCHistory* apHistory) const;
-    /// Asks the sensor and reads the history. Never throws for what it meets: what is not known is in the facts.
+    /// Asks the sensor and reads the history. Never throws, whatever it meets: the facts say what is not known.
     /// @param aLossesSince  losses from then on; absent: of the last 24 hours
     ZTSStatusFacts gatherFacts(std::optional<ZTCHistoryTime> aLossesSince = {}) const;
 

@@ -18,7 +18,7 @@ struct ZTSControlAnswer {
 /// Bytes of an answer that are accepted at most.
 inline constexpr std::size_t gcMostAnswerBytes = std::size_t{16} * 1024 * 1024;
 
-/// Never throws for what the other side does, and waits for it at most so long in all.
+/// Never throws, whatever the other side does, and waits for it at most so long in all.
 ZTSControlAnswer askSensor(const std::string& acrSocketPath, const nlohmann::json& acrRequest,
                            std::chrono::milliseconds aLimit);
 

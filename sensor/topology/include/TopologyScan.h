@@ -14,8 +14,8 @@ struct ZTSTopologyRoots {
     std::string mSwaps = "/proc/swaps";
 };
 
-/// One scan. Never throws for what the trees hold: what is missing, malformed or blocks is absent. Everything is sorted
-/// by name, so that two scans of the same state are equal.
+/// One scan. Never throws, whatever the trees hold: what is missing, malformed or blocks is absent. Everything is
+/// sorted by name, so that two scans of the same state are equal.
 ZTSTopology scanTopology(const ZTSTopologyRoots& acrRoots, ZTCPatientReader& arReader);
 
 /// The same for initiators and remote ports alone: a few files a port.

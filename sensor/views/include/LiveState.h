@@ -24,7 +24,7 @@
 ///      "warnings": [{"kind": "queue-full", "text": "queue-full of array7 ctrl-A: 120 within 300.0 s", "since": "…",
 ///                    "given": 2, "next": "…"}]}
 ///
-/// - `keeper.state`: `starting`, `running`, `waiting-for-adapters` (also for a library: `endReason` tells them apart),
+/// - `keeper.state`: `starting`, `running`, `waiting-for-adapters` (also for a library: see `endReason`),
 ///   `waiting-to-restart` or `stopping`. `since`: when that state began. `nextStart`: when the agent is started next,
 ///   where that is known.
 /// - `agent` is the running agent, or the last one. `endReason` is why the last one ended, in the words of the status
@@ -34,13 +34,13 @@
 /// - `collector.disk`: `ok`, `full` or `read-only`; anything but `ok` means that it does not ask. `diskProblem` is one
 ///   line that names the folder and the reason. `waitingFrames` and `waitingBytes` are in the spool, not yet in the
 ///   history.
-/// - `kinds`: an entry an adapter. `words` are the adapters' library's own, for kinds it has said something of.
+/// - `kinds`: an entry for each adapter. `words`: what the adapters' library has said about a kind.
 /// - `ledger`: the totals of all agents that the database has seen, the running one's up to now. Where it is missing,
 ///   the reader takes the rows that the history holds.
 /// - `topology`: when the names of ports and disks were last read. `staleSince`: since when they may be out of date,
 ///   because the files in `blocked` do not answer, or the whole reading hangs.
 /// - `losses`: what was refused or dropped in the last 24 hours, or since `since` where the collector knows less.
-/// - `warnings` are the open ones of the configuration's rules: `given` so often, `next` time if the trouble goes on. A
+/// - `warnings`: the open ones of the configuration's rules. `given`: how often. `next`: when again, if it goes on. A
 ///   hook that failed is one of the kind `hook`, an output that cannot be written one of the kind `output`, until it
 ///   works again.
 ///
@@ -183,7 +183,7 @@ struct ZTSLiveState {
     std::vector<std::string> mProblems;  ///< members that could not be read, one line each
 };
 
-/// Never throws for what the document holds.
+/// Never throws, whatever the document holds.
 ZTSLiveState readLiveState(const nlohmann::json& acrDocument);
 
 #endif

@@ -26,8 +26,8 @@ using ZTCCountersAt = std::function<const std::vector<ZTSCounterSample>&(ZTCHist
 /// Reads them from a history, which outlives the result. Cheap where times rise.
 ZTCCountersAt readCountersOf(const ZTCHistory& acrHistory);
 
-/// Names of ports and nodes, and the ports that are known. Filled once, then only read; by any thread, or with a
-/// topology or counters by the one that may use its history.
+/// Names of ports and nodes, and the ports that are known. Filled once, then only read. Any thread may read it. With a
+/// topology or counters only the thread may that uses their history.
 class ZTCNameBook {
 public:
     /// The administrator's name of a port or a node.

@@ -125,7 +125,7 @@ struct ZTSSanFacts {
     std::optional<ZTESanSeverity> getWorst() const;
 };
 
-/// The ports of a topology as the history names them. A remote port without a WWPN is none.
+/// The ports of a topology as the history names them. Absent for a remote port without a WWPN.
 ZTSInitiator toInitiator(const ZTSTopologyInitiator& acrPort);
 std::optional<ZTSRemotePort> toRemotePort(const ZTSTopologyRemotePort& acrPort);
 

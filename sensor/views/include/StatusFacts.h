@@ -45,7 +45,7 @@ struct ZTSHistoryFacts {
 /// Open episodes that the status counts at most: it has to answer at once.
 inline constexpr std::uint64_t gcMostOpenEpisodes = 1000;
 
-/// How far back losses are told, unless somebody asks for less.
+/// How far back losses are counted, unless less is asked for.
 inline constexpr std::chrono::hours gcLossSpan{24};
 
 struct ZTSStatusFacts {
@@ -93,8 +93,8 @@ inline constexpr std::chrono::minutes gcScanSpan{5};
 /// The command to run where names are stale.
 inline constexpr const char* gcStaleNamesAction = "journalctl -k -n 50";
 
-/// That the running sensor's names are not as of now, since when, why, and what to do. Empty: they are, or it did not
-/// say.
+/// Says that the running sensor's names are out of date, since when, why, and what to do. Empty: they are current, or
+/// the sensor did not say.
 std::string describeStaleNames(const ZTSStatusFacts& acrFacts);
 
 /// One line for each thing that could not be learned.

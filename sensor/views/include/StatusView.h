@@ -12,7 +12,7 @@ struct ZTSTextStyle {
     bool mHasColor = false;
 };
 
-/// The face: the state, its troubles with what to do, and in health the links and how quiet it is. Ends with a line
+/// The state, its troubles with what to do, and without a trouble the links and how quiet it is. Ends with a line
 /// break. Lines are at most `mWidth` less 3 characters long, but for words that cannot be broken.
 std::string formatStatus(const ZTSStatusFacts& acrFacts, const ZTSTextStyle& acrStyle);
 

@@ -30,8 +30,8 @@ public:
     void addRow(std::vector<std::string> aCells);
     std::size_t countRows() const { return mRows.size(); }
 
-    /// The rows since the last call, a line each; before the first ones the heading. Columns are dropped once, at the
-    /// first call, and the last columns that may be are cut with "..".
+    /// The rows since the last call, a line each; before the first ones the heading. Columns that do not fit are
+    /// dropped at the first call. Then the last ones that may be cut are cut, with "..".
     std::string takeText();
 
     /// Another width from the next text on, such as a terminal's that has changed.

@@ -1,9 +1,9 @@
-/// One run of a program that tells somebody of a trouble: started, watched, and ended with all that it has started.
+/// One run of a program that warns somebody of a trouble: started, watched, and ended with all that it has started.
 ///
-/// No shell is between. The program gets its input as a file on standard input, so that it need not read it. What it
-/// prints is kept for the report, the end of it. It runs in a process group of its own, as the user and in the sandbox
-/// of this process, with the signals' default actions and no other descriptors. A process between this one and the
-/// program ends all that the program has started, in whatever group or session, also where this process is killed.
+/// There is no shell in between. The program gets its input as a file on standard input, so that it need not read it.
+/// The end of what it prints is kept for the report. It runs in a process group of its own, as the user and in the
+/// sandbox of this process, with the signals' default actions and no other descriptors. A process between this one and
+/// the program ends all that the program has started, in whatever group or session, also where this process is killed.
 #ifndef SENSOR_WARNINGS_INCLUDE_HOOKPROCESS_H
 #define SENSOR_WARNINGS_INCLUDE_HOOKPROCESS_H
 
@@ -40,8 +40,8 @@ public:
     void addTo(std::vector<pollfd>& arFds) const;
     /// When step() is to be called at the latest.
     ZTCTime getNextStep(ZTCTime aNow) const;
-    /// To be called after each poll(). Nothing: it runs. A text: it has ended, and all that it has started with it;
-    /// an empty one: it did its work, else why it counts as failed, one line.
+    /// To be called after each poll(). Nothing: it runs. A text: it has ended with all that it has started. The text is
+    /// empty after a success; otherwise it says in one line why the run counts as failed.
     std::optional<std::string> step(ZTCTime aNow);
 
 private:

@@ -57,8 +57,8 @@ public:
     const std::vector<ZTSWarnRule>& getRules() const { return mRules; }
 
     void note(const ZTSWarnOccurrence& acrOccurrence);
-    /// What holds now of the kinds that are states. What held before and is not named does so no longer; what is new
-    /// counts as an occurrence.
+    /// The states that hold now. A state that held before and is not among them has ended. A new one counts as an
+    /// occurrence.
     void setHolding(const std::vector<ZTSWarnOccurrence>& acrHolding);
 
     /// Opens and ends troubles. Call it before the functions below. @param aIsKnown  whether it is known what happens
@@ -68,7 +68,7 @@ public:
     /// The troubles that are to be warned of now, at most so many; each is then taken as warned of, its next time set.
     std::vector<ZTSTrouble> takeDue(ZTCHistoryTime aNow, std::size_t aMost);
     std::vector<ZTSTrouble> getOpen() const;
-    /// Whether any time has to pass for something to happen.
+    /// Whether no trouble is open or counted: then time alone changes nothing.
     bool isEmpty() const { return mTracks.empty(); }
 
     /// The open troubles as a text that the next process, or a book with other rules, continues from.
