@@ -133,7 +133,7 @@ TEST_F(NamesOverTheChain, CountersThatRiseStandBesideTheEpisodesOfTheSamePortAnd
     EXPECT_THAT(tavik({"explain", std::to_string(lEpisode)}).mOutput,
                 HasSubstr("Counters that rose in the same minutes: error_frames +4, invalid_crc_count +5"));
     const std::string lExplained = tavik({"explain"}).mOutput;
-    EXPECT_THAT(lExplained, HasSubstr("Error counters rose around it: "));
+    EXPECT_THAT(lExplained, HasSubstr("Error counters rose around that time: "));
     EXPECT_THAT(lExplained, HasSubstr("invalid_crc_count +5"));
     EXPECT_THAT(lExplained, Not(HasSubstr("loss_of_sync_count")));
 }

@@ -104,11 +104,11 @@ static void sAddCounters(const ZTCEvidenceIndex& acrEvidence, ZTSFinding& arFind
         }
     }
     if (!lText.empty()) {
-        arFinding.mSeen.push_back("Error counters rose around it: " + lText + ".");
+        arFinding.mSeen.push_back("Error counters rose around that time: " + lText + ".");
     } else if (!lrAll.mCounters.empty()) {
         arFinding.mAgainst.emplace_back(
-            "No error counter rose around it: a cable that was pulled or a switch port "
-            "that was disabled looks like this, a dirty one does not.");
+            "No error counter rose around that time. A pulled cable or a disabled switch "
+            "port looks like this, a dirty connector does not.");
     }
 }
 

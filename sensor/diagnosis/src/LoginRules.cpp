@@ -176,8 +176,8 @@ void lookForFailover(const ZTCEvidenceIndex& acrEvidence, const ZTSRule& acrRule
     for (const ZTSRelogin& lrRelogin : sRelogins(acrEvidence)) {
         if (const auto lNode = sFindWholeNode(acrEvidence, lrRelogin)) {
             sAddRelogin(acrEvidence, acrRule, lrRelogin, arFindings);
-            arFindings.back().mSeen.push_back("These are all the ports that are known of node " + lNode->toText() +
-                                              ", and no other node's.");
+            arFindings.back().mSeen.push_back("These are all known ports of node " + lNode->toText() +
+                                              ", and no port of another node is among them.");
         }
     }
 }

@@ -145,8 +145,8 @@ void lookForLunOverload(const ZTCEvidenceIndex& acrEvidence, const ZTSRule& acrR
                                            describeLuns(lLuns) + " of " + lPorts);
         sAddSeen(acrEvidence, lrEpisodes, lFinding);
         if (lFinding.mRemotePorts.size() > 1) {
-            lFinding.mSeen.push_back("The same behind " + formatNumber(lFinding.mRemotePorts.size()) +
-                                     " ports of one node: no single port is at fault.");
+            lFinding.mSeen.push_back("The same is seen behind " + formatNumber(lFinding.mRemotePorts.size()) +
+                                     " ports of one node, so no single port is at fault.");
         }
         if (lLuns.mNumbers.size() > 1) {
             lFinding.mAgainst.emplace_back("More than one LUN was full: the port may be near its limit, too.");

@@ -103,7 +103,7 @@ void lookForRestarts(const ZTCEvidenceIndex& acrEvidence, const ZTSRule& acrRule
                 lrFinding.mSeverity = ZTSV_Note;
                 lrFinding.mAgainst.push_back("This host sent a reset itself just before (" + std::string(lpKind) +
                                              ", episode " + std::to_string((*lFound)->mEpisode) +
-                                             "): the unit attention may be no more than its answer.");
+                                             "): the unit attention may only be the answer to it.");
             }
         }
     }

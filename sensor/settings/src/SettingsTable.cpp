@@ -29,7 +29,8 @@ std::span<const ZTSKey> settingsTable() {
     using S = ZTSSettings;
     static constexpr auto scKeys = std::to_array<ZTSKey>({
         {"agent", "program", &S::mAgentProgram, sText(gcProgramRule), R"("qrv-tvk")",
-         "The agent: beside tavik-sensor, else in the sbin folder of its installation, else in PATH."},
+         "The agent's program. It is looked for beside tavik-sensor, then in the sbin folder of its\n"
+         "installation, then in PATH."},
         {"agent", "library", &S::mAgentLibrary, sText(gcAnyRule), R"("")",
          "The adapters' library (ZT_LIBKPM_PATH of the agent). Empty: the agent's own default."},
         {"agent", "log", &S::mAgentLog, sText(gcPathRule), R"("/var/log/tavik/qrv-tvk.log")",
@@ -42,49 +43,57 @@ std::span<const ZTSKey> settingsTable() {
          "Holds agent/ (FIFOs, pid files, status pages) and the socket control. Gone after a restart of\n"
          "the host."},
         {"sensor", "state", &S::mSensorState, sText(gcDirectoryRule), R"("/var/lib/tavik")",
-         "Holds the history (history.db) and the spool. Keep it."},
+         "Holds the history (history.db) and the spool. Do not delete it."},
 
         {"collect", "period", &S::mCollectPeriod, sSeconds(0.1, 3600), "5.0",
-         "Time between two looks at the agent when little comes. When much comes, the agent rings."},
+         "Time between two retrievals from the agent. When many events come, the agent asks for an\n"
+         "earlier one."},
         {"collect", "record_limit", &S::mCollectRecordLimit, sCount(0, scMostOf32Bits), "900",
-         "Largest number of bytes of event data in one record, as the start command sets it."},
+         "Most bytes of event data in one record."},
 
         {"targets",
          "sysfs",
          &S::mTargetsSysfs,
          {},
          "true",
-         "Remote ports are known from /sys/class/fc_remote_ports, and from a file as of\n"
-         "\"tavikctl targets\". An empty path: no file."},
+         "The sensor learns the remote ports from /sys/class/fc_remote_ports, and from a file of the form\n"
+         "that \"tavikctl targets\" takes. An empty path: no file."},
         {"targets", "file", &S::mTargetsFile, sText(gcOptionalPathRule), R"("")", ""},
 
         {"history", "days", &S::mHistoryDays, sCount(1, 36500), "90",
-         "What is older than these days, or beyond this size, is retired: counted in totals, then deleted."},
+         "What is older than these days is retired: counted in totals, then deleted. When the history is\n"
+         "larger than this size, its oldest part is retired too."},
         {"history", "size", &S::mHistorySize, sBytes(16 * scMebibyte, 1024 * scTebibyte), R"("2GiB")", ""},
         {"history", "records", &S::mHistoryRecords, sCount(0, 1000000), "100",
-         "Raw records kept at each end of an episode."},
+         "How many raw records are kept at the beginning of an episode, and how many at its end."},
 
-        {"episode", "gap", &S::mEpisodeGap, sSeconds(1, 86400), "60", "Time without an event that ends an episode."},
+        {"episode", "gap", &S::mEpisodeGap, sSeconds(1, 86400), "60",
+         "An episode ends after this time without an event."},
 
         {"http", "listen", &S::mHttpListen, sText(gcListenRule), R"("127.0.0.1:9632")",
-         "\"ADDRESS:PORT\", \"unix:PATH\", or \"\" for off. A loopback port can be read by every local user; a\n"
-         "socket by its mode. Any other address needs public = true."},
+         "\"ADDRESS:PORT\", \"unix:PATH\", or \"\" for off. Every local user can read a loopback port. The mode of\n"
+         "a socket says who can read it. Any other address needs public = true."},
         {"http", "public", &S::mHttpPublic, {}, "false", ""},
         {"http", "hosts", &S::mHttpHosts, sText(gcHostRule), "[]",
-         "Names in the Host header that are accepted beside localhost, 127.0.0.1 and [::1]."},
+         "Host names that are accepted in the Host header, besides localhost, 127.0.0.1 and [::1]."},
 
         {"metrics", "textfile", &S::mMetricsTextfile, sText(gcOptionalPathRule), R"("")",
          "A file for node_exporter's textfile collector. Empty: none."},
         {"metrics", "remote_ports", &S::mMetricsRemotePorts, sCount(0, 100000), "500",
-         "Most remote ports that get a label of their own."},
+         "At most this many remote ports get a label of their own."},
 
         {"ndjson", "path", &S::mNdjsonPath, sText(gcStreamRule), R"("")",
-         "One line of JSON an episode. \"-\" is standard output, empty is none. The file is renamed at this\n"
-         "size, and so many renamed ones are kept."},
+         "A file that gets one line of JSON for each change of an episode. \"-\" is standard output. Empty:\n"
+         "none. The file is renamed at this size, and this many renamed files are kept."},
         {"ndjson", "size", &S::mNdjsonSize, sBytes(scMebibyte / 16, scTebibyte), R"("64MiB")", ""},
         {"ndjson", "keep", &S::mNdjsonKeep, sCount(0, 1000), "5", ""},
 
-        {"journal", "enabled", &S::mJournalEnabled, {}, "false", "Episodes in the system's journal."},
+        {"journal",
+         "enabled",
+         &S::mJournalEnabled,
+         {},
+         "false",
+         "Whether each change of an episode becomes an entry in the system's journal."},
     });
     return scKeys;
 }
@@ -116,8 +125,8 @@ static void sAppendComment(std::string& arText, const std::string& acrComment) {
 
 std::string defaultSettingsFile() {
     std::string lText =
-        "# Settings of Tavik. Every default stands here as a comment: take the # away to change one.\n"
-        "# \"tavik-sensor --check\" reports what is wrong with this file and starts nothing.\n"
+        "# Settings of Tavik. Every default is here as a comment. To change one, remove its # and edit the value.\n"
+        "# \"tavik-sensor --check\" reports the errors of this file and starts nothing.\n"
         "# Durations are numbers of seconds or texts such as \"90s\", \"10m\", \"24h\", \"30d\"; sizes are texts such\n"
         "# as \"64MiB\".\n";
     std::string lSection;
@@ -130,14 +139,16 @@ std::string defaultSettingsFile() {
         lText += std::string("#") + lcrKey.mpName + " = " + lcrKey.mpDefault + "\n";
     }
     lText +=
-        "\n# Your names for ports and nodes, by world wide name. None by default.\n"
+        "\n# Your names for ports and nodes, by world wide name. By default there are none.\n"
         "[names]\n"
         "# \"50:06:01:60:3b:a0:12:34\" = \"array7 ctrl-A\"\n"
-        "\n# Programs to run on trouble; as many [[warn]] tables as wanted. None by default.\n"
+        "\n# Programs (hooks) that are run when there is trouble. By default there are none, and there may be any\n"
+        "# number of [[warn]] tables. The keys, with their defaults in parentheses:\n"
         "# kind: an event kind (kpm-sim kinds), or deaf, gap, refused, agent-down, disk-full, path-lost\n"
-        "# count, within: so many events within this time (1, 60); per: \"port\", \"initiator\" or \"host\" "
-        "(\"port\")\n"
-        "# run: program and arguments, no shell; timeout: its process group is ended after this time (30)\n";
+        "# count, within: the hook is run after this many events (1) within this time (60)\n"
+        "# per: events are counted for each \"port\", \"initiator\" or \"host\" (\"port\")\n"
+        "# run: the program and its arguments; it is run without a shell\n"
+        "# timeout: after this time the hook is ended, with all processes that it has started (30)\n";
     lText +=
         "# [[warn]]\n"
         "# kind = \"queue-full\"\n"

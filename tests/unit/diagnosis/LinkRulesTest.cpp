@@ -95,7 +95,7 @@ TEST(LinkRules, RisingErrorCountersAreEvidence) {
     lEvidence.addCounter(7, 500, "invalid_tx_word_count", 5);  // long before
     const ZTSFinding lFinding = lEvidence.find("link-unstable").at(0);
     EXPECT_THAT(lFinding.mSeen,
-                Contains("Error counters rose around it: invalid_crc_count +37, loss_of_sync_count +2."));
+                Contains("Error counters rose around that time: invalid_crc_count +37, loss_of_sync_count +2."));
     EXPECT_THAT(lFinding.mCounters, SizeIs(2));
     EXPECT_THAT(lFinding.mAgainst, IsEmpty());
 }

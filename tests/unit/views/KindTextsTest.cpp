@@ -25,8 +25,8 @@ TEST(KindTexts, EveryKindHasASectionWithAllItsParts) {
 TEST(KindTexts, TheTextIsThatOfThePage) {
     const ZTSKindText* const lpText = findKindText("queue-full");
     EXPECT_EQ(lpText->mTitle, "Queue full");
-    EXPECT_THAT(lpText->mMeans, StartsWith("A target answered TASK SET FULL:"));
-    EXPECT_THAT(lpText->mCauses, StartsWith("More commands in flight"));
+    EXPECT_THAT(lpText->mMeans, StartsWith("A target answered TASK SET FULL."));
+    EXPECT_THAT(lpText->mCauses, StartsWith("More commands are in flight"));
     EXPECT_THAT(lpText->mLookAt, HasSubstr("Lower the hosts' queue depth"));
 }
 
