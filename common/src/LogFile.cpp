@@ -160,7 +160,7 @@ void ZTCLogFile::fail(int aError) noexcept {
 
 /// Opens the path in place of what was open; leaves that as it was on failure.
 bool ZTCLogFile::openPath() noexcept {
-    // Reading tells whether the file ends inside of a line. For a file that may only be written this is not known.
+    // Reading shows whether the file ends inside of a line. For a file that may only be written this is not known.
     int lDescriptor = sOpenForAppending(mPath, O_RDWR);
     if (lDescriptor < 0 && errno == EACCES) {
         lDescriptor = sOpenForAppending(mPath, O_WRONLY);

@@ -30,7 +30,7 @@ public:
     ZTCProcessInstanceManager(const ZTCProcessInstanceManager&) = delete;
     ZTCProcessInstanceManager& operator=(const ZTCProcessInstanceManager&) = delete;
 
-    /// Takes the lock, which a fork keeps, and empties the file, or makes it with mode 0644: returns false. While
+    /// Takes the lock, which a fork keeps, and empties the file, or makes it with mode 0600: returns false. While
     /// another process holds the lock it changes nothing and returns true: getProcessId() is then what the file names,
     /// or -1. Throws ZTCInvalidEx where the path is not a regular file, ZTCClibEx for the rest.
     bool isAnInstanceRunning();

@@ -18,7 +18,7 @@ namespace {
 // A user who can open the file can hold its lock, and so pass a process off as an agent that runs.
 constexpr ::mode_t scPidFileMode = 0600;
 
-// Who looks whether the lock is held takes it for a moment (see sLookUp): one refusal proves nothing.
+// A process that looks whether the lock is held takes it for a moment (see sLookUp): one refusal proves nothing.
 constexpr int scLockTries = 10;
 constexpr int scLockPauseMilliseconds = 10;
 
@@ -206,7 +206,7 @@ void ZTCProcessInstanceManager::killRunningInstance() {
             std::cout << "Stopped the running instance, process " << lAsked << std::endl;
             return;
         }
-        // Who may write the file must not have another's process ended by it.
+        // A user who can write the file must not get another user's process ended by it.
         if (lAsked == 0 && lHolder.mProcessId > 0 && !sIsProcessOf(lHolder.mFileOwner, lHolder.mProcessId)) {
             std::cout << "The pid file '" << lpPath << "' names process " << lHolder.mProcessId
                       << ", which is not its owner's; nothing is stopped" << std::endl;

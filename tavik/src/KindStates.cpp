@@ -50,7 +50,7 @@ ZTEStatusState sGetStateOfStatus(unsigned aStatus) {
     return lState;
 }
 
-/// In a state that this agent does not know no events arrive, as far as it can tell.
+/// A state that this agent does not know counts as failed: it cannot promise that events arrive.
 ZTEStatusState sGetStateOfReport(std::uint32_t aState) {
     ZT_ENTRY();
     ZTEStatusState lState = ZTSS_Failed;
@@ -99,7 +99,7 @@ void ZTCKindStates::noteStatus(unsigned aBoardId, const ZTCScopeEvent& acrEvent,
     if (ZTSKindState* lpState = findKind(aBoardId, lKind); lpState != nullptr) {
         const bool lIsReportNewer = lpState->mReportNumber > aReports;
         lpState->mIsRegistered = true;
-        // The status does not tell a source that has failed from one that needs rights; the report does.
+        // The status is the same for a source that has failed and one that needs rights. The report is not.
         const bool lIsReportExact = aStatus == KPM_STATUS_NO_RIGHTS && lpState->mReported == ZTSS_Failed;
         lpState->mState = lIsReportNewer || lIsReportExact ? lpState->mReported : sGetStateOfStatus(aStatus);
         show(aBoardId, lKind);

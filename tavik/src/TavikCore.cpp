@@ -44,7 +44,7 @@ public:
         ZT_EXIT();
     }
 
-    /// What is still undecided is refused.
+    /// Counts the events that are still undecided as refused.
     void refuse(ZTEStatusRefusal aReason) noexcept {
         ZT_ENTRY();
         if (mUndecided != 0 && gpTavikSystem != nullptr) {
@@ -222,7 +222,7 @@ void sConsolidateGenericEvents(const ZTCPointer<ZTCScopeEvent>& acrEvent, unsign
     ZT_EXIT();
 }
 
-/// What consolidates the events of a pair: the member of its kind, or the generic one where the kind keeps no data.
+/// The member that consolidates the events of a pair: that of its kind, or the generic one where the kind has no data.
 struct ZTSDispatch {
     unsigned char mCategory;
     unsigned char mSubcategory;

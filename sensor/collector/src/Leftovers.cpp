@@ -84,8 +84,8 @@ void ZTCLeftovers::endPages(const std::string& acrCurrent) {
             unlink(lrPath.c_str());
             continue;
         }
-        // An agent that another keeper has started may still run. A process number alone does not tell: it may belong
-        // to another program by now.
+        // An agent that another keeper has started may still run. A process number alone does not show it: another
+        // program may have it by now.
         const ZTSAgentState lAgent = lookAtAgent(mAgentDirectory);
         if (lAgent.mPresence == ZTAP_None || lAgent.mPid != static_cast<long>(lpPage->mPid)) {
             mrHistory.endAgent(sDescribe(lpPage, lrPath));

@@ -52,7 +52,7 @@ void ZTCLossWindow::addGrowth(ZTSCounts& arSum, const ZTSCounts& acrOld, const Z
     arSum.mDropped += sGrowth(acrOld.mDropped, acrNew.mDropped);
 }
 
-/// Drops what is too old, and puts together what need not be told apart any more.
+/// Drops slots that are too old, and merges old ones into slots of an hour.
 void ZTCLossWindow::tidy(ZTCHistoryTime aNow) {
     std::vector<ZTSSlot> lSlots;
     for (ZTSSlot& lrSlot : mSlots) {

@@ -142,8 +142,8 @@ void ZTCSpoolingConversation::settleFrame(ZTSProgress& arProgress) {
     }
 }
 
-/// Whether the FIFO is empty and nobody has it open for writing. poll() cannot tell where nobody ever had, and a read
-/// could take a byte away; tee(2) copies and tells.
+/// Whether the FIFO is empty and nobody has it open for writing. poll() does not say so where nobody ever had, and a
+/// read could take a byte away. tee(2) copies, and says it.
 static bool sIsAtItsEnd(int aFifo) {
     std::array<int, 2> lEnds{-1, -1};
     if (pipe2(lEnds.data(), O_NONBLOCK | O_CLOEXEC) != 0) {

@@ -210,7 +210,7 @@ void ZTCKeeper::handleStop(ZTCTime aNow) {
     handleTime(aNow);
 }
 
-/// What an orderly stop does to those who take too long.
+/// Ends the processes that take too long in an orderly stop.
 void ZTCKeeper::pressStop(ZTCTime aNow) {
     const auto lSince = aNow - mStoppedAt;
     if (mCollectorStartAt && lSince >= gcStopLastCollector) {

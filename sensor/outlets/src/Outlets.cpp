@@ -200,7 +200,7 @@ void ZTCOutlets::openServer() {
     }
 }
 
-/// What needs the history; without it nothing is lost, it comes later.
+/// Feeds the outlets that need the history. Without the history they are fed later, and lose nothing.
 void ZTCOutlets::feedHistory() {
     {
         const std::lock_guard lLock(mMutex);
@@ -294,7 +294,7 @@ std::string getOutletValue(const std::string& acrOutlet, const char* apValue) {
     return "outlet." + acrOutlet + "." + apValue;
 }
 
-/// What retention took before the outlet had it.
+/// Gives the outlet the number of changes that retention deleted before it had them.
 void ZTCOutlets::giveMissed(ZTSFedOutlet& arOutlet) {
     const std::string lName = arOutlet.mpOutlet->getName();
     const std::uint64_t lMissed = sReadNumber(mpHistory->getValue(getOutletValue(lName, "missed")));

@@ -345,7 +345,7 @@ private:
         return lpList != nullptr && lpList->empty();
     }
 
-    /// What only shows where several keys are seen.
+    /// Checks that need several keys.
     void checkTogether() {
         const ZTSSettings& lcrSettings = mReading.mSettings;
         if (isPublicListen(lcrSettings.mHttpListen) && !lcrSettings.mHttpPublic) {

@@ -131,7 +131,7 @@ private:
         mFilter.mLimit = 0;
     }
 
-    /// What has changed since: the filter's number moves on with it.
+    /// Prints what has changed since the last call, and moves the filter's number on.
     void printChanges() {
         const std::uint64_t lLast = mpHistory->getLastSeq();
         if (lLast == mFilter.mAfterSeq) {

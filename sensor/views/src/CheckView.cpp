@@ -10,7 +10,7 @@
 
 static constexpr std::array<const char*, 4> scWords{"OK", "WARNING", "CRITICAL", "UNKNOWN"};
 
-/// What each verdict is to a monitoring system.
+/// The result for each verdict.
 static constexpr std::array<ZTECheckResult, ZTVD_Count> scResults{ZTCR_Critical, ZTCR_Unknown, ZTCR_Warning,
                                                                   ZTCR_Warning, ZTCR_Ok};
 
@@ -18,7 +18,7 @@ const char* getCheckWord(ZTECheckResult aResult) {
     return scWords.at(static_cast<std::size_t>(aResult));
 }
 
-/// What each severity of the SAN's troubles is to a monitoring system: a notice is only said.
+/// The result for each severity of the SAN's troubles: a notice is only mentioned.
 static constexpr std::array<ZTECheckResult, ZTSS_Count> scSanResults{ZTCR_Ok, ZTCR_Warning, ZTCR_Critical};
 
 /// Adds what the SAN's troubles make of the result. Where Tavik itself does not collect it says so alone: what it knows

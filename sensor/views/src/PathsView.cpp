@@ -69,7 +69,7 @@ static std::string sDescribeRedundancy(const ZTSSanLun& acrLun) {
     }
 }
 
-/// What of the path is not as it should be: the link's state, the remote port's, the device's.
+/// Each state of the path that is not as it should be: the link's, the remote port's, the device's.
 static std::string sDescribeState(const ZTSSanPath& acrPath, bool aIsGone) {
     if (aIsGone) {
         return "gone";

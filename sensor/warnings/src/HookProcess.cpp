@@ -44,7 +44,7 @@ static ZTCFileDescriptor sMakeInput(const std::string& acrInput) {
     return lFile;
 }
 
-/// What the sensor's programs tell each other is not for hooks, nor is the service manager's socket.
+/// Hooks get neither the variables of the sensor's programs nor the service manager's socket.
 static bool sIsForHooks(std::string_view aVariable) {
     static constexpr std::array<std::string_view, 5> scOwn{"TAVIK_", "NOTIFY_SOCKET=", "WATCHDOG_", "LISTEN_", "ZT_"};
     return std::ranges::none_of(scOwn, [&](std::string_view aOwn) { return aVariable.starts_with(aOwn); });

@@ -18,7 +18,7 @@ std::string findWarnSubject(const ZTSWarnRule& acrRule, const ZTSWarnOccurrence&
     return acrOccurrence.mInitiator.mWwpn ? acrOccurrence.mInitiator.mWwpn->toText() : std::string();
 }
 
-/// What makes a rule the same one after a change of the settings: all of it.
+/// A rule is the same one after a change of the settings only if all of it is the same.
 static std::string sRuleName(const ZTSWarnRule& acrRule) {
     return dumpJson(
         {acrRule.mKind, acrRule.mCount, acrRule.mWithin.count(), acrRule.mPer, acrRule.mRun, acrRule.mTimeout.count()},
@@ -60,7 +60,7 @@ void ZTCWarnBook::setHolding(const std::vector<ZTSWarnOccurrence>& acrHolding) {
             }
             ZTSTrack& lrTrack = findOrAdd(i, lrOccurrence);
             lNow[{i, lrTrack.mTrouble.mSubject}] = true;
-            // What a process before this one has warned of does not begin now.
+            // A trouble that an earlier process has warned of does not begin now.
             if (!lrTrack.mIsHolding && !(lrTrack.mIsOpen && lrTrack.mTrouble.mCount == 0)) {
                 lrTrack.mWindow.add(lrOccurrence.mTime, lrOccurrence.mCount);
             }

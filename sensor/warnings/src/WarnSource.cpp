@@ -37,7 +37,7 @@ static ZTSWarnOccurrence sMake(const std::string& acrKind, const ZTSInitiator& a
     return lOccurrence;
 }
 
-/// What tells the rows of `total` apart, beside the kind.
+/// The name of a row of `total`; rows of one kind have different ones.
 static std::string sTotalName(const ZTSTotal& acrTotal) {
     return (acrTotal.mInitiator.mWwpn ? acrTotal.mInitiator.mWwpn->toText() : std::string()) +
            (acrTotal.mRemotePort ? acrTotal.mRemotePort->mWwpn.toText() : std::string());

@@ -20,7 +20,7 @@ using ZTCJson = nlohmann::ordered_json;
 static constexpr seconds scLookPeriod{1};
 /// Between two looks at the paths.
 static constexpr seconds scSanPeriod{10};
-/// What a process before this one has warned of is in the history. So long that is waited for.
+/// The history has what an earlier process has warned of. This is how long the thread waits for the history.
 static constexpr seconds scHistoryPatience{10};
 /// For a test beside the timeouts of its hooks.
 static constexpr seconds scTestMargin{5};

@@ -240,6 +240,27 @@ TEST(FifoConversation, WritingToADeadAgentRaisesNoSignal) {
     EXPECT_EQ(sigismember(&lPending, SIGPIPE), 0);
 }
 
+TEST(FifoConversation, ASignalOfTheProgramsOwnThatWaitedBeforeStillWaits) {
+    const ZTCTemporaryDirectory lDirectory;
+    makeFifos(lDirectory.path());
+    const ZTCFileDescriptor lReader =
+        ZTCFileDescriptor::open(lDirectory.path("qrvtvkcmd.fifo").c_str(), O_RDONLY | O_NONBLOCK);
+    sigset_t lPipe;
+    sigemptyset(&lPipe);
+    sigaddset(&lPipe, SIGPIPE);
+    sigset_t lFormer;
+    ASSERT_EQ(pthread_sigmask(SIG_BLOCK, &lPipe, &lFormer), 0);
+    ASSERT_EQ(pthread_kill(pthread_self(), SIGPIPE), 0);
+    ZTCFifoConversation lConversation(lDirectory.path());
+    lConversation.send(scGet, sPatience());
+    sigset_t lPending;
+    sigpending(&lPending);
+    EXPECT_EQ(sigismember(&lPending, SIGPIPE), 1);
+    const timespec lNow{};
+    EXPECT_EQ(sigtimedwait(&lPipe, nullptr, &lNow), SIGPIPE);
+    pthread_sigmask(SIG_SETMASK, &lFormer, nullptr);
+}
+
 TEST(FifoConversation, StaleBytesAreThrownAwayBeforeTheFirstRequest) {
     const ZTCTemporaryDirectory lDirectory;
     ZTCFakeAgent lAgent(lDirectory.path(), {ZTCFakeAgent::answering({6})});

@@ -171,6 +171,7 @@ TEST_F(Tavikctl, GetSaysThatListsAreMissing) {
 TEST_F(Tavikctl, GetSavesTheBytesAndDecodeReadsThem) {
     const ZTCFakeAgent lAgent(dir(), {ZTCFakeAgent::answering(makeFullSampleResponse())});
     const std::string lRaw = mOther.path("answer.bin");
+    writeFile(lRaw, std::string(100000, 'x'));  // an older answer, and a longer one
     const ZTSFinishedRun lRun = run({"get", "--raw", lRaw});
     EXPECT_EQ(lRun.mStatus, 0) << lRun.mErrors;
     const ZTCBytes lBytes = makeFullSampleResponse();

@@ -1,6 +1,7 @@
 #include <fcntl.h>
 #include <gtest/gtest.h>
 #include <limits.h>
+#include <stdlib.h>
 #include <sys/stat.h>
 #include <unistd.h>
 
@@ -10,6 +11,7 @@
 #include <utility>
 #include <vector>
 
+#include "tests/support/Waiting.h"
 #include "tests/unit/common/LogSinkTesting.h"
 
 namespace {
@@ -129,6 +131,40 @@ TEST_F(LogOpening, ACharacterDeviceIsAccepted) {
     mpSink->setPath("/dev/full");
     writeTo(*mpSink, "two");
     EXPECT_EQ("-M- two\n", mStandardError.take());
+}
+
+TEST_F(LogOpening, ATerminalThatIsFullTakesLinesAgainAsSoonAsItHasRoom) {
+    const int lTerminal = posix_openpt(O_RDWR | O_NOCTTY | O_CLOEXEC | O_NONBLOCK);
+    ASSERT_GE(lTerminal, 0);
+    ASSERT_EQ(0, grantpt(lTerminal));
+    ASSERT_EQ(0, unlockpt(lTerminal));
+    const auto lReadAll = [lTerminal] {
+        std::string lText;
+        char lBytes[4096];
+        for (ssize_t lCount; (lCount = read(lTerminal, lBytes, sizeof(lBytes))) > 0;) {
+            lText.append(lBytes, static_cast<std::size_t>(lCount));
+        }
+        return lText;
+    };
+    mpSink->setPath(ptsname(lTerminal));
+    const std::string lText(1000, 'x');
+    std::string lLost;
+    for (int i = 0; i < 1000 && lLost.empty(); ++i) {
+        writeTo(*mpSink, "%s", lText.c_str());
+        lLost = mStandardError.take();
+    }
+    EXPECT_EQ("-M- " + lText + "\n", lLost);
+    // A terminal has room again soon after it was read.
+    std::string lRead;
+    waitUntil(
+        [&] {
+            lRead += lReadAll();
+            writeTo(*mpSink, "after");
+            return lRead.find("-M- after") != std::string::npos;
+        },
+        "a line that comes without another attempt to open the terminal");
+    mpSink->close();
+    close(lTerminal);
 }
 
 TEST_F(LogOpening, AFileThatCannotBeOpenedIsTriedAgainAtMostOnceASecond) {

@@ -60,6 +60,22 @@ TEST_F(LogRotation, WhatOthersWriteIntoTheFileCountsTowardsTheBound) {
     EXPECT_EQ(lcBound, std::filesystem::file_size(mPath + ".1"));
 }
 
+TEST_F(LogRotation, WhatOthersWriteCountsAlsoWhenTheClockWasSetBack) {
+    constexpr std::uint64_t lcBound = 1024 * 1024;
+    constexpr std::int64_t lcNoon = 1'700'000'000'000'000'000;
+    constexpr std::int64_t lcSecond = 1'000'000'000;
+    ZTCLogFile lFile;
+    lFile.allowRotation(true);
+    lFile.setBound(lcBound);
+    ASSERT_TRUE(lFile.setPath(mPath.c_str()));
+    ASSERT_TRUE(lFile.write("one\n", 4, lcNoon));
+    std::filesystem::resize_file(mPath, lcBound);
+    ASSERT_TRUE(lFile.write("two\n", 4, lcNoon - lcSecond));
+    lFile.close();
+    EXPECT_EQ(lcBound, std::filesystem::file_size(mPath + ".1"));
+    EXPECT_EQ(4u, std::filesystem::file_size(mPath));
+}
+
 TEST_F(LogRotation, ManyStampedLinesStayWithinTheBound) {
     constexpr std::uint64_t lcBound = 200 * 1024;
     mpSink->allowRotation(true);

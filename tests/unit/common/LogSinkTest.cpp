@@ -92,6 +92,21 @@ TEST_F(LogSink, LostLinesGoToStandardErrorAreCountedAndReportedWhenWritingWorksA
     EXPECT_EQ("", mStandardError.take());
 }
 
+TEST_F(LogSink, OnceClosedItSaysNothingOfTheLinesThatItsFormerFileLost) {
+    mpSink->setPath(mPath.c_str());
+    {
+        const ZTCResourceLimit lLimit(RLIMIT_FSIZE, 0);
+        writeTo(*mpSink, "lost");
+    }
+    EXPECT_EQ("-M- lost\n", mStandardError.take());
+    mpSink->close();
+    const std::string lOther = mDirectory.path("other");
+    mpSink->setPath(lOther.c_str());
+    writeTo(*mpSink, "after");
+    EXPECT_EQ((Lines{"-M- after"}), sinkLines(lOther));
+    EXPECT_EQ("", mStandardError.take());
+}
+
 TEST_F(LogSink, AStandardErrorThatNobodyReadsHoldsNothingUp) {
     ASSERT_EQ(0, fcntl(STDERR_FILENO, F_SETFL, 0)) << "a write that finds no room would wait for ever";
     mpSink->setPath(mPath.c_str());

@@ -1,4 +1,5 @@
 #include <gtest/gtest.h>
+#include <signal.h>
 #include <sys/file.h>
 #include <unistd.h>
 
@@ -114,4 +115,40 @@ TEST_F(InstanceRace, AnInstanceWhosePlaceAnotherTookAtOnceIsSaidToHaveStopped) {
     EXPECT_TRUE(isLocked()) << "the second one runs on";
     lSecond.tellChild();
     EXPECT_EQ(0, lSecond.waitForExit());
+}
+
+TEST_F(InstanceRace, AnInstanceThatHasGivenItsFileUpHasStoppedOnlyWhenItsProcessIsGone) {
+    ZTCForkedProcess lChild([this](ZTCForkedProcess& arSelf) {
+        sigset_t lStop;
+        sigemptyset(&lStop);
+        sigaddset(&lStop, SIGTERM);
+        sigprocmask(SIG_BLOCK, &lStop, nullptr);
+        ZTCProcessInstanceManager lManager(pathText());
+        lManager.markAsRunning();
+        arSelf.tellParent();
+        int lSignal = 0;
+        sigwait(&lStop, &lSignal);
+        lManager.exitInstanceManagement();
+        arSelf.tellParent();
+        arSelf.waitForParent();
+        return 0;
+    });
+    lChild.waitForChild();
+    unsigned lSleeps = 0;
+    const ZTCReplacement lClock(gReplaced.mMonotonicMilliseconds, [] { return std::int64_t{0}; });
+    const ZTCReplacement lSleep(gReplaced.mSleep, [&](int) {
+        ++lSleeps;
+        if (lSleeps == 1) {
+            lChild.waitForChild();
+        } else if (lSleeps == 3) {
+            lChild.tellChild();
+            EXPECT_EQ(0, lChild.waitForExit());
+        }
+    });
+    ZTCProcessInstanceManager lManager(pathText());
+    testing::internal::CaptureStdout();
+    lManager.killRunningInstance();
+    EXPECT_EQ("Stopped the running instance, process " + std::to_string(lChild.getPid()) + "\n",
+              testing::internal::GetCapturedStdout());
+    EXPECT_EQ(3u, lSleeps) << "the process ran on until then";
 }

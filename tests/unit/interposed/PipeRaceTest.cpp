@@ -5,12 +5,14 @@
 
 #include <chrono>
 #include <cstddef>
+#include <cstdint>
 #include <string>
 #include <vector>
 
 #include "common/include/Exception.h"
 #include "os/common/include/Descriptor.h"
 #include "os/common/include/NamedPipe.h"
+#include "os/common/include/ProcessEvents.h"
 #include "tests/unit/interposed/support/Replaced.h"
 #include "tests/unit/os/LogCapture.h"
 
@@ -20,10 +22,38 @@ class PipeRace : public testing::Test {
 protected:
     PipeRace() { mPipe.create(); }
 
+    std::vector<int> findWaits(const std::string& acrFirstBytes);
+
     ZTCTemporaryDirectory mDirectory;
     const std::string mPath = mDirectory.path("a.fifo");
     ZTCNamedPipe mPipe{ZTCString(mPath.c_str()), ZTFM_Read, ZTNPS_NonBlock, ZTCM_Server};
 };
+
+/// The time of each wait of a pipe that waits for 3 s, on a clock that only this test moves: 2 s pass before each of
+/// the two messages, of which the pipe gets these bytes.
+std::vector<int> PipeRace::findWaits(const std::string& acrFirstBytes) {
+    mPipe.open();
+    const ZTCDescriptor lWriter(open(mPath.c_str(), O_WRONLY | O_NONBLOCK | O_CLOEXEC));
+    std::int64_t lNow = 1000;
+    std::vector<int> lWaits;
+    const ZTCReplacement lClock(gReplaced.mMonotonicMilliseconds, [&] { return lNow; });
+    const ZTCReplacement lPoll(gReplaced.mBeforePoll, [&](const struct pollfd*, unsigned aCount, int aMilliseconds) {
+        if (aCount != 2) {
+            return;
+        }
+        lWaits.push_back(aMilliseconds);
+        if (lWaits.size() > 1) {
+            getExitEvent().raise();
+            return;
+        }
+        lNow += 2000;
+        EXPECT_EQ(static_cast<ssize_t>(acrFirstBytes.size()),
+                  write(lWriter.get(), acrFirstBytes.data(), acrFirstBytes.size()));
+    });
+    mPipe.waitForActivity(std::chrono::seconds(3));
+    getExitEvent().reset();
+    return lWaits;
+}
 
 }  // namespace
 
@@ -77,4 +107,14 @@ TEST_F(PipeRace, AMessageOfNoLengthGoesWithAllThatItsWriterHasBehindIt) {
     mPipe.read(lBuffer, lCount);
     EXPECT_EQ(1u, lCount);
     EXPECT_EQ('x', lBuffer->getData()[0]);
+}
+
+TEST_F(PipeRace, WhileAMessageArrivesTheTimeCountsFromItsLastByte) {
+    EXPECT_EQ((std::vector<int>{3000, 3000}), findWaits(std::string("\0\0\0\5h", 5)));
+}
+
+TEST_F(PipeRace, ABrokenMessageProlongsNoWait) {
+    const ZTCLogCapture lLog(63);
+    EXPECT_EQ((std::vector<int>{3000, 1000}), findWaits(std::string(4, '\0')));
+    EXPECT_EQ(1u, lLog.countMark("-E-"));
 }

@@ -3,6 +3,8 @@
 #include <gtest/gtest.h>
 
 #include <algorithm>
+#include <filesystem>
+#include <string>
 
 #include "tests/unit/linux/EngineFixture.h"
 #include "tests/unit/linux/WatcherFixture.h"
@@ -98,6 +100,21 @@ TEST_F(QueueDepths, ALunThatLeavesAndComesBackBeginsAnew) {
     mKernel.setDepth("0:0:0:0", 16);
     look();
     EXPECT_EQ(mDelivered, 0u);
+}
+
+TEST_F(QueueDepths, AChangeWhileTheLunsCannotBeListedIsDeliveredAfterwards) {
+    const std::string lClass = mKernel.sysfs() + "/class/scsi_device";
+    mKernel.setDepth("0:0:0:0", 32);
+    registerDepths();
+    look();
+    std::filesystem::rename(lClass, lClass + ".away");
+    mKernel.setAttribute("scsi_device", "a file in place of the directory");
+    look();
+    std::filesystem::remove(lClass);
+    std::filesystem::rename(lClass + ".away", lClass);
+    mKernel.setDepth("0:0:0:0", 16);
+    look();
+    EXPECT_EQ(mDelivered, 1u);
 }
 
 TEST_F(LinuxEngine, AQueueDepthThatChangesIsDeliveredWithBothValues) {

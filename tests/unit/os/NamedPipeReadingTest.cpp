@@ -39,6 +39,21 @@ TEST_F(NamedPipeReading, AMessageIsReadWhole) {
     EXPECT_EQ(lCount, 0u);
 }
 
+TEST_F(NamedPipeReading, ClosingThrowsAwayAMessageThatWasNotRead) {
+    const ZTCPointer<ZTCNamedPipe> lPipe(newReader(mPath));
+    openReader(*lPipe);
+    send(frameOf("old"));
+    lPipe->waitForActivity(gcLongSeconds);
+    lPipe->close();
+    lPipe->open();
+    ZTCPointer<ZTCBuffer> lBuffer;
+    unsigned lCount = 1;
+    EXPECT_THROW(lPipe->read(lBuffer, lCount), ZTCClibReadFailedEx);
+    send(frameOf("new"));
+    lPipe->waitForActivity(gcLongSeconds);
+    EXPECT_EQ(readMessage(*lPipe), "new");
+}
+
 TEST_F(NamedPipeReading, MessagesThatWaitAreReadInOrder) {
     const ZTCPointer<ZTCNamedPipe> lPipe(newReader(mPath));
     openReader(*lPipe);

@@ -1,11 +1,14 @@
 #include "libkpm/sim/src/ControlSocket.h"
 
 #include <gtest/gtest.h>
+#include <poll.h>
+#include <sys/resource.h>
 #include <sys/socket.h>
 #include <sys/stat.h>
 #include <unistd.h>
 
 #include <atomic>
+#include <chrono>
 #include <functional>
 #include <memory>
 #include <stdexcept>
@@ -16,6 +19,7 @@
 #include "libkpm/sim/src/Control.h"
 #include "libkpm/sim/src/ControlClient.h"
 #include "libkpm/sim/src/Scenario.h"
+#include "tests/support/ResourceLimit.h"
 #include "tests/support/TemporaryDirectory.h"
 #include "tests/support/Waiting.h"
 #include "tests/unit/sim/Recorder.h"
@@ -35,6 +39,16 @@ int sWrappedBind(int aSocket, const sockaddr* apAddress, socklen_t aSize) {
         sAfterBind();
     }
     return lResult;
+}
+
+/// How often a thread has looked at more than one descriptor: the socket's, since a client looks at its own alone.
+static std::atomic<unsigned> sPolls{0};
+
+extern "C" int sRealPoll(pollfd* apPolled, nfds_t aCount, int aMilliseconds) __asm__("__real_poll");
+extern "C" int sWrappedPoll(pollfd* apPolled, nfds_t aCount, int aMilliseconds) __asm__("__wrap_poll");
+int sWrappedPoll(pollfd* apPolled, nfds_t aCount, int aMilliseconds) {
+    sPolls += aCount > 1 ? 1 : 0;
+    return sRealPoll(apPolled, aCount, aMilliseconds);
 }
 
 /// The reason for which a socket is refused.
@@ -109,6 +123,43 @@ TEST(ControlSocket, ServesSeveralClientsAtOnce) {
     for (const auto& lrpClient : lClients) {
         EXPECT_EQ(lrpClient->ask("hello"), "ok <hello>");
     }
+}
+
+TEST(ControlSocket, ClientsThatOnlyWaitTakeNoTime) {
+    const ZTCTemporaryDirectory lDirectory;
+    const ZTCSimControlSocket lSocket(lDirectory.path("s"), sEcho);
+    ZTCSimControlClient lWaiting(lDirectory.path("s"));
+    ZTCSimControlClient lClient(lDirectory.path("s"));
+    EXPECT_EQ(lWaiting.ask("first"), "ok <first>");
+    EXPECT_EQ(lClient.ask("first"), "ok <first>");
+    constexpr unsigned lcLines = 50;
+    sPolls = 0;
+    for (unsigned lLine = 0; lLine < lcLines; ++lLine) {
+        EXPECT_EQ(lClient.ask("line"), "ok <line>");
+    }
+    EXPECT_LE(sPolls, 2 * lcLines + 2) << "it looks once for each line, or twice where a line comes in parts";
+}
+
+TEST(ControlSocket, WithoutADescriptorLeftItWaitsForOneWithoutSpinning) {
+    const ZTCTemporaryDirectory lDirectory;
+    const ZTCSimControlSocket lSocket(lDirectory.path("s"), sEcho);
+    const ZTCLibraryDescriptor lClient(::socket(AF_UNIX, SOCK_STREAM | SOCK_CLOEXEC, 0));
+    const int lFree = ::dup(lClient.get());
+    ASSERT_GE(lFree, 0);
+    ::close(lFree);
+    const sockaddr_un lAddress = makeSimSocketAddress(lDirectory.path("s"));
+    {
+        const ZTCResourceLimit lLimit(RLIMIT_NOFILE, static_cast<rlim_t>(lFree));
+        sPolls = 0;
+        const auto lBegin = std::chrono::steady_clock::now();
+        ASSERT_EQ(::connect(lClient.get(), reinterpret_cast<const sockaddr*>(&lAddress), sizeof lAddress), 0);
+        waitUntil([] { return sPolls >= 5; }, "some looks of the socket");
+        const auto lPassed = std::chrono::steady_clock::now() - lBegin;
+        EXPECT_GE(lPassed, std::chrono::milliseconds(100)) << "it pauses between its attempts";
+    }
+    ASSERT_EQ(::send(lClient.get(), "line\n", 5, 0), 5);
+    ASSERT_EQ(::shutdown(lClient.get(), SHUT_WR), 0);
+    EXPECT_EQ(sReadAll(lClient), "ok <line>\n");
 }
 
 TEST(ControlSocket, AClientThatDoesNotReadHoldsUpNobody) {

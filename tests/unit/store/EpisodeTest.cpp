@@ -121,6 +121,14 @@ TEST_F(EpisodeTest, AClockThatWasSetBackDoesNotKeepItOpenForEver) {
     EXPECT_EQ(closeAt(gcBase + 61 * gcSecond), 1U);
 }
 
+TEST_F(EpisodeTest, AClockThatWasSetBackTwiceDoesNotKeepItOpenForEver) {
+    take({makeQueueFull(gcPortA, gcBase + gcDay, gcBase + gcDay)}, gcBase + gcDay);
+    EXPECT_EQ(closeAt(gcBase + gcDay / 2), 0U);
+    EXPECT_EQ(closeAt(gcBase), 0U);
+    EXPECT_EQ(closeAt(gcBase + 60 * gcSecond), 0U);
+    EXPECT_EQ(closeAt(gcBase + 61 * gcSecond), 1U);
+}
+
 TEST_F(EpisodeTest, ARecordWhoseLastTimeLiesBeforeItsFirstIsKeptAndFlagged) {
     take({makeQueueFull(gcPortA, gcBase + gcDay, gcBase, 4)});
     const auto lEpisodes = episodes();

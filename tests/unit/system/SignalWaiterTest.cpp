@@ -7,6 +7,8 @@
 #include <unistd.h>
 
 #include <ctime>
+#include <filesystem>
+#include <iterator>
 #include <set>
 
 #include "tests/unit/os/LogCapture.h"
@@ -124,6 +126,25 @@ TEST(SignalWaiter, ItCanBeStoppedTwiceAndStartedAgain) {
         lWaiter.start();
         kill(getpid(), SIGINT);
         return getStopEvent().waitFor(20000) ? 0 : 1;
+    });
+    EXPECT_EQ(lChild.waitForExit(), 0);
+}
+
+TEST(SignalWaiter, StoppedItLeavesNoDescriptorBehind) {
+    ZTCForkedProcess lChild([](ZTCForkedProcess&) {
+        const auto lCountDescriptors = [] {
+            return std::distance(std::filesystem::directory_iterator("/proc/self/fd"), {});
+        };
+        ZTCSignalWaiter::blockSignals();
+        ZTCSignalWaiter lWaiter;
+        lWaiter.start();
+        lWaiter.stop();
+        const auto lBefore = lCountDescriptors();
+        for (int lRound = 0; lRound < 3; ++lRound) {
+            lWaiter.start();
+            lWaiter.stop();
+        }
+        return lCountDescriptors() == lBefore ? 0 : 1;
     });
     EXPECT_EQ(lChild.waitForExit(), 0);
 }

@@ -2,6 +2,7 @@
 
 #include <gtest/gtest.h>
 
+#include <chrono>
 #include <thread>
 #include <vector>
 
@@ -90,6 +91,27 @@ TEST(SynchList, WaitingEndsWithAnItemATimeOutOrAnInterruption) {
     lList.interrupt();
     lOther.join();
     EXPECT_NO_THROW(lList.waitWhileEmpty(60));
+}
+
+TEST(SynchList, AnItemAtTheFrontEndsTheWaitToo) {
+    ZTCSynchList lList;
+    constexpr int lcRounds = 300;
+    ZTCTestThreads lThreads;
+    lThreads.start(1, [&lList](unsigned) {
+        for (int lRound = 0; lRound < lcRounds; ++lRound) {
+            lList.waitWhileEmpty(20);
+            EXPECT_EQ(sNumber(lList.popFront()), lRound);
+        }
+    });
+    for (int lRound = 0; lRound < lcRounds; ++lRound) {
+        lList.pushFront(sItem(lRound));
+        while (!lList.isEmpty() && lThreads.isRunning()) {
+            std::this_thread::yield();
+        }
+        // Some of the items come while the thread waits already.
+        std::this_thread::sleep_for(std::chrono::microseconds(lRound));
+    }
+    lThreads.join();
 }
 
 TEST(SynchList, EveryItemReachesExactlyOneThread) {

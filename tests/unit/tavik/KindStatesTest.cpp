@@ -96,6 +96,20 @@ TEST_F(KindStates, AReportBeforeTheRegistrationIsTheStateOfAHandleAlone) {
     EXPECT_EQ("listening", state(0, "link"));
 }
 
+TEST_F(KindStates, AKindWithoutAHandleIsNotListeningWhateverWasReportedBefore) {
+    bringUp();
+    report(0, 8, 0x02, KPM_STATE_WORKING, "");
+    report(0, 8, 0x04, KPM_STATE_WORKING, "");
+    mLibrary.mRegisterHandles[{0, 0, FC_REG_TEMPERATURE_EVENT}] = 0;
+    startScope();
+    EXPECT_EQ("no_source", state(0, "temperature"));
+
+    mSystem->getProtocolHandler()->handleUnregisterEvents();
+    mLibrary.mRegisterHandles[{0, 0, FC_REG_LINK_EVENT}] = 0;
+    EXPECT_EQ(gcNotAllowedHex, requestHex("0000001000"));
+    EXPECT_EQ("failed", state(0, "link"));
+}
+
 TEST_F(KindStates, AReportDuringInitIsKept) {
     // The page has no boards yet.
     mLibrary.mBeforeCounted = [this] { report(0, 8, 0x02, KPM_STATE_FAILED, "gone"); };

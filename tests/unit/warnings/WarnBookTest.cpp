@@ -197,6 +197,23 @@ TEST_F(WarnBook, TheNextProcessGoesOnWithTheSamePauses) {
     EXPECT_EQ(mLast.mFirst, fromMicroseconds(gcBase));
 }
 
+TEST_F(WarnBook, AStateThatHeldBeforeTheRestartDoesNotBeginAnewAndEndsWhenItHoldsNoMore) {
+    const std::vector<ZTSWarnRule> lRules{rule("disk-full", 1, seconds(600), "host")};
+    ZTCWarnBook lBook(lRules);
+    lBook.setHolding({state("disk-full")});
+    EXPECT_EQ(due(lBook).size(), 1U);
+    pass(hours(1));
+    ZTCWarnBook lNext(lRules);
+    EXPECT_TRUE(lNext.load(lBook.toText()));
+    lNext.setHolding({state("disk-full")});
+    due(lNext);
+    EXPECT_EQ(lNext.getOpen().size(), 1U);
+    pass(seconds(1));
+    lNext.setHolding({});
+    due(lNext);
+    EXPECT_EQ(lNext.getOpen().size(), 0U);
+}
+
 TEST_F(WarnBook, ARuleThatIsGoneLosesItsTroublesAndARestKeepsThem) {
     ZTCWarnBook lBook({rule("queue-full"), rule("link")});
     lBook.note(event(gcPortA));
