@@ -21,8 +21,8 @@ gTreePackages=(debootstrap systemd-container dpkg-dev e2fsprogs git)
 gFleetPackages=(prometheus prometheus-alertmanager prometheus-node-exporter rsyslog curl python3 python3-yaml python3-jsonschema)
 gJournalPackages=(systemd util-linux)
 
-# Presets and checks compile the same sources again and again: a compiler's cache that is there is used. Paths are taken
-# relative to the tree, so that another clone of it meets the same entries.
+# Presets and checks compile the same sources again and again, so ccache is used if it is installed. Paths are relative to the
+# tree, so that another clone of it finds the same entries.
 if command -v ccache >/dev/null; then
   export CMAKE_C_COMPILER_LAUNCHER=ccache CMAKE_CXX_COMPILER_LAUNCHER=ccache
   export CCACHE_BASEDIR=$gRoot CCACHE_NOHASHDIR=1 CCACHE_IGNOREOPTIONS='-fmacro-prefix-map=*'
@@ -34,7 +34,7 @@ fail() {
   exit 1
 }
 
-# need_packages PACKAGE...: installs what is missing where the user is root, else names it in one line and ends.
+# need_packages PACKAGE...: installs missing packages if the user is root. Otherwise prints the command for it and ends.
 need_packages() {
   local lMissing=() lPackage
   for lPackage in "$@"; do
@@ -53,8 +53,8 @@ need_packages() {
   apt-get install -q -y --no-install-recommends "${lMissing[@]}"
 }
 
-# show_progress: passes a build's output on. Of ninja's status lines, "[DONE/ALL] ...", it shows on a terminal the last one
-# and elsewhere one every five seconds; everything else, warnings and errors above all, it shows as it comes.
+# show_progress: passes a build's output on. On a terminal it shows only the latest of ninja's status lines, "[DONE/ALL] ...".
+# Elsewhere it shows one every five seconds. All other lines, such as warnings and errors, are shown at once.
 show_progress() {
   local lLine lStep lNext=0 lClear=
   [ -t 1 ] && lClear=$'\r\033[K'
@@ -76,12 +76,12 @@ show_progress() {
   printf '%s' "$lClear"
 }
 
-# build_directory DIRECTORY [TARGET...]: builds what is out of date there, says beforehand how much that is, and shows
+# build_directory DIRECTORY [TARGET...]: builds what is out of date there. Says beforehand how much that is, and shows the
 # progress.
 build_directory() {
   local lDirectory=$1 lSteps lMinutes
   shift
-  # A copy, since of its own manifest ninja would count the steps that make it anew, and no more.
+  # A copy: if ninja has to make its own build.ninja again, it counts only the steps for that.
   cp "$lDirectory/build.ninja" "$lDirectory/count.ninja"
   lSteps=$(ninja -C "$lDirectory" -f count.ninja -n "$@" 2>/dev/null | grep -c '^\[' || true)
   rm "$lDirectory/count.ninja"
@@ -95,7 +95,7 @@ build_directory() {
   in_turn "$lDirectory" ninja -C "$lDirectory" "$@" | show_progress
 }
 
-# in_turn DIRECTORY COMMAND...: scripts that run beside each other configure and build in a directory one after another.
+# in_turn DIRECTORY COMMAND...: runs the command while no other script configures or builds in this directory.
 in_turn() {
   local lLock=build/.${1//\//-}.lock
   shift
