@@ -109,7 +109,8 @@ protected:
             EXPECT_TRUE((acrWords[3] == "-n" && std::stoi(acrWords[4]) > 0) ||
                         (acrWords[3] == "--since" && acrWords[4] == "yesterday"))
                 << acrPart;
-        } else if (lrProgram == "df" || lrProgram == "ls" || lrProgram == "lspci" || lrProgram == "grep") {
+        } else if (lrProgram == "df" || lrProgram == "ls" || lrProgram == "lspci" || lrProgram == "grep" ||
+                   lrProgram == "tail") {
             EXPECT_TRUE(lrProgram == "lspci" || exists("/usr/bin/" + lrProgram) || exists("/bin/" + lrProgram));
         } else {
             // Words for a person: they begin as a sentence does, or go on after a command.

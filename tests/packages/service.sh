@@ -92,7 +92,7 @@ step "Reloading the configuration"
 lPids=$(pids)
 configure 's|^#period = .*|period = 1.5|'
 expect_true "reload" systemctl reload tavik
-expect_true "the sensor says so" wait_until 90 said_lately "was read again; 1 keys have changed"
+expect_true "the sensor says so" wait_until 90 said_lately "was read again; 1 key has changed"
 configure 's|^period = .*|period = "soon"|'
 systemctl reload tavik
 expect_true "a bad file is reported" wait_until 90 said_lately "collect.period: "

@@ -6,6 +6,12 @@
 #include <optional>
 #include <string>
 
+/// For an option that names a file: an empty name, as of a variable that is not set, is wrong use. Returns what is
+/// wrong.
+inline std::string refuseEmptyName(const std::string& acrName) {
+    return acrName.empty() ? "names no file" : "";
+}
+
 /// Parses the line. Where it asks for help or for the version, returns that text, and nothing else is to be done. Wrong
 /// use is thrown as ZTCWrong, whose text is one line for people.
 template <class ZTCWrong>

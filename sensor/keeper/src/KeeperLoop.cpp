@@ -31,6 +31,11 @@ ZTCFileDescriptor openSignals() {
     return lDescriptor;
 }
 
+/// "1 key", "2 keys".
+static std::string sCountText(std::size_t aCount, const char* apWhat) {
+    return std::to_string(aCount) + " " + apWhat + (aCount == 1 ? "" : "s");
+}
+
 class ZTCKeeperLoop {
 public:
     ZTCKeeperLoop(ZTCHostWorld& arWorld, const ZTCFileDescriptor& acrSignals)
@@ -159,7 +164,7 @@ private:
             apply(aNow, lReading);
         } else {
             sayLine("the settings stay as they were: " + lReading.mFile + " has " +
-                    std::to_string(lReading.mErrors.size()) + " errors");
+                    sCountText(lReading.mErrors.size(), "error"));
         }
         mrWorld.notify("READY=1");
     }
@@ -172,8 +177,8 @@ private:
                      : lcrKey.starts_with("sensor.") ? "; it takes effect at the sensor's next start"
                                                      : ""));
         }
-        sayLine("settings: " + acrReading.mFile + " was read again; " + std::to_string(lChanged.size()) +
-                " keys have changed");
+        sayLine("settings: " + acrReading.mFile + " was read again; " + sCountText(lChanged.size(), "key") +
+                (lChanged.size() == 1 ? " has" : " have") + " changed");
         try {
             mKeeper.handleReload(aNow, heartbeatOf(acrReading.mSettings), mrWorld.setSettings(acrReading));
         } catch (const ZTCClientEx& lcrEx) {

@@ -2,6 +2,7 @@
 #include <cstdio>
 
 #include "sensor/client/include/ClientErrors.h"
+#include "sensor/client/include/CommandLine.h"
 #include "sensor/client/include/StandardStreams.h"
 #include "sensor/keeper/include/HostWorld.h"
 #include "sensor/keeper/include/KeeperLoop.h"
@@ -37,7 +38,8 @@ int main(int aCount, char** appArguments) {
     CLI::App lApp{"Keeps the Fibre Channel event agent and the collector running, in the foreground.", "tavik-sensor"};
     lApp.set_version_flag("--version", "tavik-sensor v" TAVIK_VERSION);
     lApp.add_option("--config", lConfigOption,
-                    "The configuration file; default: $TAVIK_CONFIG, else " + std::string(gcDefaultSettingsFile));
+                    "The configuration file; default: $TAVIK_CONFIG, else " + std::string(gcDefaultSettingsFile))
+        ->check(refuseEmptyName);
     lApp.add_flag("--check", lIsCheck, "Report what is wrong with the configuration file, and start nothing");
     lApp.footer(
         "SIGTERM and SIGINT stop in order, SIGHUP reads the configuration file again.\n"

@@ -24,6 +24,12 @@ static std::string sNumberText(double aNumber) {
     return {lText, std::to_chars(lText, lText + sizeof(lText), aNumber, std::chars_format::fixed).ptr};
 }
 
+/// With a point also where the number is whole: 1.0 is not a whole number to TOML.
+static std::string sFractionText(double aNumber) {
+    const std::string lText = sNumberText(aNumber);
+    return lText.find_first_not_of("-0123456789") == std::string::npos ? lText + ".0" : lText;
+}
+
 /// The value as people read it.
 static std::string sValueText(const toml::node& acrNode) {
     switch (acrNode.type()) {
@@ -32,7 +38,7 @@ static std::string sValueText(const toml::node& acrNode) {
         case toml::node_type::integer:
             return std::to_string(acrNode.as_integer()->get());
         case toml::node_type::floating_point:
-            return sNumberText(acrNode.as_floating_point()->get());
+            return sFractionText(acrNode.as_floating_point()->get());
         case toml::node_type::boolean:
             return acrNode.as_boolean()->get() ? "true" : "false";
         case toml::node_type::array:
@@ -65,6 +71,7 @@ static std::string sRangeText(const ZTSRange& acrRange) {
 struct ZTSFault {
     const char* mpWhat;
     std::string mMust;
+    const toml::node* mpPart = nullptr;  ///< the element of a list that is wrong; null: the whole value
 };
 
 // One function for each type of a member: sets it, or says what is wrong.
@@ -143,7 +150,7 @@ static std::optional<ZTSFault> sRead(const toml::node& acrNode, const ZTSRange& 
     std::vector<std::string> lTexts;
     for (const toml::node& lcrElement : *acrNode.as_array()) {
         if (const auto lFault = sRead(lcrElement, acrRange, lTexts.emplace_back())) {
-            return ZTSFault{"an element is not usable", "a list of texts, each " + lFault->mMust};
+            return ZTSFault{"an element is not usable", "a list of texts, each " + lFault->mMust, &lcrElement};
         }
     }
     arValue = std::move(lTexts);
@@ -189,8 +196,9 @@ private:
     }
 
     void addFault(const toml::node& acrNode, const std::string& acrKey, const ZTSFault& acrFault) {
-        addError(acrNode.source().begin.line, acrKey,
-                 std::string(acrFault.mpWhat) + ": " + sValueText(acrNode) + ", must be " + acrFault.mMust);
+        const toml::node& lcrWrong = acrFault.mpPart != nullptr ? *acrFault.mpPart : acrNode;
+        addError(lcrWrong.source().begin.line, acrKey,
+                 std::string(acrFault.mpWhat) + ": " + sValueText(lcrWrong) + ", must be " + acrFault.mMust);
     }
 
     void addUnknown(const toml::key& acrName, const toml::node& acrNode, const std::string& acrKey,
@@ -331,12 +339,15 @@ private:
         if (acrTable.get("kind") == nullptr) {
             addError(lLine, "warn.kind", std::string("missing: no value, must be ") + gcWarnKindRule.mpRange);
         }
+        const toml::node* const lpRun = acrTable.get("run");
         const bool lHasProgram = !lrRule.mRun.empty() && gcProgramRule.mpIsGood(lrRule.mRun.front());
-        const bool lIsReported = acrTable.get("run") != nullptr && lrRule.mRun.empty() && !isEmptyList(acrTable);
+        const bool lIsReported = lpRun != nullptr && lrRule.mRun.empty() && !isEmptyList(acrTable);
         if (!lHasProgram && !lIsReported) {
-            addError(lLine, "warn.run",
-                     "names no program: " + (lrRule.mRun.empty() ? "no value" : quoted(lrRule.mRun.front())) +
-                         ", must be a list that begins with " + gcProgramRule.mpRange);
+            const std::string lValue = lpRun == nullptr      ? "no value"
+                                       : lrRule.mRun.empty() ? "an empty list"
+                                                             : quoted(lrRule.mRun.front());
+            addError(lpRun == nullptr ? lLine : lpRun->source().begin.line, "warn.run",
+                     "names no program: " + lValue + ", must be a list that begins with " + gcProgramRule.mpRange);
         }
     }
 

@@ -1,8 +1,10 @@
 #include "sensor/store/include/History.h"
 
-#include <unistd.h>
+#include <sys/stat.h>
 
 #include <algorithm>
+#include <cerrno>
+#include <cstring>
 
 #include "sensor/store/src/Counter.h"
 #include "sensor/store/src/HistoryImplementation.h"
@@ -10,8 +12,13 @@
 #include "sensor/store/src/StoreFile.h"
 
 static ZTCDatabase sOpenDatabase(const std::string& acrPath) {
-    if (access(acrPath.c_str(), F_OK) != 0) {
-        throw ZTCNoHistoryEx(acrPath + ": there is no history yet: no sensor has run with this state directory");
+    struct stat lStatus {};
+    if (stat(acrPath.c_str(), &lStatus) != 0) {
+        if (errno == ENOENT) {
+            throw ZTCNoHistoryEx(acrPath + ": there is no history yet: no sensor has run with this state directory");
+        }
+        throw ZTCStoreEx(acrPath + ": the history cannot be read: " + std::strerror(errno) +
+                         (errno == EACCES ? "; ask with sudo, or as a user of the sensor's group" : ""));
     }
     ZTCDatabase lDatabase(acrPath, ZTDA_ReadOnly);
     checkSchema(lDatabase, getSchemaSteps());

@@ -139,6 +139,9 @@ void refuseNewerSchema(ZTCDatabase& arDatabase, ZTCSchemaSteps aSteps) {
 
 void checkSchema(ZTCDatabase& arDatabase, ZTCSchemaSteps aSteps) {
     const std::size_t lVersion = sReadVersion(arDatabase, aSteps);
+    if (lVersion == 0) {
+        throw ZTCNoHistoryEx(arDatabase.getPath() + ": there is no history yet: the sensor is about to make it");
+    }
     if (lVersion < aSteps.size()) {
         throw ZTCNoHistoryEx(arDatabase.getPath() + ": its schema has version " + std::to_string(lVersion) +
                              ", this program reads version " + std::to_string(aSteps.size()) +

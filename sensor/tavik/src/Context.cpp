@@ -29,6 +29,7 @@ ZTCContext::ZTCContext(const ZTSTavikOptions& acrOptions) : mHost(sHostName()) {
                             (lMore == 0 ? "" : " (and " + std::to_string(lMore) + " more: tavik-sensor --check)"));
     }
     mSettings = std::move(lReading.mSettings);
+    mSettingsFile = std::move(lReading.mFile);
 }
 
 std::unique_ptr<ZTCHistory> ZTCContext::openHistory() const {
@@ -57,6 +58,10 @@ ZTCNameBook ZTCContext::makeNames(const ZTCHistory* apHistory) const {
 ZTSStatusFacts ZTCContext::gatherFacts(std::optional<ZTCHistoryTime> aLossesSince) const {
     ZTSStatusFacts lFacts;
     lFacts.mHost = mHost;
+    lFacts.mPlaces = {.mSettingsFile = mSettingsFile,
+                      .mStateDirectory = mSettings.mSensorState,
+                      .mAgentLog = mSettings.mAgentLog,
+                      .mLibrary = mSettings.mAgentLibrary};
     nlohmann::json lRequest{{"request", "status"}};
     if (aLossesSince) {
         lRequest["lossesSince"] = toRfc3339(*aLossesSince);

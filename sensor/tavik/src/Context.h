@@ -35,6 +35,7 @@ private:
     void addLeftPage(ZTSStatusFacts& arFacts) const;
 
     ZTSSettings mSettings;
+    std::string mSettingsFile;
     std::string mHost;
 };
 

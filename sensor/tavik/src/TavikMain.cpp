@@ -42,7 +42,8 @@ static int sRun(int aCount, const char* const* appArguments) {
     lApp.require_subcommand(0, 1);
     lApp.fallthrough();
     lApp.set_version_flag("--version", "tavik v" TAVIK_VERSION);
-    lApp.add_option("--config", lOptions.mConfig, "Configuration; default: $TAVIK_CONFIG, else /etc/tavik/tavik.toml");
+    lApp.add_option("--config", lOptions.mConfig, "Configuration; default: $TAVIK_CONFIG, else /etc/tavik/tavik.toml")
+        ->check(refuseEmptyName);
     lApp.add_flag("--json", lOptions.mIsJson, "Print JSON instead of text");
     lApp.footer(
         "Without a command: status. Exit status of status: 0 collecting, 1 collecting but deaf for a kind or with\n"

@@ -48,8 +48,17 @@ inline constexpr std::uint64_t gcMostOpenEpisodes = 1000;
 /// How far back losses are counted, unless less is asked for.
 inline constexpr std::chrono::hours gcLossSpan{24};
 
+/// Files and folders of the configuration that the words for people name.
+struct ZTSStatusPlaces {
+    std::string mSettingsFile = "/etc/tavik/tavik.toml";
+    std::string mStateDirectory = "/var/lib/tavik";
+    std::string mAgentLog = "/var/log/tavik/qrv-tvk.log";
+    std::string mLibrary;  ///< of the adapters; empty: the agent's own default
+};
+
 struct ZTSStatusFacts {
     std::string mHost;
+    ZTSStatusPlaces mPlaces;
     ZTCHistoryTime mNow;
     ZTEAnswer mAnswer = ZTAN_NoSensor;
     std::string mAnswerProblem;         ///< one line: why the sensor did not answer

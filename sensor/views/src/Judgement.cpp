@@ -37,6 +37,22 @@ std::string formatHeadline(const ZTSStatusFacts& acrFacts, const ZTSJudgement& a
     return lText + "; " + (lrWorst.mpHeadline != nullptr ? lrWorst.mpHeadline : sLossHeadline(acrFacts));
 }
 
+/// The table's action with the configured files and folders in place of the default ones.
+static std::string sWithPlaces(std::string aAction, const ZTSStatusPlaces& acrPlaces) {
+    const ZTSStatusPlaces lDefaults;
+    const std::pair<const std::string&, const std::string&> lPlaces[] = {
+        {lDefaults.mSettingsFile, acrPlaces.mSettingsFile},
+        {lDefaults.mStateDirectory, acrPlaces.mStateDirectory},
+        {lDefaults.mAgentLog, acrPlaces.mAgentLog}};
+    for (const auto& [lrDefault, lrConfigured] : lPlaces) {
+        const std::size_t lAt = aAction.find(lrDefault);
+        if (lAt != std::string::npos) {
+            aAction.replace(lAt, lrDefault.size(), lrConfigured);
+        }
+    }
+    return aAction;
+}
+
 static std::vector<std::string> sSplitLines(std::string_view aText) {
     std::vector<std::string> lLines;
     while (!aText.empty()) {
@@ -62,7 +78,7 @@ std::vector<ZTSTroubleText> describeTroubles(const ZTSStatusFacts& acrFacts, con
                                  .mTitle = "",
                                  .mSubject = "",
                                  .mStatus = lpRow->mpStatus(acrFacts),
-                                 .mAction = sSplitLines(lpRow->mpAction),
+                                 .mAction = sSplitLines(sWithPlaces(lpRow->mpAction, acrFacts.mPlaces)),
                                  .mSee = lpRow->mpSee});
         }
     }

@@ -1,6 +1,7 @@
 #include "sensor/views/src/PageText.h"
 
 #include <algorithm>
+#include <utility>
 
 #include "sensor/views/include/TextTable.h"
 
@@ -19,14 +20,28 @@ void ZTCPageText::addRaw(const std::string& acrLabel, const std::string& acrText
     mText += (acrLabel.empty() ? std::string(scTextColumn, ' ') : lPadding + acrLabel + ": ") + acrText + "\n";
 }
 
+/// Where the text of a line begins whose first word is a narrow column of its own, followed by two blanks or more; 0:
+/// it has none.
+static std::size_t sFindSecondColumn(std::string_view aText) {
+    static constexpr std::size_t scWidest = 12;
+    const std::size_t lEnd = aText.find(' ');
+    const std::size_t lNext = lEnd == std::string_view::npos ? lEnd : aText.find_first_not_of(' ', lEnd);
+    return lNext == std::string_view::npos || lNext - lEnd < 2 || lNext > scWidest ? 0 : lNext;
+}
+
 void ZTCPageText::add(const std::string& acrLabel, const std::string& acrText) {
     const std::string lText = escapeControls(acrText);
     const std::size_t lRoom = mLineWidth - scTextColumn;
-    const bool lFits = countCharacters(lText) <= lRoom;
-    bool lIsFirst = true;
-    for (const std::string& lrLine : lFits ? std::vector<std::string>{lText} : wrapText(lText, lRoom)) {
-        addRaw(lIsFirst ? acrLabel : "", lrLine);
-        lIsFirst = false;
+    if (countCharacters(lText) <= lRoom) {
+        addRaw(acrLabel, lText);
+        return;
+    }
+    const std::size_t lColumn = sFindSecondColumn(lText);
+    std::string lLabel = acrLabel;
+    std::string lFront = lText.substr(0, lColumn);
+    for (const std::string& lrLine : wrapText(std::string_view(lText).substr(lColumn), lRoom - lColumn)) {
+        addRaw(std::exchange(lLabel, ""), lFront + lrLine);
+        lFront.assign(lColumn, ' ');
     }
 }
 

@@ -24,7 +24,8 @@ public:
 
     /// A line whose parts are as wide as they look; nothing is wrapped.
     void addRaw(const std::string& acrLabel, const std::string& acrText);
-    /// A paragraph, wrapped; a line that has columns and fits stays as it is.
+    /// A paragraph, wrapped; a line that has columns and fits stays as it is. Further lines of a text whose first word
+    /// is a column of its own begin in the second column.
     void add(const std::string& acrLabel, const std::string& acrText);
     void addParagraphs(const std::string& acrLabel, const std::vector<std::string>& acrTexts);
     /// Status, action and see.

@@ -135,7 +135,7 @@ static constexpr std::array scTable{
                            "goes on holding events. Nothing is lost before its memory for events is full.",
                 .mpCauses = "The collector is just being restarted, the disk is so slow that a write takes seconds, or "
                             "the host is overloaded.",
-                .mpLookAt = "The sensor restarts a collector that has ended or has reported no progress for a minute. "
+                .mpLookAt = "The sensor restarts a collector that has ended or has completed no look for two minutes. "
                             "If this state lasts, the service's messages say what the collector was doing."},
     ZTSStateRow{
         .mpId = "collector-refuses",
@@ -148,8 +148,8 @@ static constexpr std::array scTable{
         .mpMeans = "The collector answered with an error, or with something that this version of tavik cannot read.",
         .mpCauses = "The package was updated but the old version of the sensor is still running, or another program "
                     "serves the control socket that the configuration names.",
-        .mpLookAt = "Restart the service after an update. Compare tavik --version with the version in the service's "
-                    "first message."},
+        .mpLookAt = "Restart the service after an update. If this state lasts, check that sensor.directory in the "
+                    "configuration is the folder that the service uses."},
     ZTSStateRow{.mpId = "stopping",
                 .mVerdict = ZTVD_NotCollecting,
                 .mpHolds = [](const ZTSStatusFacts& acrFacts) { return sIsKeeper(acrFacts, ZTKP_Stopping); },
@@ -166,20 +166,32 @@ static constexpr std::array scTable{
                 .mpHolds = [](const ZTSStatusFacts& acrFacts) { return sHasEndReason(acrFacts, "no-library"); },
                 .mpHeadline = "the adapters' library cannot be loaded",
                 .mpStatus = describeNoLibraryState,
-                .mpAction = "sudo grep -n library /etc/tavik/tavik.toml;  journalctl -u tavik -n 50",
+                .mpAction = "sudo tail -n 5 /var/log/tavik/qrv-tvk.log;  sudo grep -n library /etc/tavik/tavik.toml",
                 .mpSee = "tavik explain no-library",
                 .mpMeans = "All events come from the adapters' library, and the agent could not load it. The sensor "
                            "tries again after a minute at the latest.",
                 .mpCauses = "The library is not installed, or agent.library names a file that does not exist, lacks "
                             "the entry point, or is of another version.",
                 .mpLookAt = "The agent's log has the loader's error message."},
+    ZTSStateRow{.mpId = "no-event-support",
+                .mVerdict = ZTVD_NotCollecting,
+                .mpHolds = [](const ZTSStatusFacts& acrFacts) { return sHasEndReason(acrFacts, "no-event-support"); },
+                .mpHeadline = "the adapters' driver reports no events",
+                .mpStatus = describeNoEventSupportState,
+                .mpAction = "Update the adapters' driver;  sudo tail -n 5 /var/log/tavik/qrv-tvk.log",
+                .mpSee = "tavik explain no-event-support",
+                .mpMeans =
+                    "This host has adapters, but their library says that the driver cannot report events. The sensor "
+                    "tries again after a minute at the latest.",
+                .mpCauses = "The driver is older than the library, or the library is not the one for these adapters.",
+                .mpLookAt = "Compare the versions of driver and library. agent.library in the configuration names the "
+                            "library."},
     ZTSStateRow{
         .mpId = "no-adapters",
         .mVerdict = ZTVD_NotCollecting,
         .mpHolds =
             [](const ZTSStatusFacts& acrFacts) {
-                return sIsKeeper(acrFacts, ZTKP_WaitingForAdapters) || sHasEndReason(acrFacts, "no-adapters") ||
-                       sHasEndReason(acrFacts, "no-event-support");
+                return sIsKeeper(acrFacts, ZTKP_WaitingForAdapters) || sHasEndReason(acrFacts, "no-adapters");
             },
         .mpHeadline = "no Fibre Channel adapter was found",
         .mpStatus = describeNoAdaptersState,
@@ -202,7 +214,7 @@ static constexpr std::array scTable{
                     },
                 .mpHeadline = "the agent is down",
                 .mpStatus = describeAgentDownState,
-                .mpAction = "journalctl -u tavik -n 50",
+                .mpAction = "journalctl -u tavik -n 50;  sudo tail -n 20 /var/log/tavik/qrv-tvk.log",
                 .mpSee = "tavik explain agent-down",
                 .mpMeans = "The agent has ended, and the sensor will start it again. Events until then are not seen.",
                 .mpCauses = "Somebody killed the agent, the kernel killed it because memory ran out, the adapters' "

@@ -1,6 +1,7 @@
 #include "sensor/views/src/StateTexts.h"
 
 #include <algorithm>
+#include <cctype>
 
 #include "sensor/views/include/TextTable.h"
 #include "sensor/views/include/TimeText.h"
@@ -15,19 +16,31 @@ static ZTCLines sOneLine(const std::string& acrText) {
     return acrText.empty() ? ZTCLines() : ZTCLines{acrText};
 }
 
-/// What is known of the agent's end and of the next start.
-static std::string sDescribeAgentEnd(const ZTSStatusFacts& acrFacts) {
-    const ZTSLiveAgent& lrAgent = acrFacts.mLive->mAgent;
-    const ZTSLiveKeeper& lrKeeper = acrFacts.mLive->mKeeper;
-    std::string lText = "No agent runs" + formatSince(lrKeeper.mSince, acrFacts) + ".";
-    lText += !lrAgent.mProblem.empty()     ? " " + lrAgent.mProblem
-             : !lrAgent.mEndReason.empty() ? " The last one ended: " + lrAgent.mEndReason
-                                           : " Why the last one ended is not known";
-    lText += lText.ends_with('.') ? "" : ".";
-    if (lrKeeper.mNextStart) {
-        lText += " The next start is at " + formatShortTime(*lrKeeper.mNextStart, acrFacts.mNow) + ".";
+static std::string sNextStart(const ZTSStatusFacts& acrFacts) {
+    const auto& lrNext = acrFacts.mLive->mKeeper.mNextStart;
+    return lrNext ? " The next start is at " + formatShortTime(*lrNext, acrFacts.mNow) + "." : "";
+}
+
+/// Why no agent runs, as a sentence. The sensor's words go on after "agent: ".
+static std::string sDescribeProblem(const ZTSLiveAgent& acrAgent) {
+    static constexpr std::string_view scEnded = "ended: ";
+    std::string lWords = acrAgent.mProblem;
+    if (lWords.empty() && !acrAgent.mEndReason.empty()) {
+        lWords = std::string(scEnded) + acrAgent.mEndReason;
     }
-    return lText;
+    if (lWords.empty()) {
+        return "Why the last one ended is not known.";
+    }
+    if (lWords == "ended: other") {
+        return "The last one failed; its log has the reason.";
+    }
+    if (lWords.starts_with(scEnded)) {
+        lWords = "The last one " + lWords;
+    } else if (lWords.starts_with("cannot")) {
+        lWords = "It " + lWords;
+    }
+    lWords.front() = static_cast<char>(std::toupper(static_cast<unsigned char>(lWords.front())));
+    return lWords + (lWords.ends_with('.') ? "" : ".");
 }
 
 static std::string sDescribeLeftPage(const ZTSStatusFacts& acrFacts) {
@@ -79,8 +92,14 @@ ZTCLines describeNoAdaptersState(const ZTSStatusFacts& acrFacts) {
 }
 
 ZTCLines describeNoLibraryState(const ZTSStatusFacts& acrFacts) {
-    const std::string& lrProblem = acrFacts.mLive->mAgent.mProblem;
-    return {lrProblem.empty() ? "The agent ended because it could not load the adapters' library." : lrProblem};
+    const std::string& lrLibrary = acrFacts.mPlaces.mLibrary;
+    return {"The agent could not load " + (lrLibrary.empty() ? "the adapters' library" : lrLibrary) +
+            ". Its log has the reason." + sNextStart(acrFacts)};
+}
+
+ZTCLines describeNoEventSupportState(const ZTSStatusFacts& acrFacts) {
+    return {"The adapters' library says that the driver of this host's adapters reports no events." +
+            sNextStart(acrFacts)};
 }
 
 static std::string sStartedAt(const ZTSStatusFacts& acrFacts) {
@@ -93,7 +112,8 @@ ZTCLines describeStartingState(const ZTSStatusFacts& acrFacts) {
 }
 
 ZTCLines describeAgentDownState(const ZTSStatusFacts& acrFacts) {
-    return {sDescribeAgentEnd(acrFacts)};
+    return {"No agent runs" + formatSince(acrFacts.mLive->mKeeper.mSince, acrFacts) + ". " +
+            sDescribeProblem(acrFacts.mLive->mAgent) + sNextStart(acrFacts)};
 }
 
 ZTCLines describeDiskState(const ZTSStatusFacts& acrFacts) {
@@ -112,19 +132,41 @@ bool isDeafState(std::string_view aState) {
     return aState == getKindStateName(ZTKST_Failed) || aState == getKindStateName(ZTKST_NoRights);
 }
 
+/// A kind, and the initiators for which it is in one state.
+struct ZTSGroupedKind {
+    std::string mName;
+    ZTCLines mInitiators;
+};
+
 /// Kinds in one state, with the same words of the library.
 struct ZTSKindGroup {
     std::string mState;
     std::string mWords;
-    ZTCLines mKinds;
+    std::vector<ZTSGroupedKind> mKinds;
 };
 
-static std::string sJoin(const ZTCLines& acrTexts) {
+static std::string sJoin(const ZTCLines& acrTexts, const char* apBetween = ", ") {
     std::string lText;
     for (const std::string& lrText : acrTexts) {
-        lText += (lText.empty() ? "" : ", ") + lrText;
+        lText += (lText.empty() ? "" : apBetween) + lrText;
     }
     return lText;
+}
+
+/// The kinds; of one that is in this state for some initiators alone, with their names.
+static std::string sJoinKinds(const ZTSKindGroup& acrGroup, std::size_t aInitiators) {
+    ZTCLines lNames;
+    for (const ZTSGroupedKind& lrKind : acrGroup.mKinds) {
+        const bool lIsOfAll = lrKind.mInitiators.size() == aInitiators;
+        lNames.push_back(lrKind.mName + (lIsOfAll ? "" : " of " + sJoin(lrKind.mInitiators, " and ")));
+    }
+    return sJoin(lNames);
+}
+
+static std::string sNameOf(const ZTSInitiator& acrInitiator) {
+    return !acrInitiator.mHost.empty() ? acrInitiator.mHost
+           : acrInitiator.mWwpn        ? acrInitiator.mWwpn->toText()
+                                       : "an unknown port";
 }
 
 /// Kinds of every adapter that are in one of these states, each once, by state and words.
@@ -147,9 +189,11 @@ static std::vector<ZTSKindGroup> sGroupKinds(const ZTSStatusFacts& acrFacts, boo
             if (lGroup == lGroups.end()) {
                 lGroup = lGroups.insert(lGroups.end(), {lState, lKey, {}});
             }
-            if (std::find(lGroup->mKinds.begin(), lGroup->mKinds.end(), lName) == lGroup->mKinds.end()) {
-                lGroup->mKinds.push_back(lName);
+            auto lGrouped = std::ranges::find(lGroup->mKinds, lName, &ZTSGroupedKind::mName);
+            if (lGrouped == lGroup->mKinds.end()) {
+                lGrouped = lGroup->mKinds.insert(lGroup->mKinds.end(), {lName, {}});
             }
+            lGrouped->mInitiators.push_back(sNameOf(lrKinds.mInitiator));
         }
     }
     return lGroups;
@@ -164,14 +208,15 @@ ZTCLines describeDeafState(const ZTSStatusFacts& acrFacts) {
         return aText;
     };
     ZTCLines lLines;
+    const std::size_t lInitiators = acrFacts.mLive->mKinds->size();
     for (const ZTSKindGroup& lrGroup : sGroupKinds(acrFacts, false, isDeafState)) {
-        const std::string lKinds = sJoin(lrGroup.mKinds);
+        const std::string lKinds = sJoinKinds(lrGroup, lInitiators);
         lLines.push_back(lPad(lrGroup.mState, scStateWidth) +
                          (lrGroup.mWords.empty() ? lKinds : lPad(lKinds, scKindsWidth) + "(" + lrGroup.mWords + ")"));
     }
     const auto lIsHeard = [](std::string_view aState) { return aState == getKindStateName(ZTKST_Listening); };
     for (const ZTSKindGroup& lrGroup : sGroupKinds(acrFacts, true, lIsHeard)) {
-        lLines.push_back(lPad(lrGroup.mState, scStateWidth) + sJoin(lrGroup.mKinds));
+        lLines.push_back(lPad(lrGroup.mState, scStateWidth) + sJoinKinds(lrGroup, lInitiators));
     }
     return lLines;
 }

@@ -27,6 +27,7 @@ std::vector<std::string> describeAnswerState(const ZTSStatusFacts& acrFacts);
 std::vector<std::string> describeStoppingState(const ZTSStatusFacts& acrFacts);
 std::vector<std::string> describeNoAdaptersState(const ZTSStatusFacts& acrFacts);
 std::vector<std::string> describeNoLibraryState(const ZTSStatusFacts& acrFacts);
+std::vector<std::string> describeNoEventSupportState(const ZTSStatusFacts& acrFacts);
 std::vector<std::string> describeStartingState(const ZTSStatusFacts& acrFacts);
 std::vector<std::string> describeAgentDownState(const ZTSStatusFacts& acrFacts);
 std::vector<std::string> describeDiskState(const ZTSStatusFacts& acrFacts);

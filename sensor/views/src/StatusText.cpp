@@ -218,8 +218,9 @@ private:
             return lrHistory.mSan ? "" : "no open episode: tavik events shows what was";
         }
         const bool lIsMore = lrHistory.mOpenEpisodes == gcMostOpenEpisodes;
-        return (lIsMore ? "at least " : "") + formatCount(lrHistory.mOpenEpisodes, "open episode") + ", " +
-               formatCount(lrHistory.mOpenPorts, "remote port") + ": tavik events --open";
+        return (lIsMore ? "at least " : "") + formatCount(lrHistory.mOpenEpisodes, "open episode") +
+               (lrHistory.mOpenPorts == 0 ? "" : ", " + formatCount(lrHistory.mOpenPorts, "remote port")) +
+               ": tavik events --open";
     }
 
     /// Up to when the history is complete.

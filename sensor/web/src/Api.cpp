@@ -94,6 +94,7 @@ ZTCNameBook ZTCApi::makeNames(const ZTCHistory& acrHistory) const {
 ZTSStatusFacts ZTCApi::gatherFacts() {
     ZTSStatusFacts lFacts;
     lFacts.mHost = mSources.mHost;
+    lFacts.mPlaces.mStateDirectory = mSources.mStateDirectory;
     lFacts.mNow = getHistoryTime();
     lFacts.mAnswer = ZTAN_Answered;
     lFacts.mLive = readLiveState(mSources.mReadLive());

@@ -35,6 +35,7 @@ TEST_F(WrongUse, Is2InOneLineWithoutOutput) {
         {"status", "--watch"},
         {"--json", "status", "--watch"},
         {"--config", "/no/such/file.toml"},
+        {"--config", ""},
     };
     for (const std::vector<std::string>& lrLine : lLines) {
         SCOPED_TRACE(testing::PrintToString(lrLine));
@@ -61,6 +62,20 @@ TEST_F(WrongUse, WithoutAHistoryCommandsSaySoWith3) {
         EXPECT_EQ(lRun.mOutput, "");
         expectOneLine(lRun);
         EXPECT_THAT(lRun.mErrors, HasSubstr("no history yet"));
+    }
+}
+
+TEST_F(WrongUse, AHistoryThatCannotBeReachedIsNotSaidToBeMissing) {
+    writeFile(mDirectory.path("file"), "");
+    writeFile(mDirectory.path("behind.toml"), "sensor.state = \"" + mDirectory.path("file") + "\"\n");
+    const std::vector<std::string> lCommands[] = {{"events"}, {"ports"}, {"events", "--follow"}};
+    for (const std::vector<std::string>& lrCommand : lCommands) {
+        std::vector<std::string> lLine{"--config", mDirectory.path("behind.toml")};
+        lLine.insert(lLine.end(), lrCommand.begin(), lrCommand.end());
+        const ZTSFinishedRun lRun = run(lLine);
+        EXPECT_EQ(lRun.mStatus, 3);
+        expectOneLine(lRun);
+        EXPECT_THAT(lRun.mErrors, HasSubstr("the history cannot be read: Not a directory"));
     }
 }
 

@@ -84,7 +84,7 @@ INSTANTIATE_TEST_SUITE_P(
     WrongType, SettingsError,
     testing::Values(
         ZTSBadValue{"agent.log_level", "\"31\"", "wrong type: \"31\", must be a whole number from 0 to 255"},
-        ZTSBadValue{"agent.log_level", "1.0", "wrong type: 1, must be a whole number from 0 to 255"},
+        ZTSBadValue{"agent.log_level", "1.0", "wrong type: 1.0, must be a whole number from 0 to 255"},
         ZTSBadValue{"collect.period", "true",
                     "wrong type: true, must be seconds, or a text such as \"90s\", from 0.1 to 3600 s"},
         ZTSBadValue{"targets.sysfs", "1", "wrong type: 1, must be true or false"},
@@ -95,7 +95,7 @@ INSTANTIATE_TEST_SUITE_P(
             "wrong type: \"a\", must be a list of texts, each a host's name of letters, digits and . - _ : [ ], "
             "of 1 to 255 bytes"},
         ZTSBadValue{"http.hosts", "[\"a\", 5]",
-                    "an element is not usable: a list, must be a list of texts, each a text: a host's name of letters, "
+                    "an element is not usable: 5, must be a list of texts, each a text: a host's name of letters, "
                     "digits and . - _ : [ ], of 1 to 255 bytes"},
         ZTSBadValue{"sensor.state", "2026-11-21",
                     "wrong type: a date or time, must be a text: the absolute path of a directory other than /"},
@@ -211,10 +211,16 @@ TEST(SettingsErrors, AWarningIsCheckedKeyByKey) {
     }
     EXPECT_THAT(sErrors("[[warn]]\nkind = \"flood\"\nrun = [\"a\"]\n"),
                 ElementsAre(StartsWith("t.toml:2: warn.kind: not usable: \"flood\", must be an event kind")));
-    for (const char* lpRun : {"run = []", "run = [\"\"]", "run = [\"b/c\"]", ""}) {
+    const std::pair<const char*, const char*> lRuns[] = {{"run = []", "3: warn.run: names no program: an empty list,"},
+                                                         {"run = [\"\"]", "3: warn.run: names no program: \"\","},
+                                                         {"run = [\"b/c\"]", "3: warn.run: names no program: \"b/c\","},
+                                                         {"", "1: warn.run: names no program: no value,"}};
+    for (const auto& [lpRun, lpProblem] : lRuns) {
         EXPECT_THAT(sErrors("[[warn]]\nkind = \"deaf\"\n" + std::string(lpRun) + "\n"),
-                    ElementsAre(StartsWith("t.toml:1: warn.run: names no program")));
+                    ElementsAre(StartsWith("t.toml:" + std::string(lpProblem))));
     }
+    EXPECT_THAT(sErrors("[[warn]]\nkind = \"deaf\"\nrun = [\"a\",\n 5]\n"),
+                ElementsAre(StartsWith("t.toml:4: warn.run: an element is not usable: 5, must be a list of texts")));
     EXPECT_THAT(sErrors("[[warn]]\nkind = \"deaf\"\nrun = \"a\"\n"),
                 ElementsAre(StartsWith("t.toml:3: warn.run: wrong type")));
 }

@@ -145,9 +145,17 @@ TEST_F(SchemaTest, AHistoryOfTheFirstVersionKeepsAllItsRowsAndGetsTheNewTables) 
 }
 
 TEST_F(SchemaTest, AReaderSaysWhenThereIsNoHistoryYet) {
-    EXPECT_THROW(ZTCHistory(mDirectory.path()), ZTCNoHistoryEx);
+    const auto lReason = [this] {
+        try {
+            ZTCHistory(mDirectory.path());
+        } catch (const ZTCNoHistoryEx& lrEx) {
+            return std::string(lrEx.what());
+        }
+        return std::string();
+    };
+    EXPECT_EQ(lReason(), path() + ": there is no history yet: no sensor has run with this state directory");
     writeFile(path(), "");
-    EXPECT_THROW(ZTCHistory(mDirectory.path()), ZTCNoHistoryEx);
+    EXPECT_EQ(lReason(), path() + ": there is no history yet: the sensor is about to make it");
 }
 
 TEST_F(SchemaTest, ADamagedDatabaseIsRenamedAndReportedAndANewOneBegun) {

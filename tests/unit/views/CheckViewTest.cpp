@@ -26,6 +26,14 @@ TEST_F(CheckView, NotCollectingIsCriticalButAHostWithoutAdaptersIsFine) {
     EXPECT_THAT(lCheck.mText, HasSubstr("no Fibre Channel adapter was found"));
 }
 
+TEST_F(CheckView, AdaptersWhoseDriverReportsNoEventsAreCritical) {
+    nlohmann::json lLive = makeHealthyJson();
+    lLive["keeper"]["state"] = "waiting-for-adapters";
+    lLive["agent"]["running"] = false;
+    lLive["agent"]["endReason"] = "no-event-support";
+    EXPECT_EQ(resultOf(lLive), ZTCR_Critical);
+}
+
 TEST_F(CheckView, DeafnessAndLossesAreWarnings) {
     nlohmann::json lLive = makeHealthyJson();
     lLive["losses"]["refused"]["total-limit"] = 3;

@@ -67,6 +67,11 @@ static std::vector<std::pair<std::string, ZTSStatusFacts>> sFactsOfEachState() {
                             arLive["agent"]["running"] = false;
                             arLive["agent"]["endReason"] = "no-library";
                         }));
+    lCases.emplace_back("no-event-support", sFactsOf([](ZTCJson& arLive) {
+                            arLive["keeper"]["state"] = "waiting-for-adapters";
+                            arLive["agent"]["running"] = false;
+                            arLive["agent"]["endReason"] = "no-event-support";
+                        }));
     lCases.emplace_back("no-adapters",
                         sFactsOf([](ZTCJson& arLive) { arLive["keeper"]["state"] = "waiting-for-adapters"; }));
     lCases.emplace_back("agent-down", sFactsOf([](ZTCJson& arLive) { arLive["agent"]["running"] = false; }));
@@ -170,9 +175,45 @@ TEST_F(LocalTime, AnEndedAgentsReasonChoosesItsState) {
         }));
     };
     EXPECT_THAT(lStateFor("no-adapters"), ElementsAre("no-adapters"));
-    EXPECT_THAT(lStateFor("no-event-support"), ElementsAre("no-adapters"));
+    EXPECT_THAT(lStateFor("no-event-support"), ElementsAre("no-event-support"));
     EXPECT_THAT(lStateFor("no-library"), ElementsAre("no-library"));
     EXPECT_THAT(lStateFor("signal"), ElementsAre("agent-down"));
+}
+
+TEST_F(LocalTime, AnAgentThatIsDownIsDescribedInSentences) {
+    const auto lStatusFor = [](const char* apProblem) {
+        ZTSStatusFacts lFacts = sFactsOf([apProblem](nlohmann::json& arLive) {
+            arLive["keeper"]["nextStart"] = "2026-11-21T10:04:20+01:00";
+            arLive["keeper"]["since"] = "2026-11-21T10:04:10+01:00";
+            arLive["agent"]["running"] = false;
+            arLive["agent"]["problem"] = apProblem;
+        });
+        return describeTroubles(lFacts, judge(lFacts)).at(0).mStatus.at(0);
+    };
+    const std::string lSince = "No agent runs since 10:04:10. ";
+    const std::string lNext = " The next start is at 10:04:20.";
+    EXPECT_EQ(lStatusFor("ended: killed by signal 9 (Killed)"),
+              lSince + "The last one ended: killed by signal 9 (Killed)." + lNext);
+    EXPECT_EQ(lStatusFor("ended: other"), lSince + "The last one failed; its log has the reason." + lNext);
+    EXPECT_EQ(lStatusFor("cannot be started"), lSince + "It cannot be started." + lNext);
+    EXPECT_EQ(lStatusFor("an agent runs that this sensor has not started"),
+              lSince + "An agent runs that this sensor has not started." + lNext);
+}
+
+TEST_F(LocalTime, ActionsNameTheFilesAndFoldersOfTheConfiguration) {
+    ZTSStatusFacts lFacts = sFactsOf([](nlohmann::json& arLive) { arLive["collector"]["disk"] = "full"; });
+    const auto lAction = [&] { return describeTroubles(lFacts, judge(lFacts)).at(0).mAction.at(0); };
+    EXPECT_THAT(lAction(), testing::StartsWith("df -h /var/lib/tavik;"));
+    lFacts.mPlaces = {.mSettingsFile = "/etc/t.toml",
+                      .mStateDirectory = "/data/tavik",
+                      .mAgentLog = "/data/agent.log",
+                      .mLibrary = "/opt/libkpm.so"};
+    EXPECT_THAT(lAction(), testing::StartsWith("df -h /data/tavik;"));
+    lFacts.mLive->mAgent.mIsRunning = false;
+    lFacts.mLive->mAgent.mEndReason = "no-library";
+    EXPECT_EQ(lAction(), "sudo tail -n 5 /data/agent.log;  sudo grep -n library /etc/t.toml");
+    EXPECT_THAT(describeTroubles(lFacts, judge(lFacts)).at(0).mStatus.at(0),
+                testing::StartsWith("The agent could not load /opt/libkpm.so. Its log has the reason."));
 }
 
 TEST_F(LocalTime, LossesAreToldForTheSpanThatWasAskedFor) {

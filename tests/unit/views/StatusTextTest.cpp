@@ -111,6 +111,37 @@ action: sudo systemctl edit tavik      # AmbientCapabilities=
 )");
 }
 
+TEST_F(StatusText, AKindThatOnlySomeAdaptersDoNotReportIsNamedWithThem) {
+    nlohmann::json lLive = makeHealthyJson();
+    lLive["kinds"] = nlohmann::json::array();
+    for (const char* lpHost : {"host7", "host8", "host9"}) {
+        lLive["kinds"].push_back({{"initiator", {{"host", lpHost}}},
+                                  {"kinds", {{"rscn", "no_rights"}, {"link", "listening"}, {"logo", "listening"}}},
+                                  {"words", nlohmann::json::object()}});
+    }
+    lLive["kinds"][1]["kinds"]["link"] = "failed";
+    EXPECT_THAT(format(makeFacts(lLive)), HasSubstr(R"(
+status: no_rights  rscn
+        failed     link of host8
+        listening  logo, link of host7 and host9
+)"));
+}
+
+TEST_F(StatusText, ManyKindsThatAreHeardStayInTheirColumn) {
+    nlohmann::json lLive = makeHealthyJson();
+    nlohmann::json lStates = {{"rscn", "no_rights"}};
+    for (const char* lpKind : {"plogi", "prlo", "adisc", "lsrjt", "logo", "fabric-busy", "port-busy", "fcp-read-check",
+                               "queue-full", "device-busy", "check-condition"}) {
+        lStates[lpKind] = "listening";
+    }
+    lLive["kinds"] = {{{"initiator", {{"host", "host7"}}}, {"kinds", lStates}, {"words", nlohmann::json::object()}}};
+    EXPECT_THAT(format(makeFacts(lLive)), HasSubstr(R"(
+status: no_rights  rscn
+        listening  plogi, prlo, adisc, lsrjt, logo, fabric-busy, port-busy,
+                   fcp-read-check, queue-full, device-busy, check-condition
+action: )"));
+}
+
 static ZTSStatusFacts sVanished() {
     ZTSStatusFacts lFacts = makeHealthyFacts();
     lFacts.mAnswer = ZTAN_NoSensor;
@@ -190,7 +221,7 @@ TEST_F(StatusText, SeveralTroublesOfTavikAreAllShown) {
     lLive["losses"]["refused"] = {{"total-limit", 1200}, {"collection-off", 5}};
     const std::string lText = format(makeFacts(lLive));
     EXPECT_THAT(lText, HasSubstr(" state: PARTLY DEAF;"));
-    EXPECT_THAT(lText, HasSubstr("status: failed     rscn\n"));
+    EXPECT_THAT(lText, HasSubstr("status: failed     rscn of host7\n"));
     EXPECT_THAT(lText, HasSubstr("status: 1,200 refused (total-limit); since 20 Nov 10:04.\n"));
     EXPECT_THAT(lText, HasSubstr("   see: tavik explain refused\n"));
     EXPECT_THAT(lText, Not(HasSubstr("collection-off")));
