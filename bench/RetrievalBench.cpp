@@ -41,6 +41,7 @@
 #include "bench/support/WatchedLock.h"
 #include "common/include/EncodableStream.h"
 #include "common/include/Log.h"
+#include "libkpm/include/ScopeEventKinds.h"
 
 namespace {
 
@@ -48,17 +49,14 @@ enum ZTELoad { ZTBL_Empty, ZTBL_One, ZTBL_Mixed };
 
 constexpr unsigned scManyTargets = 20000;
 
-/// Events of all kinds with data, in the order of their category and subcategory.
+/// Events of all kinds but RSCN, which has a callback of its own.
 std::vector<std::unique_ptr<ZTCBenchEvent>> sMakeMixture(std::uint64_t aPort) {
-    static const struct {
-        unsigned mCategory;
-        unsigned mSubcategory;
-    } lcKinds[] = {{1, 1}, {1, 2}, {1, 4},  {1, 8},  {1, 16}, {2, 1}, {2, 2}, {2, 4}, {4, 1}, {4, 2},
-                   {4, 4}, {4, 8}, {4, 16}, {4, 32}, {4, 64}, {8, 1}, {8, 2}, {8, 4}, {16, 1}};
     std::vector<std::unique_ptr<ZTCBenchEvent>> lEvents;
-    for (const auto& lcrKind : lcKinds) {
-        lEvents.push_back(std::make_unique<ZTCBenchEvent>(lcrKind.mCategory, lcrKind.mSubcategory, aPort,
-                                                          std::vector<std::uint32_t>{5, 6, 7, 8, 9}));
+    for (const ZTSScopeEventKind& lcrKind : gcScopeEventKinds) {
+        if (&lcrKind != &gcScopeEventKinds[findKindIndex("rscn").value()]) {
+            lEvents.push_back(std::make_unique<ZTCBenchEvent>(lcrKind.mDeliveredCategory, lcrKind.mDeliveredSubcategory,
+                                                              aPort, std::vector<std::uint32_t>{5, 6, 7, 8, 9}));
+        }
     }
     return lEvents;
 }

@@ -15,9 +15,6 @@
 
 class ZTCTargetBook {
 public:
-    /// A new agent knows nothing, and what was known for the old one may be out of date.
-    void forgetAgent();
-
     /// What is known now. Duplicates and targets that the agent has are dropped.
     void offer(std::span<const ZTSTargetPort> aTargets);
 

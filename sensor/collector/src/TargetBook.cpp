@@ -14,12 +14,6 @@ bool ZTCTargetBook::ZTSOrder::operator()(const ZTSTargetPort& acrLeft, const ZTS
            std::tie(acrRight.mFcId, acrRight.mPortName.mBytes, acrRight.mNodeName.mBytes);
 }
 
-void ZTCTargetBook::forgetAgent() {
-    mTargets.clear();
-    mKnown.clear();
-    mRegistered = 0;
-}
-
 void ZTCTargetBook::offer(std::span<const ZTSTargetPort> aTargets) {
     for (const ZTSTargetPort& lrTarget : aTargets) {
         if (mKnown.insert(lrTarget).second) {

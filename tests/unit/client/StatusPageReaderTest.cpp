@@ -12,6 +12,7 @@
 
 #include "libkpm/include/ScopeEventKinds.h"
 #include "tests/support/ResourceLimit.h"
+#include "tests/support/Seed.h"
 #include "tests/support/StatusPageFile.h"
 #include "tests/support/TemporaryDirectory.h"
 
@@ -244,7 +245,8 @@ TEST_F(StatusPageReader, RefusesToReadAPageThatHasBecomeShorter) {
 }
 
 TEST_F(StatusPageReader, SurvivesAPageOfAnyBytesBehindItsSizes) {
-    std::mt19937 lRandom(1);
+    ZTCTestSeed lSeed;
+    std::mt19937& lRandom = lSeed.engine();
     for (int lRound = 0; lRound < 20; ++lRound) {
         ZTCStatusPageFile lFile(mPath, 2);
         auto* lpBytes = reinterpret_cast<unsigned char*>(&lFile.page());
@@ -292,8 +294,9 @@ TEST_F(StatusPageReader, SeesOneMomentOfWhatIsHandedOverInAStorm) {
     ZTCStatusPageFile lFile(mPath, lcBoards);
     std::atomic<bool> lIsToEnd{false};
     // As the agent does: events, and every now and then a retrieval that takes all of them.
+    ZTCTestSeed lSeed;
     std::thread lAgent([&] {
-        std::mt19937 lRandom(2);
+        std::mt19937& lRandom = lSeed.engine();
         ZTSStatusHeader& lrHeader = lFile.header();
         while (!lIsToEnd) {
             for (int lEvent = 0; lEvent < 1000; ++lEvent) {

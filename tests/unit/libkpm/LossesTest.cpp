@@ -3,10 +3,12 @@
 #include <gtest/gtest.h>
 
 #include <array>
+#include <new>
 #include <string>
 #include <vector>
 
 #include "libkpm/common/include/AgentLink.h"
+#include "tests/support/FailingAllocation.h"
 
 static std::vector<std::string> sLines;
 static std::vector<std::string> sReports;
@@ -61,6 +63,22 @@ TEST_F(Losses, EachKindIsSaidAtMostOnceASecondWithItsTotal) {
     EXPECT_EQ(sLines.size(), 2u);
     EXPECT_EQ(sReports, (std::vector<std::string>{"overruns=5", "overruns=7"}));
     EXPECT_EQ(mLosses.getTotal(LOSS_Overrun), 7u);
+}
+
+TEST_F(Losses, AKindThatLacksTheMemoryToBeReportedIsReportedLater) {
+    mLosses.count(LOSS_Overrun, 5);
+    bool lHasThrown = false;
+    EXPECT_TRUE(failAllocation(1, [&] {
+        try {
+            mLosses.tell(mNow);
+        } catch (const std::bad_alloc&) {
+            lHasThrown = true;
+        }
+    }));
+    EXPECT_TRUE(lHasThrown);
+    mLosses.tell(mNow);
+    EXPECT_EQ(sLines, std::vector<std::string>{"5 events are lost: a buffer overran (5 since the start)"});
+    EXPECT_EQ(sReports, std::vector<std::string>{"overruns=5"});
 }
 
 TEST_F(Losses, OneKindDoesNotSilenceAnother) {

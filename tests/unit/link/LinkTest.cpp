@@ -4,11 +4,14 @@
 #include <gtest/gtest.h>
 #include <sys/eventfd.h>
 #include <sys/mman.h>
+#include <sys/resource.h>
 #include <sys/socket.h>
 #include <sys/stat.h>
+#include <sys/wait.h>
 #include <unistd.h>
 
 #include <cstring>
+#include <exception>
 #include <tuple>
 
 #include "sensor/client/include/ClientErrors.h"
@@ -128,6 +131,34 @@ TEST_F(Link, AFullLinkSaysSoInsteadOfWaitingAndTakesMessagesAgainOnceRead) {
     while (mKeeper.receive(lReceived) == ZTLR_Done) {
     }
     EXPECT_EQ(mCollector.send(lMessage), ZTLR_Done);
+}
+
+TEST_F(Link, TooManyDescriptorsOnTheirWayAreNoFailureEither) {
+    // The kernel counts them by user, and lets root send any number.
+    const pid_t lChild = fork();
+    ASSERT_GE(lChild, 0);
+    if (lChild == 0) {
+        const rlimit lLimit{16, 16};
+        ZTSLinkMessage lMessage;
+        lMessage.mType = ZTLM_AgentStarted;
+        lMessage.mResponseFifo = sMakeEvent();
+        lMessage.mBell = sMakeEvent();
+        if ((geteuid() == 0 && setuid(65534) != 0) || setrlimit(RLIMIT_NOFILE, &lLimit) != 0) {
+            _exit(2);
+        }
+        try {
+            ZTELinkResult lResult = ZTLR_Done;
+            for (int i = 0; i < 1000 && lResult == ZTLR_Done; ++i) {
+                lResult = mKeeper.send(lMessage);
+            }
+            _exit(lResult == ZTLR_NotNow ? 0 : 3);
+        } catch (const std::exception&) {
+            _exit(1);
+        }
+    }
+    int lStatus = 0;
+    ASSERT_EQ(waitpid(lChild, &lStatus, 0), lChild);
+    EXPECT_TRUE(WIFEXITED(lStatus) && WEXITSTATUS(lStatus) == 0) << lStatus;
 }
 
 TEST_F(Link, WhatWasSentBeforeTheEndIsReceivedBeforeTheEndIsSeen) {

@@ -90,6 +90,17 @@ TEST(NdjsonFile, WhatAKilledProcessLeftOfALineIsTakenBack) {
     }
 }
 
+TEST(NdjsonFile, OfAFileThatTookItsPlaceAPartOfALineIsTakenBackToo) {
+    const ZTCTemporaryDirectory lDirectory;
+    const std::string lPath = lDirectory.path("events");
+    ZTCNdjsonFile lFile(lPath, 1 << 20, 1);
+    lFile.append("first\n");
+    writeFile(lDirectory.path("other"), "older\npart of a li");
+    ASSERT_EQ(rename(lDirectory.path("other").c_str(), lPath.c_str()), 0);
+    lFile.append("second\n");
+    EXPECT_EQ(readFile(lPath), "older\nsecond\n");
+}
+
 TEST(NdjsonFile, ASymbolicLinkIsNotFollowed) {
     const ZTCTemporaryDirectory lDirectory;
     ASSERT_EQ(symlink(lDirectory.path("elsewhere").c_str(), lDirectory.path("events").c_str()), 0);

@@ -10,6 +10,7 @@
 #include "common/include/Memory.h"
 #include "tests/support/FailingAllocation.h"
 #include "tests/support/TestThreads.h"
+#include "tests/support/Waiting.h"
 
 class ZTCNumber : public ZTCQueueable {
 public:
@@ -99,18 +100,24 @@ TEST(SynchList, AnItemAtTheFrontEndsTheWaitToo) {
     ZTCTestThreads lThreads;
     lThreads.start(1, [&lList](unsigned) {
         for (int lRound = 0; lRound < lcRounds; ++lRound) {
-            lList.waitWhileEmpty(20);
+            lList.waitWhileEmpty(3600);
             EXPECT_EQ(sNumber(lList.popFront()), lRound);
         }
     });
     for (int lRound = 0; lRound < lcRounds; ++lRound) {
         lList.pushFront(sItem(lRound));
-        while (!lList.isEmpty() && lThreads.isRunning()) {
+        const ZTCDeadline lDeadline;
+        while (!lList.isEmpty() && !lDeadline.isOver()) {
             std::this_thread::yield();
+        }
+        if (!lList.isEmpty()) {
+            ADD_FAILURE() << "item " << lRound << " woke nobody";
+            break;
         }
         // Some of the items come while the thread waits already.
         std::this_thread::sleep_for(std::chrono::microseconds(lRound));
     }
+    lList.interrupt();
     lThreads.join();
 }
 
