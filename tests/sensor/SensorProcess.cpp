@@ -168,8 +168,7 @@ void ZTCSensorProcess::waitUntilAllIsStored() const {
                 const nlohmann::json lStatus = status();
                 // A new agent is asked at once, even where it holds nothing: that answer is a file for a moment, too.
                 return lStatus["agent"].value("retrievals", 0) != 0 && lStatus["agent"].value("heldRecords", 1) == 0 &&
-                       lStatus["collector"]["waitingFrames"] == 0 &&
-                       listSpool(stateDirectory()).empty();
+                       lStatus["collector"]["waitingFrames"] == 0 && listSpool(stateDirectory()).empty();
             } catch (const std::exception&) {
                 return false;  // a collector is just starting
             }
