@@ -214,6 +214,8 @@ TEST_F(AgentSessionTest, AStopAsksUntilNothingIsHeldAndThenShutsDown) {
     startSession();
     stepUntilFrames(1);
     mSession->requestStop(now(), seconds(8));
+    stepUntil([this] { return commands().size() > 3; }, "the first retrieval of the stop");
+    mSession->requestStop(now(), seconds(8));  // asked again, it goes on
     stepUntil([this] { return commands().back() == ZTSTVKC_ShutDown; }, "the shut-down");
     EXPECT_THAT(commands(), ElementsAre(ZTSTVKC_StartScope, ZTSTVKC_GetScopeData, ZTSTVKC_Stop, ZTSTVKC_GetScopeData,
                                         ZTSTVKC_GetScopeData, ZTSTVKC_ShutDown));
