@@ -80,7 +80,7 @@ void ZTCSimControlSocket::removeStale() const {
         sRefuse(mPath, "lstat", errno);
     }
     if (!S_ISSOCK(lFound.st_mode)) {
-        sRefuse(mPath, "exists and is no socket");
+        sRefuse(mPath, "exists and is not a socket");
     }
     const ZTCLibraryDescriptor lProbe(::socket(AF_UNIX, SOCK_STREAM | SOCK_CLOEXEC | SOCK_NONBLOCK, 0));
     if (!lProbe.isOpen()) {

@@ -203,24 +203,26 @@ static ZTESimExit sWait(const std::string& acrSocket, const ZTSSimWaitOptions& a
 }
 
 static int sMain(int aCount, char** apArguments) {
-    CLI::App lApp{"Speaks to a running simulated adapters' library, and reads its scenarios."};
+    CLI::App lApp{"Talks to a simulated adapters' library that is in use, and checks scenarios."};
     lApp.require_subcommand(1);
     std::string lSocket;
     std::string lFile;
     std::vector<std::string> lWords;
     ZTSSimWaitOptions lWait;
     lApp.add_option("--socket", lSocket, "Path of the library's socket")->envname("KPM_SIM_SOCKET");
-    CLI::App* lpInject = lApp.add_subcommand("inject", "Play event, storm, state or loss lines now");
-    lpInject->add_option("LINE", lWords, "KIND FIELD=VALUE ..., or storm count=N ...")->required();
+    CLI::App* lpInject = lApp.add_subcommand("inject", "Play event, storm, state and loss lines now");
+    lpInject
+        ->add_option("LINE", lWords, "KIND FIELD=VALUE ..., storm count=N ..., or a state or loss line as one argument")
+        ->required();
     CLI::App* lpRun = lApp.add_subcommand("run", "Play the event, storm, state and loss lines of a file now");
     lpRun->add_option("FILE", lFile)->required();
-    CLI::App* lpCheck = lApp.add_subcommand("check", "Read a scenario and print what it holds");
+    CLI::App* lpCheck = lApp.add_subcommand("check", "Check a scenario, and print what it holds");
     lpCheck->add_option("FILE", lFile)->required();
     CLI::App* lpKinds = lApp.add_subcommand("kinds", "List the event kinds and their fields");
     CLI::App* lpStatus = lApp.add_subcommand("status", "Print what the library has delivered");
-    CLI::App* lpCounts = lApp.add_subcommand("counts", "Print how many events of each kind it has delivered");
+    CLI::App* lpCounts = lApp.add_subcommand("counts", "Print how many events of each kind the library has delivered");
     CLI::App* lpWait = lApp.add_subcommand("wait", "Wait until the schedule is done, then print the status");
-    lpWait->add_option("--timeout", lWait.mTimeout, "Seconds to wait at most, also for the library to listen")
+    lpWait->add_option("--timeout", lWait.mTimeout, "Seconds to wait at most, including the wait for the library")
         ->capture_default_str();
     lpWait->add_flag("--started", lWait.mIsStartEnough, "Wait only until the schedule has started");
     lpWait->add_option("--delivered", lWait.mDelivered, "Wait only until this many events have been delivered");

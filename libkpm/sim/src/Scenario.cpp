@@ -14,7 +14,7 @@ static void sCheckNewName(std::string_view aName, const ZTSSimScenario& acrScena
     const bool lHasMark = aName.find_first_of(",:") != std::string_view::npos;
     if (!lStartsWithLetter || lHasMark || aName == "all" || aName == "none") {
         refuseSim(quoteSimWord(aName) +
-                  " is no name: it begins with a letter, has no comma or colon, and is not all or none");
+                  " is not a name: a name begins with a letter, has no comma or colon, and is not all or none");
     }
     if (findSimPort(acrScenario.mAdapters, aName) != nullptr || findSimPort(acrScenario.mPorts, aName) != nullptr) {
         refuseSim("the name " + quoteSimWord(aName) + " stands twice");

@@ -200,7 +200,7 @@ ZTSSimStorm parseSimStorm(ZTCSimLine& arLine, const ZTSSimScenario& acrScenario)
         forEachSimPart("kind", lKinds, [&](std::string_view aPart) {
             const std::optional<std::size_t> lKind = findKindIndex(aPart);
             if (!lKind) {
-                refuseSim("kind= names " + quoteSimWord(aPart) + ", which is no event kind");
+                refuseSim("kind= names " + quoteSimWord(aPart) + ", which is not an event kind");
             }
             lStorm.mKinds.push_back(*lKind);
             checkSimListSize("kind", lStorm.mKinds.size());

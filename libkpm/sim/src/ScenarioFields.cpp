@@ -148,7 +148,8 @@ std::uint32_t readSimBoard(std::string_view aField, std::string_view aText, cons
         return static_cast<std::uint32_t>(lpAdapter - lrAdapters.data());
     }
     if (aText.front() < '0' || aText.front() > '9') {
-        refuseSim(nameSimField(aField) + "names " + quoteSimWord(aText) + ", which is no adapter of the lines above");
+        refuseSim(nameSimField(aField) + "names " + quoteSimWord(aText) +
+                  ", which is not an adapter of the lines above");
     }
     const std::uint32_t lBoard = readSimNumber32(aField, aText);
     if (lBoard >= lrAdapters.size()) {
@@ -222,7 +223,7 @@ std::optional<std::size_t> takeSimKind(ZTCSimLine& arLine) {
     const std::string_view lName = arLine.takeWord("an event kind, or all");
     const std::optional<std::size_t> lKind = findKindIndex(lName);
     if (!lKind && lName != "all") {
-        refuseSim(quoteSimWord(lName) + " is no event kind");
+        refuseSim(quoteSimWord(lName) + " is not an event kind");
     }
     return lKind;
 }

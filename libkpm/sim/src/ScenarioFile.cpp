@@ -23,7 +23,7 @@ std::string readSimFile(const std::string& acrPath) {
         sRefuse(acrPath, std::system_category().message(errno));
     }
     if (!S_ISREG(lStatus.st_mode)) {
-        sRefuse(acrPath, "is no regular file");
+        sRefuse(acrPath, "is not a regular file");
     }
     std::string lText;
     char lBytes[65536];

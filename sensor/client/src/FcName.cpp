@@ -48,7 +48,7 @@ ZTSFcName ZTSFcName::fromText(std::string_view aText) {
     if (!lIsValid) {
         throw ZTCBadInputEx(
             "\"" + std::string(aText) +
-            "\" is no world wide name: wanted 8 hex pairs with colons, such as 50:06:01:60:3b:a0:12:34");
+            "\" is not a world wide name: wanted 8 hex pairs with colons, such as 50:06:01:60:3b:a0:12:34");
     }
     return lName;
 }

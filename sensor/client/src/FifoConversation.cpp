@@ -87,7 +87,7 @@ ZTCFileDescriptor ZTCFifoConversation::openFifo(const std::string& acrPath, int 
             mObstacleText = acrPath + " does not exist";
         } else if (errno == ENXIO) {
             mObstacle = ZTNA_NobodyListens;
-            mObstacleText = "nobody listens on " + acrPath;
+            mObstacleText = "no process listens on " + acrPath;
         } else {
             throw ZTCSystemCallEx("cannot open " + acrPath, errno);
         }
@@ -118,7 +118,7 @@ bool ZTCFifoConversation::tryTakeLock() {
         mObstacle = ZTNA_LockHeld;
         mObstacleText = mLock.describeHolder();
         if (mLock.getNamedHolder() != 0) {
-            throw ZTCNoAnswerEx(mObstacle, "no turn to talk in " + mDirectory + ": " + mObstacleText +
+            throw ZTCNoAnswerEx(mObstacle, "cannot talk to the agent in " + mDirectory + ": " + mObstacleText +
                                                " as long as it runs; ask it with 'tavik', or stop it");
         }
         return false;
@@ -140,9 +140,9 @@ void ZTCFifoConversation::connect(const ZTCTimeLimit& acrLimit) {
         while (!(tryOpenResponseFifo() && tryTakeLock() && tryOpenCommandFifo() && tryOpenResponseFifo())) {
             mCommandFifo.reset();
             if (acrLimit.hasPassed()) {
-                throw ZTCNoAnswerEx(mObstacle, (mObstacle == ZTNA_LockHeld ? "no turn to talk in " : "no agent in ") +
-                                                   mDirectory + ": " + mObstacleText + " (waited " +
-                                                   acrLimit.describeSpan() + ")");
+                throw ZTCNoAnswerEx(
+                    mObstacle, (mObstacle == ZTNA_LockHeld ? "cannot talk to the agent in " : "no agent in ") +
+                                   mDirectory + ": " + mObstacleText + " (waited " + acrLimit.describeSpan() + ")");
             }
             pollfd lCancel{.fd = mCancelDescriptor, .events = POLLIN, .revents = 0};
             if (sPoll({&lCancel, 1}, std::min(scRetryMilliseconds, acrLimit.remainingMilliseconds()))) {
@@ -181,9 +181,10 @@ void ZTCFifoConversation::discardStaleBytes(const ZTCTimeLimit& acrLimit) {
            (lResponse.revents & POLLIN) != 0) {
         discardSome(lTail);
         if (acrLimit.hasPassed()) {
-            throw ZTCNoAnswerEx(ZTNA_Silence, "the agent in " + mDirectory +
-                                                  " is still sending an answer that nobody waits for, after " +
-                                                  acrLimit.describeSpan());
+            throw ZTCNoAnswerEx(ZTNA_Silence,
+                                "the agent in " + mDirectory +
+                                    " is still sending an earlier answer, which no client waits for, after " +
+                                    acrLimit.describeSpan());
         }
     }
     mDiscardedBytes -= lHasMark() ? lTail.size() : 0;

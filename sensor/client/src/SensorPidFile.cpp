@@ -77,7 +77,7 @@ void ZTCSensorPidFile::take() {
     const long lPid = readPid(lFile.get());
     if (lPid != 0 && lPid != getpid() && isProcessAlive(lPid)) {
         throw ZTCSensorBusyEx(mPath + " names process " + std::to_string(lPid) +
-                              ", which runs: remove the file if that is no sensor");
+                              ", which runs: remove the file if that process is not a sensor");
     }
     const std::string lText = std::to_string(getpid()) + "\n";
     if (ftruncate(lFile.get(), 0) != 0 ||

@@ -33,7 +33,7 @@ std::uint32_t parseNumber(std::string_view aText, std::uint32_t aMax, const std:
                             std::to_string(aMax));
     }
     if (lError != std::errc() || lpStop != lpEnd) {
-        throw ZTCBadInputEx(acrWhat + " \"" + std::string(aText) + "\" is no decimal or 0x-hexadecimal number");
+        throw ZTCBadInputEx(acrWhat + " \"" + std::string(aText) + "\" is not a decimal or 0x-hexadecimal number");
     }
     return lValue;
 }

@@ -30,7 +30,7 @@ static void sPrintScopeData(const ZTSToolOptions& acrOptions, const std::string&
 /// Answers at once where no agent is there to be asked.
 static void sRequireAgent(const ZTSToolOptions& acrOptions) {
     if (!acrOptions.mIsWaiting && lookAtAgent(acrOptions.mDirectory).mPresence == ZTAP_None) {
-        throw ZTCNoAnswerEx(ZTNA_NobodyListens, "no agent in " + acrOptions.mDirectory + ": nobody holds " +
+        throw ZTCNoAnswerEx(ZTNA_NobodyListens, "no agent in " + acrOptions.mDirectory + ": no process holds " +
                                                     acrOptions.mDirectory + gcAgentPidFileName +
                                                     ". Start one with qrv-tvk, or wait for one with --wait");
     }
@@ -57,7 +57,7 @@ static ZTCJson sLateAnswersJson(const std::vector<ZTSAnswer>& acrAnswers) {
 static void sReportDiscards(const ZTCSensorClient& acrClient) {
     if (acrClient.getDiscardedBytes() != 0) {
         complain("threw away " + std::to_string(acrClient.getDiscardedBytes()) +
-                 " bytes of an answer that nobody had read");
+                 " bytes of an earlier answer that was not read");
     }
 }
 

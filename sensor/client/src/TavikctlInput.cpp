@@ -14,7 +14,7 @@ std::chrono::milliseconds parseSeconds(const std::string& acrText, const std::st
     const char* lpEnd = acrText.data() + acrText.size();
     const auto [lpStop, lError] = std::from_chars(acrText.data(), lpEnd, lSeconds, std::chars_format::fixed);
     if (lError != std::errc() || lpStop != lpEnd || !(lSeconds >= 0.001 && lSeconds <= scMaxSeconds)) {
-        throw ZTCBadInputEx(acrWhat + " \"" + acrText + "\" is no number of seconds from 0.001 to 86400");
+        throw ZTCBadInputEx(acrWhat + " \"" + acrText + "\" is not a number of seconds from 0.001 to 86400");
     }
     return std::chrono::milliseconds(static_cast<long long>(lSeconds * 1000));
 }

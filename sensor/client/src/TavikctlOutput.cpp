@@ -37,7 +37,7 @@ ZTEExitStatus reportAnswer(const ZTSToolOptions& acrOptions, const std::string& 
     }
     if (lrResponse.mUnreadBytes != 0) {
         complain(acrCommand + ": the answer has " + std::to_string(lrResponse.mUnreadBytes) +
-                 " bytes behind its last field, which are ignored");
+                 " bytes after its last field, which are ignored");
     }
     if (lrResponse.mOutcome == ZTRO_Failed) {
         complain("the agent in " + acrOptions.mDirectory + " refused " + acrCommand + ": status " +

@@ -128,7 +128,7 @@ private:
         note(reportAnswer(mrOptions, "get", lAnswer));
         if (mClient.getDiscardedBytes() != mReportedDiscards) {
             complain("threw away " + std::to_string(mClient.getDiscardedBytes() - mReportedDiscards) +
-                     " bytes of an answer that nobody had read");
+                     " bytes of an earlier answer that was not read");
             mReportedDiscards = mClient.getDiscardedBytes();
         }
     }

@@ -35,15 +35,16 @@ int main(int aCount, char** appArguments) {
     reserveStandardStreams();
     std::string lConfigOption;
     bool lIsCheck = false;
-    CLI::App lApp{"Keeps the Fibre Channel event agent and the collector running, in the foreground.", "tavik-sensor"};
+    CLI::App lApp{"Keeps the Fibre Channel event agent and the collector running. Stays in the foreground.",
+                  "tavik-sensor"};
     lApp.set_version_flag("--version", "tavik-sensor v" TAVIK_VERSION);
     lApp.add_option("--config", lConfigOption,
                     "The configuration file; default: $TAVIK_CONFIG, else " + std::string(gcDefaultSettingsFile))
         ->check(refuseEmptyName);
-    lApp.add_flag("--check", lIsCheck, "Report what is wrong with the configuration file, and start nothing");
+    lApp.add_flag("--check", lIsCheck, "Report the errors of the configuration file, and start nothing");
     lApp.footer(
-        "SIGTERM and SIGINT stop in order, SIGHUP reads the configuration file again.\n"
-        "Exit status: 0 done, 1 failed, or another sensor runs, 2 wrong use, a bad configuration file, or a "
+        "SIGTERM and SIGINT stop it in order. SIGHUP makes it read the configuration file again.\n"
+        "Exit status: 0 done, 1 failed or another sensor runs, 2 wrong use, a bad configuration file, or a\n"
         "history of a newer version.");
     try {
         lApp.parse(aCount, appArguments);

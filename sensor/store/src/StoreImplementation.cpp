@@ -161,7 +161,7 @@ ZTSTakenIn ZTCStore::ZTCImplementation::takeIn(std::uint64_t aNumber, const std:
     } else if (lTaker.getOutcome() != ZTRO_ScopeData) {
         lTaken.mProblem = lFrame + "the response holds no scope data";
     } else if (lUnreadBytes != 0) {
-        lTaken.mProblem = lFrame + std::to_string(lUnreadBytes) + " bytes stand behind the last record";
+        lTaken.mProblem = lFrame + std::to_string(lUnreadBytes) + " bytes follow the last record";
     }
     lrOpen.mInsertFrame.run(aNumber, lGeneration, aNow, aBody.size(), lTaken.mRecords, lTaken.mOccurrences,
                             aIsTorn ? 1 : 0);

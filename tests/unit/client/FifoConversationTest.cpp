@@ -101,7 +101,7 @@ TEST(FifoConversation, FifosThatNobodyReadsAreAnOutcomeWithAName) {
     ZTCFifoConversation lConversation(lDirectory.path());
     const auto [lReason, lText] = sFailureOf([&] { lConversation.connect(sMoment()); });
     EXPECT_EQ(lReason, ZTNA_NobodyListens);
-    EXPECT_THAT(lText, HasSubstr("nobody listens on " + lDirectory.path("qrvtvkcmd.fifo")));
+    EXPECT_THAT(lText, HasSubstr("no process listens on " + lDirectory.path("qrvtvkcmd.fifo")));
 }
 
 TEST(FifoConversation, AFileInAFifosPlaceIsRefusedAndKept) {

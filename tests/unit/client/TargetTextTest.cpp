@@ -30,7 +30,7 @@ TEST(TargetText, NamesThePartThatIsWrong) {
     EXPECT_THAT([] { parseTarget("a,b"); },
                 ThrowsMessage<ZTCBadInputEx>(AllOf(HasSubstr("2 parts"), HasSubstr("a,b"))));
     EXPECT_THAT([&] { parseTarget(std::string("x,") + scPort + ",1"); },
-                ThrowsMessage<ZTCBadInputEx>(HasSubstr("\"x\" is no world wide name")));
+                ThrowsMessage<ZTCBadInputEx>(HasSubstr("\"x\" is not a world wide name")));
     EXPECT_THAT([&] { parseTarget(lNames + "0x1000000"); },
                 ThrowsMessage<ZTCBadInputEx>(AllOf(HasSubstr("0x1000000"), HasSubstr("16777215"))));
     EXPECT_THAT([&] { parseTarget(lNames + "12z"); }, ThrowsMessage<ZTCBadInputEx>(HasSubstr("\"12z\"")));

@@ -229,7 +229,7 @@ TEST(ControlSocket, RefusesAnotherKindOfFileUntouched) {
     const ZTCTemporaryDirectory lDirectory;
     const std::string lPath = lDirectory.path("s");
     writeFile(lPath, "precious");
-    EXPECT_EQ(sRefusal(lPath), lPath + ": exists and is no socket");
+    EXPECT_EQ(sRefusal(lPath), lPath + ": exists and is not a socket");
     EXPECT_EQ(readFile(lPath), "precious");
 }
 

@@ -106,7 +106,7 @@ TEST_F(EntryPoints, AScenarioThatIsNotThereIsRefused) {
     EXPECT_EQ(mErrors, lPath + ": No such file or directory\n");
     ::setenv("KPM_SIM_SCENARIO", mDirectory.path().c_str(), 1);
     EXPECT_EQ(init(), ZTLST_NoScenario);
-    EXPECT_EQ(mErrors, mDirectory.path() + ": is no regular file\n");
+    EXPECT_EQ(mErrors, mDirectory.path() + ": is not a regular file\n");
 }
 
 TEST_F(EntryPoints, InitFailsAsToldAndCanBeCalledAgain) {
@@ -160,7 +160,7 @@ TEST_F(EntryPoints, ASocketThatCannotBeMadeFailsInit) {
     writeFile(mDirectory.path("file"), "");
     ::setenv("KPM_SIM_SOCKET", mDirectory.path("file").c_str(), 1);
     EXPECT_EQ(init(), ZTLST_NoSocket);
-    EXPECT_EQ(mErrors, mDirectory.path("file") + ": exists and is no socket\n");
+    EXPECT_EQ(mErrors, mDirectory.path("file") + ": exists and is not a socket\n");
     EXPECT_EQ(mrList.GetNumberOfAdapters(), 0u);
 }
 
