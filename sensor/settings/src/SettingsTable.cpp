@@ -46,8 +46,8 @@ std::span<const ZTSKey> settingsTable() {
          "Holds the history (history.db) and the spool. Do not delete it."},
 
         {"collect", "period", &S::mCollectPeriod, sSeconds(0.1, 3600), "5.0",
-         "Time between two retrievals from the agent. When many events come, the agent asks for an\n"
-         "earlier one."},
+         "How often the collector looks whether the agent holds events, and retrieves them. When many events\n"
+         "come, the agent asks for an earlier look."},
         {"collect", "record_limit", &S::mCollectRecordLimit, sCount(0, scMostOf32Bits), "900",
          "Most bytes of event data in one record."},
 

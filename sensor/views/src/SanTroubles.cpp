@@ -17,73 +17,75 @@ static constexpr std::array<ZTSSanTroubleRow, ZTST_Count> scTable{{
      .mpId = "lun-without-path",
      .mpTitle = "NO PATH",
      .mpAction = "See which links and ports are down;  tavik paths --trouble",
-     .mpMeans = "No path of a LUN runs. I/O to it fails, or waits where multipath queues it.",
-     .mpCauses = "All its ports or links are down; the array took the LUN away while it was in use; the last path "
-                 "was set offline.",
-     .mpLookAt = "Whether links or remote ports are down as well: these troubles stand beside it. If all are up, look "
-                 "at the array: is the LUN still mapped to this host?"},
+     .mpMeans = "No path of a LUN works. I/O to it fails, or waits if multipath queues it.",
+     .mpCauses = "All its ports or links are down, the array removed the LUN while it was in use, or somebody set the "
+                 "last path offline.",
+     .mpLookAt = "Check whether links or remote ports are down too: they are reported as troubles of their own. If all "
+                 "are up, look at the array: is the LUN still mapped to this host?"},
     {.mKind = ZTST_RedundancyLost,
      .mpId = "redundancy-lost",
      .mpTitle = "REDUNDANCY LOST",
      .mpAction = "Mend the cause before the next fault;  tavik paths --trouble",
-     .mpMeans = "I/O goes on, but over one path, one initiator or one remote port where there were more. The next "
-                "fault there stops it.",
-     .mpCauses = "A link or a fabric is down; a controller of the array is down; only one of several paths was "
-                 "brought back after a maintenance.",
-     .mpLookAt = "The links and remote ports that are down. Paths are compared with the most that the LUN had, as far "
-                 "back as the history reaches. Where fewer are meant from now on: tavik mark baseline."},
+     .mpMeans = "I/O goes on, but only one path, one initiator or one remote port is left, and there were more before. "
+                "The next fault there stops I/O.",
+     .mpCauses = "A link, a fabric or a controller of the array is down, or only one of several paths was brought back "
+                 "after a maintenance.",
+     .mpLookAt =
+         "Look at the links and remote ports that are down. The number of paths is compared with the largest number "
+         "that the LUN had in the whole history. If it is to have fewer from now on, run: tavik mark baseline"},
     {.mKind = ZTST_LinkDown,
      .mpId = "link-down",
      .mpTitle = "LINK DOWN",
      .mpAction = "Look at PORT's cable and transceiver, then at the switch's port.",
-     .mpMeans = "An adapter's port has no link. Everything behind it is out of reach through this port.",
-     .mpCauses = "The cable or a transceiver; the switch's port is disabled or down; nothing is plugged in.",
-     .mpLookAt = "The light at both ends and the switch's port. Counters of the port for loss of signal and CRC errors "
-                 "tell a bad cable or transceiver from a port that was switched off."},
+     .mpMeans = "A port of an adapter has no link. Nothing can be reached through it.",
+     .mpCauses = "The cable or a transceiver is bad, the switch's port is disabled or down, or nothing is plugged in.",
+     .mpLookAt =
+         "Look at the light at both ends and at the switch's port. If the port's counters of loss of signal and CRC "
+         "errors rose, the cable or a transceiver is bad. If they did not, the port was probably switched off."},
     {.mKind = ZTST_PathLost,
      .mpId = "path-lost",
      .mpTitle = "PATH LOST",
      .mpAction = "Look at PORT on the array and the switch, then at its zone.",
-     .mpMeans = "A remote port that this host knew is not Online. Blocked: it has just gone, and I/O to it waits. Not "
-                "Present: it stayed away, and the kernel has removed its paths.",
-     .mpCauses = "The array's port or controller is down or restarts; the switch's port of the array; a change of the "
-                 "zones.",
-     .mpLookAt = "Whether other ports of the same array are still reached: then it is this port and not the fabric. "
-                 "Whether other hosts lost it as well: then it is not this host's zone."},
+     .mpMeans = "A remote port that this host knew is not Online. Blocked means that it has just disappeared, and I/O "
+                "to it waits. Not Present means that it did not come back, and the kernel has removed its paths.",
+     .mpCauses = "The array's port or controller is down or restarting, the array's port on the switch is down, or the "
+                 "zones were changed.",
+     .mpLookAt = "Check whether other ports of the same array are still reached: then the cause is this port and not "
+                 "the fabric. Check whether other hosts lost the port too: then the cause is not this host's zone."},
     {.mKind = ZTST_RedundancyReduced,
      .mpId = "redundancy-reduced",
      .mpTitle = "REDUNDANCY REDUCED",
      .mpAction = "tavik paths --trouble",
-     .mpMeans = "Paths of a LUN do not run although their link and their remote port are up.",
-     .mpCauses = "The kernel or a person set a device offline; a LUN is not mapped to all of the array's ports; a "
-                 "path was deleted and not scanned anew.",
-     .mpLookAt = "The state of the devices. The kernel sets one offline after errors that it could not recover from: "
-                 "its log says why. A scan of the host finds paths that were deleted. Where fewer paths are meant from "
-                 "now on: tavik mark baseline."},
+     .mpMeans = "Paths of a LUN do not work, although their link and their remote port are up.",
+     .mpCauses = "The kernel or a person set a device offline, the LUN is not mapped to all ports of the array, or a "
+                 "path was deleted and not scanned again.",
+     .mpLookAt = "Look at the state of the devices. The kernel sets a device offline after errors from which it could "
+                 "not recover. Its log says why. A scan of the host finds paths that were deleted. If there are to be "
+                 "fewer paths from now on, run: tavik mark baseline"},
     {.mKind = ZTST_InitiatorWithoutPath,
      .mpId = "initiator-without-path",
      .mpTitle = "INITIATOR WITHOUT PATH",
      .mpAction = "Look at PORT's zone on the switch, and at this host's entry on the array.",
-     .mpMeans = "An adapter's port is Online, and no LUN is reached through it, while others reach some.",
-     .mpCauses = "Its zone is missing or wrong; the array does not know its WWPN; its LUNs are not mapped.",
-     .mpLookAt = "Whether it sees remote ports at all. None: the zone. Some, but no LUN: the array's entry of this "
-                 "host."},
+     .mpMeans = "A port of an adapter is Online, but no LUN is reached through it. Other ports reach LUNs.",
+     .mpCauses = "Its zone is missing or wrong, the array does not know its WWPN, or its LUNs are not mapped.",
+     .mpLookAt = "Check whether it sees remote ports. If it sees none, look at the zone. If it sees some but no LUN, "
+                 "look at the array's entry for this host."},
     {.mKind = ZTST_Flapping,
      .mpId = "flapping",
      .mpTitle = "FLAPPING",
      .mpAction = "Look at PORT's cable, transceivers and switch port;  tavik events --since 1h",
-     .mpMeans = "A link or a remote port went away and came back at least twice in the last hour.",
-     .mpCauses = "A bad cable or transceiver; a port at a wrong speed; a controller that restarts again and again.",
-     .mpLookAt = "Counters of CRC errors and loss of signal at both ends. Where only one of several remote ports does "
-                 "it, the far end."},
+     .mpMeans = "A link or a remote port disappeared and came back at least twice in the last hour.",
+     .mpCauses = "A cable or a transceiver is bad, a port has a wrong speed, or a controller restarts again and again.",
+     .mpLookAt = "Look at the counters of CRC errors and loss of signal at both ends. If only one of several remote "
+                 "ports flaps, look at its end."},
     {.mKind = ZTST_UselessPort,
      .mpId = "port-without-path",
      .mpTitle = "UNUSED PORT",
      .mpAction = "Map LUNs to it on the array, or take it out of the zone;  tavik paths",
-     .mpMeans = "A target port is Online and zoned to this host, and no LUN is reached through it. Nothing has become "
-                "worse: a notice.",
-     .mpCauses = "The array maps nothing to this host on that port; the devices were deleted and not scanned anew.",
-     .mpLookAt = "Whether it should contribute: the more paths are counted on, the more a port matters that has none."},
+     .mpMeans = "A target port is Online and zoned to this host, but no LUN is reached through it. This is only a "
+                "notice, because nothing has become worse.",
+     .mpCauses = "The array maps no LUN to this host on that port, or the devices were deleted and not scanned again.",
+     .mpLookAt = "Decide whether the port should be used. If the LUNs need its paths, map LUNs to it."},
 }};
 
 std::span<const ZTSSanTroubleRow> getSanTroubleTable() {
