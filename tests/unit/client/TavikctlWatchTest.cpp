@@ -62,6 +62,33 @@ TEST_F(TavikctlWatch, GoesOnThroughAMissingAgentAndStartsItsSuccessor) {
     EXPECT_THAT(lWatch.standardOutput(), HasSubstr("-- retrieval 2\n"));
 }
 
+TEST_F(TavikctlWatch, AnAgentThatComesLateIsStartedAndAskedOnlyAfterAnInterval) {
+    ZTCChildProcess lWatch(setup({"watch", "--interval", "3600", "--timeout", "0.2"}));
+    waitUntil([&] { return lWatch.standardError().find("no agent") != std::string::npos; }, "the message");
+    writeFile(dir() + "/qrv-tvk.pid", "1001\n");
+    const ZTCFakeAgent lAgent(dir(), {sServing()});
+    waitUntil([&] { return lWatch.standardError().find("answers") != std::string::npos; }, "the end of the outage");
+    EXPECT_EQ(lAgent.getRequests(), std::vector<ZTCWireBytes>{encodeStartScope(900)});
+    lWatch.sendSignal(SIGTERM);
+    EXPECT_EQ(lWatch.waitForExit(), 0) << lWatch.standardError();
+}
+
+TEST_F(TavikctlWatch, BytesThatWereThrownAwayAreReportedOnce) {
+    ZTCFakeAgent lAgent(dir(), {sServing()});
+    lAgent.refusePeriodOfZero();
+    // Bytes stay in a FIFO as long as somebody has it open.
+    const ZTCFileDescriptor lReader =
+        ZTCFileDescriptor::open((dir() + "/qrvtvkout.fifo").c_str(), O_RDONLY | O_NONBLOCK);
+    const ZTCFileDescriptor lWriter =
+        ZTCFileDescriptor::open((dir() + "/qrvtvkout.fifo").c_str(), O_WRONLY | O_NONBLOCK);
+    ASSERT_EQ(write(lWriter.get(), "stale", 5), 5);
+    const ZTSFinishedRun lRun = run({"watch", "--interval", "0.05", "--count", "3"});
+    EXPECT_EQ(lRun.mStatus, 0) << lRun.mErrors;
+    const std::size_t lFirst = lRun.mErrors.find("threw away 5 bytes");
+    ASSERT_NE(lFirst, std::string::npos) << lRun.mErrors;
+    EXPECT_EQ(lRun.mErrors.find("threw away", lFirst + 1), std::string::npos) << lRun.mErrors;
+}
+
 TEST_F(TavikctlWatch, ASecondOneIsRefused) {
     ZTCChildProcess lWatch(setup({"watch"}));
     waitUntil([&] { return readFile(dir() + "/qrv-sn.pid") == std::to_string(lWatch.getPid()) + "\n"; },

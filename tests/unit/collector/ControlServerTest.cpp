@@ -99,6 +99,16 @@ TEST_F(ControlServerTest, AClientThatSaysNothingIsDisconnected) {
     EXPECT_EQ(take(lClient), "EOF");
 }
 
+TEST_F(ControlServerTest, AClientThatGoesOnAskingStaysConnected) {
+    const ZTCFileDescriptor lClient = connectClient();
+    for (int i = 0; i < 5; ++i) {
+        put(lClient, "one\n");
+        serve();
+        EXPECT_EQ(take(lClient), "<one>\n");
+        mAhead += gcControlPatience - seconds(1);
+    }
+}
+
 TEST_F(ControlServerTest, AClientThatTakesNoAnswerIsDisconnectedAndHoldsNobodyUp) {
     const ZTCFileDescriptor lGreedy = connectClient();
     const std::string lLine = std::string(4000, 'x') + "\n";

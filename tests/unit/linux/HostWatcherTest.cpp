@@ -36,6 +36,17 @@ TEST_F(HostWatcher, ItsVersionChangesWithTheBoardsAndOnlyThen) {
     EXPECT_NE(mWatcher.getVersion(), lOne);
 }
 
+TEST_F(HostWatcher, AfterAMessageOfALinkTheNamesOfItsRemotePortsAreReadAnew) {
+    mKernel.addHost(0);
+    mWatcher.look();
+    mKernel.addTarget(0, 0, 5, portNameText(0x55));
+    const HBA_wwn lFormer = mWatcher.findRemotePort(0, 0, 5);
+    mKernel.addTarget(0, 0, 5, portNameText(0x66));
+    EXPECT_TRUE(isSameName(mWatcher.findRemotePort(0, 0, 5), lFormer)) << "it is kept";
+    mWatcher.noteLinkMessage(0, false);
+    EXPECT_FALSE(isSameName(mWatcher.findRemotePort(0, 0, 5), lFormer));
+}
+
 TEST_F(HostWatcher, HostsThatCannotBeReadAreAFailureThatEndsWithTheNextGoodLook) {
     mKernel.addHost(0);
     mWatcher.look();

@@ -70,6 +70,18 @@ TEST_F(SharedFile, GrowsByZerosAndKeepsItsContentAndNeverFaultsAReader) {
     close(lReader);
 }
 
+TEST_F(SharedFile, IsMappedOnceHoweverOftenItGrows) {
+    mFile.make(mPath.c_str(), 100);
+    mFile.publish();
+    for (const std::size_t lSize : {10000u, 100000u, 1000000u}) {
+        mFile.grow(lSize);
+    }
+    const std::string lMappings = readFile("/proc/self/maps");
+    const std::size_t lFirst = lMappings.find(mPath);
+    ASSERT_NE(lFirst, std::string::npos);
+    EXPECT_EQ(lMappings.find(mPath, lFirst + 1), std::string::npos);
+}
+
 TEST_F(SharedFile, StaysWhenItsOwnerGoes) {
     {
         ZTCSharedFile lFile;

@@ -69,6 +69,20 @@ TEST_F(LedgerTest, ALaterPageReplacesAnEarlierOneAlsoAfterARestart) {
     EXPECT_EQ(row().mHeld, 9U);
 }
 
+TEST_F(LedgerTest, WhateverHasChangedOnThePageIsStored) {
+    ZTSPageCounts lCounts = counts(10, 1, 5, 4);
+    note(gcGeneration, lCounts);
+    lCounts.mDropped = 2;
+    note(gcGeneration, lCounts);
+    EXPECT_EQ(row().mDropped, 2U);
+    lCounts.mHeld = 3;
+    note(gcGeneration, lCounts);
+    EXPECT_EQ(row().mHeld, 3U);
+    lCounts.mRefused[ZTRF_Failed] = 7;
+    note(gcGeneration, lCounts);
+    EXPECT_EQ(row().mRefused[ZTRF_Failed], 7U);
+}
+
 TEST_F(LedgerTest, AnAgentThatEndsInOrderWithNothingMissingLeavesNoGap) {
     take({makeQueueFull(gcPortA, gcBase, gcBase, 10)});
     note(gcGeneration, counts(10, 0, 10, 0));
