@@ -48,6 +48,25 @@ TEST_F(EvidenceWindow, EpisodesThatOverlapTheTimeAreEvidence) {
     EXPECT_EQ(lWindow.mEvidence.mEpisodes[0].mFirst, at(10));
 }
 
+TEST_F(EvidenceWindow, OfTooManyEpisodesTheNewestCountAndTheTimeBeginsWithThem) {
+    std::vector<ZTSTestRecord> lRecords;
+    for (std::uint64_t i = 0; i <= gcMostEvidenceEpisodes; ++i) {
+        const std::int64_t lTime = gcBase + gcMinute + static_cast<std::int64_t>(i);
+        lRecords.push_back(makeQueueFull(gcPortA + i, lTime, lTime));
+    }
+    take(lRecords);
+    const ZTSEvidenceWindow lWindow = gather(0, 60);
+    EXPECT_TRUE(lWindow.mIsCut);
+    EXPECT_THAT(lWindow.mEvidence.mEpisodes, SizeIs(gcMostEvidenceEpisodes));
+    EXPECT_EQ(lWindow.mEvidence.mFrom, fromMicroseconds(gcBase + gcMinute + 1)) << "the oldest one is left out";
+}
+
+TEST_F(EvidenceWindow, ARunThatGoesOnBehindTheTimeCountsAsFarAsTheTimeGoes) {
+    inTransaction([&] { store().beginRun(at(10)); });
+    inTransaction([&] { store().noteRunning(at(60)); });
+    EXPECT_EQ(gather(0, 20).mNotRunning, std::chrono::minutes(10));
+}
+
 TEST_F(EvidenceWindow, OnlyTheLatestStateOfAKindCountsAndListeningIsNone) {
     inTransaction([&] { store().beginRun(at(0)); });
     noteStates(0, {{gcLink, ZTKST_Off}, {gcRscn, ZTKST_NoRights}, {gcPlogi, ZTKST_NoSource}});
