@@ -22,8 +22,8 @@
 
 namespace {
 
-/// One delivered event, until it is decided what becomes of it. Each counts once on the status page: the system counts
-/// what is consolidated, this object everything else. An RSCN counts as so many events as it has pages, once that is
+/// One delivered event, until its outcome is decided. Each event counts once on the status page: the system counts
+/// those that it consolidates, this object all others. An RSCN counts as one event for each page, once its pages are
 /// known.
 class ZTCEventOutcome {
 public:
@@ -299,8 +299,8 @@ const ZTCPointer<ZTCScopeEvent>* sMakeKind(unsigned char aCategory, unsigned cha
     return lpKind;
 }
 
-/// The kind of an event, whose slot is given. It never changes, so that all events and records of one pair share it,
-/// from the first event on; a pair of no slot has its kind anew each time, in arHolder. Throws ZTCNoMemoryEx.
+/// The kind of the events of this slot. It never changes: all events and records of one pair share it. A pair without a
+/// slot gets a new kind each time, in arHolder. Throws ZTCNoMemoryEx.
 const ZTCPointer<ZTCScopeEvent>& sGetKind(unsigned int aSlot, unsigned char aCategory, unsigned char aSubcategory,
                                           ZTCPointer<ZTCScopeEvent>& arHolder)
     ZT_REQUIRES(gpTavikSystem->getPrevDataLock()) {

@@ -2,7 +2,7 @@
 
 #include <algorithm>
 
-/// Inserts where the times stay in order; behind those of the same time.
+/// Inserts in the order of the times, behind entries of the same time.
 template <class Entry>
 static void sInsert(std::vector<Entry>& arEntries, const Entry& acrEntry) {
     const auto lPlace =
@@ -11,7 +11,7 @@ static void sInsert(std::vector<Entry>& arEntries, const Entry& acrEntry) {
     arEntries.insert(lPlace, acrEntry);
 }
 
-/// So that taking needs no memory: an outcome that was accepted is handed on, whatever happens.
+/// Reserves memory, so that taking needs none: an outcome that was accepted is always handed on.
 void ZTCSenseMatcher::makeRoom() {
     if (mReady.capacity() <= mHeld) {
         mReady.clear();

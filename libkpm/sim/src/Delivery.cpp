@@ -15,7 +15,7 @@ static void sStore(std::vector<std::uint8_t>& arData, const ZTSSimField& acrFiel
     std::memcpy(arData.data() + acrField.mOffset, acrName.wwn, sizeof acrName.wwn);
 }
 
-/// What the defaults of an event's fields are made from.
+/// The defaults of an event's fields are made from these.
 struct ZTSSimSurroundings {
     const ZTSSimPort* mpLocal;
     const ZTSSimPort* mpRemote;

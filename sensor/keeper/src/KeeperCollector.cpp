@@ -10,9 +10,9 @@ using std::chrono::seconds;
 
 /// A collector that migrates a large history needs its time before its first look.
 static constexpr seconds scFirstLookLimit{600};
-/// With it a collector says that another try changes nothing.
+/// The exit status of a collector for which another try would change nothing.
 static constexpr int scRefusedStatus = 2;
-/// For an agent that was shut down to end, before it gets SIGTERM.
+/// How long an agent that was shut down may take to end before it gets SIGTERM.
 static constexpr seconds scAlonePause{5};
 
 void ZTCKeeper::startCollector(ZTCTime aNow) {
@@ -156,7 +156,7 @@ void ZTCKeeper::handleMessage(ZTCTime aNow, const ZTSLinkMessage& acrMessage) {
     handleTime(aNow);
 }
 
-/// Without a collector nobody drains: what is left in a FIFO is kept for the next one, and nothing else.
+/// Without a collector nobody drains. Ended agents are kept for the next one only if bytes are left in their FIFO.
 void ZTCKeeper::forgetDrained() {
     if (!mCollector) {
         std::erase_if(mEndedAgents,

@@ -18,7 +18,7 @@ using std::chrono::steady_clock;
 
 /// Between two looks at the history while somebody waits for changes.
 static constexpr seconds scFeedPeriod{1};
-/// Between two writings of the metrics file; node_exporter is scraped that often at most.
+/// Between two writings of the metrics file. node_exporter is hardly ever scraped more often.
 static constexpr seconds scMetricsPeriod{15};
 /// Between two tries to listen.
 static constexpr seconds scServerPause{10};
@@ -85,7 +85,7 @@ void ZTCOutlets::wake() {
         const std::lock_guard lLock(mMutex);
         mHasWork = true;
     }
-    mWake.notify_all();  // behind the lock: the thread would wake up twice
+    mWake.notify_all();  // after the lock: a thread that wakes up need not wait for it
 }
 
 unsigned ZTCOutlets::getPort() const {
@@ -108,7 +108,7 @@ void ZTCOutlets::run() {
     mpServer.reset();
 }
 
-/// False: it is over. Nobody is woken where nothing is to be fed.
+/// Sleeps while there is nothing to feed. False: the thread is to end.
 bool ZTCOutlets::waitForWork() {
     const bool lHasReaders = mpServer != nullptr && mpServer->hasStreams();
     std::unique_lock lLock(mMutex);
@@ -228,8 +228,8 @@ void ZTCOutlets::feedHistory() {
     }
 }
 
-/// A port that was shown with a series of its own must never be counted among the others later: who asks first decides,
-/// for all.
+/// A port that was shown with a series of its own keeps it, and is never counted among the others later. So the first
+/// answer that shows a port decides for all.
 void ZTCOutlets::giveSeries(ZTSMetricFacts& arFacts) {
     const std::lock_guard lLock(mMutex);
     if (mSeriesStoreId != arFacts.mStatus.mHistory->mStoreId) {
@@ -342,7 +342,7 @@ void ZTCOutlets::feed(ZTSFedOutlet& arOutlet) {
             mProblems.note(arOutlet.mpOutlet->getTitle(), lrEx.what());
             return;
         }
-        // They are out: what is stored too late only makes them come twice.
+        // They are written. Where the number is stored too late they are only written again.
         arOutlet.mSeq = lChanges.back().mEpisode.mSeq;
         mSetup.mSetValue(getOutletValue(lName, "seq"), std::to_string(*arOutlet.mSeq));
     }

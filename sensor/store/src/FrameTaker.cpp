@@ -5,7 +5,7 @@
 
 #include "sensor/store/src/ReceivedTime.h"
 
-/// Of a record's category and subcategory: behind its count and its two times.
+/// Where a record's category and subcategory begin: behind its count and its two times.
 static constexpr std::size_t scKindOffset = 44;
 /// The names in an RSCN record may be stale.
 static constexpr ZTCKindKey scRscn = makeKindKey(1, 0x20);
@@ -52,8 +52,8 @@ std::uint32_t ZTCFrameTaker::findPort(const ZTSRecordView& acrRecord, const ZTSK
 
 void ZTCFrameTaker::visitRecord(const ZTSRecordView& acrRecord) {
     ZTSEpisodeKey lKey;
-    // From the wire's bytes: the view's two fields have just been stored one by one, and one load of both would wait
-    // for that (an eighth of the time of all this).
+    // Read from the wire's bytes: the view's two fields were just stored one by one, and one load of both would wait
+    // for the stores (an eighth of the whole time).
     lKey.mKind = makeKindKey(acrRecord.mBytes[scKindOffset], acrRecord.mBytes[scKindOffset + 1]);
     const ZTSKindShape* lpShape = findKindShape(lKey.mKind);
     if (lpShape != nullptr) {

@@ -140,7 +140,7 @@ static void sCompare(const ZTSThingRow& acrBefore, const ZTSThingRow& acrAfter,
 
 std::vector<ZTSTopologyChange> ZTCHistory::readTopologyChanges(std::int64_t aFrom, std::int64_t aTo) const {
     ZTCDatabase& lrDatabase = mpImplementation->mDatabase;
-    // What the very first scan found was there before.
+    // Things that the very first scan found are no changes: they were there before.
     ZTCStatement lFirstScan(lrDatabase, HistoryQueries::gcFirstScan);
     const std::int64_t lFirst = lFirstScan.query().step() ? lFirstScan.number(0) : 0;
     lFirstScan.reset();
@@ -155,7 +155,7 @@ std::vector<ZTSTopologyChange> ZTCHistory::readTopologyChanges(std::int64_t aFro
                 ZTSThingRow lRow = sReadRow(lRows);
                 const std::int64_t lFrom = lRow.mFrom;
                 auto& lrVersions = lThings[{lRow.mThing.mThing, lRow.mThing.mKey}];
-                // Two of one begin: the earlier row lasted for no time, since the clock was set back.
+                // Two versions with one begin: the clock was set back, and the earlier row lasted for no time.
                 const auto lKnown = lrVersions.find(lFrom);
                 if (lKnown == lrVersions.end() || lKnown->second.mId < lRow.mId) {
                     lrVersions.insert_or_assign(lFrom, std::move(lRow));
@@ -248,7 +248,7 @@ struct ZTSPathTurn {
 
 std::map<std::string, ZTSLunWays> ZTCHistory::readMostWays(std::int64_t aFrom, std::int64_t aTo) const {
     ZTCDatabase& lrDatabase = mpImplementation->mDatabase;
-    // Where a remote port's name stood for several ports they count as one: that expects too little, never too much.
+    // Ports that had the same name count as one. So too few ways may be expected, but never too many.
     std::map<std::string, std::string> lPortNames;
     ZTSTopology lVersions;
     std::vector<ZTSPathTurn> lTurns;

@@ -4,8 +4,8 @@
 
 #include "sensor/topology/include/PatientReader.h"
 
-/// The time of the last scan is written this often while nothing changes, and scans that lie further apart are two
-/// stretches of scanning.
+/// While nothing changes, the time of the last scan is written this often. Scans that lie further apart belong to two
+/// stretches.
 static constexpr std::int64_t scScanWriteMicroseconds = 60'000'000;
 static constexpr std::int64_t scScanPauseMicroseconds = 5 * scScanWriteMicroseconds;
 
@@ -44,7 +44,7 @@ void ZTCTopologyBook::keepUnread(ZTSThing& arThing, const ZTSTopology& acrTopolo
     }
     auto lFound = mOpen.find({arThing.mThing, arThing.mKey});
     if (lFound == mOpen.end() && arThing.mThing == ZTTT_RemotePort) {
-        // Its WWPN, which is part of the key, may be what could not be read.
+        // Its WWPN is part of the key, and may be the value that could not be read.
         lFound = mOpen.lower_bound({ZTTT_RemotePort, lName + " "});
         if (lFound == mOpen.end() || !lFound->first.second.starts_with(lName + " ")) {
             return;

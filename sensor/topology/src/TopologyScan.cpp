@@ -13,7 +13,7 @@
 #include "sensor/topology/src/MountTable.h"
 #include "sensor/topology/src/SysfsFiles.h"
 
-/// Devices on devices: a bound for trees that lead in a circle.
+/// Most devices that are followed from one disk: a tree may lead in a circle.
 static constexpr std::size_t scMostHolders = 256;
 
 static std::string sReadLink(const std::string& acrPath) {

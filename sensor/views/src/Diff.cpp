@@ -141,7 +141,7 @@ std::vector<ZTSDiffChange> compareTopologies(const ZTSTopology& acrBefore, const
 
 // ---- what came and went in between ----
 
-/// What a change of the store is about: a link, a remote port or a path that is there at both ends, by its place now.
+/// Finds the subject of a stored change: a link, a remote port or a path that is there at both ends, by its place now.
 class ZTCPassingFinder {
 public:
     explicit ZTCPassingFinder(const ZTSTopology& acrNow) {

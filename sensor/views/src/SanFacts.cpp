@@ -252,7 +252,7 @@ private:
             const std::vector<std::size_t> lLuns = findSufferers(lrPort.mHost, lrPort.mWwpn->toText());
             explain(lLuns);
             ZTSSanTrouble& lrTrouble = findOrAdd(ZTST_PathLost, lrPort);
-            // The kernel keeps what it knew of a port until the next start: one that was away all the time is past.
+            // The kernel remembers a port until the next start. One that was away all the time is no warning.
             if (mrPast.mEarlier.empty() || !lLuns.empty() || wasUp(lrPort)) {
                 lrTrouble.mSeverity = ZTSS_Warning;
             }

@@ -20,8 +20,9 @@
 static constexpr int scReport = 3;
 /// Above these, so that none is overwritten while they are put into their places.
 static constexpr int scFirstSpare = 10;
-/// Between two looks for processes that were killed, and for how long they are looked for: seconds.
+/// The pause between two looks for processes that were killed.
 static constexpr timespec scLookPeriod{.tv_sec = 0, .tv_nsec = 20'000'000};
+/// The seconds for which such processes are looked for.
 static constexpr time_t scEndPatience = 2;
 
 static constexpr int scNotExecuted = 127;
@@ -43,7 +44,7 @@ static void sPlaceDescriptors(const ZTSHookPlan& acrPlan) {
     syscall(SYS_close_range, scReport + 1, ~0U, 0);
 }
 
-/// The hook's own process. Its start is reported by the pipe's end, or by an errno in it.
+/// The hook's own process. The pipe's end reports that it runs; an errno in the pipe says why it does not.
 [[noreturn]] static void sExecute(const ZTSHookPlan& acrPlan, int aStart) {
     setpgid(0, 0);
     for (int lSignal = 1; lSignal < NSIG; ++lSignal) {
@@ -58,7 +59,7 @@ static void sPlaceDescriptors(const ZTSHookPlan& acrPlan) {
     _exit(scNotExecuted);
 }
 
-/// Kills the children of this process: what its killed children leave becomes its own.
+/// Kills the children of this process. The children that a killed one leaves become its own.
 static void sKillChildren() {
     const int lFile = open("/proc/thread-self/children", O_RDONLY | O_CLOEXEC);
     std::array<char, 4096> lBytes;
