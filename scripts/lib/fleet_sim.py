@@ -1,8 +1,8 @@
 """Serves the metrics of many simulated hosts from one process, lets a real Prometheus scrape them, and measures that.
 
-Each host is a state machine of its own, from the seed and its number: its array ports are quiet or busy, and its links now and then
-change. Hosts share the ports of arrays. Every metric that makes many series is there, with realistic label sets; a real sensor has
-some twenty series more: the rest of tavik_state, tavik_luns and tavik_open_warnings. Called by scripts/fleet-sim.
+Each host is a state machine of its own, made from the seed and the number of the host. Its array ports are quiet or busy, and its links
+change now and then. Hosts share the ports of arrays. Every metric with many series is simulated, with realistic labels. A real sensor
+has about twenty series more: the rest of tavik_state, tavik_luns and tavik_open_warnings. Called by scripts/fleet-sim.
 """
 import http.server
 import json

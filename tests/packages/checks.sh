@@ -1,5 +1,5 @@
-# Shared by what runs in a tree, a container or a virtual machine with the packages: sourced. One line an expectation: ok or
-# FAIL, what was looked at, and of a failure what was expected and what came. gBad is 1 after the first failure.
+# Functions for scripts that test the packages in a tree, a container or a virtual machine: sourced. They print one line for each
+# expectation: ok or FAIL, and what was checked. A failure also prints what was expected and what came. gBad is 1 after a failure.
 gBad=0
 gSensor= # the pid of a sensor that start_sensor started
 

@@ -1,5 +1,5 @@
-# What each line of the unit's sandbox does: sourced, after service-checks.sh. A probe is a command that is run twice, under
-# systemd: with the line alone, and without it. One of the two has to fail. So it is the line that does it, and not another one.
+# Probes for each line of the unit's sandbox: sourced, after service-checks.sh. A probe is a command that is run twice, under
+# systemd: with only this line, and without it. One of the two must fail. This shows that this line has the effect, and no other.
 # The numbers of system calls are those of x86-64.
 
 # run_probe USER COMMAND PROPERTY...: as a service of its own with those properties; the command's status.
@@ -25,7 +25,7 @@ compare_probe() {
   expect "$lLine: $lProbe" "$lExpected" "$lWithout without, $(says_whether "$lProbeUser" "$lProbe" "$@" "$lLine") with it"
 }
 
-# What a container forbids by itself shows nothing of the unit: these are tried out in a virtual machine alone.
+# If a container itself forbids something, a probe shows nothing about the unit. Such probes run only in a virtual machine.
 on_machine() { systemd-detect-virt --quiet --container || "$@"; }
 
 prepare_probes() {

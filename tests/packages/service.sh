@@ -1,6 +1,6 @@
 #!/bin/sh
-# Runs where systemd has booted the tree: the service is installed and started without an adapter; the version before runs over
-# the simulated library and is upgraded; the new one is reloaded, hung, killed and removed. Its sandbox is in force all the time.
+# Runs in a tree that systemd has booted. The service is installed and started without an adapter. The version before runs over the
+# simulated library and is upgraded. The new version is reloaded, made to hang, killed and removed, always within its sandbox.
 # /packages holds before/ and now/.
 set -u
 . /tests/checks.sh

@@ -1,7 +1,7 @@
 #!/bin/sh
-# Runs in a fresh Debian tree in which no systemd runs: the packages are installed and purged; the version before is installed,
-# configured, run over the simulated library with a history of the first schema, and upgraded; the new one is run, removed and
-# purged. /packages holds before/ and now/; what is not the same in both is taken from the packages themselves.
+# Runs in a fresh Debian tree without systemd. The packages are installed and purged. The version before is installed, configured,
+# run over the simulated library with a history of the first schema, and upgraded. The new version is run, removed and purged.
+# /packages has before/ and now/. Values that differ between the two are read from the packages.
 set -u
 . /tests/checks.sh
 export DEBIAN_FRONTEND=noninteractive LC_ALL=C.UTF-8

@@ -161,7 +161,7 @@ def open_highest(browser, wwpn):
 def check_panel(browser):
     """A click on a cell opens all that is known of it."""
     open_highest(browser, "30:00:00:00:00:02:00:00")
-    browser.wait_text("panel-sentence", "array7 ctrl-A port 0 said that its queue is full")
+    browser.wait_text("panel-sentence", "array7 ctrl-A port 0 answered that its queue is full")
     browser.wait_text("panel-explanation", "What speaks against it")
     browser.wait_text("panel-explanation", "Evidence")
     facts = browser.text("panel-facts")
@@ -187,7 +187,7 @@ def check_filter(browser):
     browser.run("document.querySelector('[data-family=load]').click()")
     browser.wait("all kinds", lambda: "queue-full" in browser.run(text))
     browser.keys("find", "no such port")
-    browser.wait_text("chart-empty", "Clear it")
+    browser.wait_text("chart-empty", "Clear the filter")
 
 
 def check_live(browser, inject):

@@ -30,14 +30,14 @@ static constexpr const char* scJournal = "timeout 10 journalctl -u tavik -n 2000
 
 static constexpr const char* scReadMe = R"(This archive was made by 'tavik report'.
 
-settings.txt     what holds: the file and the defaults
+settings.txt     the settings in force, from the file and the defaults
 versions.txt     of tavik, the kernel and the distribution
 status.*         as 'tavik status' shows it; check.txt: 'tavik check'
 paths.json       LUNs with their paths
 history/         the last 7 days: episodes, ports, gaps, changes of the topology, error counters
-sysfs/           what the kernel shows of Fibre Channel ports and SCSI devices
+sysfs/           what the kernel shows about Fibre Channel ports and SCSI devices
 logs/            the end of the agent's log and of the service's messages
-missing.txt      what could not be had, and why
+missing.txt      the parts that are missing, and why
 
 Left out: the configuration file itself with its comments, and the arguments of the programs of [[warn]] tables,
 wherever they occur. In it are: the host's name, names and addresses of ports, names of disks, folders that are mounted.

@@ -61,7 +61,7 @@ function showRates(document) {
 function showChanges(document) {
   const place = element("compare-changes");
   if (document.changes === null) {
-    fillTable(place, ["What"], [], "Not known: no look at this host was stored by both moments.");
+    fillTable(place, ["What"], [], "Not known: no scan of this host was stored before both moments.");
     element("compare-passing").replaceChildren();
     return;
   }
@@ -70,13 +70,13 @@ function showChanges(document) {
     "No link, remote port, LUN or path is different.");
   element("compare-more").textContent = changes.length > mostChanges ? `${plural(changes.length - mostChanges, "more row")}: tavik diff shows them.` : "";
   fillTable(element("compare-passing"), ["What", "Name", "Was in between"], passingRows(document).slice(0, mostChanges),
-    "Nothing that is the same again was different in between.");
+    "No state changed in between and changed back.");
 }
 
 function showSum(document) {
   const rates = document.rates.filter((row) => row.different).length;
   element("compare-sum").textContent = document.same === false ? `Different: ${plural((document.changes ?? []).length, "state")}, ${plural(rates, "rate")}.`
-    : document.same ? `The same: no state and no rate of ${number(document.rates.length)} differs.` : "No rate differs. Of links, ports and paths nothing is known.";
+    : document.same ? `Nothing is different: no state, and none of ${number(document.rates.length)} rates.` : "No rate is different. The links, ports and paths of these moments are not known.";
   const stretches = stretchesOf(document);
   element("compare-spans").textContent = ["Before", "After"]
     .map((name, index) => `${name}: ${span(...stretches[index])} (${duration(stretches[index][1] - stretches[index][0])})`).join(" · ");

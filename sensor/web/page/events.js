@@ -27,9 +27,9 @@ export async function show() {
   try {
     const document = await api.events({ ...filter, limit: most });
     const count = document.episodes.length;
-    element("events-text").textContent = count === most ? `The newest ${number(most)} episodes, the newest first. A filter shows older ones.`
+    element("events-text").textContent = count === most ? `The newest ${number(most)} episodes, the newest first. Use a filter to see older ones.`
       : `${number(count)} ${count === 1 ? "episode" : "episodes, the newest first"}.`;
-    showEpisodes(element("events"), document.episodes.reverse(), "No episode passes the filter. Take a longer time, or fewer conditions.");
+    showEpisodes(element("events"), document.episodes.reverse(), "No episode matches the filter. Choose a longer time, or a wider filter.");
   } catch (problem) {
     element("events-text").textContent = problem.message;
     element("events").replaceChildren();

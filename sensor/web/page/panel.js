@@ -80,7 +80,7 @@ function doubts(model, lane, column) {
   const cell = lane.cells.get(column);
   const blind = whyBlind(model, spanOf(model, column));
   return [
-    ...(blind === "" ? [] : [`Not everything could be seen then: ${blind}.`]),
+    ...(blind === "" ? [] : [`Tavik could not see everything at this time: ${blind}.`]),
     ...(cell?.spread ? [`${number(cell.spread)} of these events may have begun before this column.`] : []),
   ];
 }
@@ -127,7 +127,7 @@ async function fill(model, lane, column, episodes, mine) {
   addFact(facts, "LUNs", set === null ? ["all LUNs"] : set.size === 0 ? [] : [luns({ all: false, numbers: [...set].sort((one, other) => one - other) })]);
   addFact(facts, "Codes", [...new Set(episodes.flatMap(codes))].slice(0, 8));
   addFact(facts, "Speaks against it", doubts(model, lane, column));
-  showEpisodes(element("panel-episodes"), episodes, "No episode lies in this cell.");
+  showEpisodes(element("panel-episodes"), episodes, "There is no episode in this cell.");
   await showDevices(facts, episodes, mine);
   if (episodes.length > 0 && mine === turn) {
     await showExplanation(element("panel-explanation"), episodes[0], mine);

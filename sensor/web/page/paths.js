@@ -62,7 +62,7 @@ function showUnits() {
   const wanted = element("paths-find").value.trim().toLowerCase();
   const shown = units.filter((unit) => (!onlyTrouble || !isWhole(unit)) && (wanted === "" || textOf(unit).includes(wanted)));
   table.fill(["LUN", { text: "Number", number: true }, "Array", "Mounted", { text: "Paths", number: true }, "Redundancy", ...initiators.map(initiatorName)],
-    shown.map(rowOf), units.length === 0 ? "No LUN is known." : "No LUN passes the filter.");
+    shown.map(rowOf), units.length === 0 ? "No LUN is known." : "No LUN matches the filter.");
   element("paths-only").setAttribute("aria-pressed", String(onlyTrouble));
   writeAddress("paths", { find: element("paths-find").value.trim(), only: onlyTrouble ? "trouble" : "" });
 }
@@ -82,7 +82,7 @@ export async function open(parameters) {
   const byKey = new Map(units.flatMap((unit) => unit.paths).map((path) => [keyOf(path.initiator), path.initiator]));
   initiators = [...byKey.values()].sort((one, other) => initiatorName(one).localeCompare(initiatorName(other), "en", { numeric: true }));
   const bad = units.filter((unit) => !isWhole(unit)).length;
-  element("paths-text").textContent = answer.luns === null ? "The paths are not known yet: no look at this host has been stored." : units.length === 0 ? "No LUN is known: no disk of this host hangs on a Fibre Channel port."
+  element("paths-text").textContent = answer.luns === null ? "The paths are not known yet: no scan of this host has been stored." : units.length === 0 ? "No LUN is known: no disk of this host is behind a Fibre Channel port."
     : bad === 0 ? `${plural(units.length, "LUN")}, all with all their paths.` : `${plural(bad, "LUN")} of ${number(units.length)} with trouble.`;
   element("paths-text").className = `headline ${bad > 0 ? "bad" : units.length === 0 ? "" : "good"}`;
   element("paths-known").hidden = units.length === 0;

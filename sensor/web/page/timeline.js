@@ -172,8 +172,8 @@ function showEmpty() {
   const isFiltered = filter.families !== null || filter.text !== "";
   const isFound = filter.text === "" || model.lanes.some(({ type }) => type === "port" || type === "fold");
   element("chart-empty").hidden = model.total > 0 && isFound;
-  element("chart-empty").textContent = isFiltered ? "Nothing in this range passes the filter. Clear it to see the rest."
-    : model.blind.some((stretch) => stretch.isTotal) ? "No event in this range. Where it is hatched, Tavik could not see: look at a longer range."
+  element("chart-empty").textContent = isFiltered ? "Nothing in this range matches the filter. Clear the filter to see the rest."
+    : model.blind.some((stretch) => stretch.isTotal) ? "No event in this range. Where the chart is hatched, Tavik could not see. Look at a longer range."
       : "No event in this range: nothing happened. Look at a longer range for older events.";
 }
 

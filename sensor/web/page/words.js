@@ -9,7 +9,7 @@ const rank = (name) => kinds.indexOf(kindOf(name));
 /** As a word of a command line. */
 export const quote = (text) => (/^[\w.:@/+-]+$/.test(text) ? text : `'${text.replaceAll("'", "'\\''")}'`);
 
-/** "array7 ctrl-A said that its queue is full 20,000 times". */
+/** "array7 ctrl-A answered that its queue is full 20,000 times". */
 export const saysOf = (kind, who, count) => kindOf(kind).says(who, times(count));
 
 /** An episode in one sentence, with the local port that saw it where it is asked for. */
