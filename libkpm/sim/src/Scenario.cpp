@@ -17,7 +17,7 @@ static void sCheckNewName(std::string_view aName, const ZTSSimScenario& acrScena
                   " is not a name: a name begins with a letter, has no comma or colon, and is not all or none");
     }
     if (findSimPort(acrScenario.mAdapters, aName) != nullptr || findSimPort(acrScenario.mPorts, aName) != nullptr) {
-        refuseSim("the name " + quoteSimWord(aName) + " stands twice");
+        refuseSim("the name " + quoteSimWord(aName) + " is given twice");
     }
 }
 

@@ -153,7 +153,7 @@ std::uint32_t readSimBoard(std::string_view aField, std::string_view aText, cons
     }
     const std::uint32_t lBoard = readSimNumber32(aField, aText);
     if (lBoard >= lrAdapters.size()) {
-        refuseSim(nameSimField(aField) + "names the board " + std::to_string(lBoard) + ", but the lines above hold " +
+        refuseSim(nameSimField(aField) + "names the board " + std::to_string(lBoard) + ", but the lines above have " +
                   std::to_string(lrAdapters.size()) + " adapters");
     }
     return lBoard;

@@ -40,10 +40,10 @@ static bool sIsBlank(char aChar) {
 static std::size_t sFindClosingQuote(std::string_view aText, std::size_t aBegin) {
     const std::size_t lClose = aText.find('"', aBegin);
     if (lClose == std::string_view::npos) {
-        refuseSim("the quotation mark in front of " + quoteSimWord(aText.substr(aBegin)) + " has no counterpart");
+        refuseSim("the quotation mark before " + quoteSimWord(aText.substr(aBegin)) + " is not closed");
     }
     if (lClose + 1 < aText.size() && !sIsBlank(aText[lClose + 1])) {
-        refuseSim("behind the quoted " + quoteSimWord(aText.substr(aBegin, lClose - aBegin)) + " there is no blank");
+        refuseSim("there must be a blank after the quoted " + quoteSimWord(aText.substr(aBegin, lClose - aBegin)));
     }
     return lClose;
 }
@@ -88,7 +88,7 @@ void ZTCSimLine::addWord(std::string_view aText, std::size_t& arPlace) {
     }
     for (const auto& [lrName, lrValue] : mFields) {
         if (lrName == lName) {
-            refuseSim(nameSimField(lName) + "stands twice");
+            refuseSim(nameSimField(lName) + "is given twice");
         }
     }
     mFields.emplace_back(lName, lValue);

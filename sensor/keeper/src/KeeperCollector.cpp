@@ -94,7 +94,8 @@ void ZTCKeeper::handleCollectorEnd(ZTCTime aNow, int aWaitStatus) {
 /// No agent has been told to collect: there is nothing to take in.
 void ZTCKeeper::stopRefused(ZTCTime aNow) {
     mrWorld.say(
-        "collector: ended: status 2: the history or the settings cannot be used, see its line: this sensor ends");
+        "collector: ended: status 2: the history or the settings cannot be used, as its last line says; this sensor "
+        "ends");
     mIsRefused = true;
     mIsStopping = true;
     mStoppedAt = aNow;
@@ -150,7 +151,7 @@ void ZTCKeeper::handleMessage(ZTCTime aNow, const ZTSLinkMessage& acrMessage) {
             mrWorld.notify("STATUS=" + mText);
             break;
         default:
-            handleBrokenLink(aNow, "it sends what only a keeper sends");
+            handleBrokenLink(aNow, "it sent a message that only a keeper may send");
             return;
     }
     handleTime(aNow);

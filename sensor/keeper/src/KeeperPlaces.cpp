@@ -23,7 +23,7 @@ std::string ownFolder() {
     std::error_code lError;
     const std::filesystem::path lProgram = std::filesystem::read_symlink("/proc/self/exe", lError);
     if (lError) {
-        throw ZTCSystemCallEx("cannot tell where this program is", lError.value());
+        throw ZTCSystemCallEx("cannot find out where this program is", lError.value());
     }
     return lProgram.parent_path();
 }

@@ -105,7 +105,7 @@ void ZTCWarnBook::judge(ZTCHistoryTime aNow, const std::function<bool(const std:
     }
     if (lIsOverfull && !mIsOverfull) {
         arLines.push_back(std::to_string(gcMostWarnings) +
-                          " troubles are open, the most that are warned of: nobody is warned of more");
+                          " troubles are open, which is the limit: no warning is given for further ones");
     }
     mIsOverfull = lIsOverfull;
 }

@@ -144,7 +144,7 @@ TEST_F(KpmSim, ChecksAScenario) {
     const ZTSToolResult lBad = sRun("check '" + mDirectory.path("f") + "'");
     EXPECT_EQ(lBad.mStatus, 1);
     EXPECT_EQ(lBad.mOutput,
-              mDirectory.path("f") + ":2: board= names the board 0, but the lines above hold 0 adapters\n");
+              mDirectory.path("f") + ":2: board= names the board 0, but the lines above have 0 adapters\n");
 }
 
 TEST_F(KpmSim, ListsEveryKindAndField) {

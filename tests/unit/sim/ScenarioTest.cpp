@@ -186,8 +186,8 @@ INSTANTIATE_TEST_SUITE_P(
         ZTSRefusedLine{"board=0 plogi", "the line begins with \"board=0\", not with a directive or an event kind"},
         ZTSRefusedLine{"plogi lun=1", "plogi has no field \"lun\""},
         ZTSRefusedLine{"plogi often", "plogi does not take the word \"often\""},
-        ZTSRefusedLine{"plogi board=", "board= has no value"}, ZTSRefusedLine{"plogi at=1 at=2", "at= stands twice"},
-        ZTSRefusedLine{"plogi board=2", "board= names the board 2, but the lines above hold 2 adapters"},
+        ZTSRefusedLine{"plogi board=", "board= has no value"}, ZTSRefusedLine{"plogi at=1 at=2", "at= is given twice"},
+        ZTSRefusedLine{"plogi board=2", "board= names the board 2, but the lines above have 2 adapters"},
         ZTSRefusedLine{"plogi board=hba7", "board= names \"hba7\", which is not an adapter of the lines above"},
         ZTSRefusedLine{"plogi board=0,,1", "board= has an empty value in its list"},
         ZTSRefusedLine{"plogi port=disk7",
@@ -226,7 +226,7 @@ INSTANTIATE_TEST_SUITE_P(
         ZTSRefusedLine{"storm count=1 kind=qfull", "kind= names \"qfull\", which is not an event kind"},
         ZTSRefusedLine{"storm count=1 every=3", "storm has no field \"every\""},
         ZTSRefusedLine{"adapter", "adapter needs a name"}, ZTSRefusedLine{"adapter hba2", "adapter needs wwpn="},
-        ZTSRefusedLine{"adapter hba0 wwpn=30:00:00:00:00:00:00:01", "the name \"hba0\" stands twice"},
+        ZTSRefusedLine{"adapter hba0 wwpn=30:00:00:00:00:00:00:01", "the name \"hba0\" is given twice"},
         ZTSRefusedLine{
             "port all",
             "\"all\" is not a name: a name begins with a letter, has no comma or colon, and is not all or none"},
@@ -243,9 +243,9 @@ INSTANTIATE_TEST_SUITE_P(
         ZTSRefusedLine{"register qfull status=1", "\"qfull\" is not an event kind"},
         ZTSRefusedLine{"register plogi board=0", "register needs status="},
         ZTSRefusedLine{"info board=0 status=1 handle=2", "info has no field \"handle\""},
-        ZTSRefusedLine{"plogi \"a b", "the quotation mark in front of \"a b\" has no counterpart"},
-        ZTSRefusedLine{"plogi port=\"a b", "the quotation mark in front of \"a b\" has no counterpart"},
-        ZTSRefusedLine{"plogi port=\"a\"b", "behind the quoted \"a\" there is no blank"},
+        ZTSRefusedLine{"plogi \"a b", "the quotation mark before \"a b\" is not closed"},
+        ZTSRefusedLine{"plogi port=\"a b", "the quotation mark before \"a b\" is not closed"},
+        ZTSRefusedLine{"plogi port=\"a\"b", "there must be a blank after the quoted \"a\""},
         ZTSRefusedLine{"loss \"\" count=1", "there is nothing between the quotation marks"},
         ZTSRefusedLine{"plogi port=\"\"", "port= has no value"},
         ZTSRefusedLine{"state", "state needs an event kind, or all"},
@@ -297,7 +297,7 @@ TEST(Scenario, TextsHaveALimitOfTheirLength) {
 TEST(Scenario, ARefusalShowsAnUnknownFieldCutAndWithoutControlCharacters) {
     EXPECT_EQ(sRefusal("plogi a\x1b[2J="), "a\\x1b[2J= has no value");
     const std::string lLong(1000, 'z');
-    EXPECT_EQ(sRefusal("plogi " + lLong + "=1 " + lLong + "=1"), std::string(40, 'z') + "...= stands twice");
+    EXPECT_EQ(sRefusal("plogi " + lLong + "=1 " + lLong + "=1"), std::string(40, 'z') + "...= is given twice");
 }
 
 TEST(Scenario, AllThreadsTogetherHaveALimit) {
