@@ -171,7 +171,8 @@ void ZTCWarnings::readHistory() {
         if (!mIsLoaded) {
             mIsLoaded = true;
             if (!mpBook->load(mpHistory->getValue(gcWarnBookValue))) {
-                mSetup.mReport("the open troubles in the history cannot be read: their warnings start again from the first");
+                mSetup.mReport(
+                    "the open troubles in the history cannot be read: their warnings start again from the first");
             }
             const std::uint64_t lBefore = std::exchange(mFailures, 0);
             std::istringstream(mpHistory->getValue(mSetup.mFailuresValue)) >> mFailures;
