@@ -57,6 +57,7 @@ struct ZTSBucket {
     std::optional<ZTSRemotePort> mRemotePort;
     std::uint64_t mOccurrences = 0;
     std::uint64_t mSpread = 0;  ///< of these, occurrences of records that began before the bucket
+    ZTCHistoryTime mLast;       ///< of the last event in it
 };
 
 class ZTCHistory {

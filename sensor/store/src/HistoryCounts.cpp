@@ -117,7 +117,8 @@ void ZTCHistory::ZTCImplementation::visitBuckets(const char* apSql, std::int64_t
                            .mKind = acrRow.mKind,
                            .mRemotePort = getPort(acrRow.mPort),
                            .mOccurrences = acrRow.mCount,
-                           .mSpread = acrRow.mSpread});
+                           .mSpread = acrRow.mSpread,
+                           .mLast = fromMicroseconds(acrRow.mLast)});
     });
 }
 

@@ -235,23 +235,31 @@ static double sHours(std::chrono::microseconds aSpan) {
 
 using ZTCDiffRates = std::map<std::pair<ZTCKindKey, std::string>, ZTSDiffRate>;
 
-/// Adds what happened in [aFrom, aTo) to that count of each rate.
-static void sCount(const ZTCHistory& acrHistory, ZTCHistoryTime aFrom, ZTCHistoryTime aTo,
-                   std::uint64_t ZTSDiffRate::*apCount, ZTCDiffRates& arRates) {
+using ZTCDiffCount = std::uint64_t ZTSDiffRate::*;
+
+/// Adds what happened in the minutes [aFrom, aTo) to that count of each rate. What had ended before `aBegin`, a time in
+/// the first minute, is added to the other count, or to none where that is null.
+static void sCount(const ZTCHistory& acrHistory, ZTCHistoryTime aFrom, ZTCHistoryTime aTo, ZTCHistoryTime aBegin,
+                   ZTCDiffCount apCount, ZTCDiffCount apCountBefore, ZTCDiffRates& arRates) {
     ZTSHistoryFilter lFilter;
     lFilter.mSince = aFrom;
     lFilter.mUntil = aTo - std::chrono::microseconds(1);
     acrHistory.visitMinutes(lFilter, [&](const ZTSBucket& acrBucket) {
+        const ZTCDiffCount lpCount = acrBucket.mLast < aBegin ? apCountBefore : apCount;
+        if (lpCount == nullptr) {
+            return true;
+        }
         const std::string lPort = acrBucket.mRemotePort ? acrBucket.mRemotePort->mWwpn.toText() : "";
         ZTSDiffRate& lrRate = arRates[{acrBucket.mKind, lPort}];
         lrRate.mKind = acrBucket.mKind;
         lrRate.mRemotePort = acrBucket.mRemotePort;
-        lrRate.*apCount += acrBucket.mOccurrences;
+        lrRate.*lpCount += acrBucket.mOccurrences;
         return true;
     });
 }
 
-/// Events are counted by the minute: both stretches are whole minutes.
+/// Events are counted by the minute: both stretches are whole minutes. In the minute in which the second one begins,
+/// events that had ended before its begin do not count as its own.
 static void sAddRates(const ZTCHistory& acrHistory, const ZTSDiffRequest& acrRequest, ZTSDiff& arDiff) {
     using std::chrono::ceil;
     using std::chrono::floor;
@@ -266,8 +274,11 @@ static void sAddRates(const ZTCHistory& acrHistory, const ZTSDiffRequest& acrReq
             std::max<std::chrono::microseconds>(lBorder - floor<minutes>(*acrRequest.mBeforeSince), minutes(1));
     }
     ZTCDiffRates lRates;
-    sCount(acrHistory, lBorder - arDiff.mBeforeSpan, lBorder, &ZTSDiffRate::mBefore, lRates);
-    sCount(acrHistory, lAfterSince, lEnd, &ZTSDiffRate::mAfter, lRates);
+    const ZTCDiffCount lpBefore = &ZTSDiffRate::mBefore;
+    const ZTCHistoryTime lBegin = acrRequest.mAfterSince.value_or(acrRequest.mFrom.mTime);
+    const ZTCDiffCount lpBeforeBegin = lAfterSince == lBorder ? lpBefore : nullptr;
+    sCount(acrHistory, lBorder - arDiff.mBeforeSpan, lBorder, ZTCHistoryTime::min(), lpBefore, nullptr, lRates);
+    sCount(acrHistory, lAfterSince, lEnd, lBegin, &ZTSDiffRate::mAfter, lpBeforeBegin, lRates);
     for (auto& [lKey, lRate] : lRates) {
         lRate.mIsDifferent =
             areRatesDifferent(lRate.mBefore, sHours(arDiff.mBeforeSpan), lRate.mAfter, sHours(arDiff.mAfterSpan));

@@ -166,6 +166,23 @@ TEST_F(DiffOfAHistory, ARateThatRoseIsADifference) {
     EXPECT_THAT(format(lDiff), HasSubstr("3.0  505.0"));
 }
 
+TEST_F(DiffOfAHistory, AStormThatEndedBeforeTheMarkOfTheSameMinuteIsNoDifference) {
+    note(scFrom - gcMinute, makeSan({}));
+    const std::int64_t lStorm = scFrom - scFrom % gcMinute + 1;
+    const std::int64_t lMark = lStorm + gcMinute / 2;
+    take({makeQueueFull(gcPortA, lStorm, lStorm + 9, 500)}, lStorm + 9);
+    const auto lDiff = [&] {
+        return makeDiff(history(), {.mFrom = {.mTime = fromMicroseconds(lMark), .mMark = "a"},
+                                    .mTo = {.mTime = fromMicroseconds(lMark + 9), .mMark = ""}});
+    };
+    EXPECT_TRUE(lDiff().isSame());
+    ASSERT_THAT(lDiff().mRates, SizeIs(1));
+    EXPECT_EQ(lDiff().mRates[0].mBefore, 500U);
+    EXPECT_EQ(lDiff().mRates[0].mAfter, 0U);
+    take({makeQueueFull(gcPortA, lMark + 1, lMark + 5, 500)}, lMark + 9);
+    EXPECT_FALSE(lDiff().isSame());
+}
+
 TEST_F(DiffOfAHistory, TheRatesOfTwoStretchesAreThoseOfNothingElse) {
     take({makeQueueFull(gcPortA, scFrom - 50 * gcMinute, scFrom - 50 * gcMinute, 1000)}, scFrom);
     take({makeQueueFull(gcPortA, scFrom - 10 * gcMinute, scFrom - 10 * gcMinute, 7)}, scFrom);
