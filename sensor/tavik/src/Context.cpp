@@ -36,6 +36,14 @@ std::unique_ptr<ZTCHistory> ZTCContext::openHistory() const {
     return std::make_unique<ZTCHistory>(mSettings.mSensorState);
 }
 
+std::string ZTCContext::findStoreId() const {
+    try {
+        return openHistory()->getStoreId();
+    } catch (const ZTCStoreEx&) {
+        return {};
+    }
+}
+
 ZTCNameBook ZTCContext::makeNames(const ZTCHistory* apHistory) const {
     ZTCNameBook lNames;
     lNames.addNames(mSettings.mNames);

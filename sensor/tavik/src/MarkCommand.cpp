@@ -38,13 +38,7 @@ int runMark(const ZTSTavikOptions& acrOptions) {
     const nlohmann::json lTime = lAnswer.mDocument.value("time", nlohmann::json());
     const auto lParsed = lTime.is_string() ? fromRfc3339(lTime.get<std::string>()) : std::nullopt;
     if (acrOptions.mIsJson) {
-        std::string lStoreId;
-        try {
-            lStoreId = lContext.openHistory()->getStoreId();
-        } catch (const ZTCStoreEx& lrEx) {
-            complain(lrEx.what());
-        }
-        nlohmann::ordered_json lDocument = beginDocument("mark", lContext.getHost(), lStoreId);
+        nlohmann::ordered_json lDocument = beginDocument("mark", lContext.getHost(), lContext.findStoreId());
         lDocument["mark"] = acrOptions.mMark;
         lDocument["time"] = lParsed ? nlohmann::ordered_json(toRfc3339(*lParsed)) : nlohmann::ordered_json(nullptr);
         writeDocument(lDocument);

@@ -29,7 +29,7 @@ int runReport(const ZTSTavikOptions& acrOptions) {
     const std::vector<ZTSReportFile> lFiles = gatherReport(lContext, lNow);
     const std::uint64_t lBytes = writeArchive(lPath, lName, lFiles, lSeconds);
     if (acrOptions.mIsJson) {
-        nlohmann::ordered_json lDocument = beginDocument("report", lContext.getHost(), "");
+        nlohmann::ordered_json lDocument = beginDocument("report", lContext.getHost(), lContext.findStoreId());
         lDocument["file"] = lPath;
         lDocument["bytes"] = lBytes;
         lDocument["files"] = lFiles.size();

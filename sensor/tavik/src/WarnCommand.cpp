@@ -46,7 +46,7 @@ int runWarn(const ZTSTavikOptions& acrOptions) {
     std::string lText;
     const bool lIsGood = sDescribe(lHooks, lText);
     if (acrOptions.mIsJson) {
-        nlohmann::ordered_json lDocument = beginDocument("warn", lContext.getHost(), "");
+        nlohmann::ordered_json lDocument = beginDocument("warn", lContext.getHost(), lContext.findStoreId());
         lDocument["hooks"] = lHooks;
         writeDocument(lDocument);
     } else {

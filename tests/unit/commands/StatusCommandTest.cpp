@@ -121,6 +121,32 @@ TEST_F(StatusCommand, MarksGoThroughTheSensor) {
     EXPECT_EQ(run({"mark", "something else"}).mStatus, 3);
 }
 
+TEST_F(StatusCommand, EveryDocumentBeginsWithSchemaHostAndStoreId) {
+    fill();
+    const ZTCFakeSensor lSensor(controlPath(), [](const nlohmann::json& acrRequest) -> std::string {
+        const std::string lRequest = acrRequest.value("request", "");
+        return lRequest == "mark"        ? "{\"mark\":\"x\",\"time\":\"2026-03-04T05:06:00Z\"}\n"
+               : lRequest == "warn-test" ? "{\"hooks\":[]}\n"
+                                         : "{}\n";
+    });
+    const std::vector<std::string> lCommands[] = {
+        {"status"},    {"events"},         {"events", "--records"}, {"ports"},
+        {"paths"},     {"explain"},        {"explain", "deaf"},     {"check"},
+        {"mark", "x"}, {"warn", "--test"}, {"diff", "24h"},         {"report", "-o", mDirectory.path("r.tgz")}};
+    for (const std::vector<std::string>& lrCommand : lCommands) {
+        SCOPED_TRACE(testing::PrintToString(lrCommand));
+        std::vector<std::string> lLine{"--json"};
+        lLine.insert(lLine.end(), lrCommand.begin(), lrCommand.end());
+        const auto lDocument = nlohmann::ordered_json::parse(run(lLine).mOutput);
+        auto lMember = lDocument.begin();
+        EXPECT_EQ(lMember.key(), "schema");
+        EXPECT_EQ(lMember.value(), "tavik." + lrCommand[0] + "/1");
+        EXPECT_EQ((++lMember).key(), "host");
+        EXPECT_EQ((++lMember).key(), "storeId");
+        EXPECT_EQ(lMember.value(), store().getStoreId());
+    }
+}
+
 TEST_F(StatusCommand, AMarkWithoutASensorIs3) {
     const ZTSFinishedRun lRun = run({"mark", "x"});
     EXPECT_EQ(lRun.mStatus, 3);
