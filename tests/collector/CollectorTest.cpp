@@ -146,6 +146,7 @@ TEST_F(CollectorTest, AnAgentThatVanishedWithItsPageIsAGapAtTheNextStart) {
     mStage.startCollector();
     mStage.waitFor([this] { return !mStage.history()->readGaps().empty(); }, "the gap");
     EXPECT_THAT(mStage.history()->readGaps()[0].mReason, HasSubstr("without a trace"));
+    EXPECT_FALSE(mStage.history()->readGaps()[0].mIsCountKnown) << "nobody knows what it held at its end";
     EXPECT_EQ(mStage.finish(), 0);
 }
 

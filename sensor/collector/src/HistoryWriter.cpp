@@ -111,6 +111,8 @@ std::optional<std::uint64_t> ZTCHistoryWriter::takeIn(const ZTSSpoolEntry& acrEn
     }
     if (acrPage != nullptr) {
         storePage(acrPage);
+    } else if (lrName.mState == ZTSPS_Torn && !mrStore.hasEnded(lrName.mGeneration)) {
+        noteSeen(lrName.mGeneration);  // a gap is due, also where this history has not heard of that agent
     }
     return lRecords;
 }
@@ -128,7 +130,8 @@ void ZTCHistoryWriter::endAgent(const ZTSEndedAgent& acrAgent) {
     if (acrAgent.mpPage != nullptr) {
         storePage(acrAgent.mpPage);
     }
-    if (mrStore.endAgent(acrAgent.mGeneration, acrAgent.mFrom, acrAgent.mTo, acrAgent.mIsVanished, acrAgent.mReason)) {
+    if (mrStore.endAgent(acrAgent.mGeneration, acrAgent.mFrom, acrAgent.mTo, acrAgent.mIsVanished, acrAgent.mReason,
+                         acrAgent.mpPage != nullptr)) {
         mReport("a gap is in the history: " + acrAgent.mReason);
     }
     if (mpPage != nullptr && mpPage->mStartId == acrAgent.mGeneration) {

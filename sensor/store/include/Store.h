@@ -149,9 +149,9 @@ public:
     /// Once for each agent that has ended, when its last page was noted and all its frames were taken in. What it held,
     /// and what it handed over that never arrived, becomes one gap; so does an agent that `aIsVanished` (killed, or
     /// gone without a word), even where nothing is known to be missing. A second call does nothing. Returns whether a
-    /// gap was written.
+    /// gap was written. `aHasLastPage`: its last page was noted; otherwise the gap's count is a lower bound.
     bool endAgent(const std::string& acrGeneration, ZTCHistoryTime aFrom, ZTCHistoryTime aTo, bool aIsVanished,
-                  const std::string& acrReason);
+                  const std::string& acrReason, bool aHasLastPage = true);
     /// Whether endAgent() was called for it. Needs no transaction.
     bool hasEnded(const std::string& acrGeneration) const;
     /// The counts of all agents but this one, by initiator and kind.

@@ -46,16 +46,18 @@ std::int64_t ZTCDatabase::readNumber(const char* apSql) {
 }
 
 void ZTCDatabase::fail(sqlite3* apHandle, int aResult, const std::string& acrPath, std::string_view aWhat) {
-    std::string lText = acrPath + ": " + std::string(aWhat.substr(0, 200)) + ": " + sqlite3_errstr(aResult);
+    const std::string lReason = sqlite3_errstr(aResult);
+    std::string lText = acrPath + ": " + std::string(aWhat.substr(0, 200)) + ": " + lReason;
+    std::string lDetail;
     if (apHandle != nullptr) {
-        lText += std::string(" (") + sqlite3_errmsg(apHandle);
+        lDetail = lReason == sqlite3_errmsg(apHandle) ? "" : sqlite3_errmsg(apHandle);
         const int lErrno = sqlite3_system_errno(apHandle);
         const int lKind = aResult & 0xFF;
         if (lErrno != 0 && (lKind == SQLITE_IOERR || lKind == SQLITE_FULL || lKind == SQLITE_CANTOPEN)) {
-            lText += std::string("; ") + std::strerror(lErrno);
+            lDetail += (lDetail.empty() ? "" : "; ") + std::string(std::strerror(lErrno));
         }
-        lText += ")";
     }
+    lText += lDetail.empty() ? "" : " (" + lDetail + ")";
     switch (aResult & 0xFF) {
         case SQLITE_NOMEM:
             throw std::bad_alloc();

@@ -111,7 +111,7 @@ void ZTCLedgerBook::flush() {
 }
 
 bool ZTCLedgerBook::endAgent(const std::string& acrGeneration, std::int64_t aFrom, std::int64_t aTo, bool aIsVanished,
-                             const std::string& acrReason) {
+                             const std::string& acrReason, bool aHasLastPage) {
     if (hasEnded(acrGeneration)) {
         return false;
     }
@@ -133,7 +133,7 @@ bool ZTCLedgerBook::endAgent(const std::string& acrGeneration, std::int64_t aFro
     }
     bool lIsWritten = false;
     if (aIsVanished || !lMissing.empty()) {
-        lIsWritten = writeGap(aFrom, aTo, acrReason, acrGeneration, true, lMissing);
+        lIsWritten = writeGap(aFrom, aTo, acrReason, acrGeneration, aHasLastPage, lMissing);
     }
     ZTCStatement(mrDatabase,
                  "INSERT INTO ledger SELECT 0, initiator, kind, received, collectionOff, totalLimit, unknownBoard, "

@@ -33,7 +33,7 @@ public:
     void addTaken(std::uint64_t aGeneration, std::uint32_t aInitiator, ZTCKindKey aKind, std::uint64_t aOccurrences);
     void note(const std::string& acrGeneration, std::span<const ZTSPageCounts> aCounts);
     bool endAgent(const std::string& acrGeneration, std::int64_t aFrom, std::int64_t aTo, bool aIsVanished,
-                  const std::string& acrReason);
+                  const std::string& acrReason, bool aHasLastPage);
     bool noteGap(const ZTSGap& acrGap);
     void flush();
 

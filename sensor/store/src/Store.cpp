@@ -106,10 +106,10 @@ void ZTCStore::noteLedger(const std::string& acrGeneration, std::span<const ZTSP
 }
 
 bool ZTCStore::endAgent(const std::string& acrGeneration, ZTCHistoryTime aFrom, ZTCHistoryTime aTo, bool aIsVanished,
-                        const std::string& acrReason) {
+                        const std::string& acrReason, bool aHasLastPage) {
     return mpImplementation->change("endAgent", [&] {
         return mpImplementation->mpOpen->mLedger.endAgent(acrGeneration, toMicroseconds(aFrom), toMicroseconds(aTo),
-                                                          aIsVanished, acrReason);
+                                                          aIsVanished, acrReason, aHasLastPage);
     });
 }
 

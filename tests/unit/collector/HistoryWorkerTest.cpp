@@ -172,6 +172,23 @@ TEST_F(HistoryWorkerTest, AFrameThatCannotBeReadIsSetAsideWithAGap) {
     EXPECT_THAT(lines(), testing::Contains(HasSubstr("3.a1.frame")));
 }
 
+TEST_F(HistoryWorkerTest, ACutResponseOfAnAgentThatNobodyKnowsIsOneGap) {
+    startAndOpen();
+    for (const std::uint64_t lNumber : {3, 4}) {
+        ZTSSpoolPart lPart = mSpool->createPart(lNumber, scGeneration, 100);
+        EXPECT_EQ(write(lPart.mFile.get(), "\0\0\0\x64", 4), 4);
+        lPart.mSize = 4;
+        mWorker->takeIn({mSpool->tear(lPart), 4}, nullptr);
+        mWorker->endForgottenAgents("");
+    }
+    EXPECT_TRUE(mWorker->finish(seconds(20)));
+    const std::vector<ZTSGap> lGaps = ZTCHistory(state()).readGaps();
+    ASSERT_EQ(lGaps.size(), 1U);
+    EXPECT_EQ(lGaps[0].mGeneration, scGeneration);
+    EXPECT_FALSE(lGaps[0].mIsCountKnown);
+    EXPECT_THAT(listSpool(state()), IsEmpty());
+}
+
 TEST_F(HistoryWorkerTest, ANewerSchemaIsFatalAndNamed) {
     startAndOpen();
     EXPECT_TRUE(mWorker->finish(seconds(20)));
