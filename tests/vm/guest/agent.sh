@@ -1,4 +1,4 @@
-# The agent in the guest, and tavikctl as its sensor. Sourced by what runs in the guest, its shell included.
+# The agent in the guest, and tavikctl as its sensor. Sourced by the scripts that run in the guest, and by its shell.
 
 . /vm/fabric.sh
 
@@ -7,7 +7,7 @@ gLog=/tmp/agent/agent.log
 gRecords=/tmp/records # the answers to every get since the agent was started, one JSON document each
 gTracing=/sys/kernel/tracing
 
-# start_agent [COMMAND...]: the agent, as an argument of the command where one is given (to take rights away); collecting.
+# start_agent [COMMAND...]: starts the agent, and collecting. The command, if there is one, runs the agent; it can take rights away.
 start_agent() {
   rm -rf /tmp/agent
   mkdir -m 0700 /tmp/agent

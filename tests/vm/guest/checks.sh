@@ -1,6 +1,6 @@
-# The checks: each is a function check_NAME with what it shows behind it, and gets an agent that collects. They write one line an
-# expectation to the second serial port: ok or FAIL, the check, what was looked at, what was expected, what came, with the
-# character 037 in between.
+# The checks. Each is a function check_NAME, with a comment that says what it shows. It gets an agent that collects. For each
+# expectation it writes one line to the second serial port: ok or FAIL, the check, what was checked, what was expected and what came,
+# separated by the character 037.
 . /vm/agent.sh
 . /vm/sensor-checks.sh
 exec 3>/dev/ttyS1
@@ -18,7 +18,7 @@ expect_text() {
   fi
 }
 
-# expect WHAT EXPECTED FILTER: collects until the filter over all records gives what is expected, twenty seconds at most.
+# expect WHAT EXPECTED FILTER: collects until the filter over all records gives the expected text, for twenty seconds at most.
 gives() {
   collect
   gGot=$(query "$2")
@@ -28,7 +28,7 @@ expect() {
   wait_until 20 gives "$2" "$3"
   expect_text "$1" "$2" "$gGot"
 }
-# expect_still: the same after the library has looked at everything once more: no more came.
+# expect_still: the same, after the library has looked at everything once more. Shows that no further event came.
 expect_still() {
   usleep 2500000
   expect "$@"
@@ -41,10 +41,10 @@ expect_logged() {
   expect_text "$1" "$2" "$(logged "$3")"
 }
 
-# The two ports see each other and the LUNs are there, as every check finds it.
+# The state in which every check begins: the two ports see each other, and the LUNs are there.
 fabric_is_ready() { fabric_wait || expect_text "the ports and LUNs" "all there" "not within a minute"; }
 
-# expect_reason WHAT TEXT: the log says TEXT as a warning, and behind a semicolon perhaps what would help.
+# expect_reason WHAT TEXT: the log has TEXT as a warning. After a semicolon it may say what would help.
 expect_reason() {
   expect_text "$1" "-W- $2" "$(logged "${2%%:*}" | sed "s#$gTracing/instances/[^ ]*#PATH#; s/;.*//")"
 }
@@ -203,7 +203,7 @@ check_messages() { # link messages between two looks are counted; what no driver
   expect_still "no event of all these" 2 "$(total link) + ([.[] | select(.kind != \"link\")] | length)"
 }
 
-# sums_up KIND LOSS EXPECTED: what came of that kind, and what the log says was lost, add up.
+# sums_up KIND LOSS EXPECTED: the events of that kind that came, and the losses in the log, add up to EXPECTED.
 sums_up() {
   collect
   gGot=$(query "$(total $1)")
@@ -240,8 +240,8 @@ next_arrives() {
 all_outcomes() { echo '[.[] | select(.kind == "check-condition" or .kind == "device-busy" or .kind == "queue-full").occurrences] | add // 0'; }
 without_sense() { echo '[.[] | select(.kind == "check-condition" and .data.senseKey == 4294967295).occurrences] | add // 0'; }
 
-# expect_conserved EXPECTED: what came and what is said to be lost are exactly as many outcomes as that. Each check condition without
-# sense data is one whose sense data are said to be lost.
+# expect_conserved EXPECTED: the outcomes that came and the outcomes that were reported as lost are exactly EXPECTED. The sense data of
+# each check condition without them were reported as lost.
 conserves() {
   collect
   gGot=$(query "$(all_outcomes)")
@@ -333,7 +333,7 @@ check_conservation() { # a seeded mix of good and failing commands: what the tar
   lConditions=$(awk '$1 == 2 {n++} END {print n + 0}' $gAnswers)
   [ "$(records_of_one)" = 2 ] || lConditions=0 # there is no probe
   expect_text "hits of the probe: the check conditions, and no other command" $lConditions $(($(probe_hits) - lHits))
-  # The same of a storm that the agent cannot read.
+  # The same for a storm that the agent cannot read in time.
   kill -STOP $gAgent
   shrink_buffers
   send_storm $gSeed
@@ -557,7 +557,7 @@ check_nobody() { # a user without rights has links, by polling
   fabric_is_ready
 }
 
-# The agent of an ordinary user with these capabilities.
+# Starts the agent as an ordinary user with these capabilities.
 as_user() { start_agent /vm/bin/setpriv --reuid 65534 --clear-groups --inh-caps "-all,$1" --ambient-caps "$1"; }
 
 # everything_comes: a check condition with its sense data, and a message.

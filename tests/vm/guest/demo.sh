@@ -1,4 +1,4 @@
-# What scripts/demo --vm shows: real FC ports of this kernel, an agent over them, and what it has to tell.
+# What scripts/demo --vm shows: real FC ports of this kernel, an agent that uses them, and the events that it collects.
 . /vm/agent.sh
 exec 3>/dev/ttyS1
 

@@ -1,12 +1,12 @@
-# What scripts/test-vm --figures prints: what the agent costs on this machine while nothing, or nothing of interest, happens, and what
-# it takes before something is lost.
+# What scripts/test-vm --figures prints: the agent's cost on this machine while no events happen, and how large a storm has to be before
+# events are lost.
 . /vm/agent.sh
 exec 3>/dev/ttyS1
 
 # ratio A B [PLACES]
 ratio() { awk "BEGIN {printf \"%.${3:-2}f\", $1 / $2}"; }
 
-# costs WHAT COMMANDS COMMAND...: one line of what the agent took while the command ran, which makes so many SCSI commands.
+# costs WHAT COMMANDS COMMAND...: prints one line with the agent's cost while the command runs. The command makes COMMANDS SCSI commands.
 costs() {
   local lWhat=$1 lCommands=$2 lRecorded lTime lWakes lBegin lTook
   shift 2
@@ -22,7 +22,7 @@ costs() {
     "$(ratio $lTime $((lTook * 1000)))" "$(ratio $((lWakes * 1000)) $lTook 1)" $(($(recorded) - lRecorded)) >&3
 }
 
-# all_came KIND EXPECTED LOSS: collects until what came and what is said to be lost are as many as that: gCame, gLost.
+# all_came KIND EXPECTED LOSS: collects until the events that came (gCame) and those reported as lost (gLost) are EXPECTED together.
 all_came() {
   collect
   gCame=$(query "$(total $1)")

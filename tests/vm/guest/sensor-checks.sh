@@ -1,10 +1,10 @@
-# The checks of the whole sensor over the kernel's own FC stack: what `tavik` shows is what was done to ports and LUNs. Sourced by
+# The checks of the whole sensor over the kernel's own FC stack: `tavik` must show what was done to ports and LUNs. Sourced by
 # checks.sh, whose functions it uses.
 
 gState=/tmp/sensor
 export TAVIK_CONFIG=$gState/tavik.toml
 
-# start_sensor: the sensor in the place of the agent; fails where it does not collect after a long time.
+# start_sensor: starts the sensor instead of the agent. Fails if it does not collect after a long time.
 start_sensor() {
   rm -rf $gState
   mkdir -p $gState/run $gState/state

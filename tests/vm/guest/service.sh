@@ -1,6 +1,6 @@
 #!/bin/sh
-# What scripts/test-vm --service shows: the installed service over real FC ports of this kernel, started by a real systemd in its
-# sandbox, with the step of root for tracefs done and undone.
+# What scripts/test-vm --service tests: the installed service over real FC ports of this kernel. A real systemd starts it in its sandbox.
+# The root step for tracefs is done and undone.
 export PATH=/usr/sbin:/usr/bin:/sbin:/bin:/vm/bin:/vm/busybox LC_ALL=C.UTF-8 DEBIAN_FRONTEND=noninteractive
 exec >/dev/ttyS1 2>&1
 stty -F /dev/ttyS1 raw -echo
