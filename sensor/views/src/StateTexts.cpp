@@ -199,7 +199,7 @@ static std::vector<ZTSKindGroup> sGroupKinds(const ZTSStatusFacts& acrFacts, boo
     return lGroups;
 }
 
-/// "no_rights  rscn                (needs CAP_NET_ADMIN)", then what is heard.
+/// "no_rights  rscn                (needs CAP_NET_ADMIN)", then what is off, then what is heard.
 ZTCLines describeDeafState(const ZTSStatusFacts& acrFacts) {
     static constexpr std::size_t scStateWidth = 11;
     static constexpr std::size_t scKindsWidth = 20;
@@ -214,9 +214,13 @@ ZTCLines describeDeafState(const ZTSStatusFacts& acrFacts) {
         lLines.push_back(lPad(lrGroup.mState, scStateWidth) +
                          (lrGroup.mWords.empty() ? lKinds : lPad(lKinds, scKindsWidth) + "(" + lrGroup.mWords + ")"));
     }
+    // A registration that was refused leaves those behind it off.
+    const auto lIsOff = [](std::string_view aState) { return aState == getKindStateName(ZTKST_Off); };
     const auto lIsHeard = [](std::string_view aState) { return aState == getKindStateName(ZTKST_Listening); };
-    for (const ZTSKindGroup& lrGroup : sGroupKinds(acrFacts, true, lIsHeard)) {
-        lLines.push_back(lPad(lrGroup.mState, scStateWidth) + sJoinKinds(lrGroup, lInitiators));
+    for (bool (*lpIsWanted)(std::string_view) : {+lIsOff, +lIsHeard}) {
+        for (const ZTSKindGroup& lrGroup : sGroupKinds(acrFacts, true, lpIsWanted)) {
+            lLines.push_back(lPad(lrGroup.mState, scStateWidth) + sJoinKinds(lrGroup, lInitiators));
+        }
     }
     return lLines;
 }

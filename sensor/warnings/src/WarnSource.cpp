@@ -141,8 +141,11 @@ void ZTCWarnSource::readGaps(const ZTCHistory& acrHistory, ZTCHistoryTime aNow,
             continue;
         }
         lLast = std::max(lLast, lrGap.mSeq);
-        const std::string lLost =
-            (lrGap.mIsCountKnown ? "" : "at least ") + std::to_string(lrGap.getOccurrences()) + " events lost: ";
+        const std::uint64_t lCount = lrGap.getOccurrences();
+        const std::string lLost = !lrGap.mIsCountKnown && lCount == 0
+                                      ? "unknown how many events are lost: "
+                                      : (lrGap.mIsCountKnown ? "" : "at least ") + std::to_string(lCount) +
+                                            (lCount == 1 ? " event lost: " : " events lost: ");
         arFound.push_back(sMake("gap", lrGap.mCounts.empty() ? ZTSInitiator() : lrGap.mCounts.front().mInitiator, 1,
                                 aNow, lLost + lrGap.mReason));
     }

@@ -120,10 +120,12 @@ TEST_F(StatusText, AKindThatOnlySomeAdaptersDoNotReportIsNamedWithThem) {
                                   {"words", nlohmann::json::object()}});
     }
     lLive["kinds"][1]["kinds"]["link"] = "failed";
+    lLive["kinds"][1]["kinds"]["logo"] = "off";
     EXPECT_THAT(format(makeFacts(lLive)), HasSubstr(R"(
 status: no_rights  rscn
         failed     link of host8
-        listening  logo, link of host7 and host9
+        off        logo of host8
+        listening  logo of host7 and host9, link of host7 and host9
 )"));
 }
 
