@@ -12,6 +12,7 @@
 #include "tavik/include/TavikCore.h"
 #include "tests/support/FailingAllocation.h"
 #include "tests/support/Seed.h"
+#include "tests/support/TestThreads.h"
 #include "tests/unit/tavik/support/DeliveredKinds.h"
 #include "tests/unit/tavik/support/Deliveries.h"
 #include "tests/unit/tavik/support/StatusPageFixture.h"
@@ -146,18 +147,16 @@ TEST_F(StatusPageConservation, EveryEventIsCountedOnceAndWhatIsHandedOverIsWhatT
     // Readers of such a lock may starve its writer.
     std::atomic<bool> lIsWanted{false};
     std::atomic<bool> lIsToEnd{false};
-    std::vector<std::thread> lThreads;
-    for (ZTCCountedSource& lrSource : lSources) {
-        lThreads.emplace_back([&, lpSource = &lrSource] {
-            while (!lIsToEnd) {
-                while (lIsWanted && !lIsToEnd) {
-                    std::this_thread::yield();
-                }
-                const std::shared_lock lHold(lSwitch);
-                lpSource->deliverOne();
+    ZTCTestThreads lThreads;
+    lThreads.start(scThreads, [&](unsigned aThread) {
+        while (!lIsToEnd) {
+            while (lIsWanted && !lIsToEnd) {
+                std::this_thread::yield();
             }
-        });
-    }
+            const std::shared_lock lHold(lSwitch);
+            lSources[aThread].deliverOne();
+        }
+    });
     const auto lAlone = [&lSwitch, &lIsWanted] {
         lIsWanted = true;
         std::unique_lock lHold(lSwitch);
@@ -233,9 +232,7 @@ TEST_F(StatusPageConservation, EveryEventIsCountedOnceAndWhatIsHandedOverIsWhatT
         std::this_thread::yield();
     }
     lIsToEnd = true;
-    for (std::thread& lrThread : lThreads) {
-        lrThread.join();
-    }
+    lThreads.join();
     // Each reason once at least, whatever the schedule was.
     mLibrary.mNumberOfAdapters = 0;
     retrieveInto(lDelivered);
@@ -299,16 +296,12 @@ TEST_F(StatusPageConservation, AdaptersThatLeaveInAStormOfRscnsLeaveNoPageBehind
     }
     const ZTCBytes lPayload = makeRscn(lWords);
     constexpr unsigned lcRscns = 300;
-    std::atomic<unsigned> lRunning{2};
-    std::vector<std::thread> lThreads;
-    for (unsigned lBoard = 0; lBoard < 2; ++lBoard) {
-        lThreads.emplace_back([&, lBoard] {
-            for (unsigned lRscn = 0; lRscn < lcRscns; ++lRscn) {
-                deliverRscn(lBoard, lPayload);
-            }
-            --lRunning;
-        });
-    }
+    ZTCTestThreads lThreads;
+    lThreads.start(2, [&](unsigned aBoard) {
+        for (unsigned lRscn = 0; lRscn < lcRscns; ++lRscn) {
+            deliverRscn(aBoard, lPayload);
+        }
+    });
     std::uint64_t lDelivered = 0;
     const auto lRetrieve = [&] {
         for (const ZTSEncodedRecordList& lcrList : retrieve().mLists) {
@@ -317,13 +310,11 @@ TEST_F(StatusPageConservation, AdaptersThatLeaveInAStormOfRscnsLeaveNoPageBehind
             }
         }
     };
-    while (lRunning != 0) {
+    while (lThreads.isRunning()) {
         mLibrary.mNumberOfAdapters = lSeed.below(3);
         lRetrieve();
     }
-    for (std::thread& lrThread : lThreads) {
-        lrThread.join();
-    }
+    lThreads.join();
     lRetrieve();
 
     const ZTSStatusSnapshot lPage = page();

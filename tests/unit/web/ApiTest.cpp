@@ -10,6 +10,7 @@
 #include <regex>
 #include <set>
 
+#include "libkpm/include/ScopeEventKinds.h"
 #include "sensor/metrics/include/Metrics.h"
 #include "tests/unit/store/StoreFixture.h"
 
@@ -187,6 +188,18 @@ TEST_F(Api, MetricsCountWhatTheHistoryHolds) {
                 AllOf(HasSubstr("kind=\"queue-full\",remote_port=\"" + makeName(gcPortA).toText() + "\"} 42\n"),
                       HasSubstr("kind=\"plogi\",remote_port=\"other\"} 2\n"), HasSubstr("tavik_retrievals_total 1\n"),
                       HasSubstr("tavik_agent_up 1\n")));
+}
+
+TEST_F(Api, ThePageHasARowForEachKindOfTheTableAndForNoOther) {
+    const std::string lText = ask("/kinds.js").mBody;
+    for (const ZTSScopeEventKind& lcrKind : gcScopeEventKinds) {
+        EXPECT_THAT(lText, HasSubstr("\n  row(\"" + std::string(lcrKind.mpName) + "\", "));
+    }
+    std::size_t lRows = 0;
+    for (std::size_t lPlace = 0; (lPlace = lText.find("\n  row(\"", lPlace)) != std::string::npos; ++lPlace) {
+        ++lRows;
+    }
+    EXPECT_EQ(lRows, gcScopeEventKindCount);
 }
 
 TEST_F(Api, ThePageAndAllThatItLoadsComeFromThisServer) {
