@@ -9,11 +9,18 @@
 #include "tests/support/Seed.h"
 
 // The real collector is killed at its system calls, exactly before or exactly after them. ZT_SENSOR_KILL_RUNS is the
-// number of kills; scripts/check-sensor-kills runs many.
+// number of kills; with ZT_SENSOR_KILL_EVERY there is one at each call of a whole run, from that one on. See
+// scripts/check-sensor-kills.
 
 static unsigned sRuns() {
     const char* const lpRuns = std::getenv("ZT_SENSOR_KILL_RUNS");
     return lpRuns != nullptr ? static_cast<unsigned>(std::strtoul(lpRuns, nullptr, 10)) : 30;
+}
+
+/// 0: not each call.
+static unsigned sFirstStop() {
+    const char* const lpFirst = std::getenv("ZT_SENSOR_KILL_EVERY");
+    return lpFirst != nullptr ? static_cast<unsigned>(std::strtoul(lpFirst, nullptr, 10)) : 0;
 }
 
 class CollectorKillTest : public testing::Test {
@@ -27,7 +34,14 @@ protected:
     }
     bool isAllStored() const { return mStage.countStored() == mAgent->getHappened(); }
     void waitUntilStored() {
-        mStage.waitFor([this] { return isAllStored(); }, "all that happened in the history");
+        try {
+            mStage.waitFor([this] { return isAllStored(); }, "all that happened in the history");
+        } catch (const std::runtime_error& lrEx) {
+            FAIL() << lrEx.what() << ": " << mAgent->getHappened() << " happened, " << mAgent->getHandedOver()
+                   << " were handed over, " << mStage.countStored() << " are stored; the last of "
+                   << mAgent->getRequests().size() << " requests is " << int(mAgent->getRequests().back().at(0)) << "\n"
+                   << mStage.status().dump(2);
+        }
     }
     ZTSKilledRun runAndKill(unsigned aStop) {
         return mStage.runAndKillCollector(aStop, [this] { return isAllStored() && mStage.spoolFiles().empty(); });
@@ -35,7 +49,7 @@ protected:
     /// After a kill: the next collector stores all of it, each once.
     void expectNothingLost() {
         mStage.startCollector();
-        waitUntilStored();
+        ASSERT_NO_FATAL_FAILURE(waitUntilStored());
         mStage.waitFor([this] { return mStage.spoolFiles().empty(); }, "an empty spool");
         mStage.killCollector();
         if (!mStage.spoolFiles().empty()) {
@@ -48,28 +62,51 @@ protected:
         EXPECT_TRUE(mStage.history()->readGaps().empty());
     }
 
+    /// Random ones of the stops of a whole run.
+    void killAtSomeStops(unsigned aStops) {
+        ZTCTestSeed lSeed;
+        unsigned lKilled = 0;
+        for (unsigned lRun = 0; lRun < sRuns(); ++lRun) {
+            const unsigned lStop = 1 + lSeed.below(aStops);
+            SCOPED_TRACE("killed at stop " + std::to_string(lStop));
+            mAgent->happen(1 + lSeed.below(300), 1 + lSeed.below(5));
+            lKilled += runAndKill(lStop).mIsKilled ? 1 : 0;
+            ASSERT_NO_FATAL_FAILURE(expectNothingLost());
+        }
+        std::cout << lKilled << " collectors killed, at some of the " << aStops << " stops of a whole run\n";
+        EXPECT_GT(lKilled, sRuns() / 2);
+    }
+    /// The first, the second, the third ... Runs differ by a few stops: it is over when three in a row have come to
+    /// their end before their stop.
+    void killAtEachStop(unsigned aStops) {
+        unsigned lKilled = 0;
+        unsigned lEnded = 0;
+        std::cout << aStops << " stops in a whole run\n";
+        for (unsigned lStop = sFirstStop(); lEnded < 3 && !HasFailure(); ++lStop) {
+            SCOPED_TRACE("killed at stop " + std::to_string(lStop));
+            mAgent->happen(100, 3);
+            const bool lIsKilled = runAndKill(lStop).mIsKilled;
+            lKilled += lIsKilled ? 1 : 0;
+            lEnded = lIsKilled ? 0 : lEnded + 1;
+            ASSERT_NO_FATAL_FAILURE(expectNothingLost());
+        }
+        std::cout << lKilled << " collectors killed, at each of the stops of a whole run, of which the first had "
+                  << aStops << '\n';
+        EXPECT_GT(lKilled, aStops / 2);
+    }
+
     ZTCCollectorStage mStage{"collect.period = 60\n"};
     std::unique_ptr<ZTCPagedAgent> mAgent;
 };
 
 TEST_F(CollectorKillTest, KilledAtASystemCallNothingIsLostAndNothingCountsTwice) {
-    ZTCTestSeed lSeed;
     mAgent->happen(100);
     const ZTSKilledRun lWhole = runAndKill(~0U);
     if (!lWhole.mIsTraced) {
         GTEST_SKIP() << "processes cannot be traced here";
     }
     ASSERT_FALSE(lWhole.mIsKilled);
-    unsigned lKilled = 0;
-    for (unsigned lRun = 0; lRun < sRuns(); ++lRun) {
-        const unsigned lStop = 1 + lSeed.below(lWhole.mStops);
-        SCOPED_TRACE("killed at stop " + std::to_string(lStop));
-        mAgent->happen(1 + lSeed.below(300), 1 + lSeed.below(5));
-        lKilled += runAndKill(lStop).mIsKilled ? 1 : 0;
-        ASSERT_NO_FATAL_FAILURE(expectNothingLost());
-    }
-    std::cout << lKilled << " collectors killed, at some of the " << lWhole.mStops << " stops of a whole run\n";
-    EXPECT_GT(lKilled, sRuns() / 2);
+    sFirstStop() != 0 ? killAtEachStop(lWhole.mStops) : killAtSomeStops(lWhole.mStops);
 }
 
 TEST_F(CollectorKillTest, KilledInTheMiddleOfALargeResponseTheResponseIsComplete) {

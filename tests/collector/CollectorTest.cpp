@@ -148,6 +148,7 @@ TEST_F(CollectorTest, AnAgentThatVanishedWithItsPageIsAGapAtTheNextStart) {
     EXPECT_THAT(mStage.history()->readGaps()[0].mReason, HasSubstr("without a trace"));
     EXPECT_FALSE(mStage.history()->readGaps()[0].mIsCountKnown) << "nobody knows what it held at its end";
     EXPECT_EQ(mStage.finish(), 0);
+    mStage.expectSound();
 }
 
 TEST_F(CollectorTest, StatusShowsWhatGoesOn) {

@@ -7,8 +7,10 @@
 #include "sensor/store/include/History.h"
 #include "tests/sensor/HistoryCheck.h"
 #include "tests/sensor/SensorProcess.h"
+#include "tests/sensor/TavikRun.h"
 #include "tests/support/SmallFileSystem.h"
 
+using testing::AllOf;
 using testing::HasSubstr;
 
 class SensorDisk : public testing::Test {
@@ -33,9 +35,22 @@ protected:
     void waitForDisk(const std::string& acrState) {
         waitUntil([&] { return mSensor.status()["collector"]["disk"] == acrState; }, "the disk " + acrState);
     }
+    /// While nothing can be stored: the agent holds what comes, and a person is told.
+    void expectHeldAndSaid() {
+        EXPECT_GT(mSensor.status()["agent"]["heldRecords"], 0);
+        const ZTSTavikRun lRun = runTavik(mSensor, {"status"});
+        EXPECT_EQ(lRun.mExit, 3) << lRun.mError;
+        EXPECT_THAT(lRun.mOutput,
+                    AllOf(HasSubstr("state: NOT COLLECTING"), HasSubstr("there is no room to store what comes"),
+                          HasSubstr("see: tavik explain disk-full")));
+        mAgent = mSensor.findAgent();
+        EXPECT_NE(mAgent, 0);
+    }
     void expectAllOf(std::uint64_t aCount) {
         waitForDisk("ok");
         mSensor.waitUntilAllIsStored();
+        EXPECT_EQ(mSensor.findAgent(), mAgent) << "the same agent";
+        EXPECT_NE(runTavik(mSensor, {"status"}).mExit, 3);
         EXPECT_EQ(mSensor.stop(), 0);
         EXPECT_EQ(countStored(mSensor.stateDirectory()), aCount);
         EXPECT_TRUE(ZTCHistory(mSensor.stateDirectory()).readGaps().empty());
@@ -44,6 +59,7 @@ protected:
     }
 
     ZTCSensorProcess mSensor{"collect.period = 0.1\n"};
+    pid_t mAgent = 0;
     std::unique_ptr<ZTCSmallFileSystem> mFileSystem;  // goes first: it is mounted in the sensor's directory
 };
 
@@ -52,12 +68,10 @@ TEST_F(SensorDisk, WhenItIsFullTheAgentKeepsItsRecordsAndAllIsStoredWhenThereIsR
     deliverTen();
     waitForDisk("full");
     deliverTen();
-    EXPECT_GT(mSensor.status()["agent"]["heldRecords"], 0);
-    const pid_t lAgent = mSensor.findAgent();
+    expectHeldAndSaid();
     mFileSystem->empty();
     expectAllOf(22);
     EXPECT_THAT(mSensor.standardError(), HasSubstr("there is room in"));
-    EXPECT_NE(lAgent, 0);
 }
 
 TEST_F(SensorDisk, AReadOnlyOneIsLikeAFullOne) {
@@ -65,7 +79,7 @@ TEST_F(SensorDisk, AReadOnlyOneIsLikeAFullOne) {
     deliverTen();
     waitForDisk("read-only");
     deliverTen();
-    EXPECT_GT(mSensor.status()["agent"]["heldRecords"], 0);
+    expectHeldAndSaid();
     mFileSystem->makeWritable();
     expectAllOf(22);
 }

@@ -22,11 +22,13 @@ static unsigned sRuns() {
 /// Storms that follow each other as long as it lives, also while no agent is there that takes them.
 class ZTCEndlessStorm {
 public:
-    explicit ZTCEndlessStorm(const ZTCSensorProcess& acrSensor)
-        : mThread([this, &acrSensor] {
+    /// @param arDelivered  counts the events of each storm that was delivered to its end
+    ZTCEndlessStorm(const ZTCSensorProcess& acrSensor, std::atomic<std::uint64_t>& arDelivered)
+        : mThread([this, &acrSensor, &arDelivered] {
               for (unsigned lRound = 0; !mIsOver; ++lRound) {
                   try {
                       acrSensor.simulate("storm count=500 threads=2 seed=" + std::to_string(lRound));
+                      arDelivered += 500;
                   } catch (const std::runtime_error&) {
                       std::this_thread::yield();  // there is no agent just now
                   }
@@ -61,7 +63,7 @@ protected:
         for (unsigned lRun = 1; lRun <= sRuns() && !HasFailure(); ++lRun) {
             SCOPED_TRACE("kill " + std::to_string(lRun));
             {
-                const ZTCEndlessStorm lStorm(mSensor);
+                const ZTCEndlessStorm lStorm(mSensor, mDelivered);
                 const ZTCDeadline lMoment(std::chrono::milliseconds(lSeed.below(400)));
                 waitUntil([&] { return lMoment.isOver(); }, "the moment of the kill");
                 acrKill();
@@ -80,10 +82,14 @@ protected:
         for (const ZTSGap& lrGap : lHistory.readGaps()) {
             lLost += lrGap.getOccurrences();
         }
+        // An RSCN has one page or more, and counts in pages.
+        EXPECT_GE(countStored(mSensor.stateDirectory()) + countRefused(mSensor.stateDirectory()) + lLost, mDelivered)
+            << "what agents had taken is missing, and no gap knows of it";
         std::cout << sRuns() << " killed, " << lLost << " events known to be lost with them, "
                   << countStored(mSensor.stateDirectory()) << " stored\n";
     }
 
+    std::atomic<std::uint64_t> mDelivered{0};
     ZTCSensorProcess mSensor{"agent.log_level = 1\nagent.heartbeat = 1\n"};
 };
 

@@ -7,6 +7,7 @@
 #include <sstream>
 
 #include "sensor/store/include/History.h"
+#include "tests/sensor/HistoryCheck.h"
 #include "tests/sensor/SensorProcess.h"
 
 /// Each change in the file by its number. A line that comes twice has to be the same.
@@ -62,5 +63,6 @@ TEST(SensorNdjson, CollectorsThatAreKilledLeaveNoChangeOut) {
         },
         "the end of each episode in the file", ZTCDeadline(6 * gcTestPatience));
     EXPECT_EQ(lSensor.stop(), 0);
+    expectSoundHistory(lSensor.stateDirectory());
     EXPECT_GE(sReadChanges(lPath, lHistory.getStoreId()).size(), 12U) << "six episodes begin and end";
 }

@@ -5,16 +5,11 @@
 #include "sensor/metrics/include/Metrics.h"
 #include "sensor/store/include/History.h"
 #include "tests/sensor/SensorProcess.h"
+#include "tests/sensor/TavikRun.h"
 
 using testing::AllOf;
 using testing::HasSubstr;
 using testing::StartsWith;
-
-struct ZTSWarnRun {
-    int mExit = -1;
-    std::string mOutput;
-    std::string mError;
-};
 
 class SensorWarn : public testing::Test {
 protected:
@@ -31,25 +26,10 @@ protected:
         mSensor.configure("http.listen = \"\"\n" + mRules);
         mSensor.start();
     }
-    ZTSWarnRun run(const std::vector<std::string>& acrArguments) {
-        ZTSChildProcessSetup lSetup;
-        lSetup.mProgram = TAVIK_PROGRAM;
-        lSetup.mArguments = acrArguments;
-        lSetup.mArguments.insert(lSetup.mArguments.begin(), {"--config", mSensor.configPath()});
-        lSetup.mEnvironment = {{"PATH", "/usr/bin:/bin"}};
-        lSetup.mWorkingDirectory = mSensor.path(".");
-        lSetup.mOutputPrefix = mSensor.path("tavik" + std::to_string(++mRuns));
-        ZTCChildProcess lProcess(lSetup);
-        ZTSWarnRun lRun;
-        lRun.mExit = lProcess.waitForExit(ZTCDeadline(6 * gcTestPatience));
-        lRun.mOutput = lProcess.standardOutput();
-        lRun.mError = lProcess.standardError();
-        return lRun;
-    }
+    ZTSTavikRun run(const std::vector<std::string>& acrArguments) const { return runTavik(mSensor, acrArguments); }
 
     ZTCSensorProcess mSensor;
     std::string mRules;
-    unsigned mRuns = 0;
 };
 
 TEST_F(SensorWarn, TheTestRunsEveryHookSaysWhichFailedAndEndsWith1UntilAllDoTheirWork) {
@@ -59,7 +39,7 @@ TEST_F(SensorWarn, TheTestRunsEveryHookSaysWhichFailedAndEndsWith1UntilAllDoThei
     const std::string lMissing = addRule("deaf", "missing", "");
     start();
 
-    const ZTSWarnRun lFirst = run({"warn", "--test"});
+    const ZTSTavikRun lFirst = run({"warn", "--test"});
     EXPECT_EQ(lFirst.mExit, 1) << lFirst.mError;
     EXPECT_THAT(
         lFirst.mOutput,
@@ -73,7 +53,7 @@ TEST_F(SensorWarn, TheTestRunsEveryHookSaysWhichFailedAndEndsWith1UntilAllDoThei
 
     writeScript(lFailing, "exit 0");
     writeScript(lMissing, "exit 0");
-    const ZTSWarnRun lSecond = run({"--json", "warn", "--test"});
+    const ZTSTavikRun lSecond = run({"--json", "warn", "--test"});
     EXPECT_EQ(lSecond.mExit, 0) << lSecond.mError;
     const nlohmann::json lDocument = nlohmann::json::parse(lSecond.mOutput);
     EXPECT_EQ(lDocument["schema"], "tavik.warn/1");
@@ -83,7 +63,7 @@ TEST_F(SensorWarn, TheTestRunsEveryHookSaysWhichFailedAndEndsWith1UntilAllDoThei
     }
 
     EXPECT_EQ(mSensor.stop(), 0);
-    const ZTSWarnRun lThird = run({"warn", "--test"});
+    const ZTSTavikRun lThird = run({"warn", "--test"});
     EXPECT_EQ(lThird.mExit, 3);
     EXPECT_EQ(lThird.mOutput, "");
     EXPECT_THAT(lThird.mError, HasSubstr("the hooks were not tested: "));
@@ -91,10 +71,10 @@ TEST_F(SensorWarn, TheTestRunsEveryHookSaysWhichFailedAndEndsWith1UntilAllDoThei
 
 TEST_F(SensorWarn, WithoutAHookTheTestSaysSoAndWithoutTestTheCommandIsWrong) {
     start();
-    const ZTSWarnRun lTest = run({"warn", "--test"});
+    const ZTSTavikRun lTest = run({"warn", "--test"});
     EXPECT_EQ(lTest.mExit, 0) << lTest.mError;
     EXPECT_THAT(lTest.mOutput, StartsWith("no hook is set"));
-    const ZTSWarnRun lWrong = run({"warn"});
+    const ZTSTavikRun lWrong = run({"warn"});
     EXPECT_EQ(lWrong.mExit, 2);
     EXPECT_THAT(lWrong.mError, HasSubstr("--test"));
     EXPECT_EQ(mSensor.stop(), 0);
