@@ -117,9 +117,17 @@ bool ZTCLedgerBook::endAgent(const std::string& acrGeneration, std::int64_t aFro
     }
     flush();
     const std::uint64_t lGeneration = findOrAddGeneration(acrGeneration);
+    // The last known page can be older than the last frame: the agent's page goes with the power. What was taken had
+    // been handed over, and of what was held then it is the first.
+    ZTCStatement(mrDatabase,
+                 "UPDATE ledger SET received = received + max(0, taken + lost - handedOver - held), "
+                 "consolidated = consolidated + max(0, taken + lost - handedOver - held), "
+                 "held = max(0, held - (taken + lost - handedOver)), handedOver = taken + lost "
+                 "WHERE generation = ? AND taken + lost > handedOver")
+        .run(lGeneration);
     std::vector<Missing> lMissing;
     ZTCStatement lRows(mrDatabase,
-                       "SELECT initiator, kind, held, max(0, handedOver - taken - lost) FROM ledger "
+                       "SELECT initiator, kind, held, handedOver - taken - lost FROM ledger "
                        "WHERE generation = ?");
     lRows.query(lGeneration);
     while (lRows.step()) {

@@ -10,6 +10,7 @@
 
 #include "sensor/collector/include/HistoryWorker.h"
 #include "sensor/collector/include/Leftovers.h"
+#include "sensor/collector/include/PageCounts.h"
 #include "sensor/store/include/History.h"
 #include "tests/sensor/HistoryCheck.h"
 #include "tests/support/Seed.h"
@@ -56,9 +57,7 @@ protected:
         resumePart();
         lLeftovers.tearParts();
         mWorker->endForgottenAgents(generation());
-        auto lpPage = std::make_shared<ZTSStatusSnapshot>();
-        lpPage->mStartId = generation();
-        mWorker->notePage(std::move(lpPage));
+        mWorker->notePage(makePage());
         waitUntil([this] { return mWorker->getState().mGeneration == generation(); }, "the agent in the history");
     }
     /// One thread at a time uses the databases. So the end comes first, and then the look.
@@ -101,11 +100,29 @@ protected:
                   static_cast<ssize_t>(aBytes.size()));
         arPart.mSize += aBytes.size();
     }
+    /// The page of the agent that runs: it has handed over what came until now, and holds a few.
+    ZTCPagePointer makePage() {
+        auto lpPage = std::make_shared<ZTSStatusSnapshot>();
+        lpPage->mStartId = generation();
+        ZTSStatusBoardCopy& lrBoard = lpPage->mBoards.emplace_back();
+        lrBoard.mWwpn = makeName(gcLocalPort).mBytes;
+        lrBoard.mWwnn = makeName(gcLocalNode).mBytes;
+        for (std::size_t i = 0; i < lrBoard.mRows.size(); ++i) {
+            if (getRowKind(i) == gcQueueFull) {
+                lrBoard.mRows[i].mHandedOver = mHandedOver;
+                lrBoard.mRows[i].mConsolidated = mHandedOver + mSeed.below(1000);
+            }
+        }
+        return lpPage;
+    }
     void handOver(ZTSSpoolPart& arPart, ZTSModelFrame aFrame) {
+        for (const ZTSTestRecord& lrRecord : aFrame.mRecords) {
+            mHandedOver += lrRecord.mOccurrences;
+        }
         const ZTSSpoolEntry lEntry{mSpool->finish(arPart), aFrame.mBytes.size()};
         aFrame.mPath = mSpool->pathOf(lEntry.mName);
         mOpen[lEntry.mName.mNumber] = std::move(aFrame);
-        mWorker->takeIn(lEntry, nullptr);
+        mWorker->takeIn(lEntry, makePage());
     }
     void storm() {
         for (unsigned i = 1 + mSeed.below(4); i > 0; --i) {
@@ -174,6 +191,7 @@ protected:
         beginPart();
         end();
         mPower.cut(true, nullptr);
+        expectIntegrity(mDirectory.path("history.db"));
         start();
     }
     void cutPower() {
@@ -190,9 +208,11 @@ protected:
         beginPart();
         end();
         mPower.cut(false, [this](unsigned aBound) { return draw(aBound); });
+        expectIntegrity(mDirectory.path("history.db"));
         cutSpool();
         mIsCut = false;
-        ++mGaps;  // with the power the agent went
+        ++mGaps;  // with the power the agent and its page went
+        mHandedOver = 0;
         start();
     }
     /// A file that was not synced is left whole, in part or not at all, perhaps under its former name.
@@ -263,8 +283,9 @@ protected:
     void expectAsModel() {
         waitUntilStored();
         countAll();
+        mWorker->notePage(makePage());
         endInOrder();
-        EXPECT_THAT(listSpool(state()), testing::IsEmpty());
+        expectSoundHistory(state());
         expectIntegrity(mDirectory.path("history.db"));
         std::map<unsigned, std::uint64_t> lTotals;
         const ZTCHistory lHistory(state());
@@ -291,6 +312,7 @@ protected:
     std::optional<std::pair<ZTSSpoolName, ZTSModelFrame>> mPart;
     std::optional<ZTSModelFrame> mLast;  ///< one that was stored and removed
     std::map<unsigned, std::uint64_t> mCounts;
+    std::uint64_t mHandedOver = 0;  ///< by the agent that runs
     std::size_t mGaps = 0;
     std::int64_t mTime = gcBase;
 };

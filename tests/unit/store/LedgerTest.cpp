@@ -117,6 +117,28 @@ TEST_F(LedgerTest, WhatAKilledAgentHeldAndWhatNeverArrivedIsOneGap) {
     EXPECT_EQ(history().readRetrievalTotals().mGaps, 1U);
 }
 
+TEST_F(LedgerTest, WhatWasTakenBehindTheLastKnownPageWasHandedOverAndIsInNoGap) {
+    note(gcGeneration, counts(100, 10, 60, 30));
+    take({makeQueueFull(gcPortA, gcBase, gcBase, 70)});
+    EXPECT_TRUE(endAgent(gcGeneration, true));
+    EXPECT_EQ(history().readGaps()[0].getOccurrences(), 20U) << "of the 30 that were held, 10 came";
+    EXPECT_EQ(row().mReceived, 100U);
+    EXPECT_EQ(row().mConsolidated, 90U);
+    EXPECT_EQ(row().mHandedOver, 70U);
+    EXPECT_EQ(row().mStored, 70U);
+    EXPECT_EQ(row().mLost, 0U);
+}
+
+TEST_F(LedgerTest, WhatWasTakenFromAnAgentWithoutAPageCountsAsReceived) {
+    take({makeQueueFull(gcPortA, gcBase, gcBase, 70)});
+    EXPECT_TRUE(endAgent(gcGeneration, true));
+    EXPECT_EQ(history().readGaps()[0].getOccurrences(), 0U);
+    EXPECT_EQ(row().mReceived, 70U);
+    EXPECT_EQ(row().mConsolidated, 70U);
+    EXPECT_EQ(row().mHandedOver, 70U);
+    EXPECT_EQ(row().mStored, 70U);
+}
+
 TEST_F(LedgerTest, AVanishedAgentIsAGapEvenWhereNothingIsMissing) {
     EXPECT_TRUE(endAgent(gcGeneration, true));
     ASSERT_EQ(history().readGaps().size(), 1U);
