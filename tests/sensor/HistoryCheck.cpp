@@ -5,8 +5,10 @@
 
 #include <filesystem>
 #include <map>
+#include <sstream>
 
 #include "sensor/store/include/History.h"
+#include "tests/support/Waiting.h"
 
 /// The first columns of the answer's rows, or what SQLite says against it.
 static std::string sExecute(const std::string& acrStateDirectory, const char* apSql) {
@@ -71,31 +73,69 @@ static std::string sNameOf(const ZTSInitiator& acrInitiator) {
     return acrInitiator.mWwpn ? acrInitiator.mWwpn->toText() : "";
 }
 
-void expectSoundHistory(const std::string& acrStateDirectory) {
-    EXPECT_EQ(checkIntegrity(acrStateDirectory), "ok");
-    EXPECT_EQ(listSpool(acrStateDirectory), std::vector<std::string>());
+/// The first thing that is wrong with it; empty: nothing.
+static std::string sFindFlaw(const std::string& acrStateDirectory) {
+    if (const std::string lProblem = checkIntegrity(acrStateDirectory); lProblem != "ok") {
+        return lProblem;
+    }
+    for (const std::string& lrName : listSpool(acrStateDirectory)) {
+        return lrName + " is in the spool";
+    }
     const ZTCHistory lHistory(acrStateDirectory);
     std::uint64_t lEpisodes = 0;
     std::uint64_t lStored = 0;
     // What agents held when they were killed is in the gaps.
     std::map<std::pair<std::string, ZTCKindKey>, std::uint64_t> lHeldInGaps;
     for (const ZTSGap& lrGap : lHistory.readGaps()) {
-        EXPECT_LE(lrGap.mFrom, lrGap.mTo) << lrGap.mReason;
+        if (lrGap.mFrom > lrGap.mTo) {
+            return "a gap ends before it begins: " + lrGap.mReason;
+        }
         for (const ZTSGapCount& lrCount : lrGap.mCounts) {
             lHeldInGaps[{sNameOf(lrCount.mInitiator), lrCount.mKind}] += lrCount.mHeld;
         }
     }
     for (const ZTSLedgerRow& lrRow : lHistory.readLedger()) {
-        SCOPED_TRACE(getKindName(lrRow.mKind));
-        EXPECT_EQ(lrRow.mReceived, lrRow.mConsolidated + lrRow.getRefusedTotal());
         const std::uint64_t lInGaps = lHeldInGaps[{sNameOf(lrRow.mInitiator), lrRow.mKind}];
-        EXPECT_EQ(lrRow.mConsolidated, lrRow.mHandedOver + lrRow.mHeld + lrRow.mDropped + lInGaps);
-        EXPECT_EQ(lrRow.mStored + lrRow.mRetired + lrRow.mLost, lrRow.mHandedOver);
+        if (lrRow.mReceived != lrRow.mConsolidated + lrRow.getRefusedTotal() ||
+            lrRow.mConsolidated != lrRow.mHandedOver + lrRow.mHeld + lrRow.mDropped + lInGaps ||
+            lrRow.mStored + lrRow.mRetired + lrRow.mLost != lrRow.mHandedOver) {
+            std::ostringstream lText;
+            lText << sNameOf(lrRow.mInitiator) << " " << getKindName(lrRow.mKind) << ": received " << lrRow.mReceived
+                  << ", refused " << lrRow.getRefusedTotal() << ", consolidated " << lrRow.mConsolidated
+                  << ", handed over " << lrRow.mHandedOver << ", held " << lrRow.mHeld << ", dropped " << lrRow.mDropped
+                  << ", held in gaps " << lInGaps << ", stored " << lrRow.mStored << ", retired " << lrRow.mRetired
+                  << ", lost " << lrRow.mLost;
+            return lText.str();
+        }
         lStored += lrRow.mStored;
     }
     lHistory.visitEpisodes({}, [&](const ZTSEpisode& acrEpisode) {
         lEpisodes += acrEpisode.mCount;
         return true;
     });
-    EXPECT_EQ(lEpisodes, lStored) << "the episodes' counts and the ledger differ";
+    return lEpisodes == lStored
+               ? ""
+               : "the episodes have " + std::to_string(lEpisodes) + ", the ledger has " + std::to_string(lStored);
+}
+
+void expectSoundHistory(const std::string& acrStateDirectory) {
+    EXPECT_EQ(sFindFlaw(acrStateDirectory), "");
+}
+
+void waitForSoundHistory(const std::string& acrStateDirectory) {
+    std::string lFlaw;
+    try {
+        waitUntil(
+            [&] {
+                try {
+                    lFlaw = sFindFlaw(acrStateDirectory);
+                } catch (const std::exception& lrEx) {
+                    lFlaw = lrEx.what();  // a collector is just opening it
+                }
+                return lFlaw.empty();
+            },
+            "a sound history", ZTCDeadline(3 * gcTestPatience));
+    } catch (const std::runtime_error&) {
+        ADD_FAILURE() << lFlaw;
+    }
 }

@@ -26,4 +26,7 @@ std::uint64_t countRefused(const std::string& acrStateDirectory);
 /// ledger says, and the spool is empty.
 void expectSoundHistory(const std::string& acrStateDirectory);
 
+/// The same while a collector runs that has nothing more to take in: its ledger follows with its next look.
+void waitForSoundHistory(const std::string& acrStateDirectory);
+
 #endif

@@ -72,7 +72,7 @@ protected:
             waitUntil([&] { return countGaps() >= lRun; }, "the gap", ZTCDeadline(3 * gcTestPatience));
             mSensor.waitUntilAllIsStored();
             EXPECT_EQ(countGaps(), lRun);
-            expectSoundHistory(mSensor.stateDirectory());
+            waitForSoundHistory(mSensor.stateDirectory());
         }
         EXPECT_EQ(mSensor.stop(), 0);
         EXPECT_EQ(countGaps(), sRuns());

@@ -119,7 +119,7 @@ TEST_F(SensorStormTest, CollectorsThatAreKilledInAStormLoseNothing) {
         lIsOver = true;
         lStorm.join();
         mSensor.waitUntilAllIsStored();
-        expectSoundHistory(mSensor.stateDirectory());
+        waitForSoundHistory(mSensor.stateDirectory());
         EXPECT_EQ(mSensor.findAgent(), lAgent) << "the agent's process is the same";
     }
     EXPECT_EQ(mSensor.stop(), 0);
