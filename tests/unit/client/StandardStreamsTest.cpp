@@ -7,6 +7,7 @@
 
 #include <algorithm>
 #include <cerrno>
+#include <cstdio>
 #include <string>
 #include <vector>
 
@@ -57,6 +58,7 @@ TEST(StandardStreams, AllIsWrittenWhereStandardOutputIsAPipeThatIsFullAndDoesNot
     }
     int lPipe[2];
     ASSERT_EQ(pipe2(lPipe, O_CLOEXEC), 0);
+    std::fflush(nullptr);  // a sanitizer's _exit() writes what is left
     const pid_t lChild = fork();
     if (lChild == 0) {
         dup2(lPipe[1], STDOUT_FILENO);
@@ -74,7 +76,8 @@ TEST(StandardStreams, AllIsWrittenWhereStandardOutputIsAPipeThatIsFullAndDoesNot
     int lStatus = -1;
     ASSERT_EQ(waitpid(lChild, &lStatus, 0), lChild);
     EXPECT_TRUE(WIFEXITED(lStatus) && WEXITSTATUS(lStatus) == 7) << lStatus;
-    EXPECT_EQ(lRead, lText);
+    EXPECT_TRUE(lRead == lText) << lRead.size() << " bytes came, of "
+                                << lText.size();  // too much for a comparison of lines
 }
 
 TEST(StandardStreams, AnErrorOfTheOutputSaysHowMuchWasWritten) {
