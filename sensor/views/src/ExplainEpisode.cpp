@@ -36,7 +36,7 @@ static std::uint64_t sRequireNumber(const std::string& acrText) {
     const auto lNumber = sParseNumber(acrText);
     if (!lNumber) {
         throw ZTCBadFilterEx("\"" + acrText +
-                             "\" is not a kind, a state, a rule or the number of an episode: tavik explain topics "
+                             "\" is not a kind, a state, a trouble, a rule or the number of an episode: tavik explain topics "
                              "lists them");
     }
     return *lNumber;
