@@ -35,9 +35,10 @@ static std::vector<std::uint64_t> sEvidence(const ZTCHistory& acrHistory, const 
 static std::uint64_t sRequireNumber(const std::string& acrText) {
     const auto lNumber = sParseNumber(acrText);
     if (!lNumber) {
-        throw ZTCBadFilterEx("\"" + acrText +
-                             "\" is not a kind, a state, a trouble, a rule or the number of an episode: tavik explain topics "
-                             "lists them");
+        throw ZTCBadFilterEx(
+            "\"" + acrText +
+            "\" is not a kind, a state, a trouble, a rule or the number of an episode: tavik explain topics "
+            "lists them");
     }
     return *lNumber;
 }
