@@ -10,6 +10,7 @@
 #ifndef SENSOR_COLLECTOR_INCLUDE_HISTORYWORKER_H
 #define SENSOR_COLLECTOR_INCLUDE_HISTORYWORKER_H
 
+#include <chrono>
 #include <condition_variable>
 #include <deque>
 #include <functional>
@@ -61,7 +62,9 @@ public:
     using Report = std::function<void(const std::string& acrLine)>;
 
     /// Starts the thread. @param arSpool  outlives this object  @param aReport  called on the worker's thread
-    ZTCHistoryWorker(ZTCSpool& arSpool, std::string aStateDirectory, const ZTSStoreLimits& acrLimits, Report aReport);
+    /// @param aRetryPause  after a transaction that has failed
+    ZTCHistoryWorker(ZTCSpool& arSpool, std::string aStateDirectory, const ZTSStoreLimits& acrLimits, Report aReport,
+                     std::chrono::milliseconds aRetryPause = std::chrono::seconds(1));
     /// Waits for the transaction in work, and ends the thread. What was not committed stays in the spool.
     ~ZTCHistoryWorker() override;
     ZTCHistoryWorker(const ZTCHistoryWorker&) = delete;
@@ -163,6 +166,7 @@ private:
     ZTCSpool& mrSpool;
     const std::string mDirectory;
     const Report mReport;
+    const std::chrono::milliseconds mRetryPause;
     const ZTCEventBell mBell;
 
     // ---- of the worker's thread ----

@@ -14,13 +14,16 @@ static constexpr milliseconds scLongestTransaction{500};
 /// A frame that is older than this when a transaction is over is synced itself. A younger one is committed or synced at
 /// the end of the next transaction. So nothing is unsynced for much more than a second.
 static constexpr milliseconds scLongestUnsynced{500};
-static constexpr seconds scRetryPause{1};
 static constexpr seconds scUpkeepPeriod{60};
 static constexpr seconds scCheckpointPeriod{1};
 
 ZTCHistoryWorker::ZTCHistoryWorker(ZTCSpool& arSpool, std::string aStateDirectory, const ZTSStoreLimits& acrLimits,
-                                   Report aReport)
-    : mrSpool(arSpool), mDirectory(std::move(aStateDirectory)), mReport(std::move(aReport)), mLimits(acrLimits) {
+                                   Report aReport, milliseconds aRetryPause)
+    : mrSpool(arSpool),
+      mDirectory(std::move(aStateDirectory)),
+      mReport(std::move(aReport)),
+      mRetryPause(aRetryPause),
+      mLimits(acrLimits) {
     mThread = std::thread([this] { run(); });
 }
 
@@ -131,7 +134,7 @@ bool ZTCHistoryWorker::openStore() {
             lProblem = lrEx.what();
         }
         setProblem(lProblem);
-        if (!pause(scRetryPause)) {
+        if (!pause(mRetryPause)) {
             return false;
         }
     }
@@ -221,7 +224,7 @@ void ZTCHistoryWorker::work(std::deque<ZTCJob>& arBatch) {
         setProblem(lrEx.what());
     }
     syncWaiting(arBatch, milliseconds(0));
-    pause(scRetryPause);
+    pause(mRetryPause);
 }
 
 void ZTCHistoryWorker::storeBatch(std::deque<ZTCJob>& arBatch) {

@@ -2,6 +2,7 @@
 
 #include <gmock/gmock.h>
 #include <gtest/gtest.h>
+#include <poll.h>
 #include <unistd.h>
 
 #include <filesystem>
@@ -9,11 +10,13 @@
 
 #include "sensor/store/include/History.h"
 #include "tests/sensor/HistoryCheck.h"
+#include "tests/support/ResourceLimit.h"
 #include "tests/support/SmallFileSystem.h"
 #include "tests/support/TemporaryDirectory.h"
 #include "tests/support/Waiting.h"
 #include "tests/unit/store/Frames.h"
 
+using std::chrono::milliseconds;
 using std::chrono::seconds;
 using testing::HasSubstr;
 using testing::IsEmpty;
@@ -29,11 +32,13 @@ protected:
     std::string state() const { return mDirectory.path("state"); }
 
     void start() {
-        mWorker =
-            std::make_unique<ZTCHistoryWorker>(*mSpool, state(), ZTSStoreLimits{}, [this](const std::string& acrLine) {
+        mWorker = std::make_unique<ZTCHistoryWorker>(
+            *mSpool, state(), ZTSStoreLimits{},
+            [this](const std::string& acrLine) {
                 const std::lock_guard lLock(mMutex);
                 mLines.push_back(acrLine);
-            });
+            },
+            milliseconds(5));
     }
     void startAndOpen() {
         start();
@@ -186,6 +191,39 @@ TEST_F(HistoryWorkerTest, ACutResponseOfAnAgentThatNobodyKnowsIsOneGap) {
     ASSERT_EQ(lGaps.size(), 1U);
     EXPECT_EQ(lGaps[0].mGeneration, scGeneration);
     EXPECT_FALSE(lGaps[0].mIsCountKnown);
+    EXPECT_THAT(listSpool(state()), IsEmpty());
+}
+
+TEST_F(HistoryWorkerTest, AFrameThatCanNeverBeReadIsGivenUpAndTheOthersFollow) {
+    startAndOpen();
+    const ZTSSpoolEntry lEntry = spool(3, 2);
+    std::filesystem::remove(mSpool->pathOf(lEntry.mName));
+    std::filesystem::create_symlink("elsewhere", mSpool->pathOf(lEntry.mName));  // which is never followed
+    mWorker->takeIn(lEntry, nullptr);
+    mWorker->takeIn(spool(4, 2), nullptr);
+    waitUntilStored(2);
+    EXPECT_EQ(ZTCHistory(state()).readGaps().size(), 1U);
+    EXPECT_THAT(lines(), testing::Contains(HasSubstr("3.a1.frame.unreadable")));
+    EXPECT_THAT(listSpool(state()), testing::ElementsAre("3.a1.frame.unreadable"));
+}
+
+TEST_F(HistoryWorkerTest, WithoutDescriptorsNoFrameIsGivenUpHoweverLongThatLasts) {
+    startAndOpen();
+    const ZTSSpoolEntry lEntry = spool(3, 2);
+    {
+        const ZTCResourceLimit lNoMore(RLIMIT_NOFILE, 1);  // poll() of one descriptor needs as much
+        mWorker->takeIn(lEntry, nullptr);
+        // It rings twice a try at most: reading and syncing fail. Ten tries are all that another file gets.
+        for (int i = 0; i < 40; ++i) {
+            pollfd lBell{.fd = mWorker->getBell().getDescriptor(), .events = POLLIN, .revents = 0};
+            ASSERT_EQ(poll(&lBell, 1, ZTCDeadline().remainingMilliseconds()), 1);
+            mWorker->getBell().clear();
+        }
+        EXPECT_THAT(mWorker->getState().mProblem, HasSubstr("3.a1.frame: Too many open files"));
+        EXPECT_EQ(mWorker->getState().mWaitingFrames, 1U);
+    }
+    waitUntilStored(2);
+    EXPECT_THAT(ZTCHistory(state()).readGaps(), IsEmpty());
     EXPECT_THAT(listSpool(state()), IsEmpty());
 }
 
