@@ -262,6 +262,13 @@ TEST_F(LibkpmAbs, FreeingUnloadsTheLibraryAndFreeingAgainDoesNothing) {
     EXPECT_THROW(mLibkpm.LIBKPM_Close(), ZTCInvalidEx);
 }
 
+TEST_F(LibkpmAbs, FreeingAgainTakesTheLibraryFromNobodyElse) {
+    mLibkpm.LIBKPM_LoadLibrary();
+    mLibkpm.LIBKPM_FreeLibrary();
+    mLibkpm.LIBKPM_FreeLibrary();
+    EXPECT_TRUE(ZTCAdaptersLibraryDouble::isModuleLoaded()) << "the double has loaded it too";
+}
+
 TEST_F(LibkpmAbs, EveryOperationIsInvalidWhileNothingIsLoaded) {
     ZTCPointer<ZTCWorldWideName> lNode;
     ZTCPointer<ZTCWorldWideName> lPort;

@@ -13,6 +13,8 @@
 
 #include "sensor/client/include/ClientErrors.h"
 #include "tests/support/ChildFunction.h"
+#include "tests/support/TemporaryDirectory.h"
+#include "tests/support/Waiting.h"
 
 /// Closes these descriptors, reserves the standard streams and opens a file. Returns its descriptor.
 static int sDescriptorAfterClosing(const std::vector<int>& acrClosed) {
@@ -67,6 +69,11 @@ TEST(StandardStreams, AllIsWrittenWhereStandardOutputIsAPipeThatIsFullAndDoesNot
         _exit(7);
     }
     close(lPipe[1]);
+    const auto lSleeps = [lChild] {
+        const std::string lStatus = readFile("/proc/" + std::to_string(lChild) + "/stat");
+        return lStatus.find(") S ") != std::string::npos;
+    };
+    waitUntil(lSleeps, "the writer to wait for room without spinning");
     std::string lRead;
     char lBuffer[4096];
     for (ssize_t lCount; (lCount = read(lPipe[0], lBuffer, sizeof(lBuffer))) > 0;) {

@@ -193,6 +193,7 @@ void ZTCFakeKernel::fillInstance(const std::string& acrPath) {
         writeFile(acrPath + "/events/header_page", mHeaderPage);
     }
     writeFile(acrPath + "/buffer_size_kb", "1408");
+    writeFile(acrPath + "/trace_clock", "local");
     if (mHasBufferPercent) {
         writeFile(acrPath + "/buffer_percent", "50");
     } else {

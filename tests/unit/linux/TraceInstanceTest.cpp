@@ -48,6 +48,7 @@ TEST_F(TraceInstance, IsMadeUnderANameOfThisProcessAndRemovedWithItsOwner) {
         EXPECT_TRUE(lpInstance->getBuffers().wakesAtOnce());
         EXPECT_EQ(mKernel.instanceFile("buffer_size_kb"), "256");
         EXPECT_EQ(mKernel.instanceFile("buffer_percent"), "0");
+        EXPECT_EQ(mKernel.instanceFile("trace_clock"), "mono") << "one clock for the buffers of all processors";
         EXPECT_EQ(event("enable"), "0") << "nothing is recorded yet";
     }
     EXPECT_TRUE(mKernel.instances().empty());

@@ -1,5 +1,8 @@
 #include "sensor/views/include/TimeText.h"
 
+#include <cstdlib>
+#include <ctime>
+
 #include "tests/unit/views/ViewSamples.h"
 
 class TimeText : public LocalTime {
@@ -14,6 +17,12 @@ TEST_F(TimeText, Rfc3339HasMicrosecondsAndTheLocalOffset) {
     EXPECT_EQ(toRfc3339(fromMicroseconds(1795251852000007)), "2026-11-21T10:04:12.000007+01:00");
     EXPECT_EQ(toRfc3339(fromMicroseconds(-1)), "1970-01-01T00:59:59.999999+01:00");
     EXPECT_EQ(toRfc3339(timeOf("2026-07-01T12:00:00Z")), "2026-07-01T14:00:00.000000+02:00");
+}
+
+TEST_F(TimeText, WestOfGreenwichTheOffsetIsNegative) {
+    setenv("TZ", "NST3:30", 1);
+    tzset();
+    EXPECT_EQ(toRfc3339(timeOf("2026-11-21T10:04:12Z")), "2026-11-21T06:34:12.000000-03:30");
 }
 
 TEST_F(TimeText, Rfc3339IsReadBackWhateverItsOffset) {
