@@ -44,6 +44,15 @@ TEST_F(CountTest, ARecordWithinOneMinuteCountsThereAndAnyOtherInItsLastMinuteAsS
     EXPECT_EQ(lDays[0].mSpread, 0U);
 }
 
+TEST_F(CountTest, TransactionsOfOneMinuteAddUp) {
+    for (const std::uint32_t lOccurrences : {3U, 4U, 5U}) {
+        take({makeQueueFull(gcPortA, gcBase, gcBase, lOccurrences)});
+    }
+    const auto lMinutes = minutes();
+    ASSERT_EQ(lMinutes.size(), 1U);
+    EXPECT_EQ(lMinutes[0].mOccurrences, 12U);
+}
+
 TEST_F(CountTest, ADayCountsLikewise) {
     const std::int64_t lMidnight = gcBase - gcBase % gcDay + gcDay;
     take({makeQueueFull(gcPortA, lMidnight - 1, lMidnight, 4), makeQueueFull(gcPortA, lMidnight, lMidnight, 5)});
