@@ -16,6 +16,9 @@
 #include "sensor/agentcommon/include/SensorAgentProtocol.h"
 #include "sensor/client/include/ClientErrors.h"
 
+/// A file that is replaced between its opening and its lock so often is replaced for ever.
+static constexpr int scMostTries = 100;
+
 long readPid(int aDescriptor) {
     char lText[32];
     ssize_t lCount;
@@ -58,7 +61,7 @@ ZTCSensorPidFile::~ZTCSensorPidFile() {
 
 void ZTCSensorPidFile::take() {
     ZTCFileDescriptor lFile;
-    do {
+    for (int lTry = 1;; ++lTry) {
         lFile = ZTCFileDescriptor::open(mPath.c_str(), O_RDWR | O_CREAT | O_NOFOLLOW | O_NONBLOCK, 0644);
         if (!lFile.isOpen()) {
             throw ZTCSystemCallEx("cannot open the sensor's pid file " + mPath, errno);
@@ -72,7 +75,14 @@ void ZTCSensorPidFile::take() {
                 throw ZTCSystemCallEx("cannot lock the sensor's pid file " + mPath, errno);
             }
         }
-    } while (!lFile.isAtPath(mPath.c_str()));
+        errno = ESTALE;  // another file is there by now, unless a call says more
+        if (lFile.isAtPath(mPath.c_str())) {
+            break;
+        }
+        if (lTry == scMostTries) {
+            throw ZTCSystemCallEx("cannot keep hold of the sensor's pid file " + mPath, errno);
+        }
+    }
 
     const long lPid = readPid(lFile.get());
     if (lPid != 0 && lPid != getpid() && isProcessAlive(lPid)) {

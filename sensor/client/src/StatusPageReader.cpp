@@ -11,7 +11,6 @@
 #include <thread>
 
 #include "libkpm/include/ScopeEventKinds.h"
-#include "sensor/client/include/ClientErrors.h"
 
 static_assert(gcScopeEventKinds.size() == gcStatusKinds);
 
@@ -19,6 +18,9 @@ namespace {
 
 /// Copies that are made before one that a retrieval interrupted is taken as it is.
 constexpr int scMostCopies = 10;
+
+/// Errors that say that there is no page there, or none for this process. All others say nothing about it.
+constexpr int scNoPage[] = {ENOENT, ENOTDIR, ELOOP, ENAMETOOLONG, EACCES, EPERM, ENXIO, ENODEV};
 
 /// Looks at a state that is being written at this moment, before it is taken without its words.
 constexpr int scMostLooks = 20;
@@ -153,6 +155,7 @@ bool ZTCStatusPageReader::open(const std::string& acrPath) {
 
 bool ZTCStatusPageReader::read(ZTSStatusSnapshot& arSnapshot) {
     mReason.clear();
+    mHasLooked = true;
     if (mpMapped == nullptr) {
         return fail("no page is open");
     }
@@ -210,7 +213,7 @@ bool ZTCStatusPageReader::read(ZTSStatusSnapshot& arSnapshot) {
 
 /// errno says why.
 bool ZTCStatusPageReader::failToLook(const char* apWhat) {
-    mHasLooked = !isShortage(errno);
+    mHasLooked = std::ranges::find(scNoPage, errno) != std::end(scNoPage);
     return fail(apWhat + std::string(std::strerror(errno)));
 }
 

@@ -118,7 +118,8 @@ bool ZTCAgentSession::attach(ZTCTime aNow) {
         scheduleNext(aNow + scAgentPause);
         return false;
     }
-    if (!mHasPage && !mPageReader.hasLooked()) {
+    readPage();
+    if (mpPage == nullptr && !mPageReader.hasLooked()) {
         // Without its page nobody can say what the agent has lost.
         if (!std::exchange(mHasToldPage, true)) {
             mEvents.mLines.push_back(mPageReader.getReason() + ": the agent is not asked; tried again every second");
@@ -126,7 +127,6 @@ bool ZTCAgentSession::attach(ZTCTime aNow) {
         scheduleNext(aNow + scDiskPause);
         return false;
     }
-    readPage();
     std::string lGeneration;
     if (mpPage != nullptr) {
         lGeneration = mpPage->mStartId;

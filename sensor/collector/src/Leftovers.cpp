@@ -74,12 +74,12 @@ void ZTCLeftovers::endPages(const std::string& acrCurrent) {
         }
         ZTCStatusPageReader lReader;
         auto lpPage = std::make_shared<ZTSStatusSnapshot>();
-        const bool lIsOpen = lReader.open(lrPath);
-        if (!lIsOpen && !lReader.hasLooked()) {
+        const bool lIsRead = lReader.open(lrPath) && lReader.read(*lpPage);
+        if (!lIsRead && !lReader.hasLooked()) {
             mReport(lReader.getReason() + ": tried again");
             continue;
         }
-        if (!lIsOpen || !lReader.read(*lpPage)) {
+        if (!lIsRead) {
             mReport(lReader.getReason() + ": removed");
             unlink(lrPath.c_str());
             continue;

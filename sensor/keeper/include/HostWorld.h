@@ -5,6 +5,7 @@
 #include <optional>
 #include <set>
 #include <string>
+#include <string_view>
 
 #include "sensor/agentcommon/include/StatusPage.h"
 #include "sensor/client/include/ClientLock.h"
@@ -17,7 +18,7 @@
 #include "sensor/settings/include/Settings.h"
 
 /// One line on standard error.
-void sayLine(const std::string& acrText);
+void sayLine(std::string_view aText);
 
 class ZTCHostWorld : public ZTCKeeperWorld {
 public:

@@ -7,8 +7,11 @@
 #include <sys/stat.h>
 #include <unistd.h>
 
+#include <algorithm>
 #include <cerrno>
+#include <climits>
 #include <cstdio>
+#include <cstring>
 #include <ctime>
 #include <random>
 
@@ -23,10 +26,13 @@
 static constexpr int scLockTries = 300;
 static constexpr int scLockPauseMilliseconds = 50;
 
-void sayLine(const std::string& acrText) {
-    const std::string lLine = "tavik-sensor: " + acrText + "\n";
+void sayLine(std::string_view aText) {
+    // Without an allocation: what it says may be that memory is short.
+    char lLine[PIPE_BUF];
+    const int lLength = std::snprintf(lLine, sizeof(lLine), "tavik-sensor: %.*s\n",
+                                      static_cast<int>(std::min(aText.size(), sizeof(lLine) - 32)), aText.data());
     // In one piece, so that lines of several processes do not mix. One that cannot be written is lost.
-    [[maybe_unused]] const ssize_t lWritten = write(STDERR_FILENO, lLine.data(), lLine.size());
+    [[maybe_unused]] const ssize_t lWritten = write(STDERR_FILENO, lLine, static_cast<std::size_t>(lLength));
 }
 
 ZTCHostWorld::ZTCHostWorld(const ZTSSettingsReading& acrReading, std::string aConfigOption)
@@ -152,7 +158,11 @@ ZTEStrangerLook ZTCHostWorld::lookForStranger() {
 
 ZTELinkResult ZTCHostWorld::send(const ZTSLinkMessage& acrMessage) {
     try {
-        return mLink.isOpen() ? mLink.send(acrMessage) : ZTLR_PeerGone;
+        const ZTELinkResult lResult = mLink.isOpen() ? mLink.send(acrMessage) : ZTLR_PeerGone;
+        if (lResult == ZTLR_NotNow && errno != EAGAIN) {
+            say(std::string("collector: a message cannot be sent: ") + std::strerror(errno));
+        }
+        return lResult;
     } catch (const ZTCClientEx& lcrEx) {
         say(std::string("collector: ") + lcrEx.what());
         return ZTLR_PeerGone;

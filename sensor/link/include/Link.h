@@ -87,7 +87,7 @@ struct ZTSLinkMessage {
 
 enum ZTELinkResult {
     ZTLR_Done,     ///< sent, or received
-    ZTLR_NotNow,   ///< nothing to receive; or no room to send: try again later
+    ZTLR_NotNow,   ///< nothing to receive; or no room to send, errno says why: try again later
     ZTLR_PeerGone  ///< the other end is closed: the keeper, or the collector, has ended
 };
 

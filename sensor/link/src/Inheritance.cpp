@@ -8,6 +8,7 @@
 #include <cerrno>
 #include <charconv>
 #include <cstdlib>
+#include <cstring>
 #include <string_view>
 
 #include "sensor/client/include/ClientErrors.h"
@@ -27,9 +28,13 @@ static ZTCFileDescriptor sTakeDescriptor(const char* apName, mode_t aKind) {
     const std::string lText = sTakeVariable(apName);
     int lNumber = -1;
     const auto [lpEnd, lError] = std::from_chars(lText.data(), lText.data() + lText.size(), lNumber);
+    const bool lIsNumber = lError == std::errc() && lpEnd == lText.data() + lText.size() && lNumber >= 3;
     struct stat lStatus {};
-    if (lError != std::errc() || lpEnd != lText.data() + lText.size() || lNumber < 3 || fstat(lNumber, &lStatus) != 0 ||
-        (lStatus.st_mode & S_IFMT) != aKind || fcntl(lNumber, F_SETFD, FD_CLOEXEC) != 0) {
+    if (lIsNumber && (fstat(lNumber, &lStatus) != 0 || fcntl(lNumber, F_SETFD, FD_CLOEXEC) != 0)) {
+        const std::string lReason = std::strerror(errno);
+        throw ZTCBadInputEx(std::string(apName) + " is \"" + lText + "\", which cannot be used: " + lReason);
+    }
+    if (!lIsNumber || (lStatus.st_mode & S_IFMT) != aKind) {
         throw ZTCBadInputEx(std::string(apName) + " is \"" + lText + "\", which is not an open descriptor of its kind");
     }
     return ZTCFileDescriptor(lNumber);

@@ -179,7 +179,7 @@ TEST_F(StatusPageReader, RefusesWhatIsNotARegularFile) {
     expectRefused("is not a regular file");
 }
 
-TEST_F(StatusPageReader, HasNotLookedOnlyWhereDescriptorsOrMemoryAreMissing) {
+TEST_F(StatusPageReader, HasLookedWhereThePathIsWrongButNotWhereDescriptorsAreMissing) {
     const ZTCStatusPageFile lFile(mPath);
     {
         const ZTCResourceLimit lNoDescriptor(RLIMIT_NOFILE, 0);
