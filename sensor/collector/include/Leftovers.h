@@ -5,6 +5,7 @@
 
 #include <functional>
 #include <string>
+#include <system_error>
 #include <vector>
 
 #include "sensor/collector/include/HistorySink.h"
@@ -33,12 +34,13 @@ public:
     void tearParts();
 
     /// Hands the pages of agents that have ended to the history, which removes them. To be called when no agent waits
-    /// to be emptied.
+    /// to be emptied. Throws ZTCClientEx where it cannot be seen whether an agent runs.
     /// @param acrCurrent  the running agent's page, which stays; empty: none
-    void endPages(const std::string& acrCurrent);
+    /// @return false: to be called again. The agent of a page still runs, or descriptors or memory were short.
+    bool endPages(const std::string& acrCurrent);
 
 private:
-    std::vector<std::string> listPages() const;
+    std::vector<std::string> listPages(std::error_code& arError) const;
 
     const std::string mAgentDirectory;
     ZTCSpool& mrSpool;

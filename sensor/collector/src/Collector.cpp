@@ -281,11 +281,12 @@ void ZTCCollector::sweep(ZTCTime aNow) {
         if (lpSession == nullptr) {
             mLeftovers.tearParts();
         }
-        mLeftovers.endPages(lpSession != nullptr ? lpSession->getPagePath() : "");
-        if (!mIsSwept) {
+        const bool lIsComplete = mLeftovers.endPages(lpSession != nullptr ? lpSession->getPagePath() : "");
+        // Agents are forgotten only where they have left no page.
+        if (!mIsSwept && lIsComplete) {
             mHistory.endForgottenAgents(lpSession != nullptr ? lpSession->getGeneration() : "");
+            mIsSwept = true;
         }
-        mIsSwept = true;
         mSpoolProblem.clear();
     } catch (const ZTCSpoolTroubleEx& lrEx) {
         mSpoolProblem = lrEx.what();

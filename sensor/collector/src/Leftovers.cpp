@@ -21,11 +21,10 @@ static ZTSEndedAgent sDescribe(const ZTCPagePointer& acrPage, const std::string&
     return lAgent;
 }
 
-std::vector<std::string> ZTCLeftovers::listPages() const {
+std::vector<std::string> ZTCLeftovers::listPages(std::error_code& arError) const {
     std::vector<std::string> lPaths;
-    std::error_code lError;
-    for (std::filesystem::directory_iterator lEntry(mAgentDirectory, lError), lEnd; !lError && lEntry != lEnd;
-         lEntry.increment(lError)) {
+    for (std::filesystem::directory_iterator lEntry(mAgentDirectory, arError), lEnd; !arError && lEntry != lEnd;
+         lEntry.increment(arError)) {
         if (lEntry->path().filename().string().starts_with("page.")) {
             lPaths.push_back(lEntry->path());
         }
@@ -35,7 +34,8 @@ std::vector<std::string> ZTCLeftovers::listPages() const {
 }
 
 ZTCPagePointer ZTCLeftovers::findPage(const std::string& acrGeneration) const {
-    for (const std::string& lrPath : listPages()) {
+    std::error_code lError;
+    for (const std::string& lrPath : listPages(lError)) {
         ZTCStatusPageReader lReader;
         auto lpPage = std::make_shared<ZTSStatusSnapshot>();
         if (lReader.open(lrPath) && lReader.read(*lpPage) && lpPage->mStartId == acrGeneration) {
@@ -67,8 +67,14 @@ void ZTCLeftovers::tearParts() {
     }
 }
 
-void ZTCLeftovers::endPages(const std::string& acrCurrent) {
-    for (const std::string& lrPath : listPages()) {
+bool ZTCLeftovers::endPages(const std::string& acrCurrent) {
+    std::error_code lError;
+    const std::vector<std::string> lPaths = listPages(lError);
+    bool lIsComplete = !isShortage(lError.value());
+    if (!lIsComplete) {
+        mReport("cannot look for status pages in " + mAgentDirectory + ": " + lError.message() + ": tried again");
+    }
+    for (const std::string& lrPath : lPaths) {
         if (lrPath == acrCurrent) {
             continue;
         }
@@ -77,6 +83,7 @@ void ZTCLeftovers::endPages(const std::string& acrCurrent) {
         const bool lIsRead = lReader.open(lrPath) && lReader.read(*lpPage);
         if (!lIsRead && !lReader.hasLooked()) {
             mReport(lReader.getReason() + ": tried again");
+            lIsComplete = false;
             continue;
         }
         if (!lIsRead) {
@@ -89,6 +96,9 @@ void ZTCLeftovers::endPages(const std::string& acrCurrent) {
         const ZTSAgentState lAgent = lookAtAgent(mAgentDirectory);
         if (lAgent.mPresence == ZTAP_None || lAgent.mPid != static_cast<long>(lpPage->mPid)) {
             mrHistory.endAgent(sDescribe(lpPage, lrPath));
+        } else {
+            lIsComplete = false;
         }
     }
+    return lIsComplete;
 }

@@ -117,7 +117,7 @@ TEST_F(LeftoversTest, ThePageOfAStartIsFoundByItsGeneration) {
 TEST_F(LeftoversTest, PagesOfEndedAgentsGoToTheHistoryAndTheRunningOnesStays) {
     writePage("page.1", 11);
     writePage("page.2", 12);
-    mLeftovers.endPages(pagePath("page.2"));
+    EXPECT_TRUE(mLeftovers.endPages(pagePath("page.2")));
     ASSERT_EQ(mHistory.mEnded.size(), 1U);
     EXPECT_EQ(mHistory.mEnded[0].mPagePath, pagePath("page.1"));
     EXPECT_FALSE(mHistory.mEnded[0].mIsVanished);
@@ -126,7 +126,7 @@ TEST_F(LeftoversTest, PagesOfEndedAgentsGoToTheHistoryAndTheRunningOnesStays) {
 
 TEST_F(LeftoversTest, AFileThatIsNoPageIsNamedAndRemoved) {
     writeFile(pagePath("page.1"), "x");
-    mLeftovers.endPages("");
+    EXPECT_TRUE(mLeftovers.endPages(""));
     EXPECT_THAT(mLines, ElementsAre(HasSubstr("page.1': is too short")));
     EXPECT_FALSE(isThere("page.1"));
     EXPECT_THAT(mHistory.mEnded, IsEmpty());
@@ -139,10 +139,10 @@ TEST_F(LeftoversTest, ThePageOfAnAgentThatStillRunsWaitsUntilItHasEnded) {
     {
         const ZTCFileDescriptor lHeld = ZTCFileDescriptor::open(pagePath("qrv-tvk.pid").c_str(), O_RDWR);
         ASSERT_EQ(flock(lHeld.get(), LOCK_EX | LOCK_NB), 0);
-        mLeftovers.endPages("");
+        EXPECT_FALSE(mLeftovers.endPages(""));
         EXPECT_THAT(mHistory.mEnded, IsEmpty());
     }
-    mLeftovers.endPages("");
+    EXPECT_TRUE(mLeftovers.endPages(""));
     EXPECT_EQ(mHistory.mEnded.size(), 1U);
 }
 
@@ -150,10 +150,12 @@ TEST_F(LeftoversTest, WithoutDescriptorsPagesAreNotTakenForMissing) {
     writePage("page.1", 11);
     {
         const ZTCResourceLimit lNoMore(RLIMIT_NOFILE, 0);
-        mLeftovers.endPages("");
+        EXPECT_FALSE(mLeftovers.endPages(""));
     }
+    EXPECT_THAT(mLines, ElementsAre(testing::AllOf(HasSubstr("cannot look for status pages in"),
+                                                   HasSubstr("Too many open files: tried again"))));
     EXPECT_THAT(mHistory.mEnded, IsEmpty());
-    mLeftovers.endPages("");
+    EXPECT_TRUE(mLeftovers.endPages(""));
     EXPECT_EQ(mHistory.mEnded.size(), 1U);
 }
 
