@@ -98,6 +98,7 @@ protected:
             },
             "a sensor that works", ZTCDeadline(6 * gcTestPatience));
         mSensor.waitUntilAllIsStored();
+        waitForSoundHistory(mSensor.stateDirectory());
     }
     /// Fails the call at each of its numbers until it is made no more. Returns how often it failed.
     unsigned fail(const ZTSFailingCall& acrCall, bool aIsLasting) {
