@@ -86,13 +86,17 @@ void ZTCFakeAgent::sendRaw(const ZTCWireBytes& acrBytes) {
     }
 }
 
-void ZTCFakeAgent::sendFrame(const ZTCWireBytes& acrBody) {
+static ZTCWireBytes sMakeFrame(const ZTCWireBytes& acrBody) {
     ZTCWireBytes lFrame;
     for (int lShift = 24; lShift >= 0; lShift -= 8) {
         lFrame.push_back(static_cast<std::uint8_t>(acrBody.size() >> lShift));
     }
     lFrame.insert(lFrame.end(), acrBody.begin(), acrBody.end());
-    sendRaw(lFrame);
+    return lFrame;
+}
+
+void ZTCFakeAgent::sendFrame(const ZTCWireBytes& acrBody) {
+    sendRaw(sMakeFrame(acrBody));
 }
 
 void ZTCFakeAgent::die() {
@@ -151,6 +155,15 @@ ZTCFakeAgent::ZTCStep ZTCFakeAgent::answering(const ZTCWireBytes& acrBody) {
 
 ZTCFakeAgent::ZTCStep ZTCFakeAgent::answeringRaw(const ZTCWireBytes& acrBytes) {
     return [acrBytes](ZTCFakeAgent& arAgent, const ZTCWireBytes&) { arAgent.sendRaw(acrBytes); };
+}
+
+ZTCFakeAgent::ZTCStep ZTCFakeAgent::answeringInHalves(const ZTCWireBytes& acrBody, std::shared_future<void> aGoOn) {
+    return [lFrame = sMakeFrame(acrBody), lGoOn = std::move(aGoOn)](ZTCFakeAgent& arAgent, const ZTCWireBytes&) {
+        const auto lMiddle = lFrame.begin() + std::ssize(lFrame) / 2;
+        arAgent.sendRaw({lFrame.begin(), lMiddle});
+        lGoOn.wait();
+        arAgent.sendRaw({lMiddle, lFrame.end()});
+    };
 }
 
 ZTCFakeAgent::ZTCStep ZTCFakeAgent::silent() {

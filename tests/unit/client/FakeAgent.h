@@ -5,6 +5,7 @@
 #include <atomic>
 #include <deque>
 #include <functional>
+#include <future>
 #include <mutex>
 #include <string>
 #include <thread>
@@ -39,6 +40,8 @@ public:
 
     static ZTCStep answering(const ZTCWireBytes& acrBody);
     static ZTCStep answeringRaw(const ZTCWireBytes& acrBytes);
+    /// Sends the first half of the answer's frame, and the other half once the future is ready.
+    static ZTCStep answeringInHalves(const ZTCWireBytes& acrBody, std::shared_future<void> aGoOn);
     static ZTCStep silent();
     static ZTCStep dying(const ZTCWireBytes& acrLastBytes);
 
