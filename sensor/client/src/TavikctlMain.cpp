@@ -61,14 +61,14 @@ static ZTEExitStatus sRunWatch(const ZTSToolOptions& acrOptions, const ZTSComman
 static ZTEExitStatus sRun(int aCount, const char* const* appArguments) {
     ZTSCommandLine lLine;
     std::function<ZTEExitStatus(const ZTSToolOptions&)> lCommand;
-    CLI::App lApp{"Talks to the Fibre Channel event agent of a directory, in the sensor's place.", "tavikctl"};
+    CLI::App lApp{"Talks to the Fibre Channel event agent of a directory, instead of a sensor.", "tavikctl"};
     lApp.require_subcommand(1);
     lApp.fallthrough();
     lApp.set_version_flag("--version", "tavikctl v" TAVIKCTL_VERSION);
     lApp.add_option("--dir", lLine.mDirectory, "The agent's directory; default: $ZT_QRV_SENSOR_DIR");
-    lApp.add_option("--timeout", lLine.mTimeout, "Longest wait for an agent and its answer, in seconds; default: 10");
+    lApp.add_option("--timeout", lLine.mTimeout, "How many seconds to wait for an agent and its answer; default: 10");
     lApp.add_flag("--json", lLine.mIsJson, "Print JSON instead of tables");
-    lApp.add_flag("--wait", lLine.mIsWaiting, "Wait for an agent that is about to be started, at most the timeout");
+    lApp.add_flag("--wait", lLine.mIsWaiting, "Wait for an agent that is about to be started, at most for the timeout");
     lApp.footer(
         "Exit status: 0 done, 1 refused by the agent, 2 wrong use, 3 no agent or no usable answer in time,\n"
         "4 a file or standard output cannot be written.");
@@ -82,7 +82,7 @@ static ZTEExitStatus sRun(int aCount, const char* const* appArguments) {
         return runCommand(acrOptions, "start",
                           encodeStartScope(parseUnsigned(lLine.mMaxRecordBytes, "max-record-bytes")));
     })->add_option("--max-record-bytes", lLine.mMaxRecordBytes, "Most bytes of event data in one record; default: 900");
-    lAdd("stop", "Stop collecting; what has been collected stays",
+    lAdd("stop", "Stop collecting. The records that were collected stay",
          [&](const ZTSToolOptions& acrOptions) { return runCommand(acrOptions, "stop", encodeStop()); });
     lAdd("get", "Take all records from the agent and print them", [&](const ZTSToolOptions& acrOptions) {
         return runGet(acrOptions, lLine.mRawPath);
@@ -91,9 +91,10 @@ static ZTEExitStatus sRun(int aCount, const char* const* appArguments) {
          [&](const ZTSToolOptions& acrOptions) {
              return runCommand(acrOptions, "targets", encodeRegisterTargets(collectTargets(lLine.mTargets)));
          })
-        ->add_option("TARGET", lLine.mTargets, "WWNN,WWPN,FCID, or a file with one a line, or - for standard input")
+        ->add_option("TARGET", lLine.mTargets,
+                     "WWNN,WWPN,FCID, or a file with one target on each line, or - for standard input")
         ->required();
-    lAdd("period", "Tell the agent the collection period",
+    lAdd("period", "Send the collection period to the agent",
          [&](const ZTSToolOptions& acrOptions) {
              return runCommand(acrOptions, "period", encodeCollectionPeriod(parseUnsigned(lLine.mPeriod, "period")));
          })
@@ -103,12 +104,13 @@ static ZTEExitStatus sRun(int aCount, const char* const* appArguments) {
          [&](const ZTSToolOptions& acrOptions) { return runCommand(acrOptions, "shutdown", encodeShutDown()); });
     lAdd("status", "Say whether an agent runs and answers",
          [](const ZTSToolOptions& acrOptions) { return runStatus(acrOptions); });
-    CLI::App* lpWatch = lAdd("watch", "Play the sensor: start collecting, retrieve and print again and again",
+    CLI::App* lpWatch = lAdd("watch", "Act as the sensor: start collecting, then retrieve and print again and again",
                              [&](const ZTSToolOptions& acrOptions) { return sRunWatch(acrOptions, lLine); });
     lpWatch->add_option("--interval", lLine.mInterval, "Seconds between two retrievals; default: 60");
-    lpWatch->add_option("--count", lLine.mCount, "End after this many retrievals; default: 0, never");
-    lpWatch->add_option("--max-record-bytes", lLine.mMaxRecordBytes, "As of start; default: 900");
-    lpWatch->add_option("--targets", lLine.mTargets, "Register these first, as with the command targets");
+    lpWatch->add_option("--count", lLine.mCount, "End after this many retrievals; default: 0, which means never");
+    lpWatch->add_option("--max-record-bytes", lLine.mMaxRecordBytes,
+                        "Most bytes of event data in one record; default: 900");
+    lpWatch->add_option("--targets", lLine.mTargets, "Register these targets first, as the command targets does");
     const CLI::App* lpDecode =
         lAdd("decode", "Print an answer saved with get --raw",
              [&](const ZTSToolOptions& acrOptions) { return runDecode(acrOptions, lLine.mDecodePath); });
