@@ -102,8 +102,8 @@ public:
     void close() noexcept;
     bool isOpen() const { return mpMapped != nullptr; }
 
-    /// After open() or read() has failed: whether it could look at the file. False: a call failed for another reason,
-    /// such as a lack of descriptors or memory. The file may be a good page, and is to be tried again.
+    /// After open() or read() has failed: whether that says something about the file. False: a call failed for a reason
+    /// of its own, such as a lack of descriptors or memory. The file may be a good page, and is to be tried again.
     bool hasLooked() const { return mHasLooked; }
 
     /// In words; empty after a success.

@@ -16,7 +16,7 @@
 #include "sensor/agentcommon/include/SensorAgentProtocol.h"
 #include "sensor/client/include/ClientErrors.h"
 
-/// A file that is replaced between its opening and its lock so often is replaced for ever.
+/// Tries to lock the file at the path. Between opening and lock, another file can take its place.
 static constexpr int scMostTries = 100;
 
 long readPid(int aDescriptor) {

@@ -39,7 +39,8 @@ std::unique_ptr<ZTCHistory> ZTCContext::openHistory() const {
 std::string ZTCContext::findStoreId() const {
     try {
         return openHistory()->getStoreId();
-    } catch (const ZTCStoreEx&) {
+    } catch (const ZTCStoreEx& lrEx) {
+        complain(lrEx.what());
         return {};
     }
 }

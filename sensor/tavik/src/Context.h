@@ -24,7 +24,7 @@ public:
 
     /// The history, read-only. Throws what ZTCHistory throws.
     std::unique_ptr<ZTCHistory> openHistory() const;
-    /// The id of the history; empty where it cannot be read.
+    /// The id of the history; empty, after saying why, where it cannot be read.
     std::string findStoreId() const;
     /// The names of the settings, and the ports and the topology that the history knows. @param apHistory  null: none;
     /// otherwise it outlives the names

@@ -38,19 +38,21 @@ std::string formatHeadline(const ZTSStatusFacts& acrFacts, const ZTSJudgement& a
 }
 
 /// The table's action with the configured files and folders in place of the default ones.
-static std::string sWithPlaces(std::string aAction, const ZTSStatusPlaces& acrPlaces) {
+static std::string sWithPlaces(std::string_view aAction, const ZTSStatusPlaces& acrPlaces) {
     const ZTSStatusPlaces lDefaults;
     const std::pair<const std::string&, const std::string&> lPlaces[] = {
         {lDefaults.mSettingsFile, acrPlaces.mSettingsFile},
         {lDefaults.mStateDirectory, acrPlaces.mStateDirectory},
         {lDefaults.mAgentLog, acrPlaces.mAgentLog}};
-    for (const auto& [lrDefault, lrConfigured] : lPlaces) {
-        const std::size_t lAt = aAction.find(lrDefault);
-        if (lAt != std::string::npos) {
-            aAction.replace(lAt, lrDefault.size(), lrConfigured);
-        }
+    std::string lText;
+    while (!aAction.empty()) {
+        const auto* const lpPlace =
+            std::ranges::find_if(lPlaces, [&](const auto& acrPlace) { return aAction.starts_with(acrPlace.first); });
+        const bool lIsPlace = lpPlace != std::end(lPlaces);
+        lText += lIsPlace ? lpPlace->second : std::string(1, aAction.front());
+        aAction.remove_prefix(lIsPlace ? lpPlace->first.size() : 1);
     }
-    return aAction;
+    return lText;
 }
 
 static std::vector<std::string> sSplitLines(std::string_view aText) {
