@@ -56,6 +56,8 @@ lun_device() {
   return 1
 }
 sg_of() { lun_device "$1" scsi_generic; }
+# Its disk comes last: the kernel asks the LUN for its size first, and does so beside other work.
+lun_is_there() { sg_of "$1" >/dev/null && lun_device "$1" block >/dev/null; }
 
 controller() { echo /sys/class/net/$1/ctlr_*; }
 set_link() { /vm/bin/ip link set "$1" "$2"; }
@@ -137,7 +139,7 @@ port_create() {
 fabric_wait() {
   local lLun
   wait_until 60 target_is Online || return 1
-  for lLun in 0 1 2 300; do wait_until 60 sg_of $lLun >/dev/null || return 1; done
+  for lLun in 0 1 2 300; do wait_until 60 lun_is_there $lLun || return 1; done
 }
 
 # fabric_up: sets gInitiator and gTarget, the numbers of the two hosts.

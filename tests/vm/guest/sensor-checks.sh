@@ -80,7 +80,8 @@ all_luns() { luns_of 0 1 2 300; }
 # What `tavik diff` shows at the initiator: as different, each change of state with how often; and what came and went in between.
 gOurs='select(.initiator == null or .initiator.wwpn == "'$(colons $gInitiatorName)'")'
 gChanges="[.changes[] | $gOurs"' | "\(.what) \(.before) -> \(.after)"] | group_by(.) | map("\(.[0]) x\(length)") | join("; ")'
-gPassing="[.passing[] | $gOurs"' | "\(.what) \([.states[].state] | join(", "))"] | join("; ")'
+# A link that is up again is Offline until its port has logged in. A slow machine shows that, a fast one does not.
+gPassing="[.passing[] | $gOurs"' | "\(.what) \([.states[].state | select(. != "Offline")] | join(", "))"] | join("; ")'
 # Where, how often and on what the events of a kind happened, of LUN 2.
 gPlaces='[.episodes[] | select(.devices != null and .devices[0].lun == 2) | "\(.count) \(.remotePort.name) \(.devices[0] | "\(.vendor) \(.model) \(.disk)")"] | join("; ")'
 
@@ -120,7 +121,7 @@ check_names() { # links, LUNs and targets that go and come, and outcomes of comm
   expect_shown "and in paths" "$(luns_of 0 2 300)" "$gLuns" paths
   lun_map 1 rd_mcp_1/memory
   rescan 1
-  wait_until 60 sg_of 1
+  wait_until 60 lun_is_there 1
   post_event $gInitiator 5 1 03020100
   expect_shown "it is mapped again" "" "$gChanges" diff before
 
