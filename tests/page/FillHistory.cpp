@@ -1,6 +1,6 @@
 // fill-history DIRECTORY EPISODES SYSFS: a history of 30 days up to now, with so many episodes of two initiators and
 // twelve remote ports, an outage, a stretch in which a kind was not heard, and two marks. The same events each time;
-// only the times move with the clock.
+// only the times move with the clock. Prints the seed of the events. ZT_TEST_SEED=N makes others.
 
 #include <algorithm>
 #include <array>
@@ -16,6 +16,7 @@
 
 #include "sensor/store/include/Store.h"
 #include "sensor/topology/include/TopologyScan.h"
+#include "tests/support/SeedChoice.h"
 #include "tests/unit/store/Frames.h"
 
 namespace {
@@ -93,8 +94,8 @@ ZTSTestRecord makeNews(std::mt19937& arRandom, std::uint64_t aPort) {
 }
 
 /// By time. What would continue an episode of a short while ago is thrown again.
-std::vector<ZTSPlanned> plan(std::uint64_t aEpisodes, std::int64_t aFrom, std::int64_t aTo) {
-    std::mt19937 lRandom(20260304);
+std::vector<ZTSPlanned> plan(unsigned aSeed, std::uint64_t aEpisodes, std::int64_t aFrom, std::int64_t aTo) {
+    std::mt19937 lRandom(aSeed);
     std::map<std::tuple<std::size_t, std::size_t, ZTCKindKey>, std::int64_t> lFree;
     std::vector<ZTSPlanned> lPlanned;
     lPlanned.reserve(aEpisodes);
@@ -246,10 +247,12 @@ void fill(const char* apDirectory, std::uint64_t aEpisodes, const char* apSysfs)
     const std::int64_t lOutage = lFrom + 12 * gcDay;
     ZTCStore lStore(apDirectory, {}, [](const std::string& acrLine) { std::fprintf(stderr, "%s\n", acrLine.c_str()); });
     ZTCFiller lFiller(lStore, lFrom);
+    const unsigned lSeed = chooseSeed(gcPictureSeed);
+    std::printf("%llu episodes with the seed %u\n", static_cast<unsigned long long>(aEpisodes), lSeed);
     lFiller.begin();
-    lFiller.take(plan(aEpisodes * 2 / 5, lFrom, lOutage));
+    lFiller.take(plan(lSeed, aEpisodes * 2 / 5, lFrom, lOutage));
     lFiller.pause(lOutage);
-    lFiller.take(plan(aEpisodes - aEpisodes * 2 / 5, lOutage + gcDay / 3, lNow - gcMinute));
+    lFiller.take(plan(lSeed, aEpisodes - aEpisodes * 2 / 5, lOutage + gcDay / 3, lNow - gcMinute));
     lFiller.noteTopology(apSysfs, lNow);
     lFiller.end(lNow);
 }

@@ -5,10 +5,11 @@
 
 #include <gtest/gtest.h>
 
-#include <cstdlib>
 #include <optional>
 #include <random>
 #include <string>
+
+#include "tests/support/SeedChoice.h"
 
 class ZTCTestSeed {
 public:
@@ -23,13 +24,6 @@ public:
     unsigned below(unsigned aBound) { return std::uniform_int_distribution<unsigned>(0, aBound - 1)(mEngine); }
 
 private:
-    static unsigned chooseSeed(std::optional<unsigned> aWanted) {
-        if (const char* const lpGiven = std::getenv("ZT_TEST_SEED")) {
-            return static_cast<unsigned>(std::strtoul(lpGiven, nullptr, 10));
-        }
-        return aWanted ? *aWanted : std::random_device()();
-    }
-
     unsigned mSeed;
     std::mt19937 mEngine;
     testing::ScopedTrace mTrace;
