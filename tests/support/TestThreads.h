@@ -1,50 +1,93 @@
-/// Threads that a test runs beside each other. They begin together, and what one of them throws fails the test.
+/// Threads that a test runs beside its own. What one of them throws fails the test. They are joined at the end of their
+/// scope, so declare them behind all that they use.
 #ifndef TESTS_SUPPORT_TESTTHREADS_H
 #define TESTS_SUPPORT_TESTTHREADS_H
 
 #include <gtest/gtest.h>
+#include <signal.h>
 
+#include <algorithm>
 #include <atomic>
 #include <exception>
+#include <list>
 #include <memory>
+#include <string>
 #include <thread>
-#include <vector>
+#include <type_traits>
+#include <utility>
 
+/// One thread. Used by the thread that made it.
+class ZTCTestThread {
+public:
+    /// Starts a thread that calls aDo(). What goes on until the test says so takes a std::stop_token, and returns soon
+    /// after a stop was requested there. A failure has the name in its text.
+    template <class Do>
+    explicit ZTCTestThread(Do aDo, std::string aName = "a thread of the test")
+        : mThread([this, lDo = std::move(aDo), lName = std::move(aName)](const std::stop_token& acrStop) mutable {
+              try {
+                  if constexpr (std::is_invocable_v<Do&, const std::stop_token&>) {
+                      lDo(acrStop);
+                  } else {
+                      lDo();
+                  }
+              } catch (const std::exception& lcrError) {
+                  ADD_FAILURE() << lName << " ended with: " << lcrError.what();
+              } catch (...) {
+                  ADD_FAILURE() << lName << " ended with an exception of an unknown class";
+              }
+              mIsRunning = false;
+          }) {}
+    /// As stop() does.
+    ~ZTCTestThread() = default;
+    ZTCTestThread(const ZTCTestThread&) = delete;
+    ZTCTestThread& operator=(const ZTCTestThread&) = delete;
+
+    /// Whether its function has not returned yet.
+    bool isRunning() const { return mIsRunning; }
+
+    /// Waits until it has ended.
+    void join() {
+        if (mThread.joinable()) {
+            mThread.join();
+        }
+    }
+
+    /// Requests a stop, and waits until it has ended.
+    void stop() {
+        mThread.request_stop();
+        join();
+    }
+
+    /// Not behind join() or stop().
+    void sendSignal(int aSignal) { EXPECT_EQ(pthread_kill(mThread.native_handle(), aSignal), 0); }
+
+private:
+    std::atomic<bool> mIsRunning{true};
+    std::jthread mThread;
+};
+
+/// Threads that begin together.
 class ZTCTestThreads {
 public:
-    ZTCTestThreads() = default;
-    ~ZTCTestThreads() { join(); }
-    ZTCTestThreads(const ZTCTestThreads&) = delete;
-    ZTCTestThreads& operator=(const ZTCTestThreads&) = delete;
-
     /// Starts threads that call aDo(0) to aDo(aCount - 1), each as soon as all of them have started.
     template <class Do>
     void start(unsigned aCount, Do aDo) {
         const ZTCGate lGate;
         for (unsigned lThread = 0; lThread < aCount; ++lThread) {
-            ++mRunning;
-            mThreads.emplace_back([this, aDo, lThread, lpIsOpen = lGate.mpIsOpen]() mutable {
-                lpIsOpen->wait(false);
-                try {
+            mThreads.emplace_back(
+                [aDo, lThread, lpIsOpen = lGate.mpIsOpen]() mutable {
+                    lpIsOpen->wait(false);
                     aDo(lThread);
-                } catch (const std::exception& lcrError) {
-                    ADD_FAILURE() << "thread " << lThread << " ended with: " << lcrError.what();
-                }
-                --mRunning;
-            });
+                },
+                "thread " + std::to_string(lThread));
         }
     }
 
     /// Waits until all of them have ended.
-    void join() {
-        for (std::thread& lrThread : mThreads) {
-            lrThread.join();
-        }
-        mThreads.clear();
-    }
+    void join() { mThreads.clear(); }
 
     /// Whether one of them is still at work.
-    bool isRunning() const { return mRunning != 0; }
+    bool isRunning() const { return std::ranges::any_of(mThreads, &ZTCTestThread::isRunning); }
 
 private:
     /// Opens when it goes away, also where a thread cannot be started.
@@ -56,8 +99,7 @@ private:
         std::shared_ptr<std::atomic<bool>> mpIsOpen = std::make_shared<std::atomic<bool>>(false);
     };
 
-    std::atomic<unsigned> mRunning{0};
-    std::vector<std::thread> mThreads;
+    std::list<ZTCTestThread> mThreads;
 };
 
 /// Runs aDo(0) to aDo(aCount - 1) on threads of their own, and returns when all of them have ended.
