@@ -2,7 +2,6 @@
 
 #include <gtest/gtest.h>
 
-#include <atomic>
 #include <chrono>
 #include <thread>
 
@@ -72,7 +71,7 @@ TEST(Conditional, ASignalWakesEveryThreadThatWaits) {
 
 TEST(Conditional, ASignalBehindTheOneThatWokeIsKept) {
     ZTCConditional lConditional;
-    std::thread lThread([&] { lConditional.wait(); });
+    ZTCTestThread lThread([&] { lConditional.wait(); });
     sWaitForWaiters(lConditional, 1);
     lConditional.signal();
     lConditional.signal();
@@ -82,28 +81,17 @@ TEST(Conditional, ASignalBehindTheOneThatWokeIsKept) {
 
 TEST(Conditional, AWakeUpForNoReasonIsNoSignal) {
     ZTCDisturbedConditional lConditional;
-    std::atomic<bool> lHasTimedOut{false};
-    std::atomic<bool> lHasEnded{false};
-    std::thread lThread([&] {
-        try {
-            lConditional.timedWait(milliseconds(50));
-        } catch (const ZTCTimeOutEx&) {
-            lHasTimedOut = true;
-        }
-        lHasEnded = true;
-    });
-    while (!lHasEnded) {
+    const ZTCTestThread lThread([&] { EXPECT_THROW(lConditional.timedWait(milliseconds(50)), ZTCTimeOutEx); });
+    while (lThread.isRunning()) {
         lConditional.wakeForNoReason();
         std::this_thread::yield();
     }
-    lThread.join();
-    EXPECT_TRUE(lHasTimedOut);
 }
 
 TEST(Conditional, AnInterruptionEndsThisWaitAndEveryLaterOne) {
     ZTCConditional lConditional;
-    std::thread lFirst([&] { lConditional.wait(); });
-    std::thread lSecond([&] { EXPECT_NO_THROW(lConditional.timedWait(4294967295u)); });
+    ZTCTestThread lFirst([&] { lConditional.wait(); });
+    ZTCTestThread lSecond([&] { lConditional.timedWait(4294967295u); });
     sWaitForWaiters(lConditional, 2);
     lConditional.interrupt();
     lFirst.join();
@@ -116,7 +104,7 @@ TEST(Conditional, AnInterruptionEndsThisWaitAndEveryLaterOne) {
 TEST(Conditional, NoSignalIsMissedBetweenTwoThreadsInTurn) {
     ZTCConditional lPing;
     ZTCConditional lPong;
-    std::thread lThread([&] {
+    const ZTCTestThread lThread([&] {
         for (int lRound = 0; lRound < 2000; ++lRound) {
             lPing.timedWait(20u);
             lPong.signal();
@@ -126,7 +114,6 @@ TEST(Conditional, NoSignalIsMissedBetweenTwoThreadsInTurn) {
         lPing.signal();
         ASSERT_NO_THROW(lPong.timedWait(20u)) << "in round " << lRound;
     }
-    lThread.join();
 }
 
 TEST(Conditional, AFailureOfItsDestructionIsTracedAndIgnored) {

@@ -1,10 +1,8 @@
 #include <fcntl.h>
 #include <gtest/gtest.h>
-#include <pthread.h>
 #include <signal.h>
 #include <unistd.h>
 
-#include <atomic>
 #include <chrono>
 #include <cstring>
 #include <string>
@@ -12,6 +10,7 @@
 
 #include "common/include/Exception.h"
 #include "os/common/include/ProcessEvents.h"
+#include "tests/support/TestThreads.h"
 #include "tests/support/Waiting.h"
 #include "tests/unit/os/NamedPipeTesting.h"
 
@@ -79,7 +78,7 @@ TEST_F(NamedPipeReading, AMessageMayBeCutAtEveryPlace) {
     openReader(*lPipe);
     const std::string lcFrames = frameOf("hello") + frameOf("w");
     for (std::size_t lCut = 1; lCut < lcFrames.size(); ++lCut) {
-        std::thread lThread([&] {
+        const ZTCTestThread lThread([&] {
             lPipe->waitForActivity(gcLongSeconds);
             EXPECT_EQ(readMessage(*lPipe), "hello");
             lPipe->waitForActivity(gcLongSeconds);
@@ -88,7 +87,6 @@ TEST_F(NamedPipeReading, AMessageMayBeCutAtEveryPlace) {
         send(lcFrames.substr(0, lCut));
         waitUntilTaken();
         send(lcFrames.substr(lCut));
-        lThread.join();
     }
     EXPECT_EQ(mLog.countMark("-E-"), 0u);
 }
@@ -97,7 +95,7 @@ TEST_F(NamedPipeReading, TheLargestMessageIsRead) {
     const ZTCPointer<ZTCNamedPipe> lPipe(newReader(mPath));
     openReader(*lPipe);
     const std::string lcBody(1048576, 'q');
-    std::thread lThread([&] {
+    ZTCTestThread lThread([&] {
         const std::string lFrame = frameOf(lcBody);
         EXPECT_EQ(write(mSensor, lFrame.data(), lFrame.size()), static_cast<ssize_t>(lFrame.size()));
     });
@@ -182,7 +180,7 @@ TEST_F(NamedPipeReading, TheExitEventEndsAnIdleWait) {
     const ZTCPointer<ZTCNamedPipe> lPipe(newReader(mPath));
     lPipe->create();
     lPipe->open();
-    std::thread lThread([&] { EXPECT_NO_THROW(lPipe->waitForActivity(gcLongSeconds)); });
+    ZTCTestThread lThread([&] { lPipe->waitForActivity(gcLongSeconds); });
     getExitEvent().raise();
     lThread.join();
     EXPECT_NO_THROW(lPipe->waitForActivity(gcLongSeconds)) << "every later wait as well";
@@ -191,24 +189,19 @@ TEST_F(NamedPipeReading, TheExitEventEndsAnIdleWait) {
 TEST_F(NamedPipeReading, ATrickleDoesNotHoldUpAnExit) {
     const ZTCPointer<ZTCNamedPipe> lPipe(newReader(mPath));
     openReader(*lPipe);
-    std::atomic<bool> lHasReturned{false};
-    std::thread lWaiter([&] {
-        EXPECT_NO_THROW(lPipe->waitForActivity(gcLongSeconds));
-        lHasReturned = true;
-    });
+    const ZTCTestThread lWaiter([&] { lPipe->waitForActivity(gcLongSeconds); });
     send(std::string("\x00\x10\x00\x00", 4));
     for (int lByte = 0; lByte < 5; ++lByte) {
         send("x");
         waitUntilTaken();
     }
-    EXPECT_FALSE(lHasReturned);
+    EXPECT_TRUE(lWaiter.isRunning());
     getExitEvent().raise();
     // The trickle goes on for as long as the wait does.
-    while (!lHasReturned) {
+    while (lWaiter.isRunning()) {
         ASSERT_EQ(write(mSensor, "x", 1), 1);
         std::this_thread::yield();
     }
-    lWaiter.join();
     EXPECT_EQ(mLog.countMark("-E-"), 0u);
 }
 
@@ -218,16 +211,12 @@ TEST_F(NamedPipeReading, ASignalToTheThreadDoesNotEndItsWait) {
     ASSERT_EQ(sigaction(SIGUSR1, &lAction, nullptr), 0);
     const ZTCPointer<ZTCNamedPipe> lPipe(newReader(mPath));
     openReader(*lPipe);
-    std::atomic<bool> lHasReturned{false};
-    std::thread lThread([&] {
-        EXPECT_NO_THROW(lPipe->waitForActivity(gcLongSeconds));
-        lHasReturned = true;
-    });
+    ZTCTestThread lThread([&] { lPipe->waitForActivity(gcLongSeconds); });
     for (int lRound = 0; lRound < 20; ++lRound) {
-        ASSERT_EQ(pthread_kill(lThread.native_handle(), SIGUSR1), 0);
+        lThread.sendSignal(SIGUSR1);
         std::this_thread::sleep_for(milliseconds(1));
     }
-    EXPECT_FALSE(lHasReturned);
+    EXPECT_TRUE(lThread.isRunning());
     send(frameOf("x"));
     lThread.join();
     EXPECT_EQ(readMessage(*lPipe), "x");

@@ -3,14 +3,13 @@
 #include <signal.h>
 #include <unistd.h>
 
-#include <atomic>
 #include <chrono>
 #include <cstring>
 #include <string>
-#include <thread>
 
 #include "common/include/Exception.h"
 #include "os/common/include/ProcessEvents.h"
+#include "tests/support/TestThreads.h"
 #include "tests/support/Waiting.h"
 #include "tests/unit/os/NamedPipeTesting.h"
 
@@ -41,7 +40,7 @@ TEST_F(NamedPipeWriting, AMessageLargerThanThePipeIsWrittenAsItIsRead) {
         lBody[lIndex] = static_cast<char>(lIndex % 251);
     }
     std::string lGot;
-    std::thread lThread([&] { lGot = readAll(mSensor, lBody.size() + 4); });
+    ZTCTestThread lThread([&] { lGot = readAll(mSensor, lBody.size() + 4); });
     unsigned lCount = 0;
     lPipe->write(bufferOf(lBody), lCount);
     lThread.join();
@@ -55,7 +54,7 @@ TEST_F(NamedPipeWriting, TheExitEventCutsAWriteWhoseReaderHasStoppedReading) {
     const int lCapacity = fcntl(mSensor, F_GETPIPE_SZ);
     unsigned lCount = 0;
     std::string lText;
-    std::thread lThread([&] {
+    ZTCTestThread lThread([&] {
         try {
             lPipe->write(bufferOf(std::string(1000000, 'z')), lCount);
         } catch (const ZTCClibWriteFailedEx& acrException) {
@@ -96,19 +95,12 @@ TEST_F(NamedPipeWriting, AReaderThatGoesInTheMiddleOfAMessageIsAnException) {
     const ZTCPointer<ZTCNamedPipe> lPipe(newWriter(mPath));
     openWriter(*lPipe);
     const int lCapacity = fcntl(mSensor, F_GETPIPE_SZ);
-    std::atomic<bool> lIsRefused{false};
-    std::thread lThread([&] {
+    const ZTCTestThread lThread([&] {
         unsigned lCount = 0;
-        try {
-            lPipe->write(bufferOf(std::string(1000000, 'z')), lCount);
-        } catch (const ZTCClibWriteFailedEx&) {
-            lIsRefused = true;
-        }
+        EXPECT_THROW(lPipe->write(bufferOf(std::string(1000000, 'z')), lCount), ZTCClibWriteFailedEx);
     });
     waitUntil([&] { return waitingBytes() == lCapacity; }, "the pipe being full");
     closeSensor();
-    lThread.join();
-    EXPECT_TRUE(lIsRefused);
 }
 
 TEST_F(NamedPipeWriting, APipeThatIsNotOpenCannotBeWritten) {

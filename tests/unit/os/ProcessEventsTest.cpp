@@ -1,7 +1,6 @@
 #include "os/common/include/ProcessEvents.h"
 
 #include <gtest/gtest.h>
-#include <pthread.h>
 #include <signal.h>
 
 #include <atomic>
@@ -10,6 +9,7 @@
 #include <thread>
 
 #include "tests/support/FailingAllocation.h"
+#include "tests/support/TestThreads.h"
 
 TEST(ProcessEvents, AnEventStaysRaised) {
     ZTCProcessEvent lEvent;
@@ -34,9 +34,8 @@ TEST(ProcessEvents, AnEventCanBeTakenBack) {
 
 TEST(ProcessEvents, RaisingWakesWhoWaits) {
     ZTCProcessEvent lEvent;
-    std::thread lThread([&] { EXPECT_TRUE(lEvent.waitFor(20000)); });
+    const ZTCTestThread lThread([&] { EXPECT_TRUE(lEvent.waitFor(20000)); });
     lEvent.raise();
-    lThread.join();
 }
 
 static std::atomic<int> sSignals{0};
@@ -47,18 +46,13 @@ TEST(ProcessEvents, ASignalToTheThreadEndsNoWaitBeforeItsTime) {
     ASSERT_EQ(sigaction(SIGUSR1, &lAction, nullptr), 0);
     for (const int lMilliseconds : {-1, 20000}) {
         ZTCProcessEvent lEvent;
-        std::atomic<bool> lHasReturned{false};
-        std::thread lThread([&] {
-            EXPECT_TRUE(lEvent.waitFor(lMilliseconds));
-            lHasReturned = true;
-        });
-        for (const int lWanted = sSignals + 20; sSignals < lWanted;) {
-            ASSERT_EQ(pthread_kill(lThread.native_handle(), SIGUSR1), 0);
+        ZTCTestThread lThread([&] { EXPECT_TRUE(lEvent.waitFor(lMilliseconds)); });
+        for (const int lWanted = sSignals + 20; sSignals < lWanted && lThread.isRunning();) {
+            lThread.sendSignal(SIGUSR1);
             std::this_thread::yield();
         }
-        EXPECT_FALSE(lHasReturned);
+        EXPECT_TRUE(lThread.isRunning());
         lEvent.raise();
-        lThread.join();
     }
 }
 
