@@ -81,14 +81,14 @@ TEST(SynchList, ItCanBeWalkedAndItemsErased) {
 TEST(SynchList, WaitingEndsWithAnItemATimeOutOrAnInterruption) {
     ZTCSynchList lList;
     EXPECT_THROW(lList.waitWhileEmpty(0), ZTCTimeOutEx);
-    std::thread lThread([&] {
-        EXPECT_NO_THROW(lList.waitWhileEmpty(60));
+    ZTCTestThread lThread([&] {
+        lList.waitWhileEmpty(60);
         EXPECT_EQ(sNumber(lList.popFront()), 7);
     });
     lList.pushBack(sItem(7));
     lThread.join();
 
-    std::thread lOther([&] { EXPECT_NO_THROW(lList.waitWhileEmpty(60)); });
+    ZTCTestThread lOther([&] { lList.waitWhileEmpty(60); });
     lList.interrupt();
     lOther.join();
     EXPECT_NO_THROW(lList.waitWhileEmpty(60));
@@ -97,8 +97,7 @@ TEST(SynchList, WaitingEndsWithAnItemATimeOutOrAnInterruption) {
 TEST(SynchList, AnItemAtTheFrontEndsTheWaitToo) {
     ZTCSynchList lList;
     constexpr int lcRounds = 300;
-    ZTCTestThreads lThreads;
-    lThreads.start(1, [&lList](unsigned) {
+    const ZTCTestThread lThread([&lList] {
         for (int lRound = 0; lRound < lcRounds; ++lRound) {
             lList.waitWhileEmpty(3600);
             if (lList.isEmpty()) {
@@ -121,7 +120,6 @@ TEST(SynchList, AnItemAtTheFrontEndsTheWaitToo) {
         std::this_thread::sleep_for(std::chrono::microseconds(lRound));
     }
     lList.interrupt();
-    lThreads.join();
 }
 
 TEST(SynchList, EveryItemReachesExactlyOneThread) {

@@ -9,11 +9,11 @@
 #include <atomic>
 #include <filesystem>
 #include <string>
-#include <thread>
 #include <vector>
 
 #include "common/include/Exception.h"
 #include "tests/support/AgentLog.h"
+#include "tests/support/TestThreads.h"
 #include "tests/unit/system/ForkedProcess.h"
 #include "tests/unit/system/SystemMainTesting.h"
 #include "tests/unit/system/TestSystem.h"
@@ -80,7 +80,7 @@ static unsigned sNumberOfThreads() {
 }
 
 static unsigned sNumberOfThreadsToEndWith() {
-    std::thread([] {}).join();
+    runOnThreads(1, [](unsigned) {});
     return sNumberOfThreads();
 }
 

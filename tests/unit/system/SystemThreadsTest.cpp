@@ -3,9 +3,9 @@
 #include <atomic>
 #include <stdexcept>
 #include <string>
-#include <thread>
 
 #include "common/include/Exception.h"
+#include "tests/support/TestThreads.h"
 #include "tests/unit/os/LogCapture.h"
 #include "tests/unit/system/TestSystem.h"
 
@@ -83,12 +83,11 @@ TEST(SystemThreads, TheStopEventMakesTheThreadsExit) {
         }));
     lSystem.createThreads();
     lSystem.startThreads();
-    std::thread lStopper([&] {
+    const ZTCTestThread lStopper([&] {
         waitUntil([&] { return lSystem.conditional(0).getNumberOfWaiters() == 1; }, "the thread's wait");
         getStopEvent().raise();
     });
     lSystem.waitForThreads();
-    lStopper.join();
     EXPECT_TRUE(lSystem.isSetForExit());
 }
 
