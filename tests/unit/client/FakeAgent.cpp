@@ -31,7 +31,7 @@ ZTCFakeAgent::ZTCFakeAgent(std::string aDirectory, std::deque<ZTCStep> aSteps)
     if (!mStop.isOpen() || !mOwnCommandWriter.isOpen()) {
         throw std::runtime_error("the fake agent cannot open its command FIFO");
     }
-    mThread = std::thread([this] { run(); });
+    mThread.emplace([this] { run(); });
 }
 
 /// Keeps the pid that a test has put into the file; else writes that of the test.
@@ -47,7 +47,7 @@ void ZTCFakeAgent::holdPidFile() {
 ZTCFakeAgent::~ZTCFakeAgent() {
     const std::uint64_t lOne = 1;
     [[maybe_unused]] const ssize_t lWritten = write(mStop.get(), &lOne, sizeof(lOne));
-    mThread.join();
+    mThread->join();
 }
 
 std::vector<ZTCWireBytes> ZTCFakeAgent::getRequests() const {

@@ -7,12 +7,13 @@
 #include <functional>
 #include <future>
 #include <mutex>
+#include <optional>
 #include <string>
-#include <thread>
 #include <vector>
 
 #include "sensor/client/include/CommandEncoder.h"
 #include "sensor/client/include/FileDescriptor.h"
+#include "tests/support/TestThreads.h"
 
 class ZTCFakeAgent {
 public:
@@ -62,7 +63,7 @@ private:
     bool mIsDead = false;
     mutable std::mutex mMutex;
     std::vector<ZTCWireBytes> mRequests;  // under mMutex
-    std::thread mThread;
+    std::optional<ZTCTestThread> mThread;
 };
 
 /// Makes the two FIFOs without anybody behind them.

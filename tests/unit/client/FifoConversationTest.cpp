@@ -13,6 +13,7 @@
 #include <future>
 
 #include "tests/support/TemporaryDirectory.h"
+#include "tests/support/TestThreads.h"
 #include "tests/support/Waiting.h"
 #include "tests/unit/client/FakeAgent.h"
 #include "tests/unit/client/WireSamples.h"
@@ -129,7 +130,7 @@ TEST(FifoConversation, IsTheReaderThatAStartingAgentWaitsFor) {
     const ZTCTemporaryDirectory lDirectory;
     makeFifos(lDirectory.path());  // left by an agent that was killed
     ZTCFifoConversation lConversation(lDirectory.path());
-    auto lAnswer = std::async(std::launch::async, [&] { return sAsk(lConversation); });
+    ZTCTestThread lAsking([&] { EXPECT_EQ(sAsk(lConversation), (ZTCWireBytes{4})); });
     // A blocking open for writing returns as soon as there is a reader.
     waitUntil(
         [&] {
@@ -137,19 +138,19 @@ TEST(FifoConversation, IsTheReaderThatAStartingAgentWaitsFor) {
         },
         "a reader of the response FIFO");
     const ZTCFakeAgent lAgent(lDirectory.path(), {ZTCFakeAgent::answering({4})});
-    EXPECT_EQ(lAnswer.get(), (ZTCWireBytes{4}));
+    lAsking.join();
 }
 
 TEST(FifoConversation, FollowsFifosThatAreMadeAnewWhileItWaits) {
     const ZTCTemporaryDirectory lDirectory;
     makeFifos(lDirectory.path());
     ZTCFifoConversation lConversation(lDirectory.path());
-    auto lAnswer = std::async(std::launch::async, [&] { return sAsk(lConversation); });
+    ZTCTestThread lAsking([&] { EXPECT_EQ(sAsk(lConversation), (ZTCWireBytes{4})); });
     waitUntil([&] { return exists(lDirectory.path("qrv-sn.lock")); }, "the client's lock");
     ASSERT_EQ(unlink(lDirectory.path("qrvtvkcmd.fifo").c_str()), 0);
     ASSERT_EQ(unlink(lDirectory.path("qrvtvkout.fifo").c_str()), 0);
     const ZTCFakeAgent lAgent(lDirectory.path(), {ZTCFakeAgent::answering({4})});
-    EXPECT_EQ(lAnswer.get(), (ZTCWireBytes{4}));
+    lAsking.join();
 }
 
 TEST(FifoConversation, ASilentAgentIsGivenUpAtTheDeadline) {
@@ -315,7 +316,7 @@ TEST(FifoConversation, AnAnswerThatPausesWhileItIsSentIsThrownAwayWhole) {
     pollfd lStale{.fd = lOtherReader.get(), .events = POLLIN, .revents = 0};
     ASSERT_EQ(poll(&lStale, 1, 20000), 1);
     // The rest comes when the next client has taken what was there.
-    auto lRest = std::async(std::launch::async, [&] {
+    const ZTCTestThread lRest([&] {
         int lWaiting = 1;
         waitUntil([&] { return ioctl(lOtherReader.get(), FIONREAD, &lWaiting) == 0 && lWaiting == 0; }, "the drain");
         poll(nullptr, 0, 200);  // longer than the quiet that a client takes for the end
@@ -324,7 +325,6 @@ TEST(FifoConversation, AnAnswerThatPausesWhileItIsSentIsThrownAwayWhole) {
     ZTCFifoConversation lConversation(lDirectory.path());
     EXPECT_EQ(sAsk(lConversation), (ZTCWireBytes{6}));
     EXPECT_EQ(lConversation.getDiscardedBytes(), 12U);
-    lRest.get();
 }
 
 TEST(FifoConversation, StaleBytesOfAPeerThatMarksNoEndAreThrownAwayAllTheSame) {
@@ -346,17 +346,16 @@ TEST(FifoConversation, ASecondClientWaitsForTheLock) {
     ZTCFifoConversation lFirst(lDirectory.path());
     lFirst.connect(sPatience());
     std::atomic<bool> lHasFirstFinished{false};
-    auto lSecondAnswer = std::async(std::launch::async, [&] {
+    ZTCTestThread lOther([&] {
         ZTCFifoConversation lSecond(lDirectory.path());
-        const ZTCWireBytes lAnswer = sAsk(lSecond);
+        EXPECT_EQ(sAsk(lSecond), (ZTCWireBytes{6}));
         EXPECT_TRUE(lHasFirstFinished);
-        return lAnswer;
     });
     EXPECT_EQ(sAsk(lFirst), (ZTCWireBytes{6}));
     EXPECT_EQ(sAsk(lFirst), (ZTCWireBytes{6}));
     lHasFirstFinished = true;
     lFirst.disconnect();
-    EXPECT_EQ(lSecondAnswer.get(), (ZTCWireBytes{6}));
+    lOther.join();
     EXPECT_EQ(lAgent.getRequests().size(), 3U);
 }
 

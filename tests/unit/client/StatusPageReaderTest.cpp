@@ -5,16 +5,15 @@
 #include <sys/stat.h>
 #include <unistd.h>
 
-#include <atomic>
 #include <cstring>
 #include <random>
-#include <thread>
 
 #include "libkpm/include/ScopeEventKinds.h"
 #include "tests/support/ResourceLimit.h"
 #include "tests/support/Seed.h"
 #include "tests/support/StatusPageFile.h"
 #include "tests/support/TemporaryDirectory.h"
+#include "tests/support/TestThreads.h"
 
 namespace {
 
@@ -292,13 +291,12 @@ TEST_F(StatusPageReader, WordsThatTheirWriterHasNotFinishedAreNotTaken) {
 TEST_F(StatusPageReader, SeesOneMomentOfWhatIsHandedOverInAStorm) {
     constexpr std::uint32_t lcBoards = 2;
     ZTCStatusPageFile lFile(mPath, lcBoards);
-    std::atomic<bool> lIsToEnd{false};
     // As the agent does: events, and every now and then a retrieval that takes all of them.
     ZTCTestSeed lSeed;
-    std::thread lAgent([&] {
+    const ZTCTestThread lAgent([&](const std::stop_token& acrStop) {
         std::mt19937& lRandom = lSeed.engine();
         ZTSStatusHeader& lrHeader = lFile.header();
-        while (!lIsToEnd) {
+        while (!acrStop.stop_requested()) {
             for (int lEvent = 0; lEvent < 1000; ++lEvent) {
                 const auto lWhere = static_cast<std::uint32_t>(lRandom());
                 ++lFile.row(lWhere % lcBoards, lWhere / lcBoards % gcStatusRowsPerBoard).mConsolidated;
@@ -330,8 +328,6 @@ TEST_F(StatusPageReader, SeesOneMomentOfWhatIsHandedOverInAStorm) {
             ASSERT_EQ(lHandedOver, mSnapshot.mHandedOverOccurrences);
         }
     }
-    lIsToEnd = true;
-    lAgent.join();
 }
 
 }  // namespace

@@ -7,10 +7,10 @@
 #include <cstdio>
 #include <cstdlib>
 #include <string>
-#include <thread>
 #include <vector>
 
 #include "common/include/Exception.h"
+#include "tests/support/TestThreads.h"
 #include "tests/unit/common/LogTesting.h"
 
 namespace {
@@ -275,7 +275,7 @@ TEST_F(Log, TheProcessesLogRotatesAndReopens) {
 }
 
 TEST_F(Log, TheCodeMayChangeWhileOthersLog) {
-    std::thread lOther([] {
+    ZTCTestThread lOther([] {
         for (int i = 0; i < 200; ++i) {
             ZT_LOG_INFO("other %d", i);
         }
