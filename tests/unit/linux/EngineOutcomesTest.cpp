@@ -1,6 +1,6 @@
 #include <atomic>
-#include <thread>
 
+#include "tests/support/TestThreads.h"
 #include "tests/unit/linux/EngineFixture.h"
 
 TEST_F(LinuxEngine, OutcomesAreDeliveredWithTheirPortAndLun) {
@@ -152,7 +152,7 @@ TEST_F(LinuxEngine, WhatIsInTheBuffersWhenTheLibraryClosesIsDelivered) {
     for (std::uint32_t lLun = 2; lLun <= 20; ++lLun) {
         mKernel.sendDone({.mLun = lLun, .mResult = 0x28}, lLun % 2);
     }
-    std::thread lStopper([&] { mpEngine->stop(); });
+    ZTCTestThread lStopper([&] { mpEngine->stop(); });
     lMayReturn = true;
     lStopper.join();
     EXPECT_EQ(mRecorder.count(), 20u);

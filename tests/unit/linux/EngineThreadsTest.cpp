@@ -5,6 +5,7 @@
 #include <thread>
 
 #include "tests/support/ResourceLimit.h"
+#include "tests/support/TestThreads.h"
 #include "tests/unit/linux/EngineFixture.h"
 
 TEST_F(LinuxEngine, StoppingWaitsForTheCallbackAndRemovesTheInstance) {
@@ -23,12 +24,8 @@ TEST_F(LinuxEngine, StoppingWaitsForTheCallbackAndRemovesTheInstance) {
     waitUntil([&] { return lIsIn.load(); }, "the callback");
     EXPECT_EQ(mpEngine->getNumberOfAdapters(), 1u) << "answered while a callback is held up";
     EXPECT_EQ(registerPort(0, portName(1), 4, 0x08), KPM_STATUS_NO_SOURCE);
-    std::atomic<bool> lHasStopped{false};
-    std::thread lStopper([&] {
-        mpEngine->stop();
-        lHasStopped = true;
-    });
-    EXPECT_FALSE(lHasStopped.load());
+    ZTCTestThread lStopper([&] { mpEngine->stop(); });
+    EXPECT_TRUE(lStopper.isRunning());
     lMayReturn = true;
     lStopper.join();
     const std::size_t lCount = mRecorder.count();

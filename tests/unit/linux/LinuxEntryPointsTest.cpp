@@ -9,6 +9,7 @@
 #include <thread>
 
 #include "libkpm/linux/src/ExitSwitch.h"
+#include "tests/support/TestThreads.h"
 #include "tests/support/Waiting.h"
 #include "tests/unit/linux/FakeKernel.h"
 #include "tests/unit/linux/LinuxRecorder.h"
@@ -111,7 +112,7 @@ TEST_F(LinuxEntryPoints, TheNumberOfAdaptersIsAnsweredWhileACallbackIsHeldUpAndW
     mKernel.setState(0, "Linkdown");
     waitUntil([&] { return lIsIn.load(); }, "the callback");
     EXPECT_EQ(mrList.GetNumberOfAdapters(), 1u);
-    std::thread lCloser([this] { mrList.Close(); });
+    ZTCTestThread lCloser([this] { mrList.Close(); });
     waitUntil([this] { return mrList.GetNumberOfAdapters() == 0; }, "Close to have begun");
     lMayReturn = true;
     lCloser.join();

@@ -11,6 +11,7 @@
 #include <thread>
 #include <vector>
 
+#include "tests/support/TestThreads.h"
 #include "tests/support/Waiting.h"
 #include "tests/unit/sim/Recorder.h"
 
@@ -251,7 +252,7 @@ TEST(Engine, StopReturnsWhenNoCallbackRuns) {
     lEngine.start();
     lRecorder.registerAll(lEngine, 0);
     waitUntil([&] { return lRunning > 0; }, "a callback");
-    std::thread lStopper([&] {
+    ZTCTestThread lStopper([&] {
         lEngine.stop();
         lIsStopped = true;
     });

@@ -10,6 +10,7 @@
 #include "libkpm/sim/src/ControlClient.h"
 #include "libkpm/sim/src/Engine.h"
 #include "tests/support/TemporaryDirectory.h"
+#include "tests/support/TestThreads.h"
 #include "tests/support/Waiting.h"
 #include "tests/unit/sim/Recorder.h"
 
@@ -168,7 +169,7 @@ TEST_F(EntryPoints, CloseEndsAnInjectionThatIsUnderWay) {
     ::setenv("KPM_SIM_SOCKET", mDirectory.path("socket").c_str(), 1);
     ASSERT_EQ(init(), 0u);
     EXPECT_EQ(registerScope(0, 4, 0x20), 0u);
-    std::thread lInjector([this] {
+    ZTCTestThread lInjector([this] {
         try {
             ZTCSimControlClient(mDirectory.path("socket")).ask("bus-reset times=1000000000");
         } catch (const ZTCSimNobodyListens&) {
@@ -198,7 +199,7 @@ TEST_F(EntryPoints, TheNumberOfAdaptersIsAnsweredWhileACallbackIsHeldUpAndWhileC
     EXPECT_EQ(registerScope(0, 4, 0x20), 0u);
     waitUntil([&] { return lIsIn.load(); }, "the callback");
     EXPECT_EQ(mrList.GetNumberOfAdapters(), 2u);
-    std::thread lCloser([this] { mrList.Close(); });
+    ZTCTestThread lCloser([this] { mrList.Close(); });
     waitUntil([this] { return mrList.GetNumberOfAdapters() == 0; }, "Close to have begun");
     lMayReturn = true;
     lCloser.join();

@@ -3,11 +3,10 @@
 #include <gmock/gmock.h>
 #include <gtest/gtest.h>
 
-#include <atomic>
 #include <list>
 #include <nlohmann/json.hpp>
-#include <thread>
 
+#include "tests/support/TestThreads.h"
 #include "tests/unit/store/StoreFixture.h"
 
 using std::chrono::hours;
@@ -90,12 +89,10 @@ TEST_F(WarnSource, WhatIsStoredWhileANewProcessBeginsCountsOnce) {
     static constexpr std::uint64_t scEvents = 200;
     take({makeQueueFull(gcPortA, gcBase, gcBase, 1)});
     const ZTCHistory lReader(mDirectory.path());
-    std::atomic<bool> lIsOver{false};
-    std::thread lWriter([&] {
+    const ZTCTestThread lWriter([&] {
         for (std::uint64_t i = 1; i < scEvents; ++i) {
             take({makeQueueFull(gcPortA, gcBase, gcBase, 1)});
         }
-        lIsOver = true;
     });
     std::list<ZTCWarnSource> lSources;
     std::vector<std::uint64_t> lCounts;
@@ -104,10 +101,9 @@ TEST_F(WarnSource, WhatIsStoredWhileANewProcessBeginsCountsOnce) {
             arCount += lrOccurrence.mCount;
         }
     };
-    while (!lIsOver) {
+    while (lWriter.isRunning()) {
         lAdd(lSources.emplace_back(std::vector{rule("queue-full")}), lCounts.emplace_back());
     }
-    lWriter.join();
     ASSERT_FALSE(lSources.empty());
     std::size_t lIndex = 0;
     for (ZTCWarnSource& lrSource : lSources) {

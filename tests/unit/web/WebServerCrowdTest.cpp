@@ -5,7 +5,6 @@
 
 #include <algorithm>
 #include <array>
-#include <atomic>
 #include <cerrno>
 #include <filesystem>
 #include <stdexcept>
@@ -14,6 +13,7 @@
 
 #include "sensor/web/include/WebServer.h"
 #include "tests/support/ResourceLimit.h"
+#include "tests/support/TestThreads.h"
 #include "tests/unit/web/HttpClient.h"
 
 using std::chrono::milliseconds;
@@ -146,15 +146,11 @@ TEST(WebServerCrowd, TenThousandClientsThatSendAByteAtATimeLoseTheirPlacesAllThe
     const ZTSWebLimits lLimits{.mConnections = 1024, .mRequestTime = milliseconds(300)};
     ZTCWebServer lServer({.mListen = "127.0.0.1:0", .mHosts = {}, .mLimits = lLimits}, &sAnswer);
     const ZTCCrowd lCrowd(lServer.getPort());
-    std::atomic<bool> lIsOver = false;
-    std::thread lDripping([&] {
-        while (!lIsOver) {
+    const ZTCTestThread lDripping([&](const std::stop_token& acrStop) {
+        while (!acrStop.stop_requested()) {
             lCrowd.dripOnce();
             std::this_thread::sleep_for(milliseconds(100));
         }
     });
-    EXPECT_NO_THROW(
-        waitUntil([&] { return sIsServed(lServer); }, "an answer behind the slow ones", ZTCDeadline(scCrowdPatience)));
-    lIsOver = true;
-    lDripping.join();
+    waitUntil([&] { return sIsServed(lServer); }, "an answer behind the slow ones", ZTCDeadline(scCrowdPatience));
 }
