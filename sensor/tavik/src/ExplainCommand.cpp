@@ -32,9 +32,7 @@ static int sExplainTime(const ZTSTavikOptions& acrOptions, const ZTCContext& acr
     const ZTCHistoryTime lTo = lrTexts.mUntil.empty() ? lNow : readPoint(lrTexts.mUntil, "--until", lMarks, lNow);
     const ZTCHistoryTime lFrom =
         lrTexts.mSince.empty() ? lTo - gcDiagnosisSpan : readPoint(lrTexts.mSince, "--since", lMarks, lNow);
-    if (lTo <= lFrom) {
-        throw ZTCBadFilterEx("--until has to be later than --since");
-    }
+    checkOrder("--since", lFrom, "--until", lTo);
     const ZTCNameBook lNames = acrContext.makeNames(lpHistory.get());
     const ZTSDiagnosis lDiagnosis = diagnoseWindow(*lpHistory, lNames, lFrom, lTo);
     if (acrOptions.mIsJson) {

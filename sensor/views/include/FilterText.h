@@ -32,6 +32,10 @@ struct ZTSFilterTexts {
 ZTCHistoryTime readPoint(const std::string& acrText, const std::string& acrOption, const std::vector<ZTSMark>& acrMarks,
                          ZTCHistoryTime aNow);
 
+/// Checks that a stretch of time ends after it begins. @param apEarlier,apLater  named in the error. Throws
+/// ZTCBadFilterEx with both times.
+void checkOrder(const char* apEarlier, ZTCHistoryTime aEarlier, const char* apLater, ZTCHistoryTime aLater);
+
 /// Whether a text is read as a time or a duration, so that no mark can have it as its name.
 bool isTimeOrDuration(const std::string& acrText);
 
@@ -39,7 +43,7 @@ bool isTimeOrDuration(const std::string& acrText);
 /// Throws ZTCBadFilterEx.
 void checkFilter(const ZTSFilterTexts& acrTexts);
 
-/// @param aDefaultLimit  where none is given; 0: all. Throws ZTCBadFilterEx.
+/// @param aDefaultLimit  where none is given; 0: all. Throws ZTCBadFilterEx, also where the time ends before it begins.
 ZTSHistoryFilter readFilter(const ZTSFilterTexts& acrTexts, const ZTCNameBook& acrNames,
                             const std::vector<ZTSMark>& acrMarks, ZTCHistoryTime aNow, std::uint64_t aDefaultLimit);
 

@@ -7,7 +7,6 @@
 #include "sensor/views/include/FilterText.h"
 #include "sensor/views/include/SanFacts.h"
 #include "sensor/views/include/SanTroubles.h"
-#include "sensor/views/include/TimeText.h"
 
 static constexpr std::array<const char*, ZTDF_Count> scThings{"link", "remotePort", "lun", "path"};
 static constexpr std::chrono::hours scLeastBefore{1};
@@ -295,13 +294,6 @@ static ZTSDiffPoint sReadPoint(const std::string& acrText, const char* apName, c
     return {.mTime = readPoint(acrText, apName, acrMarks, aNow), .mMark = lIsMark ? acrText : ""};
 }
 
-static void sCheckOrder(const char* apEarlier, ZTCHistoryTime aEarlier, const char* apLater, ZTCHistoryTime aLater) {
-    if (aEarlier >= aLater) {
-        throw ZTCBadFilterEx(std::string(apEarlier) + " has to be earlier than " + apLater + ", and " +
-                             formatDateTime(aEarlier) + " is not earlier than " + formatDateTime(aLater));
-    }
-}
-
 ZTSDiffRequest readDiffRequest(const ZTSDiffTexts& acrTexts, const std::vector<ZTSMark>& acrMarks,
                                ZTCHistoryTime aNow) {
     ZTSDiffRequest lRequest{.mFrom = {.mTime = aNow - scDefaultSpan, .mMark = ""}, .mTo = {.mTime = aNow, .mMark = ""}};
@@ -313,14 +305,14 @@ ZTSDiffRequest readDiffRequest(const ZTSDiffTexts& acrTexts, const std::vector<Z
     if (!acrTexts.mTo.empty()) {
         lRequest.mTo = sReadPoint(acrTexts.mTo, "to", acrMarks, aNow);
     }
-    sCheckOrder("from", lRequest.mFrom.mTime, "to", lRequest.mTo.mTime);
+    checkOrder("from", lRequest.mFrom.mTime, "to", lRequest.mTo.mTime);
     if (!acrTexts.mBeforeSince.empty()) {
         lRequest.mBeforeSince = readPoint(acrTexts.mBeforeSince, "before-since", acrMarks, aNow);
-        sCheckOrder("before-since", *lRequest.mBeforeSince, "from", lRequest.mFrom.mTime);
+        checkOrder("before-since", *lRequest.mBeforeSince, "from", lRequest.mFrom.mTime);
     }
     if (!acrTexts.mAfterSince.empty()) {
         lRequest.mAfterSince = readPoint(acrTexts.mAfterSince, "after-since", acrMarks, aNow);
-        sCheckOrder("after-since", *lRequest.mAfterSince, "to", lRequest.mTo.mTime);
+        checkOrder("after-since", *lRequest.mAfterSince, "to", lRequest.mTo.mTime);
     }
     return lRequest;
 }

@@ -51,12 +51,24 @@ ZTCHistoryTime readPoint(const std::string& acrText, const std::string& acrOptio
     return lMark->mTime;
 }
 
+void checkOrder(const char* apEarlier, ZTCHistoryTime aEarlier, const char* apLater, ZTCHistoryTime aLater) {
+    if (aEarlier >= aLater) {
+        throw ZTCBadFilterEx(std::string(apEarlier) + " has to be earlier than " + apLater + ", and " +
+                             formatDateTime(aEarlier) + " is not earlier than " + formatDateTime(aLater));
+    }
+}
+
 std::string listKinds() {
     std::string lText;
     for (const ZTSScopeEventKind& lrKind : gcScopeEventKinds) {
         lText += (lText.empty() ? "" : ", ") + std::string(lrKind.mpName);
     }
     return lText;
+}
+
+/// "10m" (2026-11-21 09:54:12)
+static std::string sPointText(const std::string& acrText, ZTCHistoryTime aTime) {
+    return "\"" + escapeControls(acrText) + "\" (" + formatDateTime(aTime) + ")";
 }
 
 static constexpr std::uint64_t scMostLimit = 1'000'000'000'000;
@@ -110,6 +122,10 @@ ZTSHistoryFilter readFilter(const ZTSFilterTexts& acrTexts, const ZTCNameBook& a
     }
     if (!acrTexts.mUntil.empty()) {
         lFilter.mUntil = readPoint(acrTexts.mUntil, "--until", acrMarks, aNow);
+    }
+    if (lFilter.mSince && lFilter.mUntil && *lFilter.mSince > *lFilter.mUntil) {
+        throw ZTCBadFilterEx("--since " + sPointText(acrTexts.mSince, *lFilter.mSince) + " is later than --until " +
+                             sPointText(acrTexts.mUntil, *lFilter.mUntil));
     }
     for (const std::string& lrKind : acrTexts.mKinds) {
         lFilter.mKinds.push_back(sReadKind(lrKind));

@@ -264,9 +264,7 @@ ZTCJson ZTCApi::makeExplanation(const ZTSWebRequest& acrRequest) {
     const std::string lUntil = acrRequest.get("until");
     const ZTCHistoryTime lTo = lUntil.empty() ? lNow : readPoint(lUntil, "until", lMarks, lNow);
     const ZTCHistoryTime lFrom = lSince.empty() ? lTo - gcDiagnosisSpan : readPoint(lSince, "since", lMarks, lNow);
-    if (lTo <= lFrom) {
-        throw ZTCBadFilterEx("until has to be later than since");
-    }
+    checkOrder("since", lFrom, "until", lTo);
     return makeDiagnosisDocument(diagnoseWindow(lrHistory, lNames, lFrom, lTo), mSources.mHost, lrHistory.getStoreId(),
                                  lNames);
 }
@@ -281,9 +279,7 @@ ZTCJson ZTCApi::makeTimeline(const ZTSWebRequest& acrRequest) {
     const std::string lTo = acrRequest.get("to");
     lRequest.mFrom = lFrom.empty() ? lNow - std::chrono::hours(24) : readPoint(lFrom, "from", lMarks, lNow);
     lRequest.mTo = lTo.empty() ? lNow : readPoint(lTo, "to", lMarks, lNow);
-    if (lRequest.mTo <= lRequest.mFrom) {
-        throw ZTCBadFilterEx("to has to be later than from");
-    }
+    checkOrder("from", lRequest.mFrom, "to", lRequest.mTo);
     const std::string lColumns = acrRequest.get("columns");
     const char* const lpEnd = lColumns.data() + lColumns.size();
     if (!lColumns.empty()) {

@@ -45,6 +45,13 @@ TEST_F(FilterText, SinceAndUntilTakeATimeADurationOrAMark) {
     EXPECT_THAT(complaint({.mUntil = "10 min"}), HasSubstr("--until \"10 min\""));
 }
 
+TEST_F(FilterText, ASinceBehindItsUntilIsWrongUseAndBothAreNamed) {
+    EXPECT_EQ(complaint({.mSince = "10m", .mUntil = "before"}),
+              "--since \"10m\" (2026-11-21 09:54:12) is later than --until \"before\" (2026-11-20 08:00:00)");
+    EXPECT_EQ(complaint({.mSince = "before", .mUntil = "before"}), "none") << "a moment is a stretch of time";
+    EXPECT_EQ(complaint({.mSince = "2h", .mUntil = "1h"}), "none");
+}
+
 TEST_F(FilterText, NothingGivenIsEverythingUpToTheDefaultLimit) {
     const ZTSHistoryFilter lFilter = read({});
     EXPECT_FALSE(lFilter.mSince || lFilter.mUntil || lFilter.mIsOpenOnly || lFilter.mIsAllLuns);

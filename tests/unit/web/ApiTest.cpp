@@ -108,12 +108,24 @@ TEST_F(Api, AWrongParameterGets400AndSaysWhy) {
         {"/api/v1/diff", {"since", "1h"}, "since"},
         {"/api/v1/timeline", {"columns", "0"}, "columns"},
         {"/api/v1/timeline", {"columns", "4001"}, "4001"},
-        {"/api/v1/timeline", {"to", "2000-01-01"}, "later than from"},
+        {"/api/v1/timeline", {"to", "2000-01-01"}, "from has to be earlier than to"},
+        {"/api/v1/explain", {"since", "2100-01-01"}, "since has to be earlier than until"},
     };
     for (const auto& lrWrong : lWrong) {
         const ZTSWebResponse lResponse = ask(lrWrong.mpPath, {lrWrong.mParameter});
         EXPECT_EQ(lResponse.mStatus, 400U) << lrWrong.mParameter.second;
         EXPECT_THAT(nlohmann::json::parse(lResponse.mBody)["error"].get<std::string>(), HasSubstr(lrWrong.mpSaid));
+    }
+}
+
+TEST_F(Api, ASinceBehindItsUntilGets400WithBothTimes) {
+    fill();
+    for (const char* lpPath : {"/api/v1/events", "/api/v1/ports"}) {
+        const ZTSWebResponse lResponse = ask(lpPath, {{"since", "2026-03-06"}, {"until", "2026-03-05 10:04"}});
+        EXPECT_EQ(lResponse.mStatus, 400U) << lpPath;
+        EXPECT_EQ(nlohmann::json::parse(lResponse.mBody)["error"],
+                  "--since \"2026-03-06\" (2026-03-06 00:00:00) is later than --until \"2026-03-05 10:04\" "
+                  "(2026-03-05 10:04:00)");
     }
 }
 
