@@ -3,9 +3,8 @@
 #include <algorithm>
 #include <charconv>
 #include <cmath>
+#include <limits>
 #include <string>
-
-#include "sensor/client/include/ClientErrors.h"
 
 struct ZTSUnit {
     const char* mpName;
@@ -49,13 +48,20 @@ std::chrono::milliseconds durationFromText(std::string_view aText) {
     double lNumber = 0;
     const char* lpEnd = aText.data() + aText.size();
     const auto [lpStop, lError] = std::from_chars(aText.data(), lpEnd, lNumber, std::chars_format::fixed);
-    const ZTSUnit* lpUnit = lError == std::errc()
-                                ? sFindUnit(scDurationUnits, {lpStop, static_cast<std::size_t>(lpEnd - lpStop)})
-                                : nullptr;
-    const double lMilliseconds = lpUnit == nullptr ? -1 : lNumber * static_cast<double>(lpUnit->mFactor);
-    if (!(lMilliseconds >= 0 && lMilliseconds <= scLongestMilliseconds)) {
+    if (lError == std::errc::result_out_of_range) {  // hundreds of digits, or a fraction that is as good as 0
+        lNumber = aText[aText.find_first_not_of('0')] == '.' ? 0 : std::numeric_limits<double>::infinity();
+    }
+    // Neither a sign, nor "inf", nor "nan".
+    const bool lIsNumber = lError != std::errc::invalid_argument && aText.find_first_of(".0123456789") == 0;
+    const ZTSUnit* lpUnit =
+        lIsNumber ? sFindUnit(scDurationUnits, {lpStop, static_cast<std::size_t>(lpEnd - lpStop)}) : nullptr;
+    if (lpUnit == nullptr) {
         throw ZTCBadInputEx("\"" + std::string(aText) +
                             "\" is not a duration: wanted a number and s, m, h or d, at most 36500d");
+    }
+    const double lMilliseconds = lNumber * static_cast<double>(lpUnit->mFactor);
+    if (lMilliseconds > scLongestMilliseconds) {
+        throw ZTCTooLargeEx("\"" + std::string(aText) + "\" is too long: a duration is at most 36500d");
     }
     return std::chrono::milliseconds(std::llround(lMilliseconds));
 }
@@ -75,11 +81,16 @@ std::uint64_t sizeFromText(std::string_view aText) {
     std::uint64_t lNumber = 0;
     const char* lpEnd = aText.data() + aText.size();
     const auto [lpStop, lError] = std::from_chars(aText.data(), lpEnd, lNumber);
-    const ZTSUnit* lpUnit =
-        lError == std::errc() ? sFindUnit(scSizeUnits, {lpStop, static_cast<std::size_t>(lpEnd - lpStop)}) : nullptr;
-    if (lpUnit == nullptr || lNumber > scLargestSize / lpUnit->mFactor) {
+    const bool lIsBeyond = lError == std::errc::result_out_of_range;
+    const ZTSUnit* lpUnit = lError == std::errc() || lIsBeyond
+                                ? sFindUnit(scSizeUnits, {lpStop, static_cast<std::size_t>(lpEnd - lpStop)})
+                                : nullptr;
+    if (lpUnit == nullptr) {
         throw ZTCBadInputEx("\"" + std::string(aText) +
                             "\" is not a size: wanted a whole number and B, KiB, MiB, GiB or TiB, at most 1024TiB");
+    }
+    if (lIsBeyond || lNumber > scLargestSize / lpUnit->mFactor) {
+        throw ZTCTooLargeEx("\"" + std::string(aText) + "\" is too large: a size is at most 1024TiB");
     }
     return lNumber * lpUnit->mFactor;
 }

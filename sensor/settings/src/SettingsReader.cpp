@@ -91,6 +91,8 @@ static std::optional<ZTSFault> sRead(const toml::node& acrNode, const ZTSRange& 
     } else if (acrRange.mQuantity == ZTQ_Bytes && acrNode.is_string()) {
         try {
             lNumber = static_cast<std::int64_t>(sizeFromText(acrNode.as_string()->get()));
+        } catch (const ZTCTooLargeEx&) {
+            return ZTSFault{scOutOfRange, sRangeText(acrRange)};
         } catch (const ZTCBadInputEx&) {
             return ZTSFault{"not a size", sRangeText(acrRange)};
         }
@@ -110,6 +112,8 @@ static std::optional<ZTSFault> sRead(const toml::node& acrNode, const ZTSRange& 
     if (acrNode.is_string()) {
         try {
             lSeconds = static_cast<double>(durationFromText(acrNode.as_string()->get()).count()) / 1000;
+        } catch (const ZTCTooLargeEx&) {
+            return ZTSFault{scOutOfRange, sRangeText(acrRange)};
         } catch (const ZTCBadInputEx&) {
             return ZTSFault{"not a duration", sRangeText(acrRange)};
         }

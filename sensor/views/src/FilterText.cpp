@@ -28,6 +28,17 @@ static std::optional<std::chrono::microseconds> sParseSpan(const std::string& ac
     }
 }
 
+/// Throws ZTCBadFilterEx for a duration that is longer than the longest.
+static void sRefuseTooLong(const std::string& acrText, const std::string& acrOption) {
+    try {
+        durationFromText(acrText);
+    } catch (const ZTCTooLargeEx& lrEx) {
+        throw ZTCBadFilterEx(acrOption + " " + lrEx.what());
+    } catch (const ZTCBadInputEx&) {
+        return;  // something else
+    }
+}
+
 bool isTimeOrDuration(const std::string& acrText) {
     return sParseSpan(acrText) || parseLocalTime(acrText, getHistoryTime());
 }
@@ -43,6 +54,7 @@ ZTCHistoryTime readPoint(const std::string& acrText, const std::string& acrOptio
     const auto lMark = std::find_if(acrMarks.begin(), acrMarks.end(),
                                     [&acrText](const ZTSMark& acrMark) { return acrMark.mName == acrText; });
     if (lMark == acrMarks.end()) {
+        sRefuseTooLong(acrText, acrOption);
         sFail(acrOption, acrText,
               "a time (\"2026-11-21 10:04\", \"10:04\"), a duration back from now (\"90s\", \"10m\", \"24h\", \"30d\") "
               "or "

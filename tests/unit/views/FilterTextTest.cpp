@@ -98,6 +98,12 @@ TEST_F(FilterText, ALimitIsANumber) {
     }
 }
 
+TEST_F(FilterText, ATooLongDurationIsSaidToBeTooLongUnlessAMarkHasThatName) {
+    EXPECT_EQ(complaint({.mSince = "40000d"}), "--since \"40000d\" is too long: a duration is at most 36500d");
+    mMarks.push_back({.mName = "40000d", .mTime = timeOf("2026-11-20T09:00:00+01:00")});
+    EXPECT_EQ(read({.mSince = "40000d"}).mSince, timeOf("2026-11-20T09:00:00+01:00"));
+}
+
 TEST_F(FilterText, ANameThatReadsAsATimeIsNoMark) {
     EXPECT_TRUE(isTimeOrDuration("10m"));
     EXPECT_TRUE(isTimeOrDuration("10:04"));
