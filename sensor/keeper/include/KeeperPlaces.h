@@ -18,8 +18,9 @@ std::string findAgentProgram(const std::string& acrProgram, const std::string& a
 /// The collector: beside this program, else in ../libexec/tavik. Throws as above.
 std::string findCollectorProgram(const std::string& acrOwnFolder);
 
-/// Makes sensor.directory (0755), its agent/ (0700) and sensor.state (0750), with the folders above them. Existing ones
-/// keep their mode, except agent/, which must be this user's. Throws ZTCSystemCallEx, ZTCBadInputEx.
+/// Makes sensor.directory (0755), its agent/ (0700) and sensor.state (0750), with the folders above them (0755),
+/// whatever the umask is. Existing ones keep their mode, except agent/, which must be this user's. One thread: the
+/// umask is changed meanwhile. Throws ZTCSystemCallEx, ZTCBadInputEx.
 void makeDirectories(const ZTSSettings& acrSettings);
 
 /// A listening socket at the path, mode 0660, in place of one that an earlier sensor left. Throws ZTCSystemCallEx.

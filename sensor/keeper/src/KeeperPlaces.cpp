@@ -66,10 +66,24 @@ std::string findCollectorProgram(const std::string& acrOwnFolder) {
     return sFindIn({acrOwnFolder, acrOwnFolder + "/../libexec/tavik"}, scCollectorName);
 }
 
+/// Makes the folder with exactly this mode, whatever the umask is. Returns false, with errno, where that fails.
+static bool sTryFolder(const std::string& acrPath, mode_t aMode) {
+    const mode_t lMask = umask(0);
+    const bool lIsMade = mkdir(acrPath.c_str(), aMode) == 0;
+    const int lErrno = errno;
+    umask(lMask);
+    errno = lErrno;
+    return lIsMade;
+}
+
+/// Where it is missing; the folders above it too.
 static void sMakeFolder(const std::string& acrPath, mode_t aMode) {
-    std::error_code lError;
-    std::filesystem::create_directories(std::filesystem::path(acrPath).parent_path(), lError);
-    if (mkdir(acrPath.c_str(), aMode) != 0 && errno != EEXIST) {
+    bool lIsThere = sTryFolder(acrPath, aMode);
+    if (!lIsThere && errno == ENOENT) {
+        sMakeFolder(std::filesystem::path(acrPath).parent_path(), 0755);
+        lIsThere = sTryFolder(acrPath, aMode);
+    }
+    if (!lIsThere && errno != EEXIST) {
         throw ZTCSystemCallEx("cannot make the directory " + acrPath, errno);
     }
 }

@@ -78,6 +78,48 @@ TEST_F(KeeperPlaces, DirectoriesAreMadeAndTheAgentsIsClosedToOthers) {
     EXPECT_THROW(makeDirectories(lSettings), ZTCSystemCallEx);
 }
 
+TEST_F(KeeperPlaces, TheModesOfMadeDirectoriesAreExactWhateverTheUmaskIs) {
+    for (const mode_t lUmask : {0077U, 0027U, 0000U}) {
+        const std::string lPlace = mDirectory.path("umask" + std::to_string(lUmask));
+        ZTSSettings lSettings = defaultSettings();
+        lSettings.mSensorDirectory = lPlace + "/above/run";
+        lSettings.mSensorState = lPlace + "/state";
+        const mode_t lFormer = umask(lUmask);
+        makeDirectories(lSettings);
+        EXPECT_EQ(umask(lFormer), lUmask) << "it is as before";
+        EXPECT_EQ(modeOf(lPlace), 0755U);
+        EXPECT_EQ(modeOf(lPlace + "/above"), 0755U);
+        EXPECT_EQ(modeOf(lSettings.mSensorDirectory), 0755U);
+        EXPECT_EQ(modeOf(lSettings.agentDirectory()), 0700U);
+        EXPECT_EQ(modeOf(lSettings.mSensorState), 0750U);
+    }
+}
+
+TEST_F(KeeperPlaces, DirectoriesThatWereThereKeepTheirModes) {
+    ZTSSettings lSettings = defaultSettings();
+    lSettings.mSensorDirectory = mDirectory.path("above/run");
+    lSettings.mSensorState = mDirectory.path("above/state");
+    for (const std::string& lrPath : {mDirectory.path("above"), lSettings.mSensorDirectory, lSettings.mSensorState}) {
+        ASSERT_EQ(mkdir(lrPath.c_str(), 0700), 0);
+    }
+    makeDirectories(lSettings);
+    EXPECT_EQ(modeOf(mDirectory.path("above")), 0700U);
+    EXPECT_EQ(modeOf(lSettings.mSensorDirectory), 0700U);
+    EXPECT_EQ(modeOf(lSettings.mSensorState), 0700U);
+}
+
+TEST_F(KeeperPlaces, ADirectoryThatCannotBeMadeIsNamed) {
+    writeFile(mDirectory.path("file"), "");
+    ZTSSettings lSettings = defaultSettings();
+    lSettings.mSensorDirectory = mDirectory.path("file/run");
+    try {
+        makeDirectories(lSettings);
+        ADD_FAILURE();
+    } catch (const ZTCSystemCallEx& lcrEx) {
+        EXPECT_THAT(lcrEx.what(), testing::StartsWith("cannot make the directory " + mDirectory.path("file/run")));
+    }
+}
+
 TEST_F(KeeperPlaces, TheControlSocketTakesTheOldOnesPlaceAndIsForOwnerAndGroup) {
     const std::string lPath = mDirectory.path("control");
     { const ZTCFileDescriptor lOld = openControlSocket(lPath); }
