@@ -47,10 +47,10 @@ std::string setDamagedFileAside(const std::string& acrPath) {
     gmtime_r(&lNow, &lTime);
     char lDate[32];
     std::strftime(lDate, sizeof lDate, "%Y%m%d-%H%M%S", &lTime);
-    const std::string lStart = acrPath.substr(0, acrPath.rfind('.')) + ".damaged-" + lDate;
-    std::string lTarget = lStart + ".db";
+    const std::string lStart = acrPath.substr(0, acrPath.rfind('/') + 1) + gcDamagedPrefix + lDate;
+    std::string lTarget = lStart + gcHistorySuffix;
     for (int i = 2; access(lTarget.c_str(), F_OK) == 0; ++i) {
-        lTarget = lStart + "-" + std::to_string(i) + ".db";
+        lTarget = lStart + "-" + std::to_string(i) + gcHistorySuffix;
     }
     if (rename(acrPath.c_str(), lTarget.c_str()) != 0) {
         sFail(acrPath, "it is damaged and cannot be renamed to " + lTarget, errno);

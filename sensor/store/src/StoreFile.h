@@ -5,6 +5,10 @@
 #include <cstdint>
 #include <string>
 
+/// A database that was set aside has a name of these two with the date in between.
+inline constexpr const char* gcDamagedPrefix = "history.damaged-";
+inline constexpr const char* gcHistorySuffix = ".db";
+
 /// "DIRECTORY/history.db".
 std::string getHistoryPath(const std::string& acrStateDirectory);
 

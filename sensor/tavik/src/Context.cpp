@@ -9,6 +9,7 @@
 #include "sensor/client/include/AgentState.h"
 #include "sensor/client/include/ClientErrors.h"
 #include "sensor/client/include/StatusPageReader.h"
+#include "sensor/store/include/DamagedHistories.h"
 #include "sensor/tavik/src/ControlClient.h"
 #include "sensor/views/include/TimeText.h"
 
@@ -95,6 +96,7 @@ ZTSStatusFacts ZTCContext::gatherFacts(std::optional<ZTCHistoryTime> aLossesSinc
         lFacts.mHistoryProblem = lrEx.what();
         lFacts.mIsHistoryNewer = dynamic_cast<const ZTCStoreNewerEx*>(&lrEx) != nullptr;
     }
+    lFacts.mDamagedHistories = listDamagedHistories(mSettings.mSensorState);
     lFacts.mNames = makeNames(lpHistory.get());
     lFacts.mNames.setTopology(nullptr);  // the history ends here
     lFacts.mNames.setCounters(nullptr);

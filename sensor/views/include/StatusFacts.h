@@ -64,8 +64,10 @@ struct ZTSStatusFacts {
     std::string mAnswerProblem;         ///< one line: why the sensor did not answer
     std::optional<ZTSLiveState> mLive;  ///< present for ZTAN_Answered alone
     std::optional<ZTSHistoryFacts> mHistory;
-    std::string mHistoryProblem;                       ///< one line: why there is no history to read
-    bool mIsHistoryNewer = false;                      ///< the reason is that a newer version has written it
+    std::string mHistoryProblem;   ///< one line: why there is no history to read
+    bool mIsHistoryNewer = false;  ///< the reason is that a newer version has written it
+    /// The paths of damaged ones that were set aside, by their dates; absent: not known.
+    std::optional<std::vector<std::string>> mDamagedHistories{};
     std::chrono::microseconds mLossSpan = gcLossSpan;  ///< how far back the losses of both reach
     std::optional<ZTSLeftPage> mLeftPage;
     std::string mPageProblem;  ///< one line: why it is not known whether a page was left
@@ -106,7 +108,10 @@ inline constexpr const char* gcStaleNamesAction = "journalctl -k -n 50";
 /// the sensor did not say.
 std::string describeStaleNames(const ZTSStatusFacts& acrFacts);
 
-/// One line for each thing that could not be learned.
+/// Says that damaged histories were set aside, and what to do. Empty: there are none, as far as is known.
+std::string describeDamagedHistories(const ZTSStatusFacts& acrFacts);
+
+/// One line for each thing that could not be learned, or that is in a damaged history.
 std::vector<std::string> listUnknown(const ZTSStatusFacts& acrFacts);
 
 #endif

@@ -62,6 +62,18 @@ std::string describeStaleNames(const ZTSStatusFacts& acrFacts) {
            "; events are collected all the same. Look at that adapter in the kernel's log: " + gcStaleNamesAction;
 }
 
+std::string describeDamagedHistories(const ZTSStatusFacts& acrFacts) {
+    if (!acrFacts.mDamagedHistories || acrFacts.mDamagedHistories->empty()) {
+        return {};
+    }
+    const std::vector<std::string>& lrPaths = *acrFacts.mDamagedHistories;
+    const std::string lWhat = lrPaths.size() == 1
+                                  ? "a damaged history was set aside as "
+                                  : formatNumber(lrPaths.size()) + " damaged histories were set aside, the last as ";
+    return lWhat + lrPaths.back() +
+           "; events in it are not shown. When nobody needs them any more, remove it and the -wal file beside it";
+}
+
 std::vector<std::string> listUnknown(const ZTSStatusFacts& acrFacts) {
     std::vector<std::string> lUnknown;
     const auto lAdd = [&lUnknown](bool aIsUnknown, const std::string& acrText) {
@@ -70,6 +82,8 @@ std::vector<std::string> listUnknown(const ZTSStatusFacts& acrFacts) {
         }
     };
     lAdd(!acrFacts.mHistory && !acrFacts.mHistoryProblem.empty(), acrFacts.mHistoryProblem);
+    const std::string lDamaged = describeDamagedHistories(acrFacts);
+    lAdd(!lDamaged.empty(), lDamaged);
     lAdd(acrFacts.mAnswer == ZTAN_NoSensor && !acrFacts.mPageProblem.empty(), acrFacts.mPageProblem);
     const std::string lStale = describeStaleNames(acrFacts);
     lAdd(!lStale.empty(), lStale);

@@ -287,6 +287,7 @@ ZTCJson makeStatusDocument(const ZTSStatusFacts& acrFacts) {
         lHasSan ? sTroubles(describeSanTroubles(acrFacts.mHistory->mSan->mFacts, acrFacts.mNames, acrFacts.mNow))
                 : ZTCJson(nullptr);
     lDocument["topology"] = sTopology(acrFacts);
+    lDocument["damagedHistories"] = sValue(acrFacts.mDamagedHistories);
     lDocument["unknown"] = listUnknown(acrFacts);
     return lDocument;
 }

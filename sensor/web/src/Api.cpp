@@ -7,6 +7,7 @@
 
 #include "sensor/client/include/RecordJson.h"
 #include "sensor/metrics/include/Metrics.h"
+#include "sensor/store/include/DamagedHistories.h"
 #include "sensor/views/include/DiagnosisView.h"
 #include "sensor/views/include/DiffView.h"
 #include "sensor/views/include/EpisodeJson.h"
@@ -105,6 +106,7 @@ ZTSStatusFacts ZTCApi::gatherFacts() {
         mpHistory.reset();
         lFacts.mHistoryProblem = lrEx.what();
     }
+    lFacts.mDamagedHistories = listDamagedHistories(mSources.mStateDirectory);
     return lFacts;
 }
 

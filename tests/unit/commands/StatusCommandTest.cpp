@@ -1,6 +1,7 @@
 #include <gmock/gmock.h>
 #include <sys/socket.h>
 #include <sys/stat.h>
+#include <unistd.h>
 
 #include <chrono>
 
@@ -8,6 +9,7 @@
 #include "tests/unit/commands/TavikProgram.h"
 
 using testing::HasSubstr;
+using testing::Not;
 using testing::StartsWith;
 
 class StatusCommand : public TavikProgram {};
@@ -99,6 +101,20 @@ TEST_F(StatusCommand, ADamagedDatabaseDoesNotKeepItFromAnswering) {
     EXPECT_EQ(lRun.mStatus, 0);
     EXPECT_THAT(lRun.mOutput, HasSubstr("  note: "));
     EXPECT_THAT(lRun.mOutput, HasSubstr("history.db"));
+}
+
+TEST_F(StatusCommand, ADamagedHistoryThatWasSetAsideIsNamedUntilItIsRemoved) {
+    store();
+    const std::string lPath = statePath() + "/history.damaged-20261121-100412.db";
+    writeFile(lPath, "damaged");
+    const ZTCFakeSensor lSensor(controlPath(), ZTCFakeSensor::withState(makeLiveState()));
+    EXPECT_EQ(runJson({"status"})["damagedHistories"], nlohmann::json({lPath}));
+    const ZTSFinishedRun lRun = run({"status"});
+    EXPECT_EQ(lRun.mStatus, 0);
+    EXPECT_THAT(lRun.mOutput, HasSubstr("  note: a damaged history was set aside as"));
+    ASSERT_EQ(unlink(lPath.c_str()), 0);
+    EXPECT_EQ(runJson({"status"})["damagedHistories"], nlohmann::json::array());
+    EXPECT_THAT(run({"status"}).mOutput, Not(HasSubstr("damaged")));
 }
 
 TEST_F(StatusCommand, MarksGoThroughTheSensor) {

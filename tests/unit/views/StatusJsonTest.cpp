@@ -63,6 +63,18 @@ TEST_F(StatusJson, WhatIsNotKnownIsNull) {
     EXPECT_EQ(lDocument["unknown"], ZTCJson({"no history"}));
 }
 
+TEST_F(StatusJson, DamagedHistoriesAreTheirPaths) {
+    ZTSStatusFacts lFacts = makeHealthyFacts();
+    EXPECT_EQ(makeStatusDocument(lFacts)["damagedHistories"], nullptr);
+    lFacts.mDamagedHistories.emplace();
+    EXPECT_EQ(makeStatusDocument(lFacts)["damagedHistories"], ZTCJson::array());
+    lFacts.mDamagedHistories->push_back("/var/lib/tavik/history.damaged-20261120-070000.db");
+    const ZTCJson lDocument = makeStatusDocument(lFacts);
+    EXPECT_EQ(lDocument["damagedHistories"], ZTCJson({"/var/lib/tavik/history.damaged-20261120-070000.db"}));
+    EXPECT_EQ(lDocument["unknown"], ZTCJson({describeDamagedHistories(lFacts)}));
+    EXPECT_EQ(lDocument["exit"], 0);
+}
+
 TEST_F(StatusJson, TheLedgerJoinsWhatIsStoredWithTheRunningAgentsCounts) {
     nlohmann::json lLive = makeHealthyJson();
     lLive["ledger"] = {{{"initiator", {{"wwpn", "10:00:00:00:c9:00:00:01"}}},

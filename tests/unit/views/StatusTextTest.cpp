@@ -217,6 +217,22 @@ TEST_F(StatusText, WithoutAHistoryTheReasonIsNamed) {
     EXPECT_THAT(lText, Not(HasSubstr("data:")));
 }
 
+TEST_F(StatusText, ADamagedHistoryThatWasSetAsideIsNamedWithWhatToDo) {
+    ZTSStatusFacts lFacts = makeHealthyFacts();
+    lFacts.mDamagedHistories.emplace();
+    EXPECT_THAT(format(lFacts), Not(HasSubstr("note:")));
+    lFacts.mDamagedHistories->push_back("/var/lib/tavik/history.damaged-20261120-070000.db");
+    const std::string lText = format(lFacts, 200);
+    EXPECT_THAT(lText, HasSubstr(" state: COLLECTING since 14 Nov 08:12; nothing lost\n"));
+    EXPECT_THAT(lText,
+                HasSubstr("  note: a damaged history was set aside as "
+                          "/var/lib/tavik/history.damaged-20261120-070000.db; events in it are not shown. When nobody "
+                          "needs them any more, remove it and the -wal file beside it\n"));
+    lFacts.mDamagedHistories->push_back("/var/lib/tavik/history.damaged-20261121-080000.db");
+    EXPECT_THAT(format(lFacts, 200), HasSubstr("  note: 2 damaged histories were set aside, the last as "
+                                               "/var/lib/tavik/history.damaged-20261121-080000.db; "));
+}
+
 TEST_F(StatusText, SeveralTroublesOfTavikAreAllShown) {
     nlohmann::json lLive = makeHealthyJson();
     lLive["kinds"][0]["kinds"]["rscn"] = "failed";

@@ -158,6 +158,7 @@ TEST_F(Api, APathThatIsNotThereGets404) {
 TEST_F(Api, WithoutAHistoryStatusAndMetricsStillAnswerAndTheRestGets503) {
     EXPECT_EQ(ask("/api/v1/events").mStatus, 503U);
     EXPECT_EQ(askJson("/api/v1/status")["schema"], "tavik.status/1");
+    EXPECT_EQ(askJson("/api/v1/status")["damagedHistories"], nlohmann::json::array());
     EXPECT_THAT(ask("/metrics").mBody, HasSubstr("tavik_build_info{version=\"9.8.7\"} 1\n"));
     fill();  // it is there now: no restart is needed
     EXPECT_EQ(askJson("/api/v1/events")["episodes"].size(), 3U);
