@@ -87,6 +87,8 @@ struct ZTSDiff {
     std::vector<ZTSDiffRate> mRates;          ///< kinds and ports with an event in one of the two times
     std::chrono::microseconds mBeforeSpan{};  ///< that the rates before are of
     std::chrono::microseconds mAfterSpan{};
+    ZTCHistoryTime mBeforeEnd{};  ///< where the stretches of the rates end: whole minutes
+    ZTCHistoryTime mAfterEnd{};
 
     bool isSame() const;
 };

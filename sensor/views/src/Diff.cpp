@@ -266,6 +266,8 @@ static void sAddRates(const ZTCHistory& acrHistory, const ZTSDiffRequest& acrReq
     const ZTCHistoryTime lBorder = floor<minutes>(acrRequest.mFrom.mTime);
     const ZTCHistoryTime lAfterSince = floor<minutes>(acrRequest.mAfterSince.value_or(lBorder));
     const ZTCHistoryTime lEnd = std::max<ZTCHistoryTime>(ceil<minutes>(acrRequest.mTo.mTime), lAfterSince + minutes(1));
+    arDiff.mBeforeEnd = lBorder;
+    arDiff.mAfterEnd = lEnd;
     arDiff.mAfterSpan = lEnd - lAfterSince;
     arDiff.mBeforeSpan = std::max<std::chrono::microseconds>(arDiff.mAfterSpan, scLeastBefore);
     if (acrRequest.mBeforeSince) {

@@ -150,8 +150,11 @@ std::string formatDiff(const ZTSDiff& acrDiff, const ZTCNameBook& acrNames, std:
     if (!acrDiff.mHasTopology) {
         lPage.add("note", "the paths of both moments are not stored: nothing is known of them");
     }
-    lPage.add("rates", "of the " + formatSpan(acrDiff.mBeforeSpan) + " before, and of the " +
-                           formatSpan(acrDiff.mAfterSpan) + " in between");
+    const auto lStretch = [&acrDiff](std::chrono::microseconds aSpan, ZTCHistoryTime aEnd) {
+        return "of the " + formatSpan(aSpan) + " up to " + formatShortTime(aEnd, acrDiff.mTo.mTime);
+    };
+    lPage.add("rates", lStretch(acrDiff.mBeforeSpan, acrDiff.mBeforeEnd) + ", and " +
+                           lStretch(acrDiff.mAfterSpan, acrDiff.mAfterEnd));
     std::string lText = lPage.take();
     if (!lRows.empty()) {
         ZTCTextTable lTable(

@@ -4,6 +4,7 @@
 
 #include "sensor/views/include/DiffView.h"
 #include "sensor/views/include/FilterText.h"
+#include "sensor/views/include/TimeText.h"
 #include "tests/unit/store/StoreFixture.h"
 #include "tests/unit/views/SanSamples.h"
 
@@ -181,6 +182,20 @@ TEST_F(DiffOfAHistory, AStormThatEndedBeforeTheMarkOfTheSameMinuteIsNoDifference
     EXPECT_EQ(lDiff().mRates[0].mAfter, 0U);
     take({makeQueueFull(gcPortA, lMark + 1, lMark + 5, 500)}, lMark + 9);
     EXPECT_FALSE(lDiff().isSame());
+}
+
+TEST_F(DiffOfAHistory, TheTextSaysWhereTheMinutesThatWereCountedEnd) {
+    const std::int64_t lTo = scTo + 30 * gcSecond;
+    take({makeQueueFull(gcPortA, lTo + 20 * gcSecond, lTo + 20 * gcSecond, 500)}, lTo + gcMinute);
+    const ZTSDiff lDiff = makeDiff(history(), {.mFrom = {.mTime = fromMicroseconds(scFrom + 5 * gcSecond), .mMark = ""},
+                                               .mTo = {.mTime = fromMicroseconds(lTo), .mMark = ""}});
+    ASSERT_THAT(lDiff.mRates, SizeIs(1));
+    EXPECT_EQ(lDiff.mRates[0].mAfter, 500U) << "they came in the minute of the end";
+    const auto lTime = [lTo](std::int64_t aTime) {
+        return formatShortTime(fromMicroseconds(aTime), fromMicroseconds(lTo));
+    };
+    EXPECT_THAT(format(lDiff), HasSubstr(" rates: of the 1 h up to " + lTime(scFrom) + ", and of the 1 h up to " +
+                                         lTime(scTo + gcMinute) + "\n"));
 }
 
 TEST_F(DiffOfAHistory, TheRatesOfTwoStretchesAreThoseOfNothingElse) {
