@@ -22,13 +22,13 @@ ZTCFakeSensor::ZTCFakeSensor(const std::string& acrSocketPath, ZTCAnswer aAnswer
         listen(mListener.get(), 8) != 0) {
         throw std::runtime_error("cannot listen on " + acrSocketPath);
     }
-    mThread = std::thread([this] { serve(); });
+    mThread.emplace([this] { serve(); });
 }
 
 ZTCFakeSensor::~ZTCFakeSensor() {
     const std::uint64_t lOne = 1;
     [[maybe_unused]] const ssize_t lWritten = write(mStop.get(), &lOne, sizeof(lOne));
-    mThread.join();
+    mThread->join();
 }
 
 ZTCFakeSensor::ZTCAnswer ZTCFakeSensor::withState(const nlohmann::json& acrLive) {

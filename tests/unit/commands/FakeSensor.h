@@ -2,13 +2,13 @@
 #ifndef TESTS_UNIT_COMMANDS_FAKESENSOR_H
 #define TESTS_UNIT_COMMANDS_FAKESENSOR_H
 
-#include <atomic>
 #include <functional>
 #include <nlohmann/json.hpp>
+#include <optional>
 #include <string>
-#include <thread>
 
 #include "sensor/client/include/FileDescriptor.h"
+#include "tests/support/TestThreads.h"
 
 class ZTCFakeSensor {
 public:
@@ -30,7 +30,7 @@ private:
     const ZTCAnswer mAnswer;
     ZTCFileDescriptor mListener;
     ZTCFileDescriptor mStop;
-    std::thread mThread;
+    std::optional<ZTCTestThread> mThread;
 };
 
 /// What a sensor that collects from one adapter says.
