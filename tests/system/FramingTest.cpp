@@ -2,7 +2,6 @@
 #include <unistd.h>
 
 #include <algorithm>
-#include <atomic>
 #include <chrono>
 #include <cstdint>
 #include <sstream>
@@ -12,6 +11,7 @@
 #include <vector>
 
 #include "tests/support/AgentProcess.h"
+#include "tests/support/TestThreads.h"
 
 /// Waits for an error line that contains each of these numbers as a word of its own.
 static ZTSLogLine sWaitForError(const ZTCAgentProcess& acrAgent, const std::vector<std::string>& acrNumbers) {
@@ -231,10 +231,9 @@ TEST(Framing, AnIdleWaitEndsWithoutALineAboutItsTimeOut) {
 TEST(Framing, ATrickleOfBytesDoesNotHoldUpAnExit) {
     ZTCAgentProcess lAgent;
     lAgent.startAndConnect();
-    std::atomic<bool> lIsToEnd{false};
     lAgent.pipes().sendRaw(bytesOf("00100000"));
-    std::thread lTrickle([&] {
-        while (!lIsToEnd) {
+    const ZTCTestThread lTrickle([&](const std::stop_token& acrStop) {
+        while (!acrStop.stop_requested()) {
             try {
                 lAgent.pipes().sendRaw({0x02});
             } catch (const std::runtime_error&) {
@@ -244,11 +243,7 @@ TEST(Framing, ATrickleOfBytesDoesNotHoldUpAnExit) {
         }
     });
     lAgent.pipes().waitUntilTaken();
-    int lStatus = -1;
-    EXPECT_NO_THROW(lStatus = lAgent.stop());
-    lIsToEnd = true;
-    lTrickle.join();
-    EXPECT_EQ(lStatus, 0);
+    EXPECT_EQ(lAgent.stop(), 0);
     EXPECT_TRUE(lAgent.log().has("Tavik System exiting", "-H-"));
 }
 

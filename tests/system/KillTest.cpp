@@ -2,7 +2,6 @@
 
 #include <algorithm>
 #include <array>
-#include <atomic>
 #include <chrono>
 #include <csignal>
 #include <cstdlib>
@@ -10,11 +9,11 @@
 #include <iostream>
 #include <stdexcept>
 #include <string>
-#include <thread>
 #include <vector>
 
 #include "tests/support/AgentProcess.h"
 #include "tests/support/Seed.h"
+#include "tests/support/TestThreads.h"
 #include "tests/system/AdapterEvents.h"
 
 // SIGKILL at a random moment under load: every line that was logged is there, and the next start works. ZT_KILL_RUNS is
@@ -45,15 +44,15 @@ public:
         mAgent.start();
         ZTSAcknowledged lAcknowledged;
         if (lPhase == ZTEKillPhase::Start) {
-            killWithin(60, [this](const std::atomic<bool>& acrIsKilled) { comeAsASensor(acrIsKilled); });
+            killWithin(60, [this](const ZTCTestThread& acrKiller) { comeAsASensor(acrKiller); });
         } else {
             mAgent.pipes().open();
             EXPECT_TRUE(mAgent.ping());
             if (lPhase == ZTEKillPhase::Load) {
-                killWithin(150, [&](const std::atomic<bool>&) { load(lAcknowledged, 1u << 30); });
+                killWithin(150, [&](const ZTCTestThread&) { load(lAcknowledged, 1u << 30); });
             } else {
                 load(lAcknowledged, 3);
-                killWithin(8, [this](const std::atomic<bool>&) { askToStop(); });
+                killWithin(8, [this](const ZTCTestThread&) { askToStop(); });
             }
         }
         ++mPhases[static_cast<std::size_t>(lPhase)];
@@ -71,18 +70,17 @@ public:
     }
 
 private:
-    /// Does this, and kills the agent at a random moment meanwhile; what fails for that reason does not count.
+    /// Does this, and kills the agent at a random moment meanwhile; what fails for that reason does not count. The
+    /// action gets the thread that kills, which runs until then.
     template <typename Action>
     void killWithin(unsigned aMilliseconds, Action aAction) {
         const ZTCDeadline lMoment(std::chrono::milliseconds(mrSeed.below(aMilliseconds)));
-        std::atomic<bool> lIsKilled{false};
-        std::thread lKiller([&] {
+        ZTCTestThread lKiller([&] {
             waitUntil([&] { return lMoment.isOver(); }, "the moment of the kill", ZTCDeadline(2 * gcTestPatience));
             mAgent.process().sendSignal(SIGKILL);
-            lIsKilled = true;
         });
         try {
-            aAction(lIsKilled);
+            aAction(lKiller);
         } catch (const std::runtime_error&) {
             // The agent is gone: of the pipes, of the library's socket.
         }
@@ -92,9 +90,10 @@ private:
         mEarlyEnds += lStatus == 0 ? 1 : 0;
     }
 
-    void comeAsASensor(const std::atomic<bool>& acrIsKilled) {
-        waitUntil([&] { return acrIsKilled || isFifo(mAgent.responseFifoPath()); }, "the response FIFO or the kill");
-        if (!acrIsKilled) {
+    void comeAsASensor(const ZTCTestThread& acrKiller) {
+        waitUntil([&] { return !acrKiller.isRunning() || isFifo(mAgent.responseFifoPath()); },
+                  "the response FIFO or the kill");
+        if (acrKiller.isRunning()) {
             mAgent.pipes().openResponse();
         }
     }

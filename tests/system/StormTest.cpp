@@ -1,15 +1,13 @@
 #include <gtest/gtest.h>
 
-#include <atomic>
 #include <cstdint>
-#include <exception>
 #include <map>
 #include <string>
-#include <thread>
 #include <utility>
 #include <vector>
 
 #include "tests/support/AgentProcess.h"
+#include "tests/support/TestThreads.h"
 #include "tests/system/AdapterEvents.h"
 
 // What a storm of events from many threads must never do: lose or double an event, hold up an exit, crash or hang.
@@ -67,24 +65,12 @@ TEST(Storm, EveryEventOfEightThreadsIsDeliveredExactlyOnceWhileItIsRetrieved) {
     std::map<ZTCKind, std::uint64_t> lCounts;
     for (std::uint64_t lBurst = 0; lBurst < lcBursts; ++lBurst) {
         lAgent.library().startStorm(lcThreads, lcRounds, lMixture);
-        std::atomic<bool> lIsOver{false};
         std::uint64_t lDelivered = 0;
-        std::thread lWaiter([&] {
-            try {
-                lDelivered = lAgent.library().waitForStorm();
-            } catch (const std::exception& lcrError) {
-                ADD_FAILURE() << lcrError.what();
-            }
-            lIsOver = true;
-        });
-        try {
-            do {
-                sAdd(lCounts, lAgent.retrieve());
-            } while (!lIsOver);
+        ZTCTestThread lWaiter([&] { lDelivered = lAgent.library().waitForStorm(); });
+        do {
             sAdd(lCounts, lAgent.retrieve());
-        } catch (const std::exception& lcrError) {
-            ADD_FAILURE() << lcrError.what();
-        }
+        } while (lWaiter.isRunning());
+        sAdd(lCounts, lAgent.retrieve());
         lWaiter.join();
         ASSERT_EQ(lDelivered, lcThreads * lcRounds * lMixture.size());
     }
