@@ -2,7 +2,6 @@
 // scripts/check-sensor-kills kills many.
 #include <gtest/gtest.h>
 
-#include <atomic>
 #include <csignal>
 #include <cstdlib>
 #include <functional>
@@ -13,39 +12,12 @@
 #include "tests/sensor/HistoryCheck.h"
 #include "tests/sensor/SensorProcess.h"
 #include "tests/support/Seed.h"
+#include "tests/support/TestThreads.h"
 
 static unsigned sRuns() {
     const char* const lpRuns = std::getenv("ZT_SENSOR_KILL_RUNS");
     return lpRuns != nullptr ? static_cast<unsigned>(std::strtoul(lpRuns, nullptr, 10)) : 3;
 }
-
-/// Storms that follow each other as long as it lives, also while no agent is there that takes them.
-class ZTCEndlessStorm {
-public:
-    /// @param arDelivered  counts the callbacks of each storm that came to its end
-    ZTCEndlessStorm(const ZTCSensorProcess& acrSensor, std::atomic<std::uint64_t>& arDelivered)
-        : mThread([this, &acrSensor, &arDelivered] {
-              for (unsigned lRound = 0; !mIsOver; ++lRound) {
-                  try {
-                      // An agent that has not registered for all kinds yet gets a part of it.
-                      arDelivered +=
-                          std::stoull(acrSensor.simulate("storm count=500 threads=2 seed=" + std::to_string(lRound)));
-                  } catch (const std::runtime_error&) {
-                      std::this_thread::yield();  // there is no agent just now
-                  }
-              }
-          }) {}
-    ~ZTCEndlessStorm() {
-        mIsOver = true;
-        mThread.join();
-    }
-    ZTCEndlessStorm(const ZTCEndlessStorm&) = delete;
-    ZTCEndlessStorm& operator=(const ZTCEndlessStorm&) = delete;
-
-private:
-    std::atomic<bool> mIsOver{false};
-    std::thread mThread;
-};
 
 class SensorKillTest : public testing::Test {
 protected:
@@ -56,6 +28,17 @@ protected:
             return 0;
         }
     }
+    /// Storms that follow each other, also while no agent is there that takes them.
+    void deliverStorms(const std::stop_token& acrStop) {
+        for (unsigned lRound = 0; !acrStop.stop_requested(); ++lRound) {
+            try {
+                // An agent that has not registered for all kinds yet gets a part of it.
+                mDelivered += std::stoull(mSensor.simulate("storm count=500 threads=2 seed=" + std::to_string(lRound)));
+            } catch (const std::runtime_error&) {
+                std::this_thread::yield();  // there is no agent just now
+            }
+        }
+    }
     /// Kills so many times, each at a random moment of a storm. After each kill, and at the end: all that there is, is
     /// in the history; the kill is one gap; the equations hold.
     void killInStorms(const std::function<void()>& acrKill) {
@@ -64,7 +47,7 @@ protected:
         for (unsigned lRun = 1; lRun <= sRuns() && !HasFailure(); ++lRun) {
             SCOPED_TRACE("kill " + std::to_string(lRun));
             {
-                const ZTCEndlessStorm lStorm(mSensor, mDelivered);
+                const ZTCTestThread lStorm([this](const std::stop_token& acrStop) { deliverStorms(acrStop); });
                 const ZTCDeadline lMoment(std::chrono::milliseconds(lSeed.below(400)));
                 waitUntil([&] { return lMoment.isOver(); }, "the moment of the kill");
                 acrKill();
@@ -90,7 +73,8 @@ protected:
                   << countStored(mSensor.stateDirectory()) << " stored\n";
     }
 
-    std::atomic<std::uint64_t> mDelivered{0};
+    /// Callbacks of the storms that came to their end.
+    std::uint64_t mDelivered = 0;
     ZTCSensorProcess mSensor{"agent.log_level = 1\nagent.heartbeat = 1\n"};
 };
 

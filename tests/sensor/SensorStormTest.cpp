@@ -2,16 +2,15 @@
 #include <sys/stat.h>
 
 #include <algorithm>
-#include <atomic>
 #include <csignal>
 #include <cstdlib>
 #include <iostream>
-#include <thread>
 
 #include "sensor/store/include/History.h"
 #include "tests/sensor/HistoryCheck.h"
 #include "tests/sensor/SensorProcess.h"
 #include "tests/support/Seed.h"
+#include "tests/support/TestThreads.h"
 #include "tests/support/Waiting.h"
 
 // The real sensor in storms. ZT_SENSOR_KILL_RUNS is the number of collectors that are killed;
@@ -106,9 +105,8 @@ TEST_F(SensorStormTest, CollectorsThatAreKilledInAStormLoseNothing) {
         // One in a storm, or up to three in a row: a collector may be killed while it takes in what another one left.
         const unsigned lInThisStorm = std::min(1 + lSeed.below(3), sRuns() - lRun);
         SCOPED_TRACE("kills " + std::to_string(lRun + 1) + " to " + std::to_string(lRun + lInThisStorm));
-        std::atomic<bool> lIsOver{false};
-        std::thread lStorm([&] {
-            for (unsigned lRound = 1000 * lRun; !lIsOver; ++lRound) {
+        ZTCTestThread lStorm([this, lRun](const std::stop_token& acrStop) {
+            for (unsigned lRound = 1000 * lRun; !acrStop.stop_requested(); ++lRound) {
                 deliver(lRound % 2, scStormOfOthers + ("count=2000 threads=2 seed=" + std::to_string(lRound)));
                 deliver(lRound % 2, "rscn times=200");
             }
@@ -116,8 +114,7 @@ TEST_F(SensorStormTest, CollectorsThatAreKilledInAStormLoseNothing) {
         for (unsigned i = 0; i < lInThisStorm; ++i, ++lRun) {
             lKilled += killCollector(std::chrono::milliseconds(lSeed.below(400))) ? 1 : 0;
         }
-        lIsOver = true;
-        lStorm.join();
+        lStorm.stop();
         mSensor.waitUntilAllIsStored();
         waitForSoundHistory(mSensor.stateDirectory());
         EXPECT_EQ(mSensor.findAgent(), lAgent) << "the agent's process is the same";
