@@ -7,18 +7,17 @@
 #include <sys/stat.h>
 #include <unistd.h>
 
-#include <atomic>
 #include <cerrno>
 #include <csignal>
 #include <cstring>
 #include <filesystem>
 #include <iostream>
 #include <stdexcept>
-#include <thread>
 
 #include "sensor/agentcommon/include/SensorAgentProtocol.h"
 #include "sensor/link/include/Inheritance.h"
 #include "tests/sensor/UnixLine.h"
+#include "tests/support/TestThreads.h"
 
 static void sCheck(bool aIsGood, const std::string& acrWhat) {
     if (!aIsGood) {
@@ -176,17 +175,15 @@ ZTSKilledRun ZTCCollectorStage::runAndKillCollector(unsigned aStop, const std::f
     auto [lOwn, lTheirs] = ZTCLink::makePair();
     mLink = std::move(lOwn);
     tellAll();
-    std::atomic<bool> lIsDead{false};
-    std::thread lKeeper([&] {
-        waitUntil([&] { return lIsDead || acrIsDone(); }, "the end of the collector or of its work",
-                  ZTCDeadline(6 * gcTestPatience));
+    ZTCTestThread lKeeper([&](const std::stop_token& acrStop) {
+        EXPECT_NO_THROW(waitUntil([&] { return acrStop.stop_requested() || acrIsDone(); },
+                                  "the end of the collector or of its work", ZTCDeadline(6 * gcTestPatience)));
         pump();
         mLink.close();
     });
     const ZTCLink& lrTheirs = lTheirs;
     const ZTSKilledRun lRun = killAtSystemCall(aStop, [&]() -> int { execute(lrTheirs); });
-    lIsDead = true;
-    lKeeper.join();
+    lKeeper.stop();
     return lRun;
 }
 
