@@ -250,6 +250,7 @@ int main(int argc, char** argv) {
     if (lOptions.mPart == 0) {
         std::printf("%-32s %-26s %-12s %-13s %6s %8s %8s %8s %9s %7s\n", "phase", "call", "fails with", "how long",
                     "runs", "went on", "ended 0", "ended 1", "findings", "seconds");
+        std::fflush(stdout);
     }
     unsigned lNumber = 0;
     for (const ZTSFaultPhase& lcrPhase : faultPhases()) {
