@@ -5,8 +5,10 @@
 #include <sys/stat.h>
 #include <unistd.h>
 
+#include <ctime>
 #include <filesystem>
 #include <fstream>
+#include <functional>
 #include <string>
 #include <utility>
 #include <vector>
@@ -18,7 +20,20 @@ namespace {
 
 using LogOpening = ZTCLogSinkFixture;
 
+/// Runs in place of each pause of the log; empty: the pause is made.
+std::function<void()> sPause;
+
 }  // namespace
+
+extern "C" int sRealNanosleep(const timespec* apTime, timespec* apLeft) __asm__("__real_nanosleep");
+extern "C" int sWrappedNanosleep(const timespec* apTime, timespec* apLeft) __asm__("__wrap_nanosleep");
+int sWrappedNanosleep(const timespec* apTime, timespec* apLeft) {
+    if (!sPause) {
+        return sRealNanosleep(apTime, apLeft);
+    }
+    sPause();
+    return 0;
+}
 
 TEST_F(LogOpening, APathIsMadeAbsoluteWhenItIsSet) {
     const std::filesystem::path lFormer = std::filesystem::current_path();
@@ -86,6 +101,15 @@ TEST_F(LogOpening, AFileThatEndsInsideOfALineIsEndedFirst) {
     mpSink->setPath(mPath.c_str());
     writeTo(*mpSink, "one");
     EXPECT_EQ((Lines{"before", "torn", "-M- one"}), sinkLines(mPath));
+}
+
+TEST_F(LogOpening, ALineThatAnotherProcessIsWritingAtThisMomentIsLeftWhole) {
+    writeFile(mPath, "before\nbegun");
+    sPause = [this] { std::ofstream(mPath, std::ios::app) << " and ended\n"; };
+    mpSink->setPath(mPath.c_str());
+    sPause = nullptr;
+    writeTo(*mpSink, "one");
+    EXPECT_EQ("before\nbegun and ended\n-M- one\n", readFile(mPath));
 }
 
 TEST_F(LogOpening, ASymbolicLinkIsRefusedAndItsTargetUntouched) {
