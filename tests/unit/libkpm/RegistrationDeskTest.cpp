@@ -18,7 +18,7 @@ class RegistrationDesk : public testing::Test, protected ZTCRegistrationDesk {
 protected:
     RegistrationDesk() : ZTCRegistrationDesk(2) {}
 
-    std::uint32_t getNumberOfAdapters() const override { return 2; }
+    std::uint32_t getNumberOfAdapters() const override { return mAdapters; }
     std::uint32_t getNumberOfBoardsEver() const override { return 3; }
     std::uint32_t answerAdapterInfo(std::uint32_t, ZTSBoardNames& arNames) override {
         arNames = {scNode, scPort};
@@ -41,6 +41,7 @@ protected:
         return registerForPort(aBoard, acrPort, aCategory, aSubcategory, this, &mHandle, &sOnScope);
     }
 
+    std::uint32_t mAdapters = 2;
     std::uint32_t mInfoStatus = 0;
     std::uint32_t mUnregisterStatus = 0;
     ZTSRegistrationAnswer mAnswer;
@@ -127,4 +128,14 @@ TEST_F(RegistrationDesk, ARegistrationIsEndedByItsHandleThroughTheEntryThatMadeI
     EXPECT_EQ(unregisterForPort(0, scPort, mHandle), ZTLST_NoSuchHandle);
     EXPECT_EQ(unregisterForBoard(0, lLink), ZTLST_Success);
     EXPECT_EQ(getRegistry().size(), 0u);
+}
+
+TEST_F(RegistrationDesk, RegistrationsOfABoardThatHasGoneCanStillBeEnded) {
+    ASSERT_EQ(registerPort(1, scPort, 4, 1), 0u);
+    const std::uint32_t lLink = registerForBoard(1, 2, nullptr, &sOnEvent);
+    mAdapters = 1;
+    EXPECT_EQ(unregisterForPort(1, scPort, mHandle), ZTLST_Success);
+    EXPECT_EQ(unregisterForBoard(1, lLink), ZTLST_Success);
+    EXPECT_EQ(getRegistry().size(), 0u);
+    EXPECT_EQ(registerPort(1, scPort, 4, 1), ZTLST_NoSuchBoard);
 }
