@@ -57,6 +57,14 @@ TEST_F(LinuxEngineSense, TheProbeGivesThemAndEachCheckConditionIsDeliveredOnce) 
     EXPECT_TRUE(mKernel.instances().empty());
 }
 
+TEST_F(LinuxEngineSense, ThoseOfAHostThatComesLaterAreRecordedToo) {
+    mKernel.addTypes();
+    start();
+    mKernel.addHost(3);
+    waitUntil([&] { return mKernel.senseFile("events/" + mGroup + "/check_sense/filter") == "host == 0 || host == 3"; },
+              "the new host in the probe's filter");
+}
+
 TEST_F(LinuxEngineSense, WhatWaitsAtTheEndIsDelivered) {
     mKernel.addTypes();
     start();

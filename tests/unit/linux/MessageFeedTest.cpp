@@ -32,3 +32,22 @@ TEST_F(MessageFeed, ASocketThatWasReadEmptyIsWaitedForAgain) {
     EXPECT_TRUE(mKernel.isFcDrained());
     EXPECT_GE(mFeed.getDescriptor(), 0);
 }
+
+TEST_F(MessageFeed, ASocketThatHasWorkedIsTriedAgainWithTheNextLookHoweverLongItWasTriedBefore) {
+    mKernel.mRefusesFcEvents = true;
+    mFeed.noteHosts();
+    for (int lLook = 0; lLook < 7; ++lLook) {
+        mFeed.look();
+    }
+    ASSERT_FALSE(mFeed.getState().isOpen());
+    mKernel.mRefusesFcEvents = false;
+    for (int lLook = 0; lLook < 8 && !mFeed.getState().isOpen(); ++lLook) {
+        mFeed.look();
+    }
+    ASSERT_TRUE(mFeed.getState().isOpen());
+    mKernel.sendFc(ZTLR_Failed);
+    mFeed.serve();
+    ASSERT_FALSE(mFeed.getState().isOpen());
+    mFeed.look();
+    EXPECT_TRUE(mFeed.getState().isOpen());
+}

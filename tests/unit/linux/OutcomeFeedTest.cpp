@@ -84,3 +84,15 @@ TEST_F(OutcomeFeed, AnOutcomeThatWaitsWhenTheEventIsSwitchedOffIsDelivered) {
     EXPECT_EQ(mRecorder.events(),
               (std::vector<std::string>{"0 device-busy 0 2", "0 check-condition 0 1 28 ffffffff ffffffff ffffffff"}));
 }
+
+TEST_F(OutcomeFeed, AMarkOfLostRecordsIsCountedOnceHoweverOftenRecordsComeBehindIt) {
+    open();
+    writeFile(mKernel.instance() + "/per_cpu/cpu0/stats", "overrun: 18446744073709551615\n");
+    mKernel.sendPage(ZTCPageBuilder().addShort(ZTSDoneRecord{.mResult = 8}.make()).make(gcMissedEvents));
+    mFeed.look();
+    mKernel.sendDone({.mResult = 8});
+    mFeed.look();
+    ASSERT_EQ(mRecorder.count(), 2u);
+    mLosses.tellAll();
+    EXPECT_EQ(mLog.loss("scsi-outcomes-lost"), 1u);
+}
