@@ -129,6 +129,14 @@ TEST_F(EpisodeTest, AClockThatWasSetBackTwiceDoesNotKeepItOpenForEver) {
     EXPECT_EQ(closeAt(gcBase + 61 * gcSecond), 1U);
 }
 
+TEST_F(EpisodeTest, AnEpisodeThatGoesOnAfterTheClockWasSetBackStaysOpenUntilItIsQuiet) {
+    take({makeQueueFull(gcPortA, gcBase + gcDay, gcBase + gcDay)}, gcBase + gcDay);
+    EXPECT_EQ(closeAt(gcBase), 0U);
+    take({makeQueueFull(gcPortA, gcBase + 50 * gcSecond, gcBase + 50 * gcSecond)}, gcBase + 50 * gcSecond);
+    EXPECT_EQ(closeAt(gcBase + 61 * gcSecond), 0U);
+    EXPECT_EQ(closeAt(gcBase + 122 * gcSecond), 1U);
+}
+
 TEST_F(EpisodeTest, ARecordWhoseLastTimeLiesBeforeItsFirstIsKeptAndFlagged) {
     take({makeQueueFull(gcPortA, gcBase + gcDay, gcBase, 4)});
     const auto lEpisodes = episodes();
