@@ -56,6 +56,16 @@ TEST(LinkRules, LinksOfAFabricAtDifferentTimesAreTheirCables) {
     EXPECT_THAT(lEvidence.find("link-unstable"), SizeIs(2));
 }
 
+TEST(LinkRules, LinksThatFailOneAfterAnotherAreNotOneMoment) {
+    ZTCSampleEvidence lEvidence;
+    for (const unsigned lHost : {7U, 8U, 9U}) {
+        lEvidence.addInitiator(lHost, 1);
+        lEvidence.add("link", lHost, 100 + 25 * (lHost - 7));
+    }
+    EXPECT_THAT(lEvidence.find("switch-trouble"), IsEmpty());
+    EXPECT_THAT(lEvidence.find("link-unstable"), SizeIs(3));
+}
+
 TEST(LinkRules, TheOnlyPortOfAFabricIsNotProofOfItsSwitch) {
     ZTCSampleEvidence lEvidence = sTwoFabrics();
     lEvidence.add("link", 9, 100);
