@@ -193,6 +193,19 @@ TEST_F(AgentSessionTest, SixtySecondsWithoutAByteAreSilence) {
     collectEvents();
     EXPECT_TRUE(mIsSilent);
     EXPECT_THAT(mLines.back(), HasSubstr("no byte of its answer to \"get scope data\" for 60 s"));
+    EXPECT_GT(mSession->getNextStep(), now()) << "it is not said again at once";
+}
+
+TEST_F(AgentSessionTest, AStartThatRefusesSomeKindIsAStartForTheOthers) {
+    mAgent = std::make_unique<ZTCFakeAgent>(
+        mDirectory.path("agent"),
+        std::deque<ZTCFakeAgent::ZTCStep>{ZTCFakeAgent::answering({ZTRO_Failed, 0, ZTSAPS_NotAllowed}),
+                                          ZTCFakeAgent::answering(scScopeData)});
+    startSession();
+    stepUntilFrames(1);
+    EXPECT_EQ(mStartsAnswered, 1);
+    EXPECT_THAT(commands(), ElementsAre(ZTSTVKC_StartScope, ZTSTVKC_GetScopeData));
+    EXPECT_THAT(mLines, ElementsAre(HasSubstr("answered \"start\" with status ")));
 }
 
 TEST_F(AgentSessionTest, AFurtherStartCommandSetsANewRecordLimit) {
