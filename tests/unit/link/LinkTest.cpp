@@ -173,6 +173,16 @@ TEST_F(Link, WhatWasSentBeforeTheEndIsReceivedBeforeTheEndIsSeen) {
     EXPECT_EQ(mCollector.send(lMessage), ZTLR_PeerGone);
 }
 
+TEST_F(Link, AnEndThatLeavesMessagesUnreadIsAnEndLikeAnyOther) {
+    ZTSLinkMessage lMessage;
+    lMessage.mType = ZTLM_Finish;
+    ASSERT_EQ(mKeeper.send(lMessage), ZTLR_Done);
+    mCollector.close();
+    ZTSLinkMessage lReceived;
+    EXPECT_EQ(mKeeper.receive(lReceived), ZTLR_PeerGone);
+    EXPECT_EQ(mKeeper.receive(lReceived), ZTLR_PeerGone);
+}
+
 TEST_F(Link, ATextOfTheLimitPassesALongerStatusLineIsCutALongerPathIsRefused) {
     ZTSLinkMessage lMessage;
     lMessage.mType = ZTLM_Text;
