@@ -38,6 +38,40 @@ static std::string sEnvironment(pid_t aPid) {
     return lText;
 }
 
+/// The service manager's socket: what a sensor that is launched with it says there.
+class ZTCNotifications {
+public:
+    explicit ZTCNotifications(ZTCKeeperProcess& arSensor)
+        : mSocket(socket(AF_UNIX, SOCK_DGRAM | SOCK_CLOEXEC | SOCK_NONBLOCK, 0)) {
+        const std::string lPath = arSensor.path("notify");
+        sockaddr_un lAddress{};
+        lAddress.sun_family = AF_UNIX;
+        EXPECT_LT(lPath.size(), sizeof(lAddress.sun_path));
+        lPath.copy(lAddress.sun_path, sizeof(lAddress.sun_path) - 1);
+        EXPECT_EQ(bind(mSocket.get(), reinterpret_cast<const sockaddr*>(&lAddress), sizeof(lAddress)), 0);
+        arSensor.setEnvironment("NOTIFY_SOCKET", lPath);
+    }
+
+    /// Waits until this was said since the beginning, or since the last call of forget().
+    void waitFor(const std::string& acrWanted) {
+        waitUntil(
+            [&] {
+                char lBytes[4096];
+                ssize_t lRead;
+                while ((lRead = recv(mSocket.get(), lBytes, sizeof(lBytes), 0)) > 0) {
+                    mText.append(lBytes, static_cast<std::size_t>(lRead)).append("\n");
+                }
+                return mText.find(acrWanted) != std::string::npos;
+            },
+            "the notification " + acrWanted);
+    }
+    void forget() { mText.clear(); }
+
+private:
+    const ZTCFileDescriptor mSocket;
+    std::string mText;
+};
+
 TEST(KeeperStart, MakesItsFilesWithTheirModesAndStopsInOrder) {
     ZTCKeeperProcess lSensor;
     lSensor.startAndWait();
@@ -89,36 +123,31 @@ TEST(KeeperStart, AgentAndCollectorGetWhatTheyNeedAndNothingElse) {
 
 TEST(KeeperStart, TellsTheServiceManagerThatItIsReadyAliveAndStopping) {
     ZTCKeeperProcess lSensor;
-    const std::string lPath = lSensor.path("notify");
-    const ZTCFileDescriptor lSocket(socket(AF_UNIX, SOCK_DGRAM | SOCK_CLOEXEC | SOCK_NONBLOCK, 0));
-    sockaddr_un lAddress{};
-    lAddress.sun_family = AF_UNIX;
-    ASSERT_LT(lPath.size(), sizeof(lAddress.sun_path));
-    std::memcpy(lAddress.sun_path, lPath.c_str(), lPath.size());
-    ASSERT_EQ(bind(lSocket.get(), reinterpret_cast<const sockaddr*>(&lAddress), sizeof(lAddress)), 0);
-    lSensor.setEnvironment("NOTIFY_SOCKET", lPath);
+    ZTCNotifications lSaid(lSensor);
     lSensor.setEnvironment("WATCHDOG_USEC", "60000000");
-    std::string lText;
-    const auto lWaitFor = [&](const std::string& acrWanted) {
-        waitUntil(
-            [&] {
-                char lBytes[4096];
-                ssize_t lRead;
-                while ((lRead = recv(lSocket.get(), lBytes, sizeof(lBytes), 0)) > 0) {
-                    lText.append(lBytes, static_cast<std::size_t>(lRead)).append("\n");
-                }
-                return lText.find(acrWanted) != std::string::npos;
-            },
-            "the notification " + acrWanted);
-    };
     lSensor.launch();
-    lWaitFor("READY=1\n");
-    lWaitFor("WATCHDOG=1\n");
-    lWaitFor("STATUS=running\n");
-    lSensor.process().sendSignal(SIGHUP);
-    lWaitFor("RELOADING=1\nMONOTONIC_USEC=");
+    lSaid.waitFor("READY=1\n");
+    lSaid.waitFor("WATCHDOG=1\n");
+    lSaid.waitFor("STATUS=running\n");
     lSensor.process().sendSignal(SIGTERM);
-    lWaitFor("STOPPING=1\n");
+    lSaid.waitFor("STOPPING=1\n");
+    EXPECT_EQ(lSensor.waitForExit(), 0);
+}
+
+TEST(KeeperStart, TellsTheServiceManagerWhenAReloadBeginsAndEndsWhateverTheFile) {
+    ZTCKeeperProcess lSensor;
+    ZTCNotifications lSaid(lSensor);
+    lSensor.launch();
+    lSaid.waitFor("READY=1\n");
+    for (const char* lpSettings : {"collect.period = 2\n", "collect.period = 0\n"}) {
+        SCOPED_TRACE(lpSettings);
+        lSaid.forget();
+        lSensor.configure(lpSettings);
+        lSensor.process().sendSignal(SIGHUP);
+        lSaid.waitFor("RELOADING=1\nMONOTONIC_USEC=");
+        lSaid.waitFor("READY=1\n");
+    }
+    lSensor.process().sendSignal(SIGTERM);
     EXPECT_EQ(lSensor.waitForExit(), 0);
 }
 
