@@ -3,6 +3,7 @@
 #include <gmock/gmock.h>
 #include <gtest/gtest.h>
 
+#include "sensor/settings/include/SettingsList.h"
 #include "tests/support/TemporaryDirectory.h"
 
 using std::chrono::milliseconds;
@@ -186,4 +187,11 @@ TEST(DefaultSettingsFile, ItsExamplesAreGoodSettings) {
     EXPECT_EQ(lSettings.mNames.size(), 1U);
     ASSERT_EQ(lSettings.mWarnings.size(), 1U);
     EXPECT_EQ(lSettings.mWarnings[0].mCount, 100U);
+}
+
+TEST(SettingsSecrets, ThatHoldAnotherOneComeBeforeIt) {
+    ZTSSettings lSettings;
+    lSettings.mWarnings.emplace_back().mRun = {"/usr/bin/hook", "t0k3n", "abc"};
+    lSettings.mWarnings.emplace_back().mRun = {"/usr/bin/hook", "--auth=t0k3n-of-db07"};
+    EXPECT_THAT(listSecrets(lSettings), ElementsAre("--auth=t0k3n-of-db07", "t0k3n"));
 }
