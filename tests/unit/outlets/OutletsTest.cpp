@@ -202,6 +202,24 @@ TEST_F(Outlets, APortInUseIsReportedAndANewAddressTakesEffectWithTheSettings) {
     EXPECT_THAT(ZTCHttpClient::get(lrSecond.getPort(), "/api/v1/status"), StartsWith("HTTP/1.1 200 "));
 }
 
+TEST_F(Outlets, AHostNameThatIsAddedTakesEffectWithTheSettings) {
+    ZTSSettings lSettings = settings();
+    lSettings.mHttpListen = "127.0.0.1:0";
+    ZTCOutlets& lrOutlets = start(lSettings);
+    const auto lIsServed = [&lrOutlets] {
+        try {
+            return ZTCHttpClient::get(lrOutlets.getPort(), "/", "db07.example").starts_with("HTTP/1.1 200 ");
+        } catch (const std::runtime_error&) {
+            return false;  // the server is just made anew
+        }
+    };
+    waitUntil([&] { return lrOutlets.getPort() != 0; }, "the server");
+    ASSERT_FALSE(lIsServed());
+    lSettings.mHttpHosts = {"db07.example"};
+    lrOutlets.setSettings(lSettings);
+    waitUntil(lIsServed, "an answer under the new name");
+}
+
 TEST_F(Outlets, WhatRetentionTookBeforeTheFileHadItIsALineWithTheirNumber) {
     ZTSSettings lSettings = settings();
     lSettings.mNdjsonPath = mDirectory.path("events.ndjson");
