@@ -214,6 +214,19 @@ TEST_F(WarnBook, AStateThatHeldBeforeTheRestartDoesNotBeginAnewAndEndsWhenItHold
     EXPECT_EQ(lNext.getOpen().size(), 0U);
 }
 
+TEST_F(WarnBook, AfterTheEndOfATroubleThatAnEarlierProcessHasFoundNewOnesAreWarnedOf) {
+    ZTCWarnBook lBook({rule("queue-full")});
+    lBook.note(event(gcPortA));
+    EXPECT_THAT(due(lBook), ElementsAre(mPortA));
+    ZTCWarnBook lNext({rule("queue-full")});
+    EXPECT_TRUE(lNext.load(lBook.toText()));
+    pass(seconds(61));
+    EXPECT_THAT(due(lNext), IsEmpty());
+    ASSERT_THAT(lNext.getOpen(), IsEmpty());
+    lNext.note(event(gcPortB));
+    EXPECT_THAT(due(lNext), ElementsAre(mPortB));
+}
+
 TEST_F(WarnBook, ARuleThatIsGoneLosesItsTroublesAndARestKeepsThem) {
     ZTCWarnBook lBook({rule("queue-full"), rule("link")});
     lBook.note(event(gcPortA));
