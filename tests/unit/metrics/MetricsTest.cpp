@@ -164,3 +164,11 @@ TEST(MetricsFile, AFailureLeavesTheOldFileAndNoPart) {
     EXPECT_THROW(writeMetricsFile(lPath, "x"), ZTCSystemCallEx);
     EXPECT_FALSE(exists(lPath + ".new"));
 }
+
+TEST(MetricsFile, NothingStaysOfThePartThatAKilledProcessHasLeft) {
+    const ZTCTemporaryDirectory lDirectory;
+    const std::string lPath = lDirectory.path("tavik.prom");
+    writeFile(lPath + ".new", "a longer text than the one that is written now 1\n");
+    writeMetricsFile(lPath, "one 1\n");
+    EXPECT_EQ(readFile(lPath), "one 1\n");
+}
