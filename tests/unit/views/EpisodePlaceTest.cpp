@@ -212,6 +212,7 @@ TEST_F(PlaceFromHistory, TheHistorysTopologyOfTheTimeIsUsedInAnyOrderOfTimes) {
     EXPECT_EQ(lDiskAt(lFirst + 2 * scMinute), "sdx");
     EXPECT_EQ(lDiskAt(lFirst), "sdb");
     EXPECT_EQ(lDiskAt(lFirst + scMinute), "sdx");
+    EXPECT_EQ(lDiskAt(lFirst + scMinute / 2), "sdb");
     EXPECT_EQ(lDiskAt(lFirst + 3 * scMinute), "sdx");
     EXPECT_EQ(lDiskAt(lFirst - scMinute / 2), "sdb") << "the first scan came a moment later";
     EXPECT_EQ(lDiskAt(lFirst - 2 * scMinute), "none");
