@@ -299,3 +299,23 @@ TEST_F(Api, TheTimelineShowsWhatWasNotListenedToAndMarks) {
     EXPECT_EQ(lTimeline["runs"].size(), 1U);
     EXPECT_TRUE(lTimeline["gaps"].is_array());
 }
+
+TEST_F(Api, AHistoryThatWasDamagedAndSetAsideIsReplacedByTheNewOne) {
+    for (std::uint64_t i = 0; i < 200; ++i) {
+        take({makeQueueFull(gcPortA + i, gcBase, gcBase)});
+    }
+    EXPECT_EQ(ask("/api/v1/ports").mStatus, 200U);
+    closeStore();
+    std::string lContent = readFile(path());
+    std::fill(lContent.begin() + 4096 * 2, lContent.end(), '\x55');
+    writeFile(path(), lContent);
+    // A change by somebody else: what is open reads its pages anew.
+    sqlite3* lpDatabase = nullptr;
+    ASSERT_EQ(sqlite3_open(path().c_str(), &lpDatabase), SQLITE_OK);
+    EXPECT_EQ(sqlite3_exec(lpDatabase, "PRAGMA application_id = 1", nullptr, nullptr, nullptr), SQLITE_OK);
+    sqlite3_close(lpDatabase);
+    EXPECT_EQ(ask("/api/v1/ports").mStatus, 503U);
+    fill();  // its writer sets the damaged one aside
+    ASSERT_EQ(mReports.size(), 1U);
+    EXPECT_EQ(askJson("/api/v1/ports")["ports"].size(), 2U);
+}
