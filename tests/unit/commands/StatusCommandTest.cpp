@@ -1,8 +1,10 @@
 #include <gmock/gmock.h>
 #include <sys/socket.h>
 #include <sys/stat.h>
+#include <sys/un.h>
 #include <unistd.h>
 
+#include <cerrno>
 #include <chrono>
 
 #include "tests/unit/commands/FakeSensor.h"
@@ -80,6 +82,24 @@ TEST_F(StatusCommand, ACollectorThatDoesNotAnswerIs3WithinTheTimeLimit) {
     EXPECT_EQ(lRun.mStatus, 3);
     EXPECT_THAT(lRun.mOutput, HasSubstr("NOT KNOWN; the collector does not answer"));
     EXPECT_THAT(lRun.mOutput, HasSubstr("within 1.2 s"));
+}
+
+TEST_F(StatusCommand, ASocketWhoseQueueIsFullIs3WithinTheTimeLimit) {
+    sockaddr_un lAddress{};
+    lAddress.sun_family = AF_UNIX;
+    controlPath().copy(lAddress.sun_path, sizeof(lAddress.sun_path) - 1);
+    const auto* const lpAddress = reinterpret_cast<const sockaddr*>(&lAddress);
+    const ZTCFileDescriptor lListener(socket(AF_UNIX, SOCK_STREAM | SOCK_CLOEXEC, 0));
+    ASSERT_EQ(bind(lListener.get(), lpAddress, sizeof(lAddress)), 0);
+    ASSERT_EQ(listen(lListener.get(), 0), 0);
+    std::vector<ZTCFileDescriptor> lClients;
+    do {
+        lClients.emplace_back(socket(AF_UNIX, SOCK_STREAM | SOCK_CLOEXEC | SOCK_NONBLOCK, 0));
+    } while (connect(lClients.back().get(), lpAddress, sizeof(lAddress)) == 0);
+    ASSERT_EQ(errno, EAGAIN);
+    const ZTSFinishedRun lRun = run({"status"});
+    EXPECT_EQ(lRun.mStatus, 3);
+    EXPECT_THAT(lRun.mOutput, HasSubstr("NOT KNOWN; the collector does not answer"));
 }
 
 TEST_F(StatusCommand, AnswersThatCannotBeUsedAre3AndSaid) {
