@@ -8,6 +8,7 @@
 #include "sensor/store/include/History.h"
 #include "tests/sensor/HistoryCheck.h"
 #include "tests/sensor/SensorProcess.h"
+#include "tests/sensor/TavikRun.h"
 
 using testing::HasSubstr;
 
@@ -89,6 +90,7 @@ TEST(SensorHost, ADamagedHistoryIsSetAsideAndCollectingGoesOn) {
     lSensor.start();
     EXPECT_THAT(lSensor.standardError(), HasSubstr("the database is damaged"));
     EXPECT_THAT(lSensor.standardError(), HasSubstr("history.damaged-"));
+    EXPECT_THAT(runTavik(lSensor, {"status"}).mOutput, HasSubstr("a damaged history was set aside as"));
     lSensor.simulate("queue-full board=hba0 times=3");
     lSensor.waitUntilAllIsStored();
     EXPECT_EQ(lSensor.stop(), 0);

@@ -185,13 +185,13 @@ TEST_F(DiffOfAHistory, AStormThatEndedBeforeTheMarkOfTheSameMinuteIsNoDifference
 }
 
 TEST_F(DiffOfAHistory, TheTextSaysWhereTheMinutesThatWereCountedEnd) {
-    const std::int64_t lTo = scTo + 30 * gcSecond;
+    constexpr std::int64_t lTo = scTo + 30 * gcSecond;
     take({makeQueueFull(gcPortA, lTo + 20 * gcSecond, lTo + 20 * gcSecond, 500)}, lTo + gcMinute);
     const ZTSDiff lDiff = makeDiff(history(), {.mFrom = {.mTime = fromMicroseconds(scFrom + 5 * gcSecond), .mMark = ""},
                                                .mTo = {.mTime = fromMicroseconds(lTo), .mMark = ""}});
     ASSERT_THAT(lDiff.mRates, SizeIs(1));
     EXPECT_EQ(lDiff.mRates[0].mAfter, 500U) << "they came in the minute of the end";
-    const auto lTime = [lTo](std::int64_t aTime) {
+    const auto lTime = [](std::int64_t aTime) {
         return formatShortTime(fromMicroseconds(aTime), fromMicroseconds(lTo));
     };
     EXPECT_THAT(format(lDiff), HasSubstr(" rates: of the 1 h up to " + lTime(scFrom) + ", and of the 1 h up to " +
