@@ -26,8 +26,8 @@ protected:
     }
     std::vector<ZTSWarnOccurrence> read(ZTCWarnSource& arSource) {
         std::vector<ZTSWarnOccurrence> lFound = arSource.read(history(), mNow);
-        for (const auto& [lName, lValue] : arSource.takeValues()) {
-            inTransaction([&] { store().setValue(lName, lValue); });
+        for (const auto& lrValue : arSource.takeValues()) {
+            inTransaction([&] { store().setValue(lrValue.first, lrValue.second); });
         }
         return lFound;
     }
