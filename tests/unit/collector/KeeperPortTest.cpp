@@ -27,8 +27,8 @@ protected:
         return mPort->receive([this](ZTSLinkMessage aMessage) { mReceived.push_back(aMessage.mType); });
     }
     /// Types of all that the keeper has got.
-    std::vector<int> takeSent() {
-        std::vector<int> lTypes;
+    std::vector<ZTELinkMessageType> takeSent() {
+        std::vector<ZTELinkMessageType> lTypes;
         ZTSLinkMessage lMessage;
         while (mKeeper.receive(lMessage) == ZTLR_Done) {
             lTypes.push_back(lMessage.mType);
@@ -38,7 +38,7 @@ protected:
 
     ZTCLink mKeeper;
     std::optional<ZTCKeeperPort> mPort;
-    std::vector<int> mReceived;
+    std::vector<ZTELinkMessageType> mReceived;
 };
 
 TEST_F(KeeperPortTest, HandsOverAllMessagesInOrder) {

@@ -48,7 +48,7 @@ protected:
     void start() {
         mSpool.emplace(state() + "/spool");
         mWorker = std::make_unique<ZTCHistoryWorker>(
-            *mSpool, state(), ZTSStoreLimits{.mRecordsPerEnd = 2}, [this](const std::string& acrLine) {
+            *mSpool, state(), ZTSStoreLimits{.mRecordsPerEnd = 2}, [](const std::string& acrLine) {
                 EXPECT_THAT(acrLine, testing::Not(testing::HasSubstr("set aside"))) << "nothing is damaged";
             });
         waitUntil([this] { return mWorker->getState().mIsOpen; }, "the open history");

@@ -61,8 +61,8 @@ protected:
     }
     void storeValues() {
         const std::lock_guard lLock(mTextMutex);
-        for (const auto& [lName, lValue] : mValues) {
-            inTransaction([&] { store().setValue(lName, lValue); });
+        for (const auto& lrValue : mValues) {
+            inTransaction([&] { store().setValue(lrValue.first, lrValue.second); });
         }
     }
     std::string value(const std::string& acrName) {
