@@ -92,6 +92,7 @@ int LLVMFuzzerTestOneInput(const std::uint8_t* apData, std::size_t aSize) {
         ZT_FUZZ_REQUIRE(lFilter.mKinds.size() == lInput.mTexts.mKinds.size(), "kinds");
         ZT_FUZZ_REQUIRE(lFilter.mPorts.size() >= lInput.mTexts.mPorts.size(), "ports");
         ZT_FUZZ_REQUIRE(lFilter.mSince.has_value() == !lInput.mTexts.mSince.empty(), "since");
+        ZT_FUZZ_REQUIRE(!lFilter.mSince || !lFilter.mUntil || *lFilter.mSince <= *lFilter.mUntil, "order");
         ZT_FUZZ_REQUIRE(lInput.mTexts.mLimit.empty() ? lFilter.mLimit == scDefaultLimit : true, "limit");
     } catch (const ZTCBadFilterEx& lrException) {
         const std::string lText = lrException.what();
