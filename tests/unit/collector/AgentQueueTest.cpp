@@ -185,11 +185,11 @@ TEST_F(AgentQueueTest, TheNextAgentWaitsUntilAllThatTheFormerOneWroteIsInTheSpoo
 }
 
 TEST_F(AgentQueueTest, AgentsThatEndedWhileTheyWaitedAreEmptiedInTheirOrder) {
-    for (const std::uint64_t lStart : {1, 2, 3}) {
+    for (const std::uint64_t lStart : {1U, 2U, 3U}) {
         const ZTCFileDescriptor lWriter = noteWriterStarted(lStart);
         ASSERT_EQ(write(lWriter.get(), "\0\0\0\5\2\0\0\0\0", 9), 9);
     }
-    for (const std::uint64_t lStart : {3, 1, 2}) {
+    for (const std::uint64_t lStart : {3U, 1U, 2U}) {
         noteEnded(lStart);
     }
     turnUntilTold(ZTLM_Drained, 3);

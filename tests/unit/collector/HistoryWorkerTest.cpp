@@ -179,7 +179,7 @@ TEST_F(HistoryWorkerTest, AFrameThatCannotBeReadIsSetAsideWithAGap) {
 
 TEST_F(HistoryWorkerTest, ACutResponseOfAnAgentThatNobodyKnowsIsOneGap) {
     startAndOpen();
-    for (const std::uint64_t lNumber : {3, 4}) {
+    for (const std::uint64_t lNumber : {3U, 4U}) {
         ZTSSpoolPart lPart = mSpool->createPart(lNumber, scGeneration, 100);
         EXPECT_EQ(write(lPart.mFile.get(), "\0\0\0\x64", 4), 4);
         lPart.mSize = 4;
