@@ -4,12 +4,11 @@
 #include <poll.h>
 #include <unistd.h>
 
-#include <atomic>
 #include <string>
-#include <thread>
 
 #include "sensor/client/include/FifoConversation.h"
 #include "tests/support/TemporaryDirectory.h"
+#include "tests/support/TestThreads.h"
 #include "tests/support/Waiting.h"
 #include "tests/unit/client/FakeAgent.h"
 
@@ -21,21 +20,15 @@ public:
     explicit ZTCEndlessWriter(const std::string& acrPath)
         : mReader(ZTCFileDescriptor::open(acrPath.c_str(), O_RDONLY | O_NONBLOCK)),
           mWriter(ZTCFileDescriptor::open(acrPath.c_str(), O_WRONLY | O_NONBLOCK)),
-          mThread([this] { run(); }) {
+          mThread([this](const std::stop_token& acrStop) { run(acrStop); }) {
         pollfd lBytes{.fd = mReader.get(), .events = POLLIN, .revents = 0};
         EXPECT_EQ(poll(&lBytes, 1, ZTCDeadline().remainingMilliseconds()), 1);
     }
-    ~ZTCEndlessWriter() {
-        mIsOver = true;
-        mThread.join();
-    }
-    ZTCEndlessWriter(const ZTCEndlessWriter&) = delete;
-    ZTCEndlessWriter& operator=(const ZTCEndlessWriter&) = delete;
 
 private:
-    void run() {
+    void run(const std::stop_token& acrStop) {
         const std::string lBytes(4096, 'x');
-        for (const ZTCDeadline lDeadline; !mIsOver && !lDeadline.isOver();) {
+        for (const ZTCDeadline lDeadline; !acrStop.stop_requested() && !lDeadline.isOver();) {
             if (write(mWriter.get(), lBytes.data(), lBytes.size()) < 0) {
                 pollfd lRoom{.fd = mWriter.get(), .events = POLLOUT, .revents = 0};
                 poll(&lRoom, 1, 20);
@@ -45,8 +38,7 @@ private:
 
     const ZTCFileDescriptor mReader;  ///< keeps the FIFO's bytes while nobody else reads it
     const ZTCFileDescriptor mWriter;
-    std::atomic<bool> mIsOver{false};
-    std::thread mThread;
+    ZTCTestThread mThread;  ///< ends first
 };
 
 TEST(StaleBytes, WithoutAnEndAreGivenUpAtTheTimeLimit) {
