@@ -34,3 +34,32 @@ TEST(ThreadsEnd, WhileTheThreadsEndNothingSpins) {
     EXPECT_EQ(0, lReady);
     EXPECT_TRUE(lSystem.isSetForExit());
 }
+
+TEST(ThreadsEnd, AThreadThatEndedBeforeTheOthersMakesNothingSpin) {
+    ZTCTestSystem lSystem;
+    std::atomic<bool> lMayEnd{false};
+    lSystem.addComponent(NEW ZTCFunctionComponent(lSystem, "quick", [](ZTCFunctionComponent&, ZTCSystem&) {}));
+    lSystem.addComponent(
+        NEW ZTCFunctionComponent(lSystem, "slow", [&](ZTCFunctionComponent&, ZTCSystem&) { lMayEnd.wait(false); }));
+
+    // The first wait ends with the quick thread. The next one finds nothing ready as long as the other runs.
+    unsigned lPolls = 0;
+    int lReady = -1;
+    const ZTCReplacement lPoll(gReplaced.mBeforePoll, [&](const struct pollfd* apDescriptors, unsigned aCount, int) {
+        if (aCount != 2) {
+            return;
+        }
+        std::vector<struct pollfd> lDescriptors(apDescriptors, apDescriptors + aCount);
+        if (++lPolls == 1) {
+            poll(lDescriptors.data(), aCount, -1);
+        } else if (lPolls == 2) {
+            lReady = poll(lDescriptors.data(), aCount, 0);
+            lMayEnd = true;
+            lMayEnd.notify_all();
+        }
+    });
+    lSystem.createThreads();
+    lSystem.startThreads();
+    lSystem.waitForThreads();
+    EXPECT_EQ(0, lReady);
+}
