@@ -118,6 +118,21 @@ TEST_F(RetentionTest, AStepDeletesAtMostAsManyRowsAsTheLimitSays) {
     EXPECT_EQ(storedAndRetired(), 280U);
 }
 
+TEST_F(RetentionTest, WhatAnOutputMissesAddsUpFromDayToDay) {
+    mLimits.mDays = 1;
+    fill(3);
+    inTransaction([&] { store().setValue("outlet.test.seq", "1"); });
+    retire(gcBase + 3 * gcDay);
+    const int lFirst = std::stoi(history().getValue("outlet.test.missed"));
+    EXPECT_GT(lFirst, 0);
+    const std::size_t lBefore = changes().size();
+    mSteady += hours(1);
+    retire(gcBase + 3 * gcDay + 60 * gcMinute);
+    const std::size_t lGone = lBefore - changes().size();
+    ASSERT_GT(lGone, 0U);
+    EXPECT_EQ(std::stoul(history().getValue("outlet.test.missed")), static_cast<std::size_t>(lFirst) + lGone);
+}
+
 TEST_F(RetentionTest, OpenEpisodesStay) {
     mLimits.mDays = 1;
     fill(1);
