@@ -214,6 +214,19 @@ TEST_F(SpoolingConversationTest, ARequestThatWasNeverSentLeavesTheMarkerAlone) {
     EXPECT_EQ(mProgress.mLateAnswers, 0U);
 }
 
+TEST_F(SpoolingConversationTest, AMarkerThatCannotBeSentYetLeavesTheFileOfTheAnswerThatIsOwed) {
+    const ZTCFileDescriptor lBusyAgent =
+        ZTCFileDescriptor::open((mDirectory.path("agent") + gcCommandFifoName).c_str(), O_RDWR | O_NONBLOCK);
+    const std::vector<char> lUnread(PIPE_BUF);
+    while (write(lBusyAgent.get(), lUnread.data(), lUnread.size()) > 0) {
+    }
+    mSpool.createPart(1, "ab", gcShortReserve);
+    newCollector();
+    EXPECT_EQ(mTalk->request(ZTRQ_Marker, encodeCollectionPeriod(0)), ZTSND_NotNow);
+    EXPECT_TRUE(mTalk->needsMarker());
+    EXPECT_THAT(names(), ElementsAre("1.ab.part"));
+}
+
 TEST_F(SpoolingConversationTest, AnswersInFrontOfTheMarkersAreDroppedUnlessTheyAreScopeData) {
     startAgent({ZTCFakeAgent::answering(scSuccess), ZTCFakeAgent::answering(scRefusedAsInvalid)});
     newCollector();
