@@ -227,6 +227,15 @@ TEST_F(Keeper, AStopWhileNoCollectorCanBeStartedEndsTheAgentWithSigterm) {
     EXPECT_EQ(mKeeper.getExitStatus(), 1) << "what the agent held is lost";
 }
 
+TEST_F(Keeper, AStopForestallsTheStartOfAnAgentThatIsDue) {
+    startWorking();
+    agentEnds();
+    EXPECT_THAT(mWorld.take(), Not(Contains("start agent 2"))) << "a pause comes first";
+    mKeeper.handleStop(mNow);
+    pass(seconds(10));
+    EXPECT_THAT(mWorld.take(), Not(Contains("start agent 2")));
+}
+
 TEST_F(Keeper, AStopWhileNothingIsToBeWatchedOnlyEndsTheCollector) {
     start();
     agentEnds(gcStatus0, ZTSE_NoAdapters);
