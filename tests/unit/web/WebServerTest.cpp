@@ -179,6 +179,15 @@ TEST_F(WebServer, ASecondRequestIsServedOnTheSameConnection) {
     }
 }
 
+TEST_F(WebServer, AConnectionThatAsksForNothingMoreIsHungUpOnAsOneThatNeverAsked) {
+    const unsigned lPort =
+        start(ZTSWebLimits{.mRequestTime = std::chrono::seconds(1), .mResponseTime = std::chrono::hours(1)}).getPort();
+    ZTCHttpClient lClient(lPort);
+    ASSERT_TRUE(lClient.send("GET /one HTTP/1.1\r\nHost: localhost\r\n\r\n"));
+    lClient.readUntil("/one");
+    waitUntil([&] { return lClient.isHungUpOn(); }, "the end of the connection");
+}
+
 // ---- the stream ----
 
 static const char* const scStreamRequest = "GET /stream HTTP/1.1\r\nHost: localhost\r\n\r\n";
