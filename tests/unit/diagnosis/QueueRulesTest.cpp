@@ -48,6 +48,17 @@ TEST(QueueRules, LunsOfDifferentTimesDoNotAddUp) {
     EXPECT_THAT(lEvidence.find("port-overload"), SizeIs(1));
 }
 
+TEST(QueueRules, AnEpisodeThatLastsHoldsTogetherWhatComesWhileItLasts) {
+    ZTCSampleEvidence lEvidence;
+    ZTSEpisode& lrLong = lEvidence.addLuns("queue-full", 7, 100, 1, {0});
+    lrLong.mLast = lrLong.mFirst + std::chrono::seconds(900);
+    lEvidence.addLuns("queue-full", 7, 110, 1, {1});
+    lEvidence.addLuns("queue-full", 7, 1000, 1, {2, 3});
+    const auto lFindings = lEvidence.find("port-overload");
+    ASSERT_THAT(lFindings, SizeIs(1));
+    EXPECT_THAT(lFindings[0].mEpisodes, ElementsAre(1U, 2U, 3U));
+}
+
 TEST(QueueRules, LunsOfDifferentPortsDoNotAddUp) {
     ZTCSampleEvidence lEvidence;
     lEvidence.addLuns("queue-full", 7, 100, 1, {0, 1});
