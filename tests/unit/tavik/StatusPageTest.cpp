@@ -107,7 +107,7 @@ TEST_F(StatusPage, AFileSystemThatIsFullLeavesNoPageBehind) {
     ZTCForkedProcess lChild(
         [&](ZTCForkedProcess&) {
             signal(SIGXFSZ, SIG_IGN);
-            const rlimit lLimit{1000, 1000};
+            const rlimit lLimit{1000, RLIM_INFINITY};
             setrlimit(RLIMIT_FSIZE, &lLimit);
             ZTCStatusPageWriter lWriter;
             EXPECT_THROW(lWriter.open(pagePath().c_str(), 1), ZTCClibEx);
@@ -122,7 +122,7 @@ TEST_F(StatusPage, APageThatCannotGrowCountsAsOfUnknownBoardsAndHoldsItsEquation
         [&](ZTCForkedProcess&) {
             setLogCode(0);
             signal(SIGXFSZ, SIG_IGN);
-            const rlimit lLimit{4096, 4096};
+            const rlimit lLimit{4096, RLIM_INFINITY};
             setrlimit(RLIMIT_FSIZE, &lLimit);
             collect(2);
             deliverTemperature(0);
