@@ -10,7 +10,8 @@
 #include "sensor/store/include/History.h"
 #include "sensor/views/include/NameBook.h"
 
-/// A text that cannot be a filter: wrong use. One line that names the option, the value and what is wanted.
+/// A text that cannot be a filter: wrong use. One line that names the option or parameter, the value and what is
+/// wanted.
 class ZTCBadFilterEx : public std::runtime_error {
 public:
     using std::runtime_error::runtime_error;
@@ -25,10 +26,11 @@ struct ZTSFilterTexts {
     std::vector<std::string> mLuns{};
     std::string mLimit{};
     bool mIsOpenOnly = false;
+    std::string mNamePrefix = "--";  ///< before a name in errors: that of options; parameters of a request have none
 };
 
 /// The point in time that a text stands for: a time, a duration back from now ("90s", "10m", "24h", "30d"), or the name
-/// of a mark. @param acrOption  named in the error. Throws ZTCBadFilterEx.
+/// of a mark. @param acrOption  named in the error as it is. Throws ZTCBadFilterEx.
 ZTCHistoryTime readPoint(const std::string& acrText, const std::string& acrOption, const std::vector<ZTSMark>& acrMarks,
                          ZTCHistoryTime aNow);
 

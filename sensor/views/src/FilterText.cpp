@@ -85,30 +85,30 @@ static std::string sPointText(const std::string& acrText, ZTCHistoryTime aTime) 
 
 static constexpr std::uint64_t scMostLimit = 1'000'000'000'000;
 
-static std::uint64_t sReadLimit(const std::string& acrText) {
-    const auto lLimit = sParseNumber(acrText, scMostLimit);
+static std::uint64_t sReadLimit(const ZTSFilterTexts& acrTexts) {
+    const auto lLimit = sParseNumber(acrTexts.mLimit, scMostLimit);
     if (!lLimit) {
-        sFail("--limit", acrText, "a number from 0 (all) to 1000000000000");
+        sFail(acrTexts.mNamePrefix + "limit", acrTexts.mLimit, "a number from 0 (all) to 1000000000000");
     }
     return *lLimit;
 }
 
-static void sReadLun(const std::string& acrText, ZTSHistoryFilter& arFilter) {
+static void sReadLun(const std::string& acrText, const std::string& acrPrefix, ZTSHistoryFilter& arFilter) {
     if (acrText == "all") {
         arFilter.mIsAllLuns = true;
         return;
     }
     const auto lLun = sParseNumber(acrText, 0xFFFFFFFEU);
     if (!lLun) {
-        sFail("--lun", acrText, "a number or \"all\"");
+        sFail(acrPrefix + "lun", acrText, "a number or \"all\"");
     }
     arFilter.mLuns.push_back(static_cast<std::uint32_t>(*lLun));
 }
 
-static ZTCKindKey sReadKind(const std::string& acrText) {
+static ZTCKindKey sReadKind(const std::string& acrText, const std::string& acrPrefix) {
     const auto lKind = findKind(acrText);
     if (!lKind) {
-        sFail("--kind", acrText, "one of " + listKinds());
+        sFail(acrPrefix + "kind", acrText, "one of " + listKinds());
     }
     return *lKind;
 }
@@ -116,50 +116,52 @@ static ZTCKindKey sReadKind(const std::string& acrText) {
 void checkFilter(const ZTSFilterTexts& acrTexts) {
     ZTSHistoryFilter lFilter;
     for (const std::string& lrKind : acrTexts.mKinds) {
-        sReadKind(lrKind);
+        sReadKind(lrKind, acrTexts.mNamePrefix);
     }
     for (const std::string& lrLun : acrTexts.mLuns) {
-        sReadLun(lrLun, lFilter);
+        sReadLun(lrLun, acrTexts.mNamePrefix, lFilter);
     }
     if (!acrTexts.mLimit.empty()) {
-        sReadLimit(acrTexts.mLimit);
+        sReadLimit(acrTexts);
     }
 }
 
 ZTSHistoryFilter readFilter(const ZTSFilterTexts& acrTexts, const ZTCNameBook& acrNames,
                             const std::vector<ZTSMark>& acrMarks, ZTCHistoryTime aNow, std::uint64_t aDefaultLimit) {
     ZTSHistoryFilter lFilter;
+    const std::string& lrPrefix = acrTexts.mNamePrefix;
     if (!acrTexts.mSince.empty()) {
-        lFilter.mSince = readPoint(acrTexts.mSince, "--since", acrMarks, aNow);
+        lFilter.mSince = readPoint(acrTexts.mSince, lrPrefix + "since", acrMarks, aNow);
     }
     if (!acrTexts.mUntil.empty()) {
-        lFilter.mUntil = readPoint(acrTexts.mUntil, "--until", acrMarks, aNow);
+        lFilter.mUntil = readPoint(acrTexts.mUntil, lrPrefix + "until", acrMarks, aNow);
     }
     if (lFilter.mSince && lFilter.mUntil && *lFilter.mSince > *lFilter.mUntil) {
-        throw ZTCBadFilterEx("--since " + sPointText(acrTexts.mSince, *lFilter.mSince) + " is later than --until " +
-                             sPointText(acrTexts.mUntil, *lFilter.mUntil));
+        throw ZTCBadFilterEx(lrPrefix + "since " + sPointText(acrTexts.mSince, *lFilter.mSince) + " is later than " +
+                             lrPrefix + "until " + sPointText(acrTexts.mUntil, *lFilter.mUntil));
     }
     for (const std::string& lrKind : acrTexts.mKinds) {
-        lFilter.mKinds.push_back(sReadKind(lrKind));
+        lFilter.mKinds.push_back(sReadKind(lrKind, lrPrefix));
     }
     for (const std::string& lrPort : acrTexts.mPorts) {
         const std::vector<ZTSFcName> lWwpns = acrNames.findRemotePorts(lrPort);
         if (lWwpns.empty()) {
-            sFail("--port", lrPort, "a WWPN, nor a name of a remote port (see tavik ports)");
+            sFail(lrPrefix + "port", lrPort, "a WWPN, nor a name of a remote port (see tavik ports)");
         }
         lFilter.mPorts.insert(lFilter.mPorts.end(), lWwpns.begin(), lWwpns.end());
     }
     for (const std::string& lrInitiator : acrTexts.mInitiators) {
         const std::vector<ZTSFcName> lWwpns = acrNames.findInitiators(lrInitiator);
         if (lWwpns.empty()) {
-            sFail("--initiator", lrInitiator, "a WWPN, nor a name or hostN of an adapter port (see tavik status)");
+            sFail(lrPrefix + "initiator", lrInitiator,
+                  "a WWPN, nor a name or hostN of an adapter port (see tavik status)");
         }
         lFilter.mInitiators.insert(lFilter.mInitiators.end(), lWwpns.begin(), lWwpns.end());
     }
     for (const std::string& lrLun : acrTexts.mLuns) {
-        sReadLun(lrLun, lFilter);
+        sReadLun(lrLun, lrPrefix, lFilter);
     }
     lFilter.mIsOpenOnly = acrTexts.mIsOpenOnly;
-    lFilter.mLimit = acrTexts.mLimit.empty() ? aDefaultLimit : sReadLimit(acrTexts.mLimit);
+    lFilter.mLimit = acrTexts.mLimit.empty() ? aDefaultLimit : sReadLimit(acrTexts);
     return lFilter;
 }

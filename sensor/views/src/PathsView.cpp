@@ -17,6 +17,7 @@ ZTSPathsFilter readPathsFilter(const ZTSFilterTexts& acrTexts, const ZTCNameBook
     ZTSFilterTexts lPorts;
     lPorts.mPorts = acrTexts.mPorts;
     lPorts.mInitiators = acrTexts.mInitiators;
+    lPorts.mNamePrefix = acrTexts.mNamePrefix;
     ZTSHistoryFilter lFilter = readFilter(lPorts, acrNames, {}, getHistoryTime(), 0);
     return {.mPorts = std::move(lFilter.mPorts),
             .mInitiators = std::move(lFilter.mInitiators),

@@ -47,15 +47,22 @@ static bool sReadFlag(const ZTSWebRequest& acrRequest, const std::string& acrNam
     return lText == "true";
 }
 
-static ZTSFilterTexts sFilterTexts(const ZTSWebRequest& acrRequest) {
-    sCheckNames(acrRequest, {"since", "until", "kind", "port", "initiator", "lun", "limit", "open"});
+/// Which ports and LUNs: the parameters that every filter has.
+static ZTSFilterTexts sPortTexts(const ZTSWebRequest& acrRequest) {
     ZTSFilterTexts lTexts;
-    lTexts.mSince = acrRequest.get("since");
-    lTexts.mUntil = acrRequest.get("until");
-    lTexts.mKinds = acrRequest.getAll("kind");
     lTexts.mPorts = acrRequest.getAll("port");
     lTexts.mInitiators = acrRequest.getAll("initiator");
     lTexts.mLuns = acrRequest.getAll("lun");
+    lTexts.mNamePrefix.clear();
+    return lTexts;
+}
+
+static ZTSFilterTexts sFilterTexts(const ZTSWebRequest& acrRequest) {
+    sCheckNames(acrRequest, {"since", "until", "kind", "port", "initiator", "lun", "limit", "open"});
+    ZTSFilterTexts lTexts = sPortTexts(acrRequest);
+    lTexts.mSince = acrRequest.get("since");
+    lTexts.mUntil = acrRequest.get("until");
+    lTexts.mKinds = acrRequest.getAll("kind");
     lTexts.mLimit = acrRequest.get("limit");
     lTexts.mIsOpenOnly = sReadFlag(acrRequest, "open");
     return lTexts;
@@ -222,10 +229,6 @@ ZTCJson ZTCApi::makePaths(const ZTSWebRequest& acrRequest) {
     const ZTCHistory& lrHistory = openHistory();
     const ZTCHistoryTime lNow = getHistoryTime();
     const std::string lAt = acrRequest.get("at");
-    ZTSFilterTexts lTexts;
-    lTexts.mPorts = acrRequest.getAll("port");
-    lTexts.mInitiators = acrRequest.getAll("initiator");
-    lTexts.mLuns = acrRequest.getAll("lun");
     ZTSPathsRequest lRequest;
     lRequest.mTime = lAt.empty() ? lNow : readPoint(lAt, "at", lrHistory.readMarks(), lNow);
     const std::optional<ZTSSanView> lView = readSan(lrHistory, lRequest.mTime);
@@ -233,7 +236,7 @@ ZTCJson ZTCApi::makePaths(const ZTSWebRequest& acrRequest) {
     if (lView) {
         addPorts(lNames, lView->mTopology);
     }
-    lRequest.mFilter = readPathsFilter(lTexts, lNames, sReadFlag(acrRequest, "trouble"));
+    lRequest.mFilter = readPathsFilter(sPortTexts(acrRequest), lNames, sReadFlag(acrRequest, "trouble"));
     return makePathsDocument(lView ? &*lView : nullptr, lRequest, lNames, mSources.mHost, lrHistory.getStoreId());
 }
 

@@ -7,6 +7,7 @@
 using testing::AllOf;
 using testing::ElementsAre;
 using testing::HasSubstr;
+using testing::StartsWith;
 
 class FilterText : public LocalTime {
 protected:
@@ -109,6 +110,13 @@ TEST_F(FilterText, ANameThatReadsAsATimeIsNoMark) {
     EXPECT_TRUE(isTimeOrDuration("10:04"));
     EXPECT_TRUE(isTimeOrDuration("2026-11-21"));
     EXPECT_FALSE(isTimeOrDuration("before update"));
+}
+
+TEST_F(FilterText, AParameterOfARequestIsNamedWithoutTheDashesOfAnOption) {
+    EXPECT_THAT(complaint({.mSince = "1h", .mUntil = "2h", .mNamePrefix = ""}),
+                AllOf(StartsWith("since \"1h\" ("), HasSubstr(" is later than until \"2h\" (")));
+    EXPECT_EQ(complaint({.mLuns = {"x"}, .mNamePrefix = ""}), "lun \"x\" is not a number or \"all\"");
+    EXPECT_EQ(complaint({.mLuns = {"x"}}), "--lun \"x\" is not a number or \"all\"");
 }
 
 TEST_F(FilterText, PortsAndAdaptersAreDescribedByTheBestNameThereIs) {
