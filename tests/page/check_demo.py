@@ -1,4 +1,6 @@
 """Every view with the demonstration's events, and everything that a person can do in the timeline."""
+from datetime import datetime, timedelta, timezone
+
 from selenium.webdriver.common.keys import Keys
 
 from browser import require
@@ -225,6 +227,19 @@ def check_pictures(browser):
     browser.resize(1280)
 
 
+def check_edges(browser):
+    """The edges of the stretches are those of the minutes that were counted: an end within a minute is that of the minute."""
+    begin = datetime.now(timezone.utc).replace(second=0, microsecond=0) - timedelta(hours=3)
+
+    def span(*minutes, seconds=0):
+        return [(begin + timedelta(minutes=each, seconds=seconds)).isoformat().replace("+00:00", ".000Z") for each in minutes]
+    before, after = "..".join(span(0, 40, seconds=30)), "..".join(span(60, 100, seconds=30))
+    browser.open(f"#compare;a={before};b={after}")
+    for name, edges in (("Before", span(0, 40)), ("After", span(60, 101))):
+        said = browser.driver.execute_async_script("const [edges, done] = arguments; import('/format.js').then((f) => done(f.span(...edges)));", edges)
+        browser.wait_text("compare-spans", f"{name}: {said} (")
+
+
 def check_compare(browser, address):
     browser.open("#compare")
     browser.wait_text("compare-how", "Choose a mark")
@@ -242,6 +257,7 @@ def check_compare(browser, address):
             and f"{different} rate" in browser.text("compare-sum"))
     browser.open(address)
     browser.wait_text("compare-spans", "After:")
+    check_edges(browser)
 
 
 def check_events(browser):

@@ -216,6 +216,8 @@ ZTCJson makeDiffDocument(const ZTSDiff& acrDiff, const ZTCNameBook& acrNames, co
     }
     lDocument["secondsBefore"] = lSeconds(acrDiff.mBeforeSpan);
     lDocument["secondsAfter"] = lSeconds(acrDiff.mAfterSpan);
+    lDocument["endBefore"] = toRfc3339(acrDiff.mBeforeEnd);
+    lDocument["endAfter"] = toRfc3339(acrDiff.mAfterEnd);
     lDocument["rates"] = ZTCJson::array();
     for (const ZTSDiffRate& lrRate : acrDiff.mRates) {
         lDocument["rates"].push_back({{"kind", getKindName(lrRate.mKind)},

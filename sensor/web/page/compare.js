@@ -16,10 +16,10 @@ const longest = 30 * 24 * hour;
 
 let turn = 0; // counts questions: only the newest answer is shown
 
-/** [from, to] of the stretches that the rates are of. */
+/** [from, to] of the stretches that the rates are of: whole minutes, so that their ends are not quite the two moments. */
 function stretchesOf(document) {
-  const [from, to] = [Date.parse(document.from.time), Date.parse(document.to.time)];
-  return [[from - document.secondsBefore * 1000, from], [to - document.secondsAfter * 1000, to]];
+  const [before, after] = [Date.parse(document.endBefore), Date.parse(document.endAfter)];
+  return [[before - document.secondsBefore * 1000, before], [after - document.secondsAfter * 1000, after]];
 }
 
 const rateText = (value) => (value === 0 ? "0" : value < 1 ? value.toFixed(2) : value < 10 ? value.toFixed(1) : number(Math.round(value)));

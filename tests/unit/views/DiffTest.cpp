@@ -184,7 +184,7 @@ TEST_F(DiffOfAHistory, AStormThatEndedBeforeTheMarkOfTheSameMinuteIsNoDifference
     EXPECT_FALSE(lDiff().isSame());
 }
 
-TEST_F(DiffOfAHistory, TheTextSaysWhereTheMinutesThatWereCountedEnd) {
+TEST_F(DiffOfAHistory, TheTextAndTheDocumentSayWhereTheMinutesThatWereCountedEnd) {
     constexpr std::int64_t lTo = scTo + 30 * gcSecond;
     take({makeQueueFull(gcPortA, lTo + 20 * gcSecond, lTo + 20 * gcSecond, 500)}, lTo + gcMinute);
     const ZTSDiff lDiff = makeDiff(history(), {.mFrom = {.mTime = fromMicroseconds(scFrom + 5 * gcSecond), .mMark = ""},
@@ -196,6 +196,11 @@ TEST_F(DiffOfAHistory, TheTextSaysWhereTheMinutesThatWereCountedEnd) {
     };
     EXPECT_THAT(format(lDiff), HasSubstr(" rates: of the 1 h up to " + lTime(scFrom) + ", and of the 1 h up to " +
                                          lTime(scTo + gcMinute) + "\n"));
+    const nlohmann::ordered_json lDocument = makeDiffDocument(lDiff, mNames, "db07", "id");
+    EXPECT_EQ(lDocument["endBefore"], toRfc3339(fromMicroseconds(scFrom)));
+    EXPECT_EQ(lDocument["endAfter"], toRfc3339(fromMicroseconds(scTo + gcMinute)));
+    EXPECT_EQ(lDocument["secondsAfter"], 3660);
+    EXPECT_EQ(lDocument["secondsBefore"], 3660) << "as long, where nothing else is asked for";
 }
 
 TEST_F(DiffOfAHistory, TheRatesOfTwoStretchesAreThoseOfNothingElse) {
