@@ -1,9 +1,12 @@
-"""Every view with a large history: answers in time, charts with something in them, accessible in light and dark, at all
-widths, and on paper. Keeps a picture of each."""
+"""Every view with a large history and beside it a damaged one that was set aside: answers in time, charts with something in
+them, accessible in light and dark, at all widths, and on paper. Keeps a picture of each."""
+import os
+
 from browser import require
 from check_cells import check_table
 
 MOST_MILLISECONDS = 1000
+SET_ASIDE = "a damaged history was set aside as"
 VIEWS = {
     "now": ("#now", "headline", "COLLECTING"),
     "timeline": ("#timeline;range=30d", "range-text", " to "),
@@ -20,6 +23,7 @@ def show(browser, view):
     browser.wait_text(name, part)
     if view == "now":
         browser.wait("the remote ports", lambda: "array7" in browser.text("ports"))
+        browser.wait_text("notes", SET_ASIDE)
     if view == "paths":
         browser.wait("the drawing", lambda: browser.run("return document.querySelectorAll('#paths-map .route').length") > 20)
         require("a path with trouble is not marked", browser.run("return document.querySelectorAll('.trouble-chip').length") > 0)
@@ -96,6 +100,26 @@ def check_paper(browser):
     browser.wait("colors again", lambda: browser.most_saturated("chart") > 60)
 
 
+def check_notes(browser):
+    """The lines that `tavik status` calls notes are in Now, each once, and are gone when their cause is."""
+    notes = "return [...document.querySelectorAll('#notes li')].map((line) => line.textContent)"
+
+    def told():
+        return [f"Note: {text}" for text in browser.ask("/api/v1/status")[0]["unknown"]]
+    browser.open("#now")
+    browser.wait("the notes of the document", lambda: browser.run(notes) == told() != [])
+    browser.wait("the remote ports", lambda: "array7" in browser.text("ports"))
+    require("the note is not there once", browser.text("view-now").count(SET_ASIDE) == 1)
+    parts = browser.driver.execute_async_script("import('/troubles.js').then((m) => arguments[0](m.noteBox('<i>a</i>').children.length))")
+    require("a note's text is read as markup", parts == 1)
+    for path in browser.ask("/api/v1/status")[0]["damagedHistories"]:
+        os.remove(path)
+    browser.open("#now")
+    browser.wait("the remote ports", lambda: "array7" in browser.text("ports"))
+    browser.wait("the notes of the document", lambda: browser.run(notes) == told())
+    require("the note stays", SET_ASIDE not in browser.text("view-now"))
+
+
 def check_large(browser, checker, episodes):
     browser.open("#now")
     check_times(browser, episodes)
@@ -104,3 +128,4 @@ def check_large(browser, checker, episodes):
     check_views(browser, checker)
     check_widths(browser)
     check_paper(browser)
+    check_notes(browser)

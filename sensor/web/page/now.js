@@ -10,7 +10,7 @@ import { findingBox } from "./findings.js";
 import { kindOf, kinds } from "./kinds.js";
 import { makeGrid } from "./grid.js";
 import { familyColor, mix, readColors, strengthOf, swatch } from "./palette.js";
-import { troubleBox } from "./troubles.js";
+import { noteBox, troubleBox } from "./troubles.js";
 import { sentenceOf } from "./words.js";
 
 const hour = 3600000;
@@ -18,6 +18,7 @@ const mostTroubles = 12;
 const mostDevices = 12;
 const mostKinds = 3;
 let shownFindings = "";
+let shownNotes = "";
 const looks = new Map(); // what to look at next, by kind
 
 const code = (text) => make("code", text);
@@ -187,6 +188,17 @@ function showStatus(status) {
   document.title = `${status.host}: ${status.verdict.toLowerCase()} – Tavik`;
 }
 
+/** What could not be found out, or is in a damaged history: the lines that `tavik status` calls notes. */
+function showNotes(notes) {
+  const text = JSON.stringify(notes);
+  if (text === shownNotes) {
+    return; // what a person has selected stays selected
+  }
+  shownNotes = text;
+  element("notes").hidden = notes.length === 0;
+  element("notes").replaceChildren(...notes.map(noteBox));
+}
+
 /** The host's name stands above every view. */
 export async function showHost() {
   try {
@@ -212,12 +224,14 @@ export async function show() {
     element("headline").textContent = `No answer: ${problem.message}`;
     element("headline").className = "headline bad";
     element("troubles").replaceChildren(make("p", ["Look on the host: ", code("systemctl status tavik"), " and ", code("tavik status"), ". The page asks again by itself."]));
+    showNotes([]);
     return;
   }
   showStatus(status);
   element("headline").textContent = status.text;
   element("headline").className = `headline ${status.exit === 0 ? "good" : "bad"}`;
   element("troubles").replaceChildren(...status.troubles.map(troubleBox));
+  showNotes(status.unknown);
   showLinks(status);
   await Promise.all([part("findings", showFindings), part("open-troubles", showOpen), part("ports", showPorts)]);
 }

@@ -1,4 +1,4 @@
-// A trouble of the documents: what is wrong, what to do, and where more stands.
+// A trouble of the documents: what is wrong, what to do, and where more stands. And a note, which is no trouble.
 
 import { make } from "./dom.js";
 
@@ -21,3 +21,5 @@ export function troubleBox(trouble) {
   }
   return box;
 }
+
+export const noteBox = (text) => make("li", [make("b", "Note: "), text], "trouble level-1");
