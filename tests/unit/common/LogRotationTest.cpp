@@ -90,6 +90,23 @@ TEST_F(LogRotation, ManyStampedLinesStayWithinTheBound) {
     EXPECT_GT(std::filesystem::file_size(mPath + ".1") + 100, lcBound);
 }
 
+TEST_F(LogRotation, LinesOfOneMomentStayWithinTheBound) {
+    constexpr std::uint64_t lcBound = 200 * 1024;
+    constexpr std::int64_t lcNoon = 1'700'000'000'000'000'000;
+    ZTCLogFile lFile;
+    lFile.allowRotation(true);
+    lFile.setBound(lcBound);
+    ASSERT_TRUE(lFile.setPath(mPath.c_str()));
+    const std::string lLine = std::string(4095, 'x') + "\n";
+    for (std::uint64_t lWritten = 0; lWritten <= lcBound; lWritten += lLine.size()) {
+        ASSERT_TRUE(lFile.write(lLine.data(), lLine.size(), lcNoon));
+        ASSERT_LE(std::filesystem::file_size(mPath), lcBound);
+    }
+    lFile.close();
+    EXPECT_EQ(lcBound, std::filesystem::file_size(mPath + ".1"));
+    EXPECT_EQ(lLine.size(), std::filesystem::file_size(mPath));
+}
+
 TEST_F(LogRotation, ALineLongerThanTheBoundIsWrittenIntoAFileOfItsOwn) {
     mpSink->allowRotation(true);
     mpSink->setBound(20);
