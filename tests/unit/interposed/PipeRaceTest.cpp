@@ -78,6 +78,24 @@ TEST_F(PipeRace, AFifoThatIsReplacedBetweenItsTwoOpensIsRefused) {
     close(lOther);
 }
 
+TEST_F(PipeRace, AWriterSaysOnceThatItWaitsHoweverOftenItTries) {
+    const ZTCLogCapture lLog;
+    const std::string lPath = mDirectory.path("b.fifo");
+    ZTCNamedPipe lWriter(ZTCString(lPath.c_str()), ZTFM_Write, ZTNPS_Block, ZTCM_Server);
+    lWriter.create();
+    unsigned lWaits = 0;
+    int lReader = -1;
+    const ZTCReplacement lPoll(gReplaced.mBeforePoll, [&](const struct pollfd*, unsigned, int) {
+        if (++lWaits == 3) {
+            lReader = open(lPath.c_str(), O_RDONLY | O_NONBLOCK | O_CLOEXEC);
+        }
+    });
+    lWriter.open();
+    EXPECT_LE(3u, lWaits);
+    EXPECT_EQ(1u, lLog.file().count("Waiting for a reader of '" + lPath + "'", "-N-"));
+    close(lReader);
+}
+
 TEST_F(PipeRace, AMessageOfNoLengthGoesWithAllThatItsWriterHasBehindIt) {
     ZTCLogCapture lLog(63);
     mPipe.open();
