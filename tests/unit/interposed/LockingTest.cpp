@@ -53,6 +53,23 @@ TEST_F(Locking, RecordListsAreEncodedOutsideOfTheLock) {
     EXPECT_TRUE(isHeld()) << "the test sees a lock that is held";
 }
 
+TEST_F(Locking, WhereverARetrievalLeavesTheLockToAnEventItsBoardHasAList) {
+    collect(1);
+    unsigned lDelivered = 0;
+    bool lIsDelivering = false;
+    const ZTCReplacement lEvent(gReplaced.mBeforeLock, [&](const ZTSOsMutex& acrMutex) {
+        if (&acrMutex == &lock() && !lIsDelivering) {
+            lIsDelivering = true;
+            deliverTemperature(0);
+            ++lDelivered;
+            lIsDelivering = false;
+        }
+    });
+    retrieve();
+    EXPECT_LE(1u, lDelivered);
+    EXPECT_EQ(std::vector<std::string>(), mLog.texts("-E-"));
+}
+
 TEST_F(Locking, EachPageOfAnRscnTakesTheLockAnew) {
     collect(1);
     const auto lHoldsOf = [&](const std::vector<std::uint32_t>& acrPages) {
