@@ -141,6 +141,16 @@ TEST_F(RemotePorts, ANameIsKeptUntilItIsToBeForgotten) {
     EXPECT_EQ(find(0, 0, 0), 0);
 }
 
+TEST_F(RemotePorts, OnceTheyAreForgottenTheRemotePortsOfNowNameTheirTargets) {
+    mKernel.addRport(1, 7, 3, portNameText(0x42));
+    EXPECT_EQ(find(1, 0, 3), 0x42);
+    EXPECT_EQ(find(1, 0, 4), 0);
+    mKernel.addRport(1, 8, 4, portNameText(0x43));
+    mPorts.forget();
+    EXPECT_EQ(find(1, 0, 3), 0x42);
+    EXPECT_EQ(find(1, 0, 4), 0x43);
+}
+
 TEST_F(RemotePorts, GarbledOnesAreZero) {
     mKernel.addTarget(0, 0, 1, "garbage");
     mKernel.addRport(0, 2, 2, "garbage");
