@@ -95,6 +95,14 @@ TEST_F(KpmSim, WaitsUntilTheScheduleIsDone) {
     EXPECT_EQ(runOnSocket("wait --started").mStatus, 0);
 }
 
+TEST_F(KpmSim, WaitsForSoManyEventsWhateverTheScheduleDoes) {
+    mRecorder.registerKind(mEngine, 0, "plogi");
+    ASSERT_EQ(runOnSocket("inject plogi times=3").mOutput, "ok 3\n");
+    const ZTSToolResult lResult = runOnSocket("wait --timeout 20 --delivered 3");
+    EXPECT_EQ(lResult.mOutput, "ok delivered=3 dropped=0 pages=0 registered=1 adapters=2 schedule=waiting\n");
+    EXPECT_EQ(lResult.mStatus, 0);
+}
+
 TEST_F(KpmSim, EndsWithOneWhenItWaitsInVain) {
     const ZTSToolResult lResult = runOnSocket("wait --timeout 0 --delivered 1");
     EXPECT_EQ(lResult.mOutput,
