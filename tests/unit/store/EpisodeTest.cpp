@@ -1,6 +1,7 @@
 // Runs of like events become episodes: gaps, counts, times, phases, unions.
 #include "sensor/store/include/Episode.h"
 
+#include "sensor/store/src/Database.h"
 #include "tests/unit/store/StoreFixture.h"
 
 using EpisodeTest = ZTCStoreTest;
@@ -197,6 +198,28 @@ TEST_F(EpisodeTest, OfALongEpisodeExactlyTheFirstAndTheLastRecordsAreKept) {
         lOrdinals.push_back(lrRecord.mOrdinal);
     }
     EXPECT_EQ(lOrdinals, (std::vector<std::uint64_t>{0, 1, 8, 9}));
+}
+
+TEST_F(EpisodeTest, OfALongEpisodeTheRowsFromBeforeARestartAreDeletedInTheirTurn) {
+    mLimits.mRecordsPerEnd = 2;
+    const auto lTakeOne = [&](std::int64_t aNumber) {
+        const std::int64_t lTime = gcBase + aNumber * gcSecond;
+        take({makeQueueFull(gcPortA, lTime, lTime)}, lTime);
+    };
+    const auto lCountRows = [this] {
+        return ZTCDatabase(path(), ZTDA_ReadOnly).readNumber("SELECT count(*) FROM record");
+    };
+    for (std::int64_t i = 0; i < 10; ++i) {
+        lTakeOne(i);
+    }
+    const std::int64_t lRows = lCountRows();
+    EXPECT_GT(lRows, 0);
+    closeStore();
+    for (std::int64_t i = 10; i < 20; ++i) {
+        lTakeOne(i);
+    }
+    EXPECT_EQ(lCountRows(), lRows);
+    EXPECT_EQ(episodes().size(), 1U);
 }
 
 TEST_F(EpisodeTest, ALongEpisodeOfOneFrameKeepsAsManyRecordsAtItsEnd) {
