@@ -166,6 +166,26 @@ TEST_F(LedgerTest, TotalsOfManyAgentsAddUp) {
     EXPECT_EQ(lRow.mHeld, 5U);
 }
 
+TEST_F(LedgerTest, EachCountOfEndedAgentsAddsUp) {
+    ZTSPageCounts lCounts = counts(100, 0, 0, 0);
+    for (std::size_t i = 0; i < lCounts.mRefused.size(); ++i) {
+        lCounts.mRefused[i] = i + 1;
+    }
+    lCounts.mConsolidated = 60;
+    lCounts.mDropped = 50;
+    for (const char* const lpGeneration : {"one", "another", "a third"}) {
+        note(lpGeneration, lCounts);
+        EXPECT_FALSE(endAgent(lpGeneration));
+    }
+    const ZTSLedgerRow lRow = row();
+    EXPECT_EQ(lRow.mReceived, 300U);
+    EXPECT_EQ(lRow.mConsolidated, 180U);
+    EXPECT_EQ(lRow.mDropped, 150U);
+    for (std::size_t i = 0; i < lCounts.mRefused.size(); ++i) {
+        EXPECT_EQ(lRow.mRefused[i], 3 * (i + 1)) << i;
+    }
+}
+
 TEST_F(LedgerTest, AKnownLossOnTheWayIsNotCountedAgainWhenTheAgentEnds) {
     take({makeQueueFull(gcPortA, gcBase, gcBase, 90)});
     note(gcGeneration, counts(100, 0, 100, 0));
