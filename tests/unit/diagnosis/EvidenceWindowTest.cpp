@@ -67,6 +67,15 @@ TEST_F(EvidenceWindow, ARunThatGoesOnBehindTheTimeCountsAsFarAsTheTimeGoes) {
     EXPECT_EQ(gather(0, 20).mNotRunning, std::chrono::minutes(10));
 }
 
+TEST_F(EvidenceWindow, ARunThatBeginsBehindTheTimeChangesNothing) {
+    inTransaction([&] { store().beginRun(at(0)); });
+    inTransaction([&] { store().endRun(at(20)); });
+    inTransaction([&] { store().beginRun(at(60)); });
+    inTransaction([&] { store().noteRunning(at(90)); });
+    EXPECT_EQ(gather(0, 20).mNotRunning, std::chrono::minutes(0));
+    EXPECT_EQ(gather(0, 30).mNotRunning, std::chrono::minutes(10));
+}
+
 TEST_F(EvidenceWindow, OnlyTheLatestStateOfAKindCountsAndListeningIsNone) {
     inTransaction([&] { store().beginRun(at(0)); });
     noteStates(0, {{gcLink, ZTKST_Off}, {gcRscn, ZTKST_NoRights}, {gcPlogi, ZTKST_NoSource}});
