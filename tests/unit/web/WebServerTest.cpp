@@ -212,6 +212,22 @@ TEST_F(WebServer, AStreamGetsItsBeginningAndThenEveryEvent) {
     }
 }
 
+TEST_F(WebServer, AStreamStaysWhenTheTimeOfAnAnswerIsLongOver) {
+    ZTCWebServer& lrServer = start(ZTSWebLimits{.mResponseTime = milliseconds(300)});
+    ZTCHttpClient lStream(lrServer.getPort());
+    ASSERT_TRUE(lStream.send(scStreamRequest));
+    lStream.readUntil(": begin\n\n");
+    // Two answers that nobody reads, one after the other, show that the time has passed.
+    for (int i = 0; i < 2; ++i) {
+        ZTCHttpClient lSlow(lrServer.getPort());
+        ASSERT_TRUE(lSlow.send("GET /large HTTP/1.1\r\nHost: localhost\r\n\r\n"));
+        waitUntil([&] { return !lSlow.send("G"); }, "the end of an answer that nobody reads");
+    }
+    EXPECT_FALSE(lStream.isHungUpOn());
+    lrServer.publish("episode", "{}");
+    EXPECT_THAT(lStream.readUntil("{}\n\n"), HasSubstr("event: episode\n"));
+}
+
 TEST_F(WebServer, TheNinthStreamGets503AndAPlaceThatIsFreeAgainIsGiven) {
     ZTCWebServer& lrServer = start();
     std::vector<std::unique_ptr<ZTCHttpClient>> lReaders;
