@@ -209,6 +209,14 @@ TEST_F(Api, MetricsCountWhatTheHistoryHolds) {
                       HasSubstr("tavik_agent_up 1\n")));
 }
 
+TEST_F(Api, MetricsCountOpenEpisodesAndNoClosedOnes) {
+    take({makeQueueFull(gcPortA, gcBase, gcBase), makeQueueFull(gcPortB, gcBase, gcBase)});
+    ASSERT_EQ(closeAt(gcBase + 60 * gcMinute), 2U);
+    EXPECT_THAT(ask("/metrics").mBody, Not(HasSubstr("tavik_open_episodes{")));
+    take({makeQueueFull(gcPortA, gcBase + 60 * gcMinute, gcBase + 60 * gcMinute)});
+    EXPECT_THAT(ask("/metrics").mBody, HasSubstr("\ntavik_open_episodes{kind=\"queue-full\"} 1\n"));
+}
+
 TEST_F(Api, ThePageHasARowForEachKindOfTheTableAndForNoOther) {
     const std::string lText = ask("/kinds.js").mBody;
     for (const ZTSScopeEventKind& lcrKind : gcScopeEventKinds) {
