@@ -119,6 +119,18 @@ TEST_F(Warnings, AHookGetsTheEpisodeAndWhatIsToBeKnownOfTheWarning) {
                       HasSubstr("TAVIK_NEXT=2"), HasSubstr("TAVIK_EPISODE=1\n"), HasSubstr("TAVIK_TEST=0\n")));
 }
 
+TEST_F(Warnings, AHookOfAPortGetsThatPortsEpisodeThoughAnotherPortHasANewerOne) {
+    ZTSWarnRule lRule = rule("queue-full", keep("warned"));
+    lRule.mCount = 5;
+    start({lRule}).openHistory();
+    const std::int64_t lNow = toMicroseconds(getHistoryTime());
+    take({makeQueueFull(gcPortA, lNow, lNow, 5), makeQueueFull(gcPortB, lNow, lNow, 1)}, lNow);
+    mpWarnings->setLive("{}");
+    const nlohmann::json lDocument = document("warned");
+    EXPECT_EQ(lDocument["remotePort"]["wwpn"], makeName(gcPortA).toText());
+    EXPECT_EQ(lDocument["count"], 5);
+}
+
 TEST_F(Warnings, AHookGetsTheDisksBehindTheEpisode) {
     ZTSTopology lTopology;
     lTopology.mInitiators.emplace_back();
