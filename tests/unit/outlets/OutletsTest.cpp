@@ -2,6 +2,7 @@
 
 #include <gmock/gmock.h>
 #include <gtest/gtest.h>
+#include <sqlite3.h>
 
 #include <nlohmann/json.hpp>
 #include <sstream>
@@ -69,6 +70,18 @@ protected:
                .mEnd = aAt,
                .mOccurrences = 3,
                .mPortName = {}}});
+    }
+
+    /// Spoils the pages of the database, as a bad disk does.
+    void damage() {
+        std::string lContent = readFile(path());
+        std::fill(lContent.begin() + 4096 * 2, lContent.end(), '\x55');
+        writeFile(path(), lContent);
+        // A change by somebody else: what is open reads its pages anew.
+        sqlite3* lpDatabase = nullptr;
+        ASSERT_EQ(sqlite3_open(path().c_str(), &lpDatabase), SQLITE_OK);
+        EXPECT_EQ(sqlite3_exec(lpDatabase, "PRAGMA application_id = 1", nullptr, nullptr, nullptr), SQLITE_OK);
+        sqlite3_close(lpDatabase);
     }
 
     std::mutex mValueMutex;
@@ -278,6 +291,34 @@ TEST_F(Outlets, AHistoryThatCannotBeReadIsReportedAndReadLater) {
     lrOutlets.wake();
     waitUntil([&] { return lines().find("works again") != std::string::npos; }, "the end of the problem");
     EXPECT_TRUE(exists(lSettings.mNdjsonPath));
+}
+
+TEST_F(Outlets, ANewHistoryInThePlaceOfADamagedOneIsFedFromItsBeginning) {
+    static constexpr std::uint64_t scChanges = 200;
+    ZTSSettings lSettings = settings();
+    lSettings.mNdjsonPath = mDirectory.path("events.ndjson");
+    for (std::uint64_t i = 0; i < scChanges; ++i) {
+        take({makeQueueFull(gcPortA + i, gcBase, gcBase)});
+    }
+    const std::string lFormerId = store().getStoreId();
+    ZTCOutlets& lrOutlets = start(lSettings);
+    waitUntil([&] { return !value(scNdjsonSeq).empty(); }, "the lines of the first history");
+    closeStore();
+    damage();
+    waitUntil(
+        [&] {
+            lrOutlets.wake();
+            return lines().find("cannot read the history") != std::string::npos;
+        },
+        "the report of the damage");
+    takeOne();  // its writer sets the damaged one aside
+    ASSERT_NE(store().getStoreId(), lFormerId);
+    lrOutlets.wake();
+    waitUntil([&] { return sParseLines(readFile(lSettings.mNdjsonPath)).size() > scChanges; },
+              "the new history's line");
+    const nlohmann::json lLast = sParseLines(readFile(lSettings.mNdjsonPath)).back();
+    EXPECT_EQ(lLast["storeId"], store().getStoreId());
+    EXPECT_EQ(lLast["kind"], "link");
 }
 
 TEST_F(Outlets, AMetricsFileWhoseFolderIsGoneIsReportedOnceAndComesBackWithIt) {
