@@ -1,6 +1,7 @@
 #include <archive.h>
 #include <archive_entry.h>
 #include <gmock/gmock.h>
+#include <sys/stat.h>
 
 #include <array>
 #include <map>
@@ -102,6 +103,14 @@ TEST_F(Report, NoSecretOfTheConfigurationIsInIt) {
         }
     }
     EXPECT_EQ(lFiles.at("logs/qrv-tvk.log"), "started page-me [left out] [left out]\n");
+}
+
+TEST_F(Report, NoSecretOfTheConfigurationIsInTheMessagesOfTheService) {
+    const std::string lJournal = mTavik.path("journalctl");
+    writeFile(lJournal, "#!/bin/sh\necho 'page-me --token=s3cr3t-t0k3n hunter2 failed'\n");
+    ASSERT_EQ(chmod(lJournal.c_str(), 0700), 0);
+    mTavik.setVariable("PATH", mTavik.path("") + ":/usr/bin:/bin");
+    EXPECT_EQ(make().at("logs/journal.txt"), "page-me [left out] [left out] failed\n");
 }
 
 TEST_F(Report, WhatCannotBeHadIsNamedAndTheRestIsThere) {
