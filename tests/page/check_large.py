@@ -7,6 +7,7 @@ from check_cells import check_table
 
 MOST_MILLISECONDS = 1000
 SET_ASIDE = "a damaged history was set aside as"
+UNWRITABLE = "does not work:"
 VIEWS = {
     "now": ("#now", "headline", "COLLECTING"),
     "timeline": ("#timeline;range=30d", "range-text", " to "),
@@ -101,16 +102,20 @@ def check_paper(browser):
 
 
 def check_notes(browser):
-    """The lines that `tavik status` calls notes are in Now, each once, and are gone when their cause is."""
+    """Notes, and outputs that do not work, are in Now as in `tavik status`, each once, and are gone when their cause is."""
     notes = "return [...document.querySelectorAll('#notes li')].map((line) => line.textContent)"
 
     def told():
-        return [f"Note: {text}" for text in browser.ask("/api/v1/status")[0]["unknown"]]
+        status = browser.ask("/api/v1/status")[0]
+        return [f"Note: {text}" for text in status["unknown"]] + [f"Output: {warning['text']}" for warning in status["warnings"]]
     browser.open("#now")
-    browser.wait("the notes of the document", lambda: browser.run(notes) == told() != [])
+    for text in (SET_ASIDE, UNWRITABLE):
+        browser.wait_text("notes", text)
+    browser.wait("the notes of the document", lambda: browser.run(notes) == told())
     browser.wait("the remote ports", lambda: "array7" in browser.text("ports"))
-    require("the note is not there once", browser.text("view-now").count(SET_ASIDE) == 1)
-    parts = browser.driver.execute_async_script("import('/troubles.js').then((m) => arguments[0](m.noteBox('<i>a</i>').children.length))")
+    for text in (SET_ASIDE, UNWRITABLE):
+        require(f"'{text}' is not there once", browser.text("view-now").count(text) == 1)
+    parts = browser.driver.execute_async_script("import('/troubles.js').then((m) => arguments[0](m.noteBox(['a', '<i>a</i>']).children.length))")
     require("a note's text is read as markup", parts == 1)
     for path in browser.ask("/api/v1/status")[0]["damagedHistories"]:
         os.remove(path)

@@ -188,7 +188,14 @@ function showStatus(status) {
   document.title = `${status.host}: ${status.verdict.toLowerCase()} – Tavik`;
 }
 
-/** What could not be found out, or is in a damaged history: the lines that `tavik status` calls notes. */
+const failing = { hook: "Hook", output: "Output" };
+
+/** [label, text] of the lines that `tavik status` calls notes, hooks and outputs: Tavik collects all the same. */
+const notesOf = (status) => [
+  ...status.unknown.map((text) => ["Note", text]),
+  ...(status.warnings ?? []).filter(({ kind }) => kind in failing).map(({ kind, text }) => [failing[kind], text]),
+];
+
 function showNotes(notes) {
   const text = JSON.stringify(notes);
   if (text === shownNotes) {
@@ -231,7 +238,7 @@ export async function show() {
   element("headline").textContent = status.text;
   element("headline").className = `headline ${status.exit === 0 ? "good" : "bad"}`;
   element("troubles").replaceChildren(...status.troubles.map(troubleBox));
-  showNotes(status.unknown);
+  showNotes(notesOf(status));
   showLinks(status);
   await Promise.all([part("findings", showFindings), part("open-troubles", showOpen), part("ports", showPorts)]);
 }

@@ -22,4 +22,4 @@ export function troubleBox(trouble) {
   return box;
 }
 
-export const noteBox = (text) => make("li", [make("b", "Note: "), text], "trouble level-1");
+export const noteBox = ([label, text]) => make("li", [make("b", `${label}: `), text], "trouble level-1");
