@@ -217,6 +217,30 @@ TEST_F(Api, MetricsCountOpenEpisodesAndNoClosedOnes) {
     EXPECT_THAT(ask("/metrics").mBody, HasSubstr("\ntavik_open_episodes{kind=\"queue-full\"} 1\n"));
 }
 
+TEST_F(Api, MetricsHaveWhatTheProgramsKeepInTheHistory) {
+    fill();
+    ZTSGap lGap;
+    lGap.mReason = "the agent was killed";
+    lGap.mCounts = {{.mInitiator = {}, .mKind = gcQueueFull, .mHeld = 3, .mHandedOver = 4}};
+    inTransaction([&] {
+        store().setValue(gcAgentRestartsValue, "5");
+        store().setValue(gcHookFailuresValue, "6");
+        store().setValue(gcLibraryLossesValue, R"({"total": {"messages": 8}})");
+        store().setValue("outlet.ndjson.seq", "1");
+        store().setValue("outlet.ndjson.missed", "9");
+        store().setValue("outlet.journal.missed", "10");
+        ASSERT_TRUE(store().noteGap(lGap));
+    });
+    const std::string lText = ask("/metrics").mBody;
+    for (const char* const lpSample :
+         {"tavik_agent_restarts_total 5", "tavik_hook_failures_total 6", "tavik_gaps_total 1",
+          "tavik_lost_events_total{source=\"gap\"} 7", "tavik_lost_events_total{source=\"messages\"} 8",
+          "tavik_output_missed_total{output=\"ndjson\"} 9"}) {
+        EXPECT_THAT(lText, HasSubstr("\n" + std::string(lpSample) + "\n"));
+    }
+    EXPECT_THAT(lText, Not(HasSubstr("output=\"journal\""))) << "it has never written anything";
+}
+
 TEST_F(Api, ThePageHasARowForEachKindOfTheTableAndForNoOther) {
     const std::string lText = ask("/kinds.js").mBody;
     for (const ZTSScopeEventKind& lcrKind : gcScopeEventKinds) {
