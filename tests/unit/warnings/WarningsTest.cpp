@@ -131,6 +131,20 @@ TEST_F(Warnings, AHookOfAPortGetsThatPortsEpisodeThoughAnotherPortHasANewerOne) 
     EXPECT_EQ(lDocument["count"], 5);
 }
 
+TEST_F(Warnings, AHookOfAnInitiatorGetsItsEpisodeThoughAnotherInitiatorHasANewerOne) {
+    ZTSWarnRule lRule = rule("queue-full", keep("warned"));
+    lRule.mCount = 5;
+    lRule.mPer = "initiator";
+    start({lRule}).openHistory();
+    const std::int64_t lNow = toMicroseconds(getHistoryTime());
+    take({makeQueueFull(gcPortA, lNow, lNow, 5)}, lNow);
+    take({makeQueueFull(gcPortA, lNow, lNow, 1)}, lNow, gcLocalPort + 1);
+    mpWarnings->setLive("{}");
+    const nlohmann::json lDocument = document("warned");
+    EXPECT_EQ(lDocument["initiator"]["wwpn"], makeName(gcLocalPort).toText());
+    EXPECT_EQ(lDocument["count"], 5);
+}
+
 TEST_F(Warnings, AHookGetsTheDisksBehindTheEpisode) {
     ZTSTopology lTopology;
     lTopology.mInitiators.emplace_back();
