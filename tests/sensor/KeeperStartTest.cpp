@@ -147,6 +147,7 @@ TEST(KeeperStart, TellsTheServiceManagerWhenAReloadBeginsAndEndsWhateverTheFile)
         lSaid.waitFor("RELOADING=1\nMONOTONIC_USEC=");
         lSaid.waitFor("READY=1\n");
     }
+    lSensor.waitFor("StartAnswered ");  // an agent that does not listen yet cannot be asked to end
     lSensor.process().sendSignal(SIGTERM);
     EXPECT_EQ(lSensor.waitForExit(), 0);
 }
