@@ -2,14 +2,17 @@
 #ifndef TESTS_UNIT_CLIENT_TAVIKCTLFIXTURE_H
 #define TESTS_UNIT_CLIENT_TAVIKCTLFIXTURE_H
 
+#include <fcntl.h>
 #include <gmock/gmock.h>
 #include <gtest/gtest.h>
+#include <sys/stat.h>
 
 #include <algorithm>
 #include <nlohmann/json.hpp>
 #include <string>
 #include <vector>
 
+#include "sensor/client/include/FileDescriptor.h"
 #include "tests/support/ChildProcess.h"
 #include "tests/support/TemporaryDirectory.h"
 #include "tests/unit/client/FakeAgent.h"
@@ -54,6 +57,27 @@ protected:
         return {lStatus, lProcess.standardOutput(), lProcess.standardError()};
     }
 
+    /// What an agent does that has more records for each retrieval than a pipe takes as text.
+    static ZTCFakeAgent::ZTCStep servingMoreThanAPipeTakes() {
+        return
+            [lMany = makeSampleResponse(
+                 1,
+                 {makeSampleList("k", std::vector<ZTCBytes>(2000, makeSampleRecord(8, 0x02, bytesOf("01000000"))))})](
+                ZTCFakeAgent& arAgent, const ZTCWireBytes& acrRequest) {
+                arAgent.sendFrame(acrRequest[0] == 1 ? lMany : gcSuccess);
+            };
+    }
+
+    /// The tool with these arguments and a pipe as its output. The pipe is open for reading, and nobody reads.
+    ZTSChildProcessSetup setupUnread(const std::string& acrArguments) {
+        const std::string lPipe = mOther.path("output");
+        EXPECT_EQ(mkfifo(lPipe.c_str(), 0600), 0);
+        mUnread = ZTCFileDescriptor::open(lPipe.c_str(), O_RDONLY | O_NONBLOCK);
+        ZTSChildProcessSetup lSetup = setup({"-c", "exec \"$0\" " + acrArguments + " >" + lPipe, TAVIKCTL_PROGRAM});
+        lSetup.mProgram = "/bin/sh";
+        return lSetup;
+    }
+
     static void expectOneLine(const std::string& acrErrors) {
         EXPECT_THAT(acrErrors, testing::StartsWith("tavikctl: "));
         EXPECT_EQ(std::count(acrErrors.begin(), acrErrors.end(), '\n'), 1) << acrErrors;
@@ -62,6 +86,7 @@ protected:
     const ZTCTemporaryDirectory mDirectory;
     const ZTCTemporaryDirectory mOther;
     int mRuns = 0;
+    ZTCFileDescriptor mUnread;
 };
 
 inline nlohmann::json parseJson(const std::string& acrText) {

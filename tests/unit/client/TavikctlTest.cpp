@@ -29,18 +29,8 @@ TEST_F(Tavikctl, EachCommandSendsItsRequestAndEndsWith0) {
 }
 
 TEST_F(Tavikctl, AGetThatNobodyReadsKeepsNobodyElseFromTheAgent) {
-    // More text than a pipe takes: the first one stops while it prints.
-    const ZTCBytes lMany = makeSampleResponse(
-        1, {makeSampleList("k", std::vector<ZTCBytes>(2000, makeSampleRecord(8, 0x02, bytesOf("01000000"))))});
-    const ZTCFakeAgent lAgent(dir(), {[&](ZTCFakeAgent& arAgent, const ZTCWireBytes& acrRequest) {
-                                  arAgent.sendFrame(acrRequest[0] == 1 ? lMany : gcSuccess);
-                              }});
-    const std::string lPipe = mOther.path("output");
-    ASSERT_EQ(mkfifo(lPipe.c_str(), 0600), 0);
-    const ZTCFileDescriptor lReader = ZTCFileDescriptor::open(lPipe.c_str(), O_RDONLY | O_NONBLOCK);
-    ZTSChildProcessSetup lSetup = setup({"-c", "exec \"$0\" get >" + lPipe, TAVIKCTL_PROGRAM});
-    lSetup.mProgram = "/bin/sh";
-    ZTCChildProcess lGet(lSetup);
+    const ZTCFakeAgent lAgent(dir(), {servingMoreThanAPipeTakes()});
+    ZTCChildProcess lGet(setupUnread("get"));  // stops while it prints
     waitUntil([&] { return !lAgent.getRequests().empty(); }, "the request for records");
     const ZTSFinishedRun lOther = run({"--timeout", "20", "period", "3600"});
     EXPECT_EQ(lOther.mStatus, 0) << lOther.mErrors;

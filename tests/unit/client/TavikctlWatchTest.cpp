@@ -134,18 +134,8 @@ TEST_F(TavikctlWatch, ThePidFileIsTouchedAgainAndAgainWithinAnInterval) {
 }
 
 TEST_F(TavikctlWatch, AReaderThatStopsKeepsNeitherThePidFileNorASignalWaiting) {
-    // More text than a pipe takes: the watch writes into one that nobody reads.
-    const ZTCBytes lMany = makeSampleResponse(
-        1, {makeSampleList("k", std::vector<ZTCBytes>(2000, makeSampleRecord(8, 0x02, bytesOf("01000000"))))});
-    const ZTCFakeAgent lAgent(dir(), {[&](ZTCFakeAgent& arAgent, const ZTCWireBytes& acrRequest) {
-                                  arAgent.sendFrame(acrRequest[0] == 1 ? lMany : gcSuccess);
-                              }});
-    const std::string lPipe = mOther.path("output");
-    ASSERT_EQ(mkfifo(lPipe.c_str(), 0600), 0);
-    const ZTCFileDescriptor lReader = ZTCFileDescriptor::open(lPipe.c_str(), O_RDONLY | O_NONBLOCK);
-    ZTSChildProcessSetup lSetup = setup({"-c", "exec \"$0\" watch --interval 0.05 >" + lPipe, TAVIKCTL_PROGRAM});
-    lSetup.mProgram = "/bin/sh";
-    ZTCChildProcess lWatch(lSetup);
+    const ZTCFakeAgent lAgent(dir(), {servingMoreThanAPipeTakes()});
+    ZTCChildProcess lWatch(setupUnread("watch --interval 0.05"));
     waitUntil([&] { return lAgent.getRequests().size() >= 2; }, "a retrieval");
     sExpectTouch(dir() + "/qrv-sn.pid");
     sExpectTouch(dir() + "/qrv-sn.pid");
