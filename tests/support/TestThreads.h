@@ -1,5 +1,5 @@
-/// Threads that a test runs beside its own. What one of them throws fails the test. They are joined at the end of their
-/// scope, so declare them behind all that they use.
+/// Threads that a test starts. An exception in one of them fails the test. The end of the scope waits for them, so
+/// declare them after everything that they use.
 #ifndef TESTS_SUPPORT_TESTTHREADS_H
 #define TESTS_SUPPORT_TESTTHREADS_H
 
@@ -19,8 +19,8 @@
 /// One thread. Used by the thread that made it.
 class ZTCTestThread {
 public:
-    /// Starts a thread that calls aDo(). What goes on until the test says so takes a std::stop_token, and returns soon
-    /// after a stop was requested there. A failure has the name in its text.
+    /// Starts a thread that calls aDo(), or aDo(token) if it takes a std::stop_token: a loop ends when the token says
+    /// that a stop was requested. The text of a failure has the name.
     template <class Do>
     explicit ZTCTestThread(Do aDo, std::string aName = "a thread of the test")
         : mThread([this, lDo = std::move(aDo), lName = std::move(aName)](const std::stop_token& acrStop) mutable {

@@ -57,7 +57,7 @@ protected:
         return {lStatus, lProcess.standardOutput(), lProcess.standardError()};
     }
 
-    /// What an agent does that has more records for each retrieval than a pipe takes as text.
+    /// A step of the agent: each retrieval gets so many records that their text does not fit into a pipe.
     static ZTCFakeAgent::ZTCStep servingMoreThanAPipeTakes() {
         return
             [lMany = makeSampleResponse(

@@ -2,13 +2,13 @@
 
 #include <gmock/gmock.h>
 #include <gtest/gtest.h>
-#include <sqlite3.h>
 
 #include <nlohmann/json.hpp>
 #include <sstream>
 
 #include "sensor/metrics/include/SeriesPorts.h"
 #include "tests/support/Waiting.h"
+#include "tests/unit/store/Damage.h"
 #include "tests/unit/store/StoreFixture.h"
 #include "tests/unit/web/HttpClient.h"
 
@@ -70,18 +70,6 @@ protected:
                .mEnd = aAt,
                .mOccurrences = 3,
                .mPortName = {}}});
-    }
-
-    /// Spoils the pages of the database, as a bad disk does.
-    void damage() {
-        std::string lContent = readFile(path());
-        std::fill(lContent.begin() + 4096 * 2, lContent.end(), '\x55');
-        writeFile(path(), lContent);
-        // A change by somebody else: what is open reads its pages anew.
-        sqlite3* lpDatabase = nullptr;
-        ASSERT_EQ(sqlite3_open(path().c_str(), &lpDatabase), SQLITE_OK);
-        EXPECT_EQ(sqlite3_exec(lpDatabase, "PRAGMA application_id = 1", nullptr, nullptr, nullptr), SQLITE_OK);
-        sqlite3_close(lpDatabase);
     }
 
     std::mutex mValueMutex;
@@ -304,7 +292,7 @@ TEST_F(Outlets, ANewHistoryInThePlaceOfADamagedOneIsFedFromItsBeginning) {
     ZTCOutlets& lrOutlets = start(lSettings);
     waitUntil([&] { return !value(scNdjsonSeq).empty(); }, "the lines of the first history");
     closeStore();
-    damage();
+    damageHistory(path());
     waitUntil(
         [&] {
             lrOutlets.wake();

@@ -10,6 +10,7 @@
 #include <map>
 
 #include "sensor/store/src/DamageCheck.h"
+#include "tests/unit/store/Damage.h"
 #include "tests/unit/store/Integrity.h"
 #include "tests/unit/store/StoreFixture.h"
 
@@ -231,11 +232,7 @@ TEST_F(SchemaTest, DamageThatAQuestionMeetsIsSetAsideByReopening) {
     }
     closeStore();
     store();
-    std::string lContent = readFile(path());
-    std::fill(lContent.begin() + 4096 * 2, lContent.end(), '\x55');
-    writeFile(path(), lContent);
-    // A change by somebody else: the store reads its pages anew.
-    execute("PRAGMA user_version = " + std::to_string(getSchemaSteps().size()));
+    damageHistory(path());
     try {
         for (int i = 0; i < 100; ++i) {
             store().getValue("value " + std::to_string(i));

@@ -12,6 +12,7 @@
 
 #include "libkpm/include/ScopeEventKinds.h"
 #include "sensor/metrics/include/Metrics.h"
+#include "tests/unit/store/Damage.h"
 #include "tests/unit/store/StoreFixture.h"
 
 using testing::AllOf;
@@ -344,14 +345,7 @@ TEST_F(Api, AHistoryThatWasDamagedAndSetAsideIsReplacedByTheNewOne) {
     }
     EXPECT_EQ(ask("/api/v1/ports").mStatus, 200U);
     closeStore();
-    std::string lContent = readFile(path());
-    std::fill(lContent.begin() + 4096 * 2, lContent.end(), '\x55');
-    writeFile(path(), lContent);
-    // A change by somebody else: what is open reads its pages anew.
-    sqlite3* lpDatabase = nullptr;
-    ASSERT_EQ(sqlite3_open(path().c_str(), &lpDatabase), SQLITE_OK);
-    EXPECT_EQ(sqlite3_exec(lpDatabase, "PRAGMA application_id = 1", nullptr, nullptr, nullptr), SQLITE_OK);
-    sqlite3_close(lpDatabase);
+    damageHistory(path());
     EXPECT_EQ(ask("/api/v1/ports").mStatus, 503U);
     fill();  // its writer sets the damaged one aside
     ASSERT_EQ(mReports.size(), 1U);
